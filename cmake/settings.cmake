@@ -1,0 +1,40 @@
+# Compiler settings shared by all targets.
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_C_STANDARD 99)
+set(CMAKE_CXX_VISIBILITY_PRESET hidden)
+set(CMAKE_C_VISIBILITY_PRESET hidden)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+option(QORI_SANITIZE "Address and undefined-behaviour sanitizers" OFF)
+option(QORI_WERROR "Treat warnings as errors" OFF)
+
+find_program(QORI_CCACHE ccache)
+if(QORI_CCACHE)
+    set(CMAKE_C_COMPILER_LAUNCHER ${QORI_CCACHE})
+    set(CMAKE_CXX_COMPILER_LAUNCHER ${QORI_CCACHE})
+endif()
+
+add_library(qori_warnings INTERFACE)
+target_compile_options(qori_warnings INTERFACE
+    $<$<COMPILE_LANGUAGE:C,CXX>:-Wall -Wextra -Wshadow -Wconversion>
+    $<$<AND:$<BOOL:${QORI_WERROR}>,$<COMPILE_LANGUAGE:C,CXX>>:-Werror>)
+
+# The processor the library is built for, and floating-point arithmetic that means what it says. Callers on 32-bit
+# Windows align the stack to 4 bytes only.
+add_library(qori_target INTERFACE)
+target_compile_options(qori_target INTERFACE
+    $<$<COMPILE_LANGUAGE:C,CXX>:-mavx2 -mfma -ffp-contract=off -fno-math-errno>
+    $<$<AND:$<PLATFORM_ID:Windows>,$<COMPILE_LANGUAGE:C,CXX>>:-mfpmath=sse -mstackrealign>)
+if(QORI_SANITIZE)
+    # Unaligned elements are part of the contract (steps of any value), so alignment is not checked.
+    add_compile_options($<$<COMPILE_LANGUAGE:C,CXX>:-fsanitize=address,undefined> $<$<COMPILE_LANGUAGE:C,CXX>:-fno-sanitize=alignment>
+        $<$<COMPILE_LANGUAGE:C,CXX>:-fno-sanitize-recover=all> $<$<COMPILE_LANGUAGE:C,CXX>:-fno-omit-frame-pointer>)
+    add_link_options(-fsanitize=address,undefined)
+endif()
+
+# No C++ runtime: neither exceptions nor type information nor guarded statics nor heap.
+add_library(qori_freestanding INTERFACE)
+target_compile_options(qori_freestanding INTERFACE
+    $<$<COMPILE_LANGUAGE:CXX>:-fno-exceptions -fno-rtti -fno-threadsafe-statics -fno-asynchronous-unwind-tables>)

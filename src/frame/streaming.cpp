@@ -1,0 +1,21 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "streaming.h"
+
+#include "qorcore.h"
+
+namespace qori {
+
+bool streams(StreamRule rule, int32_t trafficBytes) {
+    if (trafficBytes <= rule.queryAbove) return false;
+    int32_t cache = 0;
+    if (qorGetMaxCacheSizeB(&cache) != 0 || cache <= 0) return false;
+    switch (rule.limit) {
+        case StreamRule::Limit::cache: return trafficBytes >= cache;
+        case StreamRule::Limit::aboveCache: return trafficBytes > cache;
+        case StreamRule::Limit::halfCache: return trafficBytes >= cache / 2;
+        case StreamRule::Limit::aboveHalfCache: return trafficBytes > cache / 2;
+    }
+    return false;
+}
+
+}  // namespace qori

@@ -1,0 +1,41 @@
+// SPDX-License-Identifier: Apache-2.0
+// When a call stores past the cache. Streaming pays where the result would be evicted before anyone reads it, so the
+// call's traffic is held against the largest cache; the choice never changes a result.
+#pragma once
+#include "image.h"
+
+namespace qori {
+
+struct StreamRule {
+    enum class Limit { cache, aboveCache, halfCache, aboveHalfCache };
+    int32_t queryAbove;   ///< Bytes of traffic up to which the cache size is not even asked for.
+    Limit limit;          ///< What the traffic must reach (or exceed) to stream.
+};
+
+namespace streamRules {
+/// Conversions to wider types, 32-bit copies between planar and packed, mirrors of C4, fills of 32-bit C4.
+inline constexpr StreamRule widening{1'048'576, StreamRule::Limit::cache};
+/// Column filters; traffic counts 16 bytes per pixel.
+inline constexpr StreamRule columnFilter{INT32_MIN, StreamRule::Limit::cache};
+/// 16u thresholds out of place.
+inline constexpr StreamRule threshold16u{262'144, StreamRule::Limit::aboveHalfCache};
+/// Copies that split or merge channels of 8- and 16-bit elements.
+inline constexpr StreamRule channelSplit{524'288, StreamRule::Limit::aboveCache};
+/// Zeroing and filling work buffers.
+inline constexpr StreamRule workFill{2'097'152, StreamRule::Limit::aboveCache};
+/// Fills of 8- and 16-bit images.
+inline constexpr StreamRule constantFill{3'145'728, StreamRule::Limit::halfCache};
+/// Every other copy: measured, streaming gains from half the cache on, as source and destination compete for it.
+inline constexpr StreamRule copy{1'048'576, StreamRule::Limit::halfCache};
+}  // namespace streamRules
+
+/// Bytes that a call moves, in 32-bit arithmetic that wraps: a call too large to count does not stream.
+constexpr int32_t traffic(QorImageSize roi, int bytesPerPixel) {
+    return static_cast<int32_t>(static_cast<uint32_t>(bytesPerPixel) * static_cast<uint32_t>(roi.width) *
+                                static_cast<uint32_t>(roi.height));
+}
+
+/// Asks the companion for the cache size on every call above the rule's bound; false when it cannot tell.
+bool streams(StreamRule rule, int32_t trafficBytes);
+
+}  // namespace qori

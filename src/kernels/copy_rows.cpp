@@ -1,0 +1,132 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "copy_rows.h"
+
+#include "simd.h"
+
+namespace qori::kernels {
+namespace {
+
+constexpr ptrdiff_t kVector = 32;
+
+/// Bytes from p to the next multiple of `boundary`, a power of two.
+QORI_INLINE ptrdiff_t toBoundary(const void* p, uintptr_t boundary) {
+    return static_cast<ptrdiff_t>(-reinterpret_cast<uintptr_t>(p) & (boundary - 1));
+}
+
+/// Up to 64 bytes by two accesses that overlap; both are read before either is written.
+QORI_INLINE void copyShort(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    if (bytes >= kVector) {
+        const Bytes first = load(src), last = load(src + bytes - kVector);
+        store(dst, first);
+        store(dst + bytes - kVector, last);
+    } else if (bytes >= 16) {
+        const Bytes ends = loadHalves(src, src + bytes - 16);
+        storeHalves(dst, dst + bytes - 16, ends);
+    } else if (bytes >= 8) {
+        const auto first = detail::loadWord<uint64_t>(src), last = detail::loadWord<uint64_t>(src + bytes - 8);
+        detail::storeWord(dst, first);
+        detail::storeWord(dst + bytes - 8, last);
+    } else if (bytes >= 4) {
+        const auto first = detail::loadWord<uint32_t>(src), last = detail::loadWord<uint32_t>(src + bytes - 4);
+        detail::storeWord(dst, first);
+        detail::storeWord(dst + bytes - 4, last);
+    } else if (bytes > 0) {
+        const uint8_t first = src[0], middle = src[bytes >> 1], last = src[bytes - 1];
+        dst[0] = first;
+        dst[bytes >> 1] = middle;
+        dst[bytes - 1] = last;
+    }
+}
+
+/// The body from an aligned destination on; the last 1 to 128 bytes are the caller's. `done` bytes are already copied.
+template <bool streaming>
+QORI_INLINE ptrdiff_t copyBlocks(uint8_t* dst, const uint8_t* src, ptrdiff_t done, ptrdiff_t bytes) {
+    for (; done < bytes - 4 * kVector; done += 4 * kVector) {
+        const Bytes a = load(src + done), b = load(src + done + kVector);
+        const Bytes c = load(src + done + 2 * kVector), d = load(src + done + 3 * kVector);
+        storeAs<streaming>(dst + done, a);
+        storeAs<streaming>(dst + done + kVector, b);
+        storeAs<streaming>(dst + done + 2 * kVector, c);
+        storeAs<streaming>(dst + done + 3 * kVector, d);
+    }
+    return done;
+}
+
+template <bool streaming>
+QORI_INLINE void copyAligned(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    if (bytes <= 2 * kVector) return copyShort(dst, src, bytes);
+    if (bytes <= 4 * kVector) {
+        const Bytes a = load(src), b = load(src + kVector);
+        const Bytes c = load(src + bytes - 2 * kVector), d = load(src + bytes - kVector);
+        store(dst, a);
+        store(dst + kVector, b);
+        store(dst + bytes - 2 * kVector, c);
+        store(dst + bytes - kVector, d);
+        return;
+    }
+    store(dst, load(src));
+    const ptrdiff_t done = copyBlocks<streaming>(dst, src, toBoundary(dst, kVector), bytes);
+    for (ptrdiff_t rest = 4 * kVector; rest > 0; rest -= kVector)
+        if (bytes - done > rest - kVector) store(dst + bytes - rest, load(src + bytes - rest));
+}
+
+/// Vectors of the pattern at a phase below 96.
+QORI_INLINE Bytes patternAt(const Pattern& pattern, ptrdiff_t offset) {
+    return load(pattern.bytes + offset % Pattern::period);
+}
+
+template <bool streaming>
+QORI_INLINE void fillAligned(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
+    const Bytes first = load(pattern.bytes);
+    if (bytes < kVector) return storePartial(dst, first, bytes);
+    store(dst, first);
+    ptrdiff_t done = toBoundary(dst, kVector);
+    const Bytes p0 = load(pattern.bytes + done), p1 = load(pattern.bytes + done + kVector);
+    const Bytes p2 = load(pattern.bytes + done + 2 * kVector);
+    for (; done <= bytes - 6 * kVector; done += 6 * kVector) {
+        storeAs<streaming>(dst + done, p0);
+        storeAs<streaming>(dst + done + kVector, p1);
+        storeAs<streaming>(dst + done + 2 * kVector, p2);
+        storeAs<streaming>(dst + done + 3 * kVector, p0);
+        storeAs<streaming>(dst + done + 4 * kVector, p1);
+        storeAs<streaming>(dst + done + 5 * kVector, p2);
+    }
+    // Up to six vectors are left; p0 comes next and the cycle goes on.
+    if (done <= bytes - kVector) store(dst + done, p0);
+    if (done <= bytes - 2 * kVector) store(dst + done + kVector, p1);
+    if (done <= bytes - 3 * kVector) store(dst + done + 2 * kVector, p2);
+    if (done <= bytes - 4 * kVector) store(dst + done + 3 * kVector, p0);
+    if (done <= bytes - 5 * kVector) store(dst + done + 4 * kVector, p1);
+    store(dst + bytes - kVector, patternAt(pattern, bytes - kVector));
+}
+
+}  // namespace
+
+void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<false>(dst, src, bytes); }
+void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<true>(dst, src, bytes); }
+
+void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool streamStores) {
+    constexpr ptrdiff_t block = 64;
+    const ptrdiff_t head = toBoundary(src, block);
+    if (bytes < block || head > bytes - block) return copyRow(dst, src, bytes);
+    copyRow(dst, src, head);
+    const bool streaming = streamStores && toBoundary(dst + head, kVector) == 0;
+    ptrdiff_t done = head;
+    for (; done <= bytes - block; done += block) {
+        const Bytes a{_mm256_stream_load_si256(reinterpret_cast<const __m256i*>(src + done))};
+        const Bytes b{_mm256_stream_load_si256(reinterpret_cast<const __m256i*>(src + done + kVector))};
+        if (streaming) {
+            stream(dst + done, a);
+            stream(dst + done + kVector, b);
+        } else {
+            store(dst + done, a);
+            store(dst + done + kVector, b);
+        }
+    }
+    copyRow(dst + done, src + done, bytes - done);
+}
+
+void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) { fillAligned<false>(dst, pattern, bytes); }
+void fillRowStreaming(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) { fillAligned<true>(dst, pattern, bytes); }
+
+}  // namespace qori::kernels
