@@ -1,0 +1,29 @@
+# Checks of the built files and of the tests themselves.
+set(python ${Python3_EXECUTABLE})
+set(checks ${CMAKE_CURRENT_SOURCE_DIR}/checks)
+
+add_test(NAME apigen COMMAND ${python} ${checks}/apigen_test.py)
+add_test(NAME header_is_current COMMAND ${python} ${checks}/header_is_current.py ${PROJECT_SOURCE_DIR})
+if(WIN32)
+    add_test(NAME dll_tables COMMAND ${python} ${checks}/dll_tables.py ${CMAKE_OBJDUMP} $<TARGET_FILE:qorik5>
+        ${PROJECT_BINARY_DIR}/generated/exports.txt)
+elseif(NOT QORI_SANITIZE)
+    add_test(NAME elf_tables COMMAND ${python} ${checks}/elf_tables.py $<TARGET_FILE:qorik5>
+        ${PROJECT_BINARY_DIR}/generated/exports.txt)
+endif()
+
+# Every export has been compared with its reference by one of the test binaries of this run.
+get_property(tests GLOBAL PROPERTY qori_tests)
+list(TRANSFORM tests REPLACE "(.+)" "swept_\\1.txt")
+add_test(NAME all_exports_swept COMMAND ${python} ${checks}/all_exports_swept.py ${PROJECT_BINARY_DIR}/generated/exports.txt ${tests})
+set_tests_properties(all_exports_swept PROPERTIES FIXTURES_REQUIRED swept)
+
+# The header stands alone in C99 and C++, and a program in each links.
+foreach(language c cpp)
+    add_executable(header_${language} checks/header.${language})
+    target_compile_options(header_${language} PRIVATE -Wall -Wextra -Wpedantic -Werror)
+    target_link_libraries(header_${language} PRIVATE qorik5_link)
+    target_link_options(header_${language} PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
+    set_target_properties(header_${language} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
+    add_test(NAME header_${language} COMMAND header_${language})
+endforeach()

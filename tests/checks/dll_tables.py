@@ -1,0 +1,38 @@
+"""The DLL exports exactly the registry's names, undecorated and sorted, through 16-byte stubs that jump through
+consecutive slots, and imports nothing but the operating system's own DLLs and the companion's four functions."""
+import re
+import subprocess
+import sys
+from pathlib import Path
+
+objdump, dll, list_file = sys.argv[1:]
+SYSTEM = {"kernel32.dll", "msvcrt.dll"}
+COMPANION = {"qorMalloc", "qorFree", "qorGetEnabledCpuFeatures", "qorGetMaxCacheSizeB"}
+
+expected = Path(list_file).read_text().split()
+assert expected == sorted(expected), "the registry's list is not sorted byte-wise"
+tables = subprocess.run([objdump, "-p", dll], check=True, capture_output=True, text=True).stdout
+
+names = re.findall(r"^\s*\[\s*\d+\](?: \+base\[\s*\d+\])?\s+(?:[0-9a-f]{4}\s+)?(\w\S*)$",
+                   tables.split("[Ordinal/Name Pointer] Table")[1], re.M)
+if names != expected:
+    sys.exit(f"exports differ from the registry: missing {sorted(set(expected) - set(names))[:5]}, "
+             f"extra {sorted(set(names) - set(expected))[:5]}, or not sorted")
+
+imports = {}
+for block in re.split(r"DLL Name: ", tables)[1:]:
+    name, _, rest = block.partition("\n")
+    imports[name.strip().lower()] = set(re.findall(r"^\t[0-9a-f]+[ \t]+\d+[ \t]+(\w+)", rest, re.M))
+if imports.keys() - SYSTEM != {"qorcore-8.2.dll"}:
+    sys.exit(f"imports from {sorted(imports)}")
+if imports["qorcore-8.2.dll"] != COMPANION:
+    sys.exit(f"imports {sorted(imports['qorcore-8.2.dll'])} from the companion")
+
+code = subprocess.run([objdump, "-d", "-j", ".text", dll], check=True, capture_output=True, text=True).stdout
+jumps = dict(re.findall(r"<_(qori\w+)>:\n\s*([0-9a-f]+:\s+ff 25 [0-9a-f ]{11})", code))
+stubs = [(int(jumps[n].split(":")[0], 16), int.from_bytes(bytes.fromhex(jumps[n].split("ff 25")[1].replace(" ", "")), "little"))
+         for n in expected]
+for i, (address, slot) in enumerate(stubs):
+    if address != stubs[0][0] + 16 * i or slot != stubs[0][1] + 4 * i:
+        sys.exit(f"stub {i} ({expected[i]}) at {address:#x} jumps through {slot:#x}")
+print(f"{len(names)} exports, imports from {', '.join(sorted(imports))}")
