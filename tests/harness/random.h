@@ -3,17 +3,24 @@
 #pragma once
 #include <cstdint>
 #include <limits>
-#include <random>
 #include <type_traits>
+
+#include "qori.h"
 
 namespace qori::test {
 
 class Random {
 public:
-    explicit Random(uint64_t seed) : engine_(seed) {}
+    explicit Random(uint64_t seed) : state_(seed) {}
 
-    uint64_t bits() { return engine_(); }
-    int below(int n) { return static_cast<int>(bits() % static_cast<uint64_t>(n)); }
+    /// The splitmix64 generator (Steele, Lea, Flood: Fast splittable pseudorandom number generators, 2014).
+    uint64_t bits() {
+        uint64_t z = state_ += 0x9E3779B97F4A7C15u;
+        z = (z ^ z >> 30) * 0xBF58476D1CE4E5B9u;
+        z = (z ^ z >> 27) * 0x94D049BB133111EBu;
+        return z ^ z >> 31;
+    }
+    int below(int n) { return static_cast<int>((bits() >> 32) * static_cast<uint32_t>(n) >> 32); }
     bool oneIn(int n) { return below(n) == 0; }
 
     /// Integers: an extreme one time in four. Floats: any bit pattern one time in eight, else moderate values.
@@ -28,6 +35,9 @@ public:
                 return any;
             }
             return static_cast<T>(static_cast<int32_t>(bits())) / static_cast<T>(1 << 20);
+        } else if constexpr (requires(T t) { t.re; }) {
+            using Part = decltype(T::re);
+            return {value<Part>(), value<Part>()};
         } else {
             using Limits = std::numeric_limits<T>;
             constexpr T extremes[] = {Limits::min(), Limits::max(), 0, 1, static_cast<T>(Limits::max() - 1),
@@ -37,7 +47,7 @@ public:
     }
 
 private:
-    std::mt19937_64 engine_;
+    uint64_t state_;
 };
 
 /// The generator of the running test: seeded per test, so that one test's draw does not depend on another.

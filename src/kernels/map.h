@@ -1,0 +1,136 @@
+// SPDX-License-Identifier: Apache-2.0
+// Element-wise row kernels: one loop for every operation, type and layout. A block is as many elements as one vector of
+// the smallest element type holds, so that each image contributes whole vectors to it.
+//
+// An operation is a callable: Pack<D, n> op(int phase, Pack<S, n>... sources), where phase runs 0, 1, 2, 0, ... over the
+// blocks of a row: with 1, 3 or 4 channels, constants per channel repeat after three blocks. It may keep state (a
+// warning seen) and may offer
+//     Pack<D, n> tail(int phase, ptrdiff_t count, Pack<S, n>... sources)   for the last, partial block, whose elements
+//                                                                           from count on are zeros and never stored;
+//     static constexpr bool mayStream = true                               to be compiled with streaming stores too.
+#pragma once
+#include <algorithm>
+
+#include "frame/driver.h"
+#include "simd.h"
+
+namespace qori::kernels {
+
+/// n elements of type T in whole vectors.
+template <class T, int n>
+struct Pack {
+    static constexpr int vectors = n * static_cast<int>(sizeof(T)) / 32;
+    Vec<T> v[vectors];
+};
+
+template <class... T>
+constexpr int blockOf = 32 / static_cast<int>(std::min({sizeof(T)...}));
+
+namespace detail {
+
+template <class T, int n>
+QORI_INLINE Pack<T, n> loadPack(const T* p) {
+    Pack<T, n> pack;
+    for (int i = 0; i < Pack<T, n>::vectors; ++i) pack.v[i] = load(p + i * Vec<T>::lanes);
+    return pack;
+}
+
+template <class T, int n>
+QORI_INLINE Pack<T, n> loadPackUpTo(const T* p, ptrdiff_t count) {
+    Pack<T, n> pack;
+    for (int i = 0; i < Pack<T, n>::vectors; ++i) pack.v[i] = loadUpTo(p + i * Vec<T>::lanes, count - i * Vec<T>::lanes);
+    return pack;
+}
+
+/// Keeps the fourth element of each four of `old`.
+template <class T>
+QORI_INLINE Vec<T> withAlphaOf(Vec<T> a, Vec<T> old) {
+    if constexpr (sizeof(T) == 1) {
+        return fromInteger<T>(_mm256_blendv_epi8(toInteger(a.v), toInteger(old.v), _mm256_set1_epi32(static_cast<int>(0xFF000000u))));
+    } else if constexpr (sizeof(T) == 2) {
+        return fromInteger<T>(_mm256_blend_epi16(toInteger(a.v), toInteger(old.v), 0x88));
+    } else if constexpr (sizeof(T) == 4) {
+        return fromInteger<T>(_mm256_blend_epi32(toInteger(a.v), toInteger(old.v), 0x88));
+    } else {
+        return fromInteger<T>(_mm256_blend_epi32(toInteger(a.v), toInteger(old.v), 0xC0));
+    }
+}
+
+template <bool keepAlpha, bool streaming, class T, int n>
+QORI_INLINE void storePack(T* p, Pack<T, n> pack) {
+    for (int i = 0; i < Pack<T, n>::vectors; ++i) {
+        T* const at = p + i * Vec<T>::lanes;
+        if constexpr (keepAlpha) pack.v[i] = withAlphaOf(pack.v[i], load(at));
+        storeAs<streaming>(at, pack.v[i]);
+    }
+}
+
+template <bool keepAlpha, class T, int n>
+QORI_INLINE void storePackUpTo(T* p, Pack<T, n> pack, ptrdiff_t count) {
+    for (int i = 0; i < Pack<T, n>::vectors; ++i) {
+        T* const at = p + i * Vec<T>::lanes;
+        const ptrdiff_t rest = count - i * Vec<T>::lanes;
+        if (rest <= 0) return;
+        if constexpr (keepAlpha) pack.v[i] = withAlphaOf(pack.v[i], loadUpTo(at, rest));
+        storeUpTo(at, pack.v[i], rest);
+    }
+}
+
+template <class Op, class... Packs>
+QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
+    if constexpr (requires { op.tail(phase, count, packs...); }) return op.tail(phase, count, packs...);
+    else return op(phase, packs...);
+}
+
+}  // namespace detail
+
+/// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
+/// sources may be the same. Streaming wants dst on a 32-byte boundary and is ignored elsewhere.
+template <bool keepAlpha, class Op, class D, class... S>
+QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
+    constexpr int n = blockOf<D, S...>;
+    constexpr bool mayStream = requires { Op::mayStream; };
+    const auto body = [&]<bool streams>(std::bool_constant<streams>) {
+        ptrdiff_t i = 0;
+        for (; i <= elements - 3 * n; i += 3 * n) {
+            for (int phase = 0; phase < 3; ++phase)
+                detail::storePack<keepAlpha, streams>(dst + i + phase * n, op(phase, detail::loadPack<S, n>(src + i + phase * n)...));
+        }
+        int phase = 0;
+        for (; i <= elements - n; i += n, ++phase)
+            detail::storePack<keepAlpha, streams>(dst + i, op(phase, detail::loadPack<S, n>(src + i)...));
+        if (i < elements) {
+            const ptrdiff_t rest = elements - i;
+            detail::storePackUpTo<keepAlpha>(dst + i, detail::applyTail(op, phase, rest, detail::loadPackUpTo<S, n>(src + i, rest)...), rest);
+        }
+    };
+    if constexpr (mayStream) {
+        if (streaming && reinterpret_cast<uintptr_t>(dst) % 32 == 0) return body(std::true_type{});
+    }
+    body(std::false_type{});
+}
+
+/// mapRow over a region of `channels` interleaved channels.
+template <bool keepAlpha = false, class Op, class D, class... S>
+void mapImage(QorImageSize roi, int channels, Op&& op, bool streaming, Image<D> dst, Image<const S>... src) {
+    forEachRow(roi, [&](ptrdiff_t pixels, D* d, const S*... s) {
+        mapRow<keepAlpha>(op, pixels * channels, streaming, d, s...);
+    }, walk(dst, channels), walk(src, channels)...);
+    if (streaming) streamFence();
+}
+
+/// One constant per channel, repeated over three vectors: the constants of phase p are v[p]. AC4 constants come as four
+/// with any fourth.
+template <class T>
+struct ChannelVectors {
+    Vec<T> v[3];
+};
+
+template <class T>
+ChannelVectors<T> channelVectors(const T* values, int channels) {
+    alignas(32) T all[3 * Vec<T>::lanes];
+    for (int i = 0; i < 3 * Vec<T>::lanes; ++i) all[i] = values[i % channels];
+    return {{load(all), load(all + Vec<T>::lanes), load(all + 2 * Vec<T>::lanes)}};
+}
+
+}  // namespace qori::kernels
