@@ -164,6 +164,19 @@ typedef enum QorDataType {
     qor64f = 19
 } QorDataType;
 
+/** How a result between two representable values is rounded. */
+typedef enum QorRoundingMode {
+    roundTowardZero = 0,  /**< Truncate. */
+    roundNearestEven = 1, /**< To nearest; an exact half goes to the even neighbour. */
+    roundHalfAway = 2     /**< To nearest; an exact half goes away from zero. */
+} QorRoundingMode;
+
+/** Speed or accuracy, where a function offers the choice; every value but hintAccurate means hintFast. */
+typedef enum QorAccuracyHint {
+    hintFast = 1,
+    hintAccurate = 2
+} QorAccuracyHint;
+
 /** Flags of qoriCopyManaged; they combine. */
 typedef enum QorCopyFlags {
     copyStreamStore = 1, /**< Stores bypass the cache. */

@@ -1,0 +1,137 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bench.h"
+
+#include <benchmark/benchmark.h>
+#include <immintrin.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstring>
+
+namespace qori::bench {
+namespace {
+
+std::vector<Row>& allRows() {
+    static std::vector<Row> rows;
+    return rows;
+}
+
+using Clock = std::chrono::steady_clock;
+
+double secondsOf(const std::function<void()>& work, int repeats) {
+    const auto begin = Clock::now();
+    for (int i = 0; i < repeats; ++i) {
+        work();
+        benchmark::ClobberMemory();
+    }
+    return std::chrono::duration<double>(Clock::now() - begin).count() / repeats;
+}
+
+void readAll(const uint8_t* p, int64_t bytes) {
+    __m256i a = _mm256_setzero_si256(), b = a, c = a, d = a;
+    int64_t i = 0;
+    for (; i + 128 <= bytes; i += 128) {
+        const auto* v = reinterpret_cast<const __m256i*>(p + i);
+        a = _mm256_or_si256(a, _mm256_loadu_si256(v));
+        b = _mm256_or_si256(b, _mm256_loadu_si256(v + 1));
+        c = _mm256_or_si256(c, _mm256_loadu_si256(v + 2));
+        d = _mm256_or_si256(d, _mm256_loadu_si256(v + 3));
+    }
+    benchmark::DoNotOptimize(_mm256_or_si256(_mm256_or_si256(a, b), _mm256_or_si256(c, d)));
+}
+
+/// The roofline over its own buffers.
+std::function<void()> rooflineOf(Roofline kind, int64_t bytes) {
+    const auto allocate = [](int64_t n) {
+        auto* p = static_cast<uint8_t*>(std::aligned_alloc(64, static_cast<size_t>((n + 63) / 64 * 64)));
+        std::memset(p, 1, static_cast<size_t>(n));
+        return std::shared_ptr<uint8_t>(p, std::free);
+    };
+    if (kind == Roofline::read) {
+        auto source = allocate(bytes);
+        return [=] { readAll(source.get(), bytes); };
+    }
+    if (kind == Roofline::set) {
+        auto target = allocate(bytes);
+        return [=] { std::memset(target.get(), 3, static_cast<size_t>(bytes)); };
+    }
+    auto source = allocate(bytes / 2), target = allocate(bytes / 2);
+    return [=] { std::memcpy(target.get(), source.get(), static_cast<size_t>(bytes / 2)); };
+}
+
+struct Timed {
+    std::function<void()> work;
+    int repeats = 1;
+    std::vector<double> seconds = {};
+
+    double median() {
+        std::nth_element(seconds.begin(), seconds.begin() + static_cast<ptrdiff_t>(seconds.size() / 2), seconds.end());
+        return seconds[seconds.size() / 2];
+    }
+};
+
+/// Enough calls for a fifth of a millisecond, so that the clock does not matter.
+Timed prepare(std::function<void()> work) {
+    Timed timed{std::move(work)};
+    secondsOf(timed.work, 1);
+    const double once = secondsOf(timed.work, 3);
+    timed.repeats = static_cast<int>(std::clamp(2e-4 / std::max(once, 1e-9), 1.0, 1e6));
+    return timed;
+}
+
+void run(benchmark::State& state, const Row& row, Size size) {
+    const Contenders contenders = row.make(size);
+    const auto bytes = static_cast<int64_t>(row.bytesPerPixel * static_cast<double>(size.pixels()));
+    Timed ours = prepare(contenders.ours), roof = prepare(rooflineOf(row.roofline, bytes));
+    Timed copy = prepare(rooflineOf(Roofline::copy, 2 * size.pixels()));
+    std::vector<Timed*> all = {&ours, &roof, &copy};
+    Timed plain, peer;
+    if (contenders.plain) {
+        plain = prepare(contenders.plain);
+        all.push_back(&plain);
+    }
+    if (contenders.peer) {
+        peer = prepare(contenders.peer);
+        all.push_back(&peer);
+    }
+    for (auto _ : state) {
+        for (Timed* timed : all) timed->seconds.push_back(secondsOf(timed->work, timed->repeats));
+        state.SetIterationTime(ours.seconds.back());
+    }
+    const double seconds = ours.median(), pixels = static_cast<double>(size.pixels());
+    auto& out = state.counters;
+    out["Mpix/s"] = pixels / seconds * 1e-6;
+    out["GB/s"] = row.bytesPerPixel * pixels / seconds * 1e-9;
+    out["ns"] = seconds * 1e9;
+    out["roof"] = roof.median() / seconds;
+    if (contenders.plain) out["vs_plain"] = plain.median() / seconds;
+    if (contenders.peer) out["vs_peer"] = peer.median() / seconds;
+    constexpr double kCopyAtL2 = 51'853, kCopyAtFrame = 15'345;
+    const bool isFrame = size.width == kFrame.width, isL2 = size.width == kL2.width;
+    const double best = isFrame ? row.bestAtFrame / kCopyAtFrame : isL2 ? row.bestAtL2 / kCopyAtL2 : 0;
+    if (best > 0) out["vs_best"] = copy.median() / seconds / best;
+}
+
+void registerAll() {
+    for (const Row& row : allRows())
+        for (Size size : row.sizes)
+            benchmark::RegisterBenchmark((row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
+                                         [&row, size](benchmark::State& state) { run(state, row, size); })
+                ->UseManualTime()->Iterations(size.pixels() > 20'000'000 ? 7 : 41)->Unit(benchmark::kMicrosecond);
+}
+
+}  // namespace
+
+Rows::Rows(std::vector<Row> rows) {
+    for (Row& row : rows) allRows().push_back(std::move(row));
+}
+
+}  // namespace qori::bench
+
+int main(int argc, char** argv) {
+    qori::bench::registerAll();
+    benchmark::Initialize(&argc, argv);
+    if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 1;
+    benchmark::RunSpecifiedBenchmarks();
+    return 0;
+}
