@@ -50,9 +50,11 @@ QorResult copyMasked(Image<const T> src, Image<T> dst, QorImageSize roi, Image<c
 template <class T, int n>
 QorResult extractChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    forEachRow(roi, [](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::extractRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels);
+    const bool streaming = streamsChannels<T>(roi, n, 1);
+    forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) {
+        kernels::extractRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
     }, walk(src, n), walk(dst, 1));
+    if (streaming) streamFence();
     return QOR_OK;
 }
 

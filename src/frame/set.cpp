@@ -14,7 +14,7 @@ QorResult setPixels(const T* value, Image<T> dst, QorImageSize roi) {
     constexpr StreamRule rule = sizeof(T) == 4 ? streamRules::widening : streamRules::constantFill;
     const bool streaming = streams(rule, traffic(roi, n * elementBytes<T>));
     const auto fill = streaming ? kernels::fillRowStreaming : kernels::fillRow;
-    const kernels::Pattern pattern = kernels::patternOf(value, n);
+    const kernels::Pattern pattern = kernels::patternOf<n>(value);
     forEachRow(roi, [&](ptrdiff_t pixels, T* d) { fill(asBytes(d), pattern, pixels * n * elementBytes<T>); }, walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
@@ -24,7 +24,7 @@ template <class T>
 QorResult setColour(const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(value, dst), sizeCheck(roi))) return r;
     const T pixel[4] = {value[0], value[1], value[2], T{}};
-    const kernels::Pattern pattern = kernels::patternOf(pixel, 4);
+    const kernels::Pattern pattern = kernels::patternOf<4>(pixel);
     forEachRow(roi, [&](ptrdiff_t pixels, T* d) {
         kernels::selectFillRow<4 * elementBytes<T>, 3 * elementBytes<T>>(asBytes(d), pattern, pixels);
     }, walk(dst, 4));
@@ -37,7 +37,7 @@ QorResult setMasked(const T* value, Image<T> dst, QorImageSize roi, Image<const 
     constexpr int pixel = channels(layout) * elementBytes<T>, selected = processedChannels(layout) * elementBytes<T>;
     T values[channels(layout)] = {};
     for (int i = 0; i < processedChannels(layout); ++i) values[i] = value[i];
-    const kernels::Pattern pattern = kernels::patternOf(values, channels(layout));
+    const kernels::Pattern pattern = kernels::patternOf<channels(layout)>(values);
     forEachRow(roi, [&](ptrdiff_t pixels, T* d, const uint8_t* m) {
         kernels::maskedFillRow<pixel, selected>(asBytes(d), pattern, m, pixels);
     }, walk(dst, channels(layout)), walk(mask, 1));
@@ -48,7 +48,7 @@ template <class T, int n>
 QorResult setChannel(const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(dst), sizeCheck(roi))) return r;
     T pixel[n] = {*value};
-    const kernels::Pattern pattern = kernels::patternOf(pixel, n);
+    const kernels::Pattern pattern = kernels::patternOf<n>(pixel);
     forEachRow(roi, [&](ptrdiff_t pixels, T* d) {
         kernels::selectFillRow<n * elementBytes<T>, elementBytes<T>>(asBytes(d), pattern, pixels);
     }, walk(dst, n));

@@ -3,6 +3,7 @@
 // 16 / element whole pixels; byte (pixel * channels + channel) * element + r of a span is byte r of that element.
 #pragma once
 #include <array>
+#include <cstddef>
 #include <cstdint>
 
 namespace qori::kernels {
@@ -25,15 +26,6 @@ constexpr ByteTable bothHalves(Fill fill) {
 /// Byte i of a plane's half comes from the byte of the span with this index.
 constexpr int spanIndex(int i, int channels, int element, int channel) {
     return (i / element * channels + channel) * element + i % element;
-}
-
-/// Takes a channel out of half `half` of a span: zeros where the channel's bytes lie in other halves.
-template <int channels, int element>
-constexpr ByteTable takeChannel(int channel, int half) {
-    return bothHalves([=](int i) {
-        const int index = spanIndex(i, channels, element, channel);
-        return index / 16 == half ? index % 16 : kNone;
-    });
 }
 
 /// Takes a channel out of a half in which the bytes of all halves that belong to it have been mixed.
@@ -77,26 +69,21 @@ constexpr ByteTable interleaveWords() {
     return table;
 }
 
-/// How vector k of a destination row with pixels of `pixelBytes` gathers elements of `element` bytes from a source row
-/// with one element per pixel: a 16-byte window of the source and an index into it.
+/// Where vector k of a row with pixels of `pixelBytes` finds the mask of each of its bytes: a 16-byte window of the
+/// mask of 32 pixels and an index into it.
 struct Window {
     int begin;
     ByteTable index;
 };
 
-/// repeat: every element of the destination pixel, else only its first; the others become 0.
-template <int pixelBytes, int element, bool repeat>
-constexpr auto windows() {
-    std::array<Window, pixelBytes / element> all{};
-    for (int k = 0; k < pixelBytes / element; ++k) {
-        const int first = 32 * k / pixelBytes * element;
-        all[static_cast<size_t>(k)].begin = first > 16 ? 16 : first;
-        for (int i = 0; i < 32; ++i) {
-            const int within = (32 * k + i) % pixelBytes;
-            const int source = (32 * k + i) / pixelBytes * element + within % element;
-            all[static_cast<size_t>(k)].index.at[i] = repeat || within < element
-                ? static_cast<uint8_t>(source - all[static_cast<size_t>(k)].begin) : kNone;
-        }
+template <int pixelBytes>
+constexpr auto maskWindows() {
+    std::array<Window, pixelBytes> all{};
+    for (int k = 0; k < pixelBytes; ++k) {
+        Window& window = all[static_cast<size_t>(k)];
+        const int first = 32 * k / pixelBytes;
+        window.begin = first > 16 ? 16 : first;
+        for (int i = 0; i < 32; ++i) window.index.at[i] = static_cast<uint8_t>((32 * k + i) / pixelBytes - window.begin);
     }
     return all;
 }

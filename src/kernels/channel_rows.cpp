@@ -9,13 +9,12 @@ namespace {
 
 QORI_INLINE Bytes table(const ByteTable& bytes) { return load(bytes.at); }
 
-/// The two spans of a group side by side: half k of the first span and of the second.
-template <int channels>
-QORI_INLINE Bytes loadSpans(const uint8_t* in, int k) { return loadHalves(in + 16 * k, in + 16 * (channels + k)); }
-
-template <int channels, bool streaming>
-QORI_INLINE void storeSpans(uint8_t* out, int k, Bytes a) {
-    storeHalvesAs<streaming>(out + 16 * k, out + 16 * (channels + k), a);
+/// make(0) to make(n - 1).
+template <size_t n>
+constexpr std::array<ByteTable, n> tables(ByteTable (*make)(int)) {
+    std::array<ByteTable, n> all{};
+    for (size_t k = 0; k < n; ++k) all[k] = make(static_cast<int>(k));
+    return all;
 }
 
 /// Of three halves, the one that holds bytes of `channel` at each position: positions repeat modulo 16 because 3 and
@@ -41,7 +40,7 @@ QORI_INLINE void transposeWords(Bytes (&a)[4]) {
 
 template <int channels, int element>
 struct Split {
-    static constexpr int pixels = 32 / element;
+    static constexpr int span = 16 / element;
     static constexpr bool mayStream = true;
     static constexpr std::array<Run, 1> in = {wholePixels(channels * element)};
     static constexpr auto out = [] {
@@ -50,34 +49,35 @@ struct Split {
         return runs;
     }();
 
-    template <bool streaming, class Out, class In>
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
         Bytes a[channels];
-        for (int k = 0; k < channels; ++k) a[k] = loadSpans<channels>(from[0], k);
+        for (int k = 0; k < channels; ++k) a[k] = loadSpans<channels, spans>(from[0], k);
         if constexpr (channels == 3) {
             static constexpr ByteTable take[3] = {takeMixed<3, element>(0), takeMixed<3, element>(1), takeMixed<3, element>(2)};
             for (int c = 0; c < 3; ++c)
-                storeAs<streaming>(to[static_cast<size_t>(c)], shuffleHalves(mix3<element>(a[0], a[1], a[2], c), table(take[c])));
+                storeSpans<1, spans, streaming>(to[static_cast<size_t>(c)], 0,
+                                                shuffleHalves(mix3<element>(a[0], a[1], a[2], c), table(take[c])));
         } else {
             static constexpr ByteTable words = channelWords<element>();
             for (Bytes& half : a) half = element == 4 ? half : shuffleHalves(half, table(words));
             transposeWords(a);
-            for (size_t c = 0; c < 4; ++c) storeAs<streaming>(to[c], a[c]);
+            for (size_t c = 0; c < 4; ++c) storeSpans<1, spans, streaming>(to[c], 0, a[c]);
         }
     }
 };
 
 template <int channels, int element>
 struct Merge {
-    static constexpr int pixels = 32 / element;
+    static constexpr int span = 16 / element;
     static constexpr bool mayStream = true;
     static constexpr auto in = Split<channels, element>::out;
     static constexpr std::array<Run, 1> out = {wholePixels(channels * element)};
 
-    template <bool streaming, class Out, class In>
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
         Bytes a[channels];
-        for (size_t c = 0; c < channels; ++c) a[c] = load(from[c]);
+        for (size_t c = 0; c < channels; ++c) a[c] = loadSpans<1, spans>(from[c], 0);
         if constexpr (channels == 3) {
             static constexpr ByteTable put[3] = {putMixed<3, element>(0), putMixed<3, element>(1), putMixed<3, element>(2)};
             static constexpr ByteTable second[3] = {selectChannel<3, element>(1, 0), selectChannel<3, element>(1, 1),
@@ -86,74 +86,108 @@ struct Merge {
                                                    selectChannel<3, element>(2, 2)};
             for (int c = 0; c < 3; ++c) a[c] = shuffleHalves(a[c], table(put[c]));
             for (int k = 0; k < 3; ++k)
-                storeSpans<3, streaming>(to[0], k, blend(blend(a[0], a[1], table(second[k])), a[2], table(third[k])));
+                storeSpans<3, spans, streaming>(to[0], k, blend(blend(a[0], a[1], table(second[k])), a[2], table(third[k])));
         } else {
             static constexpr ByteTable bytes = interleaveWords<element>();
             transposeWords(a);
             for (int k = 0; k < 4; ++k)
-                storeSpans<4, streaming>(to[0], k, element == 4 ? a[k] : shuffleHalves(a[k], table(bytes)));
+                storeSpans<4, spans, streaming>(to[0], k, element == 4 ? a[k] : shuffleHalves(a[k], table(bytes)));
         }
     }
 };
 
+/// Where half k of a span of one-channel pixels is accessed: the last one begins early, so that it ends with the
+/// channel's last element and not with the pixel.
+template <int channels, int element>
+constexpr int channelHalf(int k) { return k < channels - 1 ? 16 * k : 16 * k - (channels - 1) * element; }
+
+template <int channels, int element, int spans>
+QORI_INLINE Bytes loadChannelHalf(const uint8_t* in, int k) {
+    return loadSpans<channels, spans>(in + channelHalf<channels, element>(k) - 16 * k, k);
+}
+
 template <int channels, int element>
 struct Extract {
-    static constexpr int pixels = 32 / element;
-    static constexpr bool mayStream = false;
+    static constexpr int span = 16 / element;
+    static constexpr bool mayStream = true;
     static constexpr std::array<Run, 1> in = {oneChannel(channels * element, element)};
     static constexpr std::array<Run, 1> out = {wholePixels(element)};
 
-    template <bool streaming, class Out, class In>
+    /// The elements of the plane's half that come from half k.
+    static constexpr ByteTable moves(int k) {
+        return bothHalves([=](int i) {
+            const int from = spanIndex(i, channels, element, 0);
+            return from / 16 == k ? from - channelHalf<channels, element>(k) : kNone;
+        });
+    }
+
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
-        static constexpr auto take = [] {
-            std::array<ByteTable, channels> tables{};
-            for (int k = 0; k < channels; ++k) tables[static_cast<size_t>(k)] = takeChannel<channels, element>(0, k);
-            return tables;
-        }();
-        Bytes gathered = shuffleHalves(loadSpans<channels>(from[0], 0), table(take[0]));
+        static constexpr auto take = tables<channels>(moves);
+        Bytes gathered = shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], 0), table(take[0]));
         for (int k = 1; k < channels; ++k)
-            gathered = gathered | shuffleHalves(loadSpans<channels>(from[0], k), table(take[static_cast<size_t>(k)]));
-        storeAs<streaming>(to[0], gathered);
+            gathered = gathered | shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], k), table(take[static_cast<size_t>(k)]));
+        storeSpans<1, spans, streaming>(to[0], 0, gathered);
     }
 };
 
 template <int channels, int element>
 struct Insert {
-    static constexpr int pixels = 32 / element;
+    static constexpr int span = 16 / element;
     static constexpr bool mayStream = false;
     static constexpr std::array<Run, 2> in = {wholePixels(element), oneChannel(channels * element, element)};
     static constexpr std::array<Run, 1> out = {oneChannel(channels * element, element)};
 
-    template <bool streaming, class Out, class In>
+    /// Half k's bytes from the plane's half; none between the elements.
+    static constexpr ByteTable moves(int k) {
+        return bothHalves([=](int i) {
+            const int at = channelHalf<channels, element>(k) + i, within = at % (channels * element);
+            return within < element ? at / (channels * element) * element + within : kNone;
+        });
+    }
+    static constexpr ByteTable selects(int k) {
+        return bothHalves([=](int i) { return moves(k).at[i] == kNone ? 0 : kAll; });
+    }
+
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
-        static constexpr auto spread = windows<channels * element, element, false>();
-        alignas(32) static constexpr auto select = selectWithinPixel<channels * element>(element);
-        for (size_t k = 0; k < channels; ++k) {
-            const Bytes elements = shuffleHalves(loadTwice(from[0] + spread[k].begin), table(spread[k].index));
-            storeAs<streaming>(to[0] + 32 * k, blend(load(from[1] + 32 * k), elements, load(select.data() + 32 * k % 96)));
+        static constexpr auto spread = tables<channels>(moves);
+        static constexpr auto select = tables<channels>(selects);
+        const Bytes elements = loadSpans<1, spans>(from[0], 0);
+        Bytes halves[channels];
+        for (int k = 0; k < channels; ++k) {
+            const auto t = static_cast<size_t>(k);
+            halves[k] = blend(loadChannelHalf<channels, element, spans>(from[1], k), shuffleHalves(elements, table(spread[t])), table(select[t]));
         }
+        for (int k = 0; k < channels; ++k)
+            storeSpans<channels, spans, streaming>(to[0] + channelHalf<channels, element>(k) - 16 * k, k, halves[k]);
     }
 };
 
 template <int channels, int element>
 struct Duplicate {
-    static constexpr int pixels = 32 / element;
+    static constexpr int span = 16 / element;
     static constexpr bool mayStream = true;
     static constexpr std::array<Run, 1> in = {wholePixels(element)};
     static constexpr std::array<Run, 1> out = {wholePixels(channels * element)};
 
-    template <bool streaming, class Out, class In>
+    static constexpr ByteTable moves(int k) {
+        return bothHalves([=](int i) { return (16 * k + i) / (channels * element) * element + (16 * k + i) % element; });
+    }
+
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
-        static constexpr auto spread = windows<channels * element, element, true>();
-        for (size_t k = 0; k < channels; ++k)
-            storeAs<streaming>(to[0] + 32 * k, shuffleHalves(loadTwice(from[0] + spread[k].begin), table(spread[k].index)));
+        static constexpr auto spread = tables<channels>(moves);
+        const Bytes elements = loadSpans<1, spans>(from[0], 0);
+        for (int k = 0; k < channels; ++k)
+            storeSpans<channels, spans, streaming>(to[0], k, shuffleHalves(elements, table(spread[static_cast<size_t>(k)])));
     }
 };
 
 /// Halves of four pixel groups to three: 12 bytes of each of the four source halves, laid end to end.
 template <int element>
 struct DropAlpha {
-    static constexpr int pixels = 32 / element;
+    static constexpr int span = 16 / element;
     static constexpr bool mayStream = true;
     static constexpr std::array<Run, 1> in = {wholePixels(4 * element)};
     static constexpr std::array<Run, 1> out = {wholePixels(3 * element)};
@@ -167,20 +201,20 @@ struct DropAlpha {
         });
     }
 
-    template <bool streaming, class Out, class In>
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
         static constexpr ByteTable first[3] = {moves(0, 0), moves(1, 1), moves(2, 2)};
         static constexpr ByteTable second[3] = {moves(0, 1), moves(1, 2), moves(2, 3)};
         Bytes a[4];
-        for (int k = 0; k < 4; ++k) a[k] = loadSpans<4>(from[0], k);
+        for (int k = 0; k < 4; ++k) a[k] = loadSpans<4, spans>(from[0], k);
         for (int k = 0; k < 3; ++k)
-            storeSpans<3, streaming>(to[0], k, shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k])));
+            storeSpans<3, spans, streaming>(to[0], k, shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k])));
     }
 };
 
 template <int element>
 struct FillColour {
-    static constexpr int pixels = 32 / element;
+    static constexpr int span = 16 / element;
     static constexpr bool mayStream = false;
     static constexpr std::array<Run, 2> in = {wholePixels(3 * element), wholePixels(4 * element)};
     static constexpr std::array<Run, 1> out = {wholePixels(4 * element)};
@@ -194,13 +228,13 @@ struct FillColour {
         });
     }
 
-    template <bool streaming, class Out, class In>
+    template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
-        static constexpr ByteTable spread[4] = {moves(0), moves(1), moves(2), moves(3)};
+        static constexpr auto spread = tables<4>(moves);
         alignas(32) static constexpr auto colour = selectWithinPixel<4 * element>(3 * element);
         for (int k = 0; k < 4; ++k) {
-            const Bytes elements = shuffleHalves(loadHalves(from[0] + begin(k), from[0] + 48 + begin(k)), table(spread[k]));
-            storeSpans<4, streaming>(to[0], k, blend(loadSpans<4>(from[1], k), elements, load(colour.data())));
+            const Bytes elements = shuffleHalves(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k), table(spread[static_cast<size_t>(k)]));
+            storeSpans<4, spans, streaming>(to[0], k, blend(loadSpans<4, spans>(from[1], k), elements, load(colour.data())));
         }
     }
 };
@@ -211,45 +245,45 @@ template <int channels, int element>
 void splitRow(uint8_t* const* planes, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
     std::array<uint8_t*, channels> out;
     for (size_t c = 0; c < channels; ++c) out[c] = planes[c];
-    mapGroups(Split<channels, element>{}, out, std::array{src}, pixels, streaming);
+    mapSpans(Split<channels, element>{}, out, std::array{src}, pixels, streaming);
 }
 
 template <int channels, int element>
 void mergeRow(uint8_t* dst, const uint8_t* const* planes, ptrdiff_t pixels, bool streaming) {
     std::array<const uint8_t*, channels> in;
     for (size_t c = 0; c < channels; ++c) in[c] = planes[c];
-    mapGroups(Merge<channels, element>{}, std::array{dst}, in, pixels, streaming);
+    mapSpans(Merge<channels, element>{}, std::array{dst}, in, pixels, streaming);
 }
 
 template <int channels, int element>
-void extractRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels) {
-    mapGroups(Extract<channels, element>{}, std::array{dst}, std::array{src}, pixels);
+void extractRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
+    mapSpans(Extract<channels, element>{}, std::array{dst}, std::array{src}, pixels, streaming);
 }
 
 template <int channels, int element>
 void insertRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels) {
-    mapGroups(Insert<channels, element>{}, std::array{dst}, std::array<const uint8_t*, 2>{src, dst}, pixels);
+    mapSpans(Insert<channels, element>{}, std::array{dst}, std::array<const uint8_t*, 2>{src, dst}, pixels);
 }
 
 template <int channels, int element>
 void duplicateRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
-    mapGroups(Duplicate<channels, element>{}, std::array{dst}, std::array{src}, pixels, streaming);
+    mapSpans(Duplicate<channels, element>{}, std::array{dst}, std::array{src}, pixels, streaming);
 }
 
 template <int element>
 void dropAlphaRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
-    mapGroups(DropAlpha<element>{}, std::array{dst}, std::array{src}, pixels, streaming);
+    mapSpans(DropAlpha<element>{}, std::array{dst}, std::array{src}, pixels, streaming);
 }
 
 template <int element>
 void fillColourRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels) {
-    mapGroups(FillColour<element>{}, std::array{dst}, std::array<const uint8_t*, 2>{src, dst}, pixels);
+    mapSpans(FillColour<element>{}, std::array{dst}, std::array<const uint8_t*, 2>{src, dst}, pixels);
 }
 
 #define QORI_INSTANTIATE_CHANNELS(channels, element)                                            \
     template void splitRow<channels, element>(uint8_t* const*, const uint8_t*, ptrdiff_t, bool); \
     template void mergeRow<channels, element>(uint8_t*, const uint8_t* const*, ptrdiff_t, bool); \
-    template void extractRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t);            \
+    template void extractRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t, bool);            \
     template void insertRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t);             \
     template void duplicateRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t, bool)
 #define QORI_INSTANTIATE(element)                                                       \

@@ -14,7 +14,7 @@ void mergeRow(uint8_t* dst, const uint8_t* const* planes, ptrdiff_t pixels, bool
 
 /// src and dst point at the channel's element of the first pixel. insertRow rewrites the bytes between elements.
 template <int channels, int element>
-void extractRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels);
+void extractRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming);
 template <int channels, int element>
 void insertRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels);
 

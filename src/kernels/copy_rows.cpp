@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "copy_rows.h"
 
-#include "simd.h"
-
 namespace qori::kernels {
 namespace {
 
@@ -77,9 +75,8 @@ QORI_INLINE Bytes patternAt(const Pattern& pattern, ptrdiff_t offset) {
 
 template <bool streaming>
 QORI_INLINE void fillAligned(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
-    const Bytes first = load(pattern.bytes);
-    if (bytes < kVector) return storePartial(dst, first, bytes);
-    store(dst, first);
+    if (bytes <= 4 * kVector) return copyAligned<false>(dst, pattern.bytes, bytes);
+    store(dst, load(pattern.bytes));
     ptrdiff_t done = toBoundary(dst, kVector);
     const Bytes p0 = load(pattern.bytes + done), p1 = load(pattern.bytes + done + kVector);
     const Bytes p2 = load(pattern.bytes + done + 2 * kVector);

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Rows of bytes moved or filled without looking at them.
 #pragma once
-#include <cstddef>
-#include <cstdint>
+#include "byte_tables.h"
+#include "simd.h"
 
 namespace qori::kernels {
 
@@ -21,14 +21,22 @@ struct Pattern {
     alignas(32) uint8_t bytes[128];
 };
 
-template <class T>
-Pattern patternOf(const T* pixel, int channels) {
+template <int pixelBytes>
+Pattern repeatPixel(const uint8_t* pixel) {
+    static constexpr auto index = [] {
+        std::array<ByteTable, 4> tables{};
+        for (int i = 0; i < 128; ++i) tables[static_cast<size_t>(i / 32)].at[i % 32] = static_cast<uint8_t>(i % pixelBytes);
+        return tables;
+    }();
+    const Bytes both{_mm256_broadcastsi128_si256(_mm256_castsi256_si128(loadPartial(pixel, pixelBytes).v))};
     Pattern pattern;
-    const auto* source = reinterpret_cast<const uint8_t*>(pixel);
-    const int pixelBytes = channels * static_cast<int>(sizeof(T));
-    for (int i = 0; i < pixelBytes; ++i) pattern.bytes[i] = source[i];
-    for (int i = pixelBytes; i < 128; ++i) pattern.bytes[i] = pattern.bytes[i - pixelBytes];
+    for (int k = 0; k < 4; ++k) store(pattern.bytes + 32 * k, shuffleHalves(both, load(index[static_cast<size_t>(k)].at)));
     return pattern;
+}
+
+template <int channels, class T>
+Pattern patternOf(const T* pixel) {
+    return repeatPixel<channels * static_cast<int>(sizeof(T))>(reinterpret_cast<const uint8_t*>(pixel));
 }
 
 void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes);

@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
-// Row kernels that rearrange bytes work on groups: a fixed number of pixels that fills whole vectors in every run of
-// bytes they read and write. A group says what its runs are and what happens to one group; the loop, the tail and the
-// alignment for streaming stores are here, once.
+// Row kernels that rearrange bytes work on spans: as many pixels as 16 bytes hold elements. Two spans side by side, one
+// in each half of the vectors, are a group. A kernel says which runs of bytes it reads and writes and what happens to
+// one or two spans; the loop, the tail and the alignment for streaming stores are here, once.
+//
+// The row's last span begins early enough to end with the row, so it may do pixels again that are done already: the
+// images of these kernels never overlap, and what a kernel reads of its destination it writes back.
 #pragma once
 #include <array>
 
@@ -18,40 +21,45 @@ struct Run {
 constexpr Run wholePixels(int pixelBytes) { return {pixelBytes, pixelBytes}; }
 constexpr Run oneChannel(int pixelBytes, int elementBytes) { return {pixelBytes, elementBytes}; }
 
+/// Half k of a span with `channels` halves, and of the next span where two are done.
+template <int channels, int spans>
+QORI_INLINE Bytes loadSpans(const uint8_t* in, int k) {
+    if constexpr (spans == 2) return loadHalves(in + 16 * k, in + 16 * (channels + k));
+    else return {_mm256_castsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(in + 16 * k)))};
+}
+
+template <int channels, int spans, bool streaming>
+QORI_INLINE void storeSpans(uint8_t* out, int k, Bytes a) {
+    if constexpr (spans == 2 && channels == 1) storeAs<streaming>(out, a);
+    else if constexpr (spans == 2) storeHalvesAs<streaming>(out + 16 * k, out + 16 * (channels + k), a);
+    else _mm_storeu_si128(reinterpret_cast<__m128i*>(out + 16 * k), _mm256_castsi256_si128(a.v));
+}
+
 namespace detail {
 
-/// Up to a group through buffers of a group's size. A run that is read and written (insertion, masks) appears among
-/// the inputs with the same pointer.
-template <class Group, size_t ins, size_t outs>
-QORI_NOINLINE void partialGroup(const Group& group, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
-                                ptrdiff_t pixels) {
-    constexpr auto bytesOf = [](Run run, ptrdiff_t n) { return (n - 1) * run.pixelBytes + run.lastBytes; };
-    constexpr auto total = [](const auto& runs) {
-        int bytes = 0;
-        for (const Run& run : runs) bytes += run.pixelBytes * Group::pixels;
-        return static_cast<size_t>(bytes);
-    };
-    alignas(32) uint8_t inBuffer[total(Group::in)];
-    alignas(32) uint8_t outBuffer[total(Group::out)];
-    std::array<const uint8_t*, ins> groupIn;
-    std::array<uint8_t*, outs> groupOut;
-    uint8_t* next = inBuffer;
+template <class Kernel>
+constexpr int spanBytes(const Run& run) { return run.pixelBytes * Kernel::span; }
+
+/// Fewer pixels than a span, through buffers of a span's size. A run that is read and written appears among the
+/// inputs with the same pointer.
+template <class Kernel, size_t ins, size_t outs>
+QORI_INLINE void shortRow(const Kernel& kernel, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
+                          ptrdiff_t pixels) {
+    constexpr int kMost = 64;   // four channels
+    alignas(32) uint8_t buffers[ins + outs][kMost];
+    std::array<const uint8_t*, ins> from;
+    std::array<uint8_t*, outs> to;
+    const auto bytesOf = [=](const Run& run) { return (pixels - 1) * run.pixelBytes + run.lastBytes; };
     for (size_t r = 0; r < ins; ++r) {
-        const ptrdiff_t bytes = bytesOf(Group::in[r], pixels);
-        for (ptrdiff_t at = 0; at < Group::in[r].pixelBytes * Group::pixels; at += 32)
-            store(next + at, loadUpTo(in[r] + at, bytes - at));
-        groupIn[r] = next;
-        next += Group::in[r].pixelBytes * Group::pixels;
+        const ptrdiff_t bytes = bytesOf(Kernel::in[r]);
+        for (int at = 0; at < bytes; at += 32) store(buffers[r] + at, loadUpTo(in[r] + at, bytes - at));
+        from[r] = buffers[r];
     }
-    next = outBuffer;
+    for (size_t r = 0; r < outs; ++r) to[r] = buffers[ins + r];
+    kernel.template run<1, false>(to, from);
     for (size_t r = 0; r < outs; ++r) {
-        groupOut[r] = next;
-        next += Group::out[r].pixelBytes * Group::pixels;
-    }
-    group.template run<false>(groupOut, groupIn);
-    for (size_t r = 0; r < outs; ++r) {
-        const ptrdiff_t bytes = bytesOf(Group::out[r], pixels);
-        for (ptrdiff_t at = 0; at < bytes; at += 32) storeUpTo(out[r] + at, load(groupOut[r] + at), bytes - at);
+        const ptrdiff_t bytes = bytesOf(Kernel::out[r]);
+        for (int at = 0; at < bytes; at += 32) storeUpTo(out[r] + at, load(to[r] + at), bytes - at);
     }
 }
 
@@ -61,61 +69,49 @@ QORI_INLINE void advanceRuns(Pointers& pointers, const std::array<Run, count>& r
 }
 
 /// Pixels until every output is 32-byte aligned, or -1 where that never happens.
-template <class Group, size_t outs>
+template <class Kernel, size_t outs>
 int pixelsToAlignment(const std::array<uint8_t*, outs>& out) {
     for (int pixels = 0; pixels < 32; ++pixels) {
         bool aligned = true;
         for (size_t r = 0; r < outs; ++r)
-            aligned &= (reinterpret_cast<uintptr_t>(out[r] + pixels * Group::out[r].pixelBytes) & 31u) == 0;
+            aligned &= (reinterpret_cast<uintptr_t>(out[r] + pixels * Kernel::out[r].pixelBytes) & 31u) == 0;
         if (aligned) return pixels;
     }
     return -1;
 }
 
-template <bool streaming, class Group, size_t ins, size_t outs>
-QORI_INLINE void wholeGroups(const Group& group, std::array<uint8_t*, outs>& out, std::array<const uint8_t*, ins>& in,
-                             ptrdiff_t count) {
-    for (; count > 0; --count) {
-        group.template run<streaming>(out, in);
-        advanceRuns(out, Group::out, Group::pixels);
-        advanceRuns(in, Group::in, Group::pixels);
-    }
-}
-
 }  // namespace detail
 
-template <class Group, size_t ins, size_t outs>
-QORI_NOINLINE void mapGroups(const Group& group, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
-                             ptrdiff_t pixels, bool streaming = false) {
-    static_assert(ins == Group::in.size() && outs == Group::out.size());
-    // A channel of interest ends inside its last pixel, so that pixel is never part of a whole group.
-    constexpr bool endsEarly = [] {
-        bool early = false;
-        for (const Run& run : Group::in) early |= run.lastBytes < run.pixelBytes;
-        for (const Run& run : Group::out) early |= run.lastBytes < run.pixelBytes;
-        return early;
-    }();
-    if constexpr (Group::mayStream) {
-        const int head = streaming ? detail::pixelsToAlignment<Group>(out) : -1;
-        if (head >= 0 && head < pixels) {
-            if (head > 0) {
-                for (ptrdiff_t done = 0; done < head; done += Group::pixels) {
-                    const ptrdiff_t part = head - done < Group::pixels ? head - done : Group::pixels;
-                    detail::partialGroup(group, out, in, part);
-                    detail::advanceRuns(out, Group::out, part);
-                    detail::advanceRuns(in, Group::in, part);
-                }
+template <class Kernel, size_t ins, size_t outs>
+QORI_NOINLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
+                            ptrdiff_t pixels, bool streaming = false) {
+    static_assert(ins == Kernel::in.size() && outs == Kernel::out.size());
+    constexpr int span = Kernel::span;
+    if (pixels < span) return detail::shortRow(kernel, out, in, pixels);
+    const auto advance = [&](ptrdiff_t by) {
+        detail::advanceRuns(out, Kernel::out, by);
+        detail::advanceRuns(in, Kernel::in, by);
+        pixels -= by;
+    };
+    if constexpr (Kernel::mayStream) {
+        const int head = streaming && pixels >= 64 ? detail::pixelsToAlignment<Kernel>(out) : -1;
+        if (head >= 0) {
+            for (int done = 0; done < head; done += span) {
+                kernel.template run<1, false>(out, in);
+                advance(head - done < span ? head - done : span);
             }
-            pixels -= head;
-            const ptrdiff_t count = (pixels - endsEarly) / Group::pixels;
-            detail::wholeGroups<true>(group, out, in, count);
-            pixels -= count * Group::pixels;
+            for (; pixels >= 2 * span; advance(2 * span)) kernel.template run<2, true>(out, in);
         }
     }
-    const ptrdiff_t count = (pixels - endsEarly) / Group::pixels;
-    detail::wholeGroups<false>(group, out, in, count);
-    pixels -= count * Group::pixels;
-    if (pixels > 0) detail::partialGroup(group, out, in, pixels);
+    for (; pixels >= 2 * span; advance(2 * span)) kernel.template run<2, false>(out, in);
+    if (pixels >= span) {
+        kernel.template run<1, false>(out, in);
+        advance(span);
+    }
+    if (pixels > 0) {
+        advance(pixels - span);
+        kernel.template run<1, false>(out, in);
+    }
 }
 
 }  // namespace qori::kernels

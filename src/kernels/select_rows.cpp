@@ -2,7 +2,7 @@
 #include "select_rows.h"
 
 #include "byte_tables.h"
-#include "groups.h"
+#include "simd.h"
 
 namespace qori::kernels {
 namespace {
@@ -77,7 +77,7 @@ struct Masked {
     /// The kept bytes of the group's vector k.
     static QORI_INLINE Bytes keep(const uint8_t* keptBytes, Bytes kept, int k) {
         if constexpr (pixelBytes == 1) return kept;
-        static constexpr auto spread = windows<pixelBytes, 1, true>();
+        static constexpr auto spread = maskWindows<pixelBytes>();
         const Window& window = spread[static_cast<size_t>(k)];
         const Bytes expanded = shuffleHalves(loadTwice(keptBytes + window.begin), load(window.index.at));
         if constexpr (wholePixel) return expanded;

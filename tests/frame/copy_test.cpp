@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "frame/mask.h"
-#include "harness/companion/qorcore_instrumented.h"
 #include "harness/sweep.h"
 #include "reference/move.h"
 
 namespace qori::test {
 namespace {
 
+constexpr int kAboveEveryBound = (1 << 20) + (1 << 16);
 constexpr int kSrcSlot = 0, kDstSlot = 1, kMaskSlot = 2, kPlaneSlot = 3;
 
 /// One copy with everything checked: result, surroundings, sources.
@@ -20,7 +20,7 @@ void checkPacked(Function function, const Shape& shape) {
     TestImage mask(kMaskSlot, shape, 1);
     src.fill<T>(channels(SL), [] { return static_cast<T>(random().value<T>()); });
     dst.fill<T>(channels(DL), [] { return static_cast<T>(random().value<T>()); });
-    fillMask(mask, shape);
+    if (kind == Kind::MR) fillMask(mask, shape);
     const Snapshot srcBefore = src.snapshot();
     Snapshot expected = dst.snapshot();
     const View<uint8_t> maskView = mask.view<uint8_t>(1);
@@ -77,10 +77,7 @@ void sweep(const char* name, Function function) {
         else checkPacked<T, SL, DL, kind>(function, shape);
     };
     forShapes(smallShapes(), check);
-    for (int32_t cache : {1, 1 << 28, -1}) {   // streams; asks and does not; asks in vain
-        qorTestSetCacheSize(cache);
-        forShapes(largeShapes(static_cast<int>(sizeof(T)) * channels(DL)), check);
-    }
+    forStreamingChoices(static_cast<int>(sizeof(T)) * (channels(SL) + channels(DL)), kAboveEveryBound, check);
     markSwept(name);
 }
 
@@ -117,8 +114,7 @@ template <class T, Layout SL, Layout DL, Kind kind, class Function>
 void duplicate(const char* name, Function function) {
     const auto check = [&](const Shape& shape) { checkDuplicate<channels(DL)>(function, shape); };
     forShapes(smallShapes(), check);
-    qorTestSetCacheSize(1);
-    forShapes(largeShapes(channels(DL)), check);
+    forStreamingChoices(1 + channels(DL), kAboveEveryBound, check);
     markSwept(name);
 }
 

@@ -49,13 +49,12 @@ const std::vector<Shape>& smallShapes() {
     return shapes;
 }
 
-std::vector<Shape> largeShapes(int pixelBytes) {
-    constexpr int kBytes = (3 << 20) + (1 << 16);
-    const auto tall = [=](int width) { return kBytes / (width * pixelBytes) + 1; };
-    const int wide = 1531;
+std::vector<Shape> largeShapes(int bytesPerPixel, int trafficBytes) {
+    const auto tall = [=](int width) { return trafficBytes / (width * bytesPerPixel) + 1; };
+    constexpr int wide = 1531;
     return {
         {.width = 512, .height = tall(512), .atBegin = true},
-        {.width = wide, .height = tall(wide), .padding = 64 - wide * pixelBytes % 64, .atBegin = true, .shift = 4},
+        {.width = wide, .height = tall(wide), .padding = 64 - wide * bytesPerPixel % 64, .atBegin = true, .shift = 4},
         {.width = 777, .height = tall(777), .padding = 3},
     };
 }

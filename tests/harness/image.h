@@ -40,9 +40,9 @@ std::string describe(const Shape& shape);
 
 /// Every width around the vector sizes and a few larger ones, each packed and padded, at both guards, some flipped.
 const std::vector<Shape>& smallShapes();
-/// Regions of a little more than 3 MiB, which passes every streaming bound, at alignments where stores can stream and
-/// where they cannot.
-std::vector<Shape> largeShapes(int pixelBytes);
+/// Regions whose traffic, at so many bytes per pixel, is a little more than `trafficBytes`; at alignments where stores
+/// can stream and where they cannot.
+std::vector<Shape> largeShapes(int bytesPerPixel, int trafficBytes);
 
 /// Pixels seen through a pointer and a step, any alignment.
 template <class T>

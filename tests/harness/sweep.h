@@ -2,6 +2,7 @@
 // Runs one export over many shapes against its scalar reference.
 #pragma once
 #include "call.h"
+#include "companion/qorcore_instrumented.h"
 #include "image.h"
 
 namespace qori::test {
@@ -13,6 +14,18 @@ void forShapes(const std::vector<Shape>& shapes, Check check) {
         SCOPED_TRACE(describe(shape));
         check(shape);
         if (testing::Test::HasFailure()) return;
+    }
+}
+
+/// Regions above a streaming bound, with a cache that makes the call stream, one that does not, and none that answers.
+template <class Check>
+void forStreamingChoices(int bytesPerPixel, int trafficBytes, Check check) {
+    const std::vector<Shape> shapes = largeShapes(bytesPerPixel, trafficBytes);
+    qorTestSetCacheSize(1);
+    forShapes(shapes, check);
+    for (int32_t cache : {1 << 28, -1}) {
+        qorTestSetCacheSize(cache);
+        forShapes({shapes.front()}, check);
     }
 }
 
