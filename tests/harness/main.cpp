@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <gtest/gtest.h>
 
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
@@ -33,6 +34,14 @@ class Listener : public testing::EmptyTestEventListener {
     }
 };
 
+/// A stray access ends the run; say which test it was.
+void reportFault(int) {
+    const testing::TestInfo* info = testing::UnitTest::GetInstance()->current_test_info();
+    std::printf("access outside the allowed memory in %s\n", info != nullptr ? info->name() : "no test");
+    std::fflush(stdout);
+    std::_Exit(3);
+}
+
 }  // namespace
 
 Random& random() { return generator; }
@@ -47,6 +56,9 @@ int main(int argc, char** argv) {
     if (const char* text = std::getenv("QORI_SEED")) seed = std::strtoull(text, nullptr, 10);
     std::printf("seed %llu (set QORI_SEED to choose)\n", static_cast<unsigned long long>(seed));
     testing::UnitTest::GetInstance()->listeners().Append(new Listener);
+#ifndef __SANITIZE_ADDRESS__
+    std::signal(SIGSEGV, reportFault);
+#endif
     const int result = RUN_ALL_TESTS();
     if (testing::UnitTest::GetInstance()->test_to_run_count() == 0) {
         std::printf("no test was run\n");
