@@ -56,13 +56,13 @@ struct Split {
         if constexpr (channels == 3) {
             static constexpr ByteTable take[3] = {takeMixed<3, element>(0), takeMixed<3, element>(1), takeMixed<3, element>(2)};
             for (int c = 0; c < 3; ++c)
-                storeSpans<1, spans, streaming>(to[static_cast<size_t>(c)], 0,
-                                                shuffleHalves(mix3<element>(a[0], a[1], a[2], c), table(take[c])));
+                storeAllSpans<spans, streaming>(to[static_cast<size_t>(c)],
+                                                {shuffleHalves(mix3<element>(a[0], a[1], a[2], c), table(take[c]))});
         } else {
             static constexpr ByteTable words = channelWords<element>();
             for (Bytes& half : a) half = element == 4 ? half : shuffleHalves(half, table(words));
             transposeWords(a);
-            for (size_t c = 0; c < 4; ++c) storeSpans<1, spans, streaming>(to[c], 0, a[c]);
+            for (size_t c = 0; c < 4; ++c) storeAllSpans<spans, streaming>(to[c], {a[c]});
         }
     }
 };
@@ -85,13 +85,14 @@ struct Merge {
             static constexpr ByteTable third[3] = {selectChannel<3, element>(2, 0), selectChannel<3, element>(2, 1),
                                                    selectChannel<3, element>(2, 2)};
             for (int c = 0; c < 3; ++c) a[c] = shuffleHalves(a[c], table(put[c]));
-            for (int k = 0; k < 3; ++k)
-                storeSpans<3, spans, streaming>(to[0], k, blend(blend(a[0], a[1], table(second[k])), a[2], table(third[k])));
+            Bytes halves[3];
+            for (int k = 0; k < 3; ++k) halves[k] = blend(blend(a[0], a[1], table(second[k])), a[2], table(third[k]));
+            storeAllSpans<spans, streaming>(to[0], halves);
         } else {
             static constexpr ByteTable bytes = interleaveWords<element>();
             transposeWords(a);
-            for (int k = 0; k < 4; ++k)
-                storeSpans<4, spans, streaming>(to[0], k, element == 4 ? a[k] : shuffleHalves(a[k], table(bytes)));
+            for (Bytes& half : a) half = element == 4 ? half : shuffleHalves(half, table(bytes));
+            storeAllSpans<spans, streaming>(to[0], a);
         }
     }
 };
@@ -127,7 +128,7 @@ struct Extract {
         Bytes gathered = shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], 0), table(take[0]));
         for (int k = 1; k < channels; ++k)
             gathered = gathered | shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], k), table(take[static_cast<size_t>(k)]));
-        storeSpans<1, spans, streaming>(to[0], 0, gathered);
+        storeAllSpans<spans, streaming>(to[0], {gathered});
     }
 };
 
@@ -160,7 +161,7 @@ struct Insert {
             halves[k] = blend(loadChannelHalf<channels, element, spans>(from[1], k), shuffleHalves(elements, table(spread[t])), table(select[t]));
         }
         for (int k = 0; k < channels; ++k)
-            storeSpans<channels, spans, streaming>(to[0] + channelHalf<channels, element>(k) - 16 * k, k, halves[k]);
+            storeSpans<channels, spans>(to[0] + channelHalf<channels, element>(k) - 16 * k, k, halves[k]);
     }
 };
 
@@ -179,8 +180,9 @@ struct Duplicate {
     QORI_INLINE void run(const Out& to, const In& from) const {
         static constexpr auto spread = tables<channels>(moves);
         const Bytes elements = loadSpans<1, spans>(from[0], 0);
-        for (int k = 0; k < channels; ++k)
-            storeSpans<channels, spans, streaming>(to[0], k, shuffleHalves(elements, table(spread[static_cast<size_t>(k)])));
+        Bytes halves[channels];
+        for (int k = 0; k < channels; ++k) halves[k] = shuffleHalves(elements, table(spread[static_cast<size_t>(k)]));
+        storeAllSpans<spans, streaming>(to[0], halves);
     }
 };
 
@@ -205,10 +207,10 @@ struct DropAlpha {
     QORI_INLINE void run(const Out& to, const In& from) const {
         static constexpr ByteTable first[3] = {moves(0, 0), moves(1, 1), moves(2, 2)};
         static constexpr ByteTable second[3] = {moves(0, 1), moves(1, 2), moves(2, 3)};
-        Bytes a[4];
+        Bytes a[4], halves[3];
         for (int k = 0; k < 4; ++k) a[k] = loadSpans<4, spans>(from[0], k);
-        for (int k = 0; k < 3; ++k)
-            storeSpans<3, spans, streaming>(to[0], k, shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k])));
+        for (int k = 0; k < 3; ++k) halves[k] = shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k]));
+        storeAllSpans<spans, streaming>(to[0], halves);
     }
 };
 
@@ -232,10 +234,12 @@ struct FillColour {
     QORI_INLINE void run(const Out& to, const In& from) const {
         static constexpr auto spread = tables<4>(moves);
         alignas(32) static constexpr auto colour = selectWithinPixel<4 * element>(3 * element);
+        Bytes halves[4];
         for (int k = 0; k < 4; ++k) {
             const Bytes elements = shuffleHalves(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k), table(spread[static_cast<size_t>(k)]));
-            storeSpans<4, spans, streaming>(to[0], k, blend(loadSpans<4, spans>(from[1], k), elements, load(colour.data())));
+            halves[k] = blend(loadSpans<4, spans>(from[1], k), elements, load(colour.data()));
         }
+        storeAllSpans<spans, streaming>(to[0], halves);
     }
 };
 

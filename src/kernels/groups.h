@@ -28,11 +28,30 @@ QORI_INLINE Bytes loadSpans(const uint8_t* in, int k) {
     else return {_mm256_castsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(in + 16 * k)))};
 }
 
-template <int channels, int spans, bool streaming>
+template <int channels, int spans>
 QORI_INLINE void storeSpans(uint8_t* out, int k, Bytes a) {
-    if constexpr (spans == 2 && channels == 1) storeAs<streaming>(out, a);
-    else if constexpr (spans == 2) storeHalvesAs<streaming>(out + 16 * k, out + 16 * (channels + k), a);
+    if constexpr (spans == 2) storeHalves(out + 16 * k, out + 16 * (channels + k), a);
     else _mm_storeu_si128(reinterpret_cast<__m128i*>(out + 16 * k), _mm256_castsi256_si128(a.v));
+}
+
+/// All halves of one or two spans. Two spans are first laid end to end, so that whole vectors are stored.
+template <int spans, bool streaming, int channels>
+QORI_INLINE void storeAllSpans(uint8_t* out, const Bytes (&halves)[channels]) {
+    constexpr int low = 0x20, high = 0x31;   // the low halves of both, the high halves of both
+    if constexpr (spans == 1) {
+        for (int k = 0; k < channels; ++k) storeSpans<channels, 1>(out, k, halves[k]);
+    } else if constexpr (channels == 1) {
+        storeAs<streaming>(out, halves[0]);
+    } else if constexpr (channels == 3) {
+        storeAs<streaming>(out, Bytes{_mm256_permute2x128_si256(halves[0].v, halves[1].v, low)});
+        storeAs<streaming>(out + 32, Bytes{_mm256_blend_epi32(halves[2].v, halves[0].v, 0xF0)});
+        storeAs<streaming>(out + 64, Bytes{_mm256_permute2x128_si256(halves[1].v, halves[2].v, high)});
+    } else {
+        storeAs<streaming>(out, Bytes{_mm256_permute2x128_si256(halves[0].v, halves[1].v, low)});
+        storeAs<streaming>(out + 32, Bytes{_mm256_permute2x128_si256(halves[2].v, halves[3].v, low)});
+        storeAs<streaming>(out + 64, Bytes{_mm256_permute2x128_si256(halves[0].v, halves[1].v, high)});
+        storeAs<streaming>(out + 96, Bytes{_mm256_permute2x128_si256(halves[2].v, halves[3].v, high)});
+    }
 }
 
 namespace detail {

@@ -87,16 +87,6 @@ QORI_INLINE void storeHalves(uint8_t* low, uint8_t* high, Bytes a) {
     _mm_storeu_si128(reinterpret_cast<__m128i*>(high), _mm256_extracti128_si256(a.v, 1));
 }
 
-template <bool streaming>
-QORI_INLINE void storeHalvesAs(uint8_t* low, uint8_t* high, Bytes a) {
-    if constexpr (streaming) {
-        _mm_stream_si128(reinterpret_cast<__m128i*>(low), _mm256_castsi256_si128(a.v));
-        _mm_stream_si128(reinterpret_cast<__m128i*>(high), _mm256_extracti128_si256(a.v, 1));
-    } else {
-        storeHalves(low, high, a);
-    }
-}
-
 /// 16 bytes at p in both halves.
 QORI_INLINE Bytes loadTwice(const uint8_t* p) {
     return {_mm256_broadcastsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(p)))};
