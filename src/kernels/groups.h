@@ -119,10 +119,16 @@ QORI_NOINLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out
                 kernel.template run<1, false>(out, in);
                 advance(head - done < span ? head - done : span);
             }
-            for (; pixels >= 2 * span; advance(2 * span)) kernel.template run<2, true>(out, in);
+            while (pixels >= 2 * span) {
+                kernel.template run<2, true>(out, in);
+                advance(2 * span);
+            }
         }
     }
-    for (; pixels >= 2 * span; advance(2 * span)) kernel.template run<2, false>(out, in);
+    while (pixels >= 2 * span) {
+        kernel.template run<2, false>(out, in);
+        advance(2 * span);
+    }
     if (pixels >= span) {
         kernel.template run<1, false>(out, in);
         advance(span);
