@@ -1,6 +1,7 @@
 """The DLL exports exactly the registry's names, undecorated and sorted, through 16-byte stubs that jump through
-consecutive slots, and imports nothing but the operating system's own DLLs and the companion's four functions."""
+consecutive slots, imports nothing but the operating system's own DLLs and the companion's four functions, and carries its version."""
 import re
+import struct
 import subprocess
 import sys
 from pathlib import Path
@@ -35,4 +36,12 @@ stubs = [(int(jumps[n].split(":")[0], 16), int.from_bytes(bytes.fromhex(jumps[n]
 for i, (address, slot) in enumerate(stubs):
     if address != stubs[0][0] + 16 * i or slot != stubs[0][1] + 4 * i:
         sys.exit(f"stub {i} ({expected[i]}) at {address:#x} jumps through {slot:#x}")
+# VS_FIXEDFILEINFO: signature, structure version, then file and product version as two words of major.minor, patch.build.
+image = Path(dll).read_bytes()
+fixed = image[image.index(struct.pack("<I", 0xFEEF04BD)):][:24]
+if struct.unpack("<4I", fixed[8:]) != (8 << 16 | 2, 1 << 16 | 1083) * 2:
+    sys.exit("the version resource is not 8.2.1.1083")
+if "8.2.1 (r44077)".encode("utf-16-le") not in image:
+    sys.exit("the version resource lacks the version text")
+
 print(f"{len(names)} exports, imports from {', '.join(sorted(imports))}")
