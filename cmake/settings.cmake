@@ -37,4 +37,6 @@ endif()
 # No C++ runtime: neither exceptions nor type information nor guarded statics nor heap.
 add_library(qori_freestanding INTERFACE)
 target_compile_options(qori_freestanding INTERFACE
-    $<$<COMPILE_LANGUAGE:CXX>:-fno-exceptions -fno-rtti -fno-threadsafe-statics -fno-asynchronous-unwind-tables>)
+    $<$<COMPILE_LANGUAGE:CXX>:-fno-exceptions -fno-rtti -fno-threadsafe-statics -fno-asynchronous-unwind-tables>
+    # Kernels are vector code already; packing their pointers into vectors only slows short rows down.
+    $<$<COMPILE_LANGUAGE:CXX>:-fno-tree-slp-vectorize>)

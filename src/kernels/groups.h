@@ -102,8 +102,8 @@ int pixelsToAlignment(const std::array<uint8_t*, outs>& out) {
 }  // namespace detail
 
 template <class Kernel, size_t ins, size_t outs>
-QORI_NOINLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
-                            ptrdiff_t pixels, bool streaming = false) {
+QORI_INLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
+                          ptrdiff_t pixels, bool streaming = false) {
     static_assert(ins == Kernel::in.size() && outs == Kernel::out.size());
     constexpr int span = Kernel::span;
     if (pixels < span) return detail::shortRow(kernel, out, in, pixels);
