@@ -121,9 +121,12 @@ void run(benchmark::State& state, const Row& row, Size size) {
 void registerAll() {
     for (const Row& row : allRows())
         for (Size size : row.sizes)
-            benchmark::RegisterBenchmark((row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
-                                         [&row, size](benchmark::State& state) { run(state, row, size); })
-                ->UseManualTime()->Iterations(size.pixels() > 20'000'000 ? 7 : 41)->Unit(benchmark::kMicrosecond);
+            benchmark::RegisterBenchmark(
+                (row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
+                [&row, size](benchmark::State& state) { run(state, row, size); })
+                ->UseManualTime()
+                ->Iterations(size.pixels() > 20'000'000 ? 7 : 41)
+                ->Unit(benchmark::kMicrosecond);
 }
 
 }  // namespace

@@ -16,8 +16,11 @@ struct PlanesOf {
     Picture red, green, blue;
     uint8_t* pointers[3];
 
-    explicit PlanesOf(const Picture& photo) : red(photo.size(), 1), green(photo.size(), 1), blue(photo.size(), 1),
-                                              pointers{red.data(), green.data(), blue.data()} {
+    explicit PlanesOf(const Picture& photo)
+        : red(photo.size(), 1),
+          green(photo.size(), 1),
+          blue(photo.size(), 1),
+          pointers{red.data(), green.data(), blue.data()} {
         qoriCopy_8u_C3P3R(photo.data(), photo.step(), pointers, red.step(), photo.size());
     }
 };
@@ -30,7 +33,8 @@ Picture planes(const Picture& photo) {
     for (int i = 0; i < 3; ++i) {
         const int begin = photo.width() * i / 3, end = photo.width() * (i + 1) / 3;
         if (end > begin)
-            qoriDup_8u_C1C3R(all[i]->at(begin, 0), all[i]->step(), out.at(begin, 0), out.step(), {end - begin, photo.height()});
+            qoriDup_8u_C1C3R(all[i]->at(begin, 0), all[i]->step(), out.at(begin, 0), out.step(),
+                             {end - begin, photo.height()});
     }
     return out;
 }
@@ -64,7 +68,8 @@ Picture circle(const Picture& photo) {
 Picture channelBars(const Picture& photo) {
     Picture out = copyOf(photo);
     const int bar = photo.width() / 10;
-    for (int i = 0; bar > 0 && i < 10; i += 2) qoriSet_8u_C3CR(0, out.at(bar * i, 0) + 2, out.step(), {bar, photo.height()});
+    for (int i = 0; bar > 0 && i < 10; i += 2)
+        qoriSet_8u_C3CR(0, out.at(bar * i, 0) + 2, out.step(), {bar, photo.height()});
     return out;
 }
 
@@ -106,7 +111,7 @@ Picture puzzle(const Picture& photo) {
 /// A white mount with a dark inner line, each edge filled as a region of its own.
 Picture framed(const Picture& photo) {
     Picture out = copyOf(photo);
-    const auto frame = [&](int inset, int thickness, const uint8_t (&colour)[3]) {
+    const auto frame = [&](int inset, int thickness, const uint8_t(&colour)[3]) {
         const int w = photo.width() - 2 * inset, h = photo.height() - 2 * inset;
         if (w <= 2 * thickness || h <= 2 * thickness || thickness < 1) return;
         qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {w, thickness});

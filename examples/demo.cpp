@@ -32,10 +32,13 @@ Result timed(const Panel& panel, const Picture& photo) {
     return best;
 }
 
-void place(const Picture& sheet, const Typeface& type, const Panel& panel, const Result& result, int cell, int64_t pixels) {
-    const int x = kGap + cell % kColumns * (kCell.width + kGap), y = kHeader + cell / kColumns * (kCell.height + kCaption + kGap);
+void place(const Picture& sheet, const Typeface& type, const Panel& panel, const Result& result, int cell,
+           int64_t pixels) {
+    const int x = kGap + cell % kColumns * (kCell.width + kGap),
+              y = kHeader + cell / kColumns * (kCell.height + kCaption + kGap);
     const Picture small = thumbnail(result.picture, kCell);
-    qoriCopy_8u_C3R(small.data(), small.step(), sheet.at(x + (kCell.width - small.width()) / 2, y + (kCell.height - small.height()) / 2),
+    qoriCopy_8u_C3R(small.data(), small.step(),
+                    sheet.at(x + (kCell.width - small.width()) / 2, y + (kCell.height - small.height()) / 2),
                     sheet.step(), small.size());
     char text[160];
     std::snprintf(text, sizeof text, "%s   %.3f ms, %.0f Mpix/s", panel.functions, result.milliseconds,
@@ -65,11 +68,13 @@ int run(const char* photoFile, const char* sheetFile, const char* fontFile) {
     qoriSet_8u_C3R(kBackground, sheet.data(), sheet.step(), sheet.size());
     char title[160];
     const QorLibraryVersion* version = qoriGetLibVersion();
-    std::snprintf(title, sizeof title, "%s %s, %d-bit:  %d x %d pixels, best of 7 with allocation", version->libraryName,
-                  version->versionText, static_cast<int>(8 * sizeof(void*)), photo.width(), photo.height());
+    std::snprintf(title, sizeof title, "%s %s, %d-bit:  %d x %d pixels, best of 7 with allocation",
+                  version->libraryName, version->versionText, static_cast<int>(8 * sizeof(void*)), photo.width(),
+                  photo.height());
     type.draw(sheet, kGap, 56, 30, title, kBright);
     for (size_t i = 0; i < panels.size(); ++i)
-        place(sheet, type, panels[i], timed(panels[i], photo), static_cast<int>(i), int64_t{photo.width()} * photo.height());
+        place(sheet, type, panels[i], timed(panels[i], photo), static_cast<int>(i),
+              int64_t{photo.width()} * photo.height());
     if (!writePng(sheetFile, sheet)) {
         std::fprintf(stderr, "demo: cannot write %s\n", sheetFile);
         return 1;

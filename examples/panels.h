@@ -9,8 +9,8 @@ namespace demo {
 
 struct Panel {
     const char* caption;
-    const char* functions;                     ///< The exports that do the work.
-    Picture (*make)(const Picture& photo);     ///< Three channels, of the photograph's size.
+    const char* functions;                  ///< The exports that do the work.
+    Picture (*make)(const Picture& photo);  ///< Three channels, of the photograph's size.
 };
 
 std::span<const Panel> copyPanels();

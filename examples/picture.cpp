@@ -23,7 +23,8 @@ namespace demo {
 
 Picture readPicture(const std::string& file, std::string& reason) {
     int width = 0, height = 0, channels = 0;
-    const std::unique_ptr<stbi_uc, void (*)(void*)> pixels(stbi_load(file.c_str(), &width, &height, &channels, 3), stbi_image_free);
+    const std::unique_ptr<stbi_uc, void (*)(void*)> pixels(stbi_load(file.c_str(), &width, &height, &channels, 3),
+                                                           stbi_image_free);
     if (!pixels) {
         reason = stbi_failure_reason();
         return {};
@@ -43,11 +44,12 @@ bool writePng(const std::string& file, const Picture& picture) {
 
 Picture thumbnail(const Picture& picture, QorImageSize box) {
     const double scale = std::min(double(box.width) / picture.width(), double(box.height) / picture.height());
-    const QorImageSize size{std::max(1, int(std::lround(picture.width() * scale))), std::max(1, int(std::lround(picture.height() * scale)))};
+    const QorImageSize size{std::max(1, int(std::lround(picture.width() * scale))),
+                            std::max(1, int(std::lround(picture.height() * scale)))};
     Picture small(size, 3);
     if (small.data() != nullptr)
-        stbir_resize_uint8_srgb(picture.data(), picture.width(), picture.height(), picture.step(), small.data(), size.width, size.height,
-                                small.step(), 3, STBIR_ALPHA_CHANNEL_NONE, 0);
+        stbir_resize_uint8_srgb(picture.data(), picture.width(), picture.height(), picture.step(), small.data(),
+                                size.width, size.height, small.step(), 3, STBIR_ALPHA_CHANNEL_NONE, 0);
     return small;
 }
 
@@ -65,7 +67,8 @@ Typeface::Typeface(const std::string& file) {
 
 Typeface::~Typeface() = default;
 
-void Typeface::draw(const Picture& target, int x, int baseline, float height, const std::string& text, const uint8_t (&colour)[3]) const {
+void Typeface::draw(const Picture& target, int x, int baseline, float height, const std::string& text,
+                    const uint8_t (&colour)[3]) const {
     const float scale = stbtt_ScaleForPixelHeight(&font_->info, height);
     float pen = static_cast<float>(x);
     for (size_t i = 0; i < text.size(); ++i) {
@@ -77,11 +80,13 @@ void Typeface::draw(const Picture& target, int x, int baseline, float height, co
                 const int px = static_cast<int>(pen) + dx + gx, py = baseline + dy + gy, cover = glyph[gy * w + gx];
                 if (px < 0 || py < 0 || px >= target.width() || py >= target.height()) continue;
                 uint8_t* pixel = target.at(px, py);
-                for (int c = 0; c < 3; ++c) pixel[c] = static_cast<uint8_t>((pixel[c] * (255 - cover) + colour[c] * cover) / 255);
+                for (int c = 0; c < 3; ++c)
+                    pixel[c] = static_cast<uint8_t>((pixel[c] * (255 - cover) + colour[c] * cover) / 255);
             }
         stbtt_FreeBitmap(glyph, nullptr);
         pen += scale * static_cast<float>(advance);
-        if (i + 1 < text.size()) pen += scale * static_cast<float>(stbtt_GetCodepointKernAdvance(&font_->info, text[i], text[i + 1]));
+        if (i + 1 < text.size())
+            pen += scale * static_cast<float>(stbtt_GetCodepointKernAdvance(&font_->info, text[i], text[i + 1]));
     }
 }
 

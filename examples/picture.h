@@ -50,7 +50,8 @@ public:
     Typeface(const Typeface&) = delete;
     Typeface& operator=(const Typeface&) = delete;
     bool isUsable() const { return font_ != nullptr; }
-    void draw(const Picture& target, int x, int baseline, float height, const std::string& text, const uint8_t (&colour)[3]) const;
+    void draw(const Picture& target, int x, int baseline, float height, const std::string& text,
+              const uint8_t (&colour)[3]) const;
 
 private:
     struct Font;
