@@ -26,7 +26,9 @@ struct RepeatByte {
                 v.v = _mm256_or_si256(v.v, _mm256_slli_epi16(v.v, 8));
                 if constexpr (std::is_signed_v<D>) v.v = _mm256_xor_si256(v.v, _mm256_set1_epi16(INT16_MIN));
             } else {
-                v.v = _mm256_mullo_epi32(v.v, _mm256_set1_epi32(0x01010101));
+                const __m256i lowBytes = _mm256_setr_epi8(0, 0, 0, 0, 4, 4, 4, 4, 8, 8, 8, 8, 12, 12, 12, 12,  //
+                                                          0, 0, 0, 0, 4, 4, 4, 4, 8, 8, 8, 8, 12, 12, 12, 12);
+                v.v = _mm256_shuffle_epi8(v.v, lowBytes);
                 if constexpr (std::is_signed_v<D>) v.v = _mm256_xor_si256(v.v, _mm256_set1_epi32(INT32_MIN));
             }
         }

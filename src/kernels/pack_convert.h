@@ -99,14 +99,17 @@ QORI_INLINE Pack<float, n> toFloat(Pack<S, n> a) {
     return out;
 }
 
-/// Rounding of float lanes to integral values, by mode; none depends on the control register.
+/// Rounding of float lanes to integral values, by mode: as floats, and as 32-bit integers where they fit. None depends on
+/// the caller's control register; NearestEven wants a ControlScope.
 struct TowardZero {
     static QORI_INLINE __m256 round(__m256 x) { return _mm256_round_ps(x, _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC); }
+    static QORI_INLINE __m256i toInt32(__m256 x) { return _mm256_cvttps_epi32(x); }
 };
 struct NearestEven {
     static QORI_INLINE __m256 round(__m256 x) {
         return _mm256_round_ps(x, _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC);
     }
+    static QORI_INLINE __m256i toInt32(__m256 x) { return _mm256_cvtps_epi32(x); }
 };
 struct HalfAway {
     /// x minus its integral part is exact, so the comparison with a half is.
@@ -117,6 +120,7 @@ struct HalfAway {
         const __m256 one = _mm256_or_ps(_mm256_set1_ps(1.0f), _mm256_and_ps(sign, x));
         return _mm256_add_ps(whole, _mm256_and_ps(away, one));
     }
+    static QORI_INLINE __m256i toInt32(__m256 x) { return _mm256_cvttps_epi32(round(x)); }
 };
 
 /// Rounded and saturated. A NaN becomes the processor's integer indefinite, -2^31, and then saturates: the type's
@@ -135,12 +139,12 @@ QORI_INLINE __m256i roundToInt32(__m256 x) {
         return _mm256_or_si256(value, _mm256_castps_si256(beyond));
     } else if constexpr (std::is_same_v<D, int32_t>) {
         const __m256 beyond = _mm256_cmp_ps(x, _mm256_set1_ps(2147483648.0f), _CMP_GE_OQ);
-        const __m256i value = _mm256_cvttps_epi32(Mode::round(x));
+        const __m256i value = Mode::toInt32(x);
         return _mm256_xor_si256(value, _mm256_castps_si256(beyond));  // 0x80000000 to 0x7FFFFFFF
     } else {
         // Below the range the conversion gives -2^31 at worst, which saturates rightly; above it must not.
         const __m256 limited = _mm256_min_ps(_mm256_set1_ps(static_cast<float>(std::numeric_limits<D>::max())), x);
-        return _mm256_cvttps_epi32(Mode::round(limited));
+        return Mode::toInt32(limited);
     }
 }
 

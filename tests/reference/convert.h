@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// The scalar truth of conversion and scaling, in 64-bit integers and long double.
+// The scalar truth of conversion and scaling, in 64-bit integers and floats.
 #pragma once
 #include <cmath>
 #include <cstdint>
@@ -54,22 +54,23 @@ D scaleInteger(S x, int roundMode, int scaleFactor) {
     return saturate<D>(sign * (whole + up));
 }
 
-/// x * 2^-scaleFactor in long double, which holds it exactly for every factor below 16,000; rounded, saturated.
+/// x * 2^-scaleFactor, rounded and saturated. A double holds the product exactly wherever it is not huge or far below a
+/// half.
 template <class D>
 D convertFloat(float x, int roundMode, int scaleFactor) {
     using Limits = std::numeric_limits<D>;
     constexpr bool isUnsigned32 = std::is_same_v<D, uint32_t>;
     if (isUnsigned32 && scaleFactor < -159) return x > 0 ? Limits::max() : 0;
     if (std::isnan(x)) return isUnsigned32 ? Limits::max() : Limits::min();
-    const int factor = scaleFactor > 2000 ? 2000 : scaleFactor < -2000 ? -2000 : scaleFactor;
-    const long double value = std::ldexp(static_cast<long double>(x), -factor);
-    if (value >= 1e10L) return Limits::max();
-    if (value <= -1e10L) return Limits::min();
+    const int factor = scaleFactor > 800 ? 800 : scaleFactor < -800 ? -800 : scaleFactor;
+    const double value = std::ldexp(static_cast<double>(x), -factor);
+    if (value >= 1e10) return Limits::max();
+    if (value <= -1e10) return Limits::min();
     const auto whole = static_cast<int64_t>(value);  // toward zero
-    const long double rest = std::abs(value - static_cast<long double>(whole));
+    const double rest = std::abs(value - static_cast<double>(whole));
     const bool up = roundMode == 0   ? false
-                    : roundMode == 1 ? rest > 0.5L || (rest == 0.5L && whole % 2 != 0)
-                                     : rest >= 0.5L;
+                    : roundMode == 1 ? rest > 0.5 || (rest == 0.5 && whole % 2 != 0)
+                                     : rest >= 0.5;
     return saturate<D>(whole + (up ? (value < 0 ? -1 : 1) : 0));
 }
 
