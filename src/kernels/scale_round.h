@@ -144,7 +144,9 @@ struct LeftShift {
 template <class W>
 struct RoundShift {
     explicit RoundShift(int32_t scale)
-        : bias(Lane<W>::all(static_cast<W>((uint64_t{1} << (scale - 1)) - 1))), one(Lane<W>::all(1)), count(_mm_cvtsi32_si128(scale)) {}
+        : bias(Lane<W>::all(static_cast<W>((uint64_t{1} << (scale - 1)) - 1))),
+          one(Lane<W>::all(1)),
+          count(_mm_cvtsi32_si128(scale)) {}
     QORI_INLINE Vec<W> operator()(Vec<W> v) const {
         const Vec<W> odd{_mm256_and_si256(Lane<W>::shiftRight(v, count).v, one.v)};
         return Lane<W>::shiftRight(Lane<W>::add(Lane<W>::add(v, odd), bias), count);
@@ -153,9 +155,9 @@ struct RoundShift {
     __m128i count;
 };
 
-/// Scale above 1, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling halves from
-/// values beside them. |v| / 2 + 2^(scale-2) is at most 3/4 of 2^bits (unsigned lanes; scale up to their width) and 3/4 of
-/// 2^(bits-1) (signed; scale below their width).
+/// Scale above 2, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling exact halves
+/// from values beside them. |v| / 2 + 2^(scale-2) is at most 3/4 of 2^bits (unsigned lanes, scale up to their width) and
+/// 3/4 of 2^(bits-1) (signed ones, scale below it).
 template <class W>
 struct RoundShiftSticky {
     explicit RoundShiftSticky(int32_t scale) : rest(scale - 1) {}
@@ -174,6 +176,7 @@ bool withScaleRule(int32_t scale, Use use) {
     constexpr int lastScale = static_cast<int>(std::bit_width(limit - 1));
     constexpr auto room = static_cast<uint64_t>(std::numeric_limits<W>::max()) - limit;
     constexpr int lastDirect = std::min(lastScale, static_cast<int>(std::bit_width(room)));   // 2^(scale-1) <= room
+    static_assert(lastDirect >= 2);
     if (scale > lastScale) return false;
     if (scale == 0) use(Saturate<T, W>{});
     else if (scale < 0) use(LeftShift<T, W>{scale});
