@@ -195,6 +195,415 @@ typedef struct QorLibraryVersion {
     const char* buildDateText; /**< Build date as "Mmm dd yyyy". */
 } QorLibraryVersion;
 
+/* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
+
+/** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  Integer sums are exact before scaling, complex ones by part. 32f and 32fc: IEEE single precision,
+ *            no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; 16u and complex elements only, the others take steps of any
+ *            value); then nothing is written.
+ *  Example   qoriAdd_8u_C1RSfs(a, aStep, b, bStep, mean, meanStep, (QorImageSize){640, 480}, 1);   // (a + b) / 2
+ */
+QORI_API QorResult QORI_CALL qoriAdd_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
+ *            precision, no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
+ *            written.
+ *  Example   qoriSub_8u_C1IRSfs(background, bgStep, picture, step, roi, 0);   // picture -= background
+ */
+QORI_API QorResult QORI_CALL qoriSub_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Multiplies two images: saturate(src1 * src2 * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  Integer products are exact before scaling; complex ones, (a + bi)(c + di) = (ac - bd) + (ad +
+ *            bc)i, by part. 32f and 32fc: IEEE single-precision operations without fusing, no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
+ *            written.
+ *  Example   qoriMul_8u_C1RSfs(a, aStep, b, bStep, dst, dstStep, roi, 8);   // a * b / 256
+ */
+QORI_API QorResult QORI_CALL qoriMul_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Multiplies two images as fractions of the largest value: round(src1 * src2 / max), max 255 or 65535.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  To nearest; there are no ties. Multiplying by max changes nothing.
+ *  Units     Steps in bytes, checked before the sizes; roiSize in pixels.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ *  Example   qoriMulScale_8u_C1R(alpha, alphaStep, picture, step, dst, dstStep, roi);
+ */
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C1IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C3IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C4IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_AC4IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C1IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C3IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C4IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
 /* ---- Copy ----------------------------------------------------------------------------------------------------- */
 
 /** Copies a region pixel by pixel.
