@@ -604,6 +604,199 @@ QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4R(const uint16_t* pSrc1, int32_
 QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
     int32_t srcDstStep, QorImageSize roiSize);
 
+/* ---- Division of two images ----------------------------------------------------------------------------------- */
+
+/** Divides the second image by the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the numerator and the destination.
+ *  Elements  Integers: the exact quotient is rounded once; complex (c + di) / (a + bi) = ((ca + db) + (da -
+ *            cb)i) / (a^2 + b^2), by part. 32f: with r the processor's approximate reciprocal of src1 and e = 1
+ *            - src1 * r, fused, src2 * r * (1 + e + e^2); this is not the correctly rounded quotient, and its
+ *            last bits depend on the processor. 32fc: in double precision, rounded to single. A zero divisor
+ *            gives integers the type's maximum, or for a negative numerator the minimum, and 0 for 0 (complex:
+ *            each part by its own numerator part). Floats get an infinity with the sign of the quotient (32fc:
+ *            of the numerator part), and the NaN 0x7FBFFFFF where the numerator is 0 or NaN.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: quotients are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK, or QOR_WARN_DIV_BY_ZERO when an element that counts had a zero divisor (everything is
+ *            computed); errors in this order: QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or
+ *            height below 1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriDiv_8u_C1IRSfs(shading, shadingStep, picture, step, roi, -7);   // picture = picture * 128 / shading
+ */
+QORI_API QorResult QORI_CALL qoriDiv_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Divides the second image by the first, rounding as told: saturate(round(src2 / src1 * 2^-scaleFactor)).
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the numerator and the destination.
+ *  Elements  The exact quotient is rounded once: toward zero, to nearest with ties to even, or to nearest with
+ *            ties away from zero. A zero divisor gives the type's maximum, or for a negative numerator the
+ *            minimum, and 0 for 0.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: quotients are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK, or QOR_WARN_DIV_BY_ZERO when an element that counts had a zero divisor (everything is
+ *            computed); errors in this order: QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or
+ *            height below 1), QOR_ERR_STEP (a step below 1), QOR_ERR_ROUND_MODE (roundMode is no
+ *            QorRoundingMode); then nothing is written.
+ *  Example   qoriDiv_Round_16u_C1RSfs(exposure, eStep, raw, rawStep, dst, dstStep, roi, roundHalfAway, -8);
+ */
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+
 /* ---- Copy ----------------------------------------------------------------------------------------------------- */
 
 /** Copies a region pixel by pixel.

@@ -115,29 +115,6 @@ TEST(BinaryArithmetic, StepsOfAnyValueWhereNoneIsChecked) {
     EXPECT_EQ(-4, g[1]);
 }
 
-/// Which faults a member of any operation reports, and which of two it reports first.
-template <class T, Kind kind, bool checksSteps, bool stepsFirst, class Function, class... Parameters>
-void checkStatuses(Function function, Parameters... parameters) {
-    const Shape shape{.width = 4, .height = 2};
-    TestImage a(1, shape, 32), b(2, shape, 32), d(0, shape, 32);
-    const auto statusOf = [&](bool null, int step, QorImageSize roi, int which) {
-        const auto pointer = [&](const TestImage& image, int index) { return null && which == index ? nullptr : image.data<T>(); };
-        const auto stepOf = [&](const TestImage& image, int index) { return which == index ? step : image.step(); };
-        if constexpr (kind == Kind::IR)
-            return call(function, pointer(a, 0), stepOf(a, 0), pointer(d, 2), stepOf(d, 2), roi, parameters...);
-        else
-            return call(function, pointer(a, 0), stepOf(a, 0), pointer(b, 1), stepOf(b, 1), pointer(d, 2), stepOf(d, 2), roi, parameters...);
-    };
-    for (int which : kind == Kind::IR ? std::vector<int>{0, 2} : std::vector<int>{0, 1, 2}) {
-        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, d, statusOf(true, 0, {0, 0}, which));
-        for (QorImageSize bad : {QorImageSize{0, 2}, QorImageSize{4, 0}, QorImageSize{INT32_MIN, -1}})
-            QORI_EXPECT_STATUS(stepsFirst ? QOR_ERR_STEP : QOR_ERR_SIZE, d, statusOf(false, 0, bad, which));
-        if (!checksSteps) continue;
-        for (int bad : {0, -32, INT32_MIN}) QORI_EXPECT_STATUS(QOR_ERR_STEP, d, statusOf(false, bad, {1, 1}, which));
-    }
-    QORI_EXPECT_STATUS(QOR_ERR_SIZE, d, statusOf(false, 0, {0, 1}, 3));
-}
-
 template <class T, Kind kind, bool stepsFirst, bool anyStep, class Function>
 void checkScaledStatuses(Function f) {
     withScale<T>(0, [&](auto... s) { checkStatuses<T, kind, !anyStep, stepsFirst>(f, s...); });

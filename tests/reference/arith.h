@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Arithmetic with a scale factor, one element at a time, in exact numbers of sign and magnitude.
 #pragma once
+#include <immintrin.h>
+
 #include <algorithm>
 #include <array>
 #include <bit>
@@ -49,7 +51,7 @@ struct Big {
 };
 
 /// numerator * 2^-scale / denominator, rounded; some value above 2^32 where it is beyond.
-inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int scale, QorRoundingMode mode) {
+inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int scale, int mode) {
     const int up = scale < 0 ? std::min(-(scale + 1), 99) + 1 : 0, down = std::clamp(scale, 0, 66);
     uint64_t q, r2IsAbove, r2IsEqual;   // quotient; how twice the remainder compares with the denominator
     if (std::bit_width(numerator) + up <= 63 && std::bit_width(denominator) + down <= 63) {
@@ -133,6 +135,57 @@ T multiply(T a, T b, int scale) {
 template <class T>
 T multiplyFractions(T a, T b) {
     return static_cast<T>(scaledQuotient(uint64_t{a} * b, std::numeric_limits<T>::max(), 0, roundNearestEven));
+}
+
+template <class T>
+bool isZero(T a) {
+    if constexpr (isComplex<T>) return a.re == 0 && a.im == 0;
+    else return a == 0;
+}
+
+inline float floatFromBits(uint32_t bits) {
+    float f;
+    __builtin_memcpy(&f, &bits, sizeof f);
+    return f;
+}
+
+/// numerator over a zero of the sign of `zero`.
+inline float overZero(float numerator, float zero) {
+    if (numerator == 0 || std::isnan(numerator)) return floatFromBits(0x7FBFFFFF);
+    const float infinity = std::numeric_limits<float>::infinity();
+    return std::signbit(numerator) != std::signbit(zero) ? -infinity : infinity;
+}
+
+/// The quotient is defined by the processor's reciprocal, so that no other arithmetic can stand in for it here.
+inline float divideByReciprocal(float d, float n) {
+    const float r = _mm_cvtss_f32(_mm_rcp_ss(_mm_set_ss(d)));
+    const float e = std::fma(-d, r, 1.f), q = n * r;
+    return std::fma(std::fma(q, e, q), e, q);
+}
+
+/// b / a.
+template <class T>
+T divide(T a, T b, int scale, int mode = roundNearestEven) {
+    const auto rounded = [&]<class C>(C, Exact n, Exact d) {
+        return saturated<C>(n.negative != d.negative, scaledQuotient(n.magnitude, d.magnitude, scale, mode));
+    };
+    if constexpr (std::is_same_v<T, float>) {
+        return isZero(a) ? overZero(b, a) : divideByReciprocal(a, b);
+    } else if constexpr (std::is_same_v<T, QorComplex32f>) {
+        if (isZero(a)) return {overZero(b.re, 0.f), overZero(b.im, 0.f)};
+        const double p = a.re, q = a.im, r = b.re, t = b.im, norm = p * p + q * q;
+        return {static_cast<float>((r * p + t * q) / norm), static_cast<float>((t * p - r * q) / norm)};
+    } else if (isZero(a)) {
+        return byPart(a, b, [](auto, auto n) {
+            using C = decltype(n);
+            return saturated<C>(n < 0, n == 0 ? 0 : UINT64_MAX);
+        });
+    } else if constexpr (isComplex<T>) {
+        const Exact p = exact(a.re), q = exact(a.im), r = exact(b.re), t = exact(b.im), norm = p * p + q * q;
+        return {rounded(a.re, r * p + t * q, norm), rounded(a.re, t * p + -(r * q), norm)};
+    } else {
+        return rounded(a, exact(b), exact(a));
+    }
 }
 
 }  // namespace qori::test::reference
