@@ -8,7 +8,7 @@ namespace {
 template <class Op, Layout layout, class T>
 QorResult combine(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale) {
     const auto run = [&](auto operation) { runBinary<layout>(operation, src1, src2, dst, roi); };
-    if (!kernels::withScaledOperation<Op, T>(scale, run)) fillZeros<layout>(dst, roi);
+    if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
     return QOR_OK;
 }
 

@@ -42,8 +42,10 @@ void runBinary(Operation&& operation, Image<const T> first, Image<const T> secon
 }
 
 template <Layout layout, class T>
-void fillZeros(Image<T> dst, QorImageSize roi) {
-    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), kernels::Zeros<T>{}, false, dst);
+void fillConstant(Image<T> dst, QorImageSize roi, T value) {
+    const T values[1] = {value};
+    kernels::Fill<T> fill{kernels::channelVectors(values, 1).v[0]};
+    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, false, dst);
 }
 
 }  // namespace qori::arith

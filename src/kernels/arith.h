@@ -263,11 +263,13 @@ QORI_INLINE Vec<T> fractionProduct(Vec<T> a, Vec<T> b) {
     return narrow<T>(divide(product.low), divide(product.high));
 }
 
-/// Zeros, for scales that leave nothing.
+/// One value, for results known beforehand.
 template <class T>
-struct Zeros {
+struct Fill {
     static constexpr bool mayStream = true;
-    QORI_INLINE Pack<T, Vec<T>::lanes> operator()(int) { return {{zero<T>()}}; }
+    Vec<T> value;
+
+    QORI_INLINE Pack<T, Vec<T>::lanes> operator()(int) const { return {{value}}; }
 };
 
 }  // namespace qori::kernels
