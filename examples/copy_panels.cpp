@@ -8,7 +8,7 @@ namespace {
 
 Picture copyOf(const Picture& photo) {
     Picture out(photo.size(), 3);
-    qoriCopy_8u_C3R(photo.data(), photo.step(), out.data(), out.step(), photo.size());
+    require(qoriCopy_8u_C3R(photo.data(), photo.step(), out.data(), out.step(), photo.size()));
     return out;
 }
 
@@ -21,7 +21,7 @@ struct PlanesOf {
           green(photo.size(), 1),
           blue(photo.size(), 1),
           pointers{red.data(), green.data(), blue.data()} {
-        qoriCopy_8u_C3P3R(photo.data(), photo.step(), pointers, red.step(), photo.size());
+        require(qoriCopy_8u_C3P3R(photo.data(), photo.step(), pointers, red.step(), photo.size()));
     }
 };
 
@@ -33,8 +33,8 @@ Picture planes(const Picture& photo) {
     for (int i = 0; i < 3; ++i) {
         const int begin = photo.width() * i / 3, end = photo.width() * (i + 1) / 3;
         if (end > begin)
-            qoriDup_8u_C1C3R(all[i]->at(begin, 0), all[i]->step(), out.at(begin, 0), out.step(),
-                             {end - begin, photo.height()});
+            require(qoriDup_8u_C1C3R(all[i]->at(begin, 0), all[i]->step(), out.at(begin, 0), out.step(),
+                                     {end - begin, photo.height()}));
     }
     return out;
 }
@@ -43,7 +43,7 @@ Picture swappedPlanes(const Picture& photo) {
     const PlanesOf split(photo);
     const uint8_t* order[3] = {split.pointers[2], split.pointers[1], split.pointers[0]};
     Picture out(photo.size(), 3);
-    qoriCopy_8u_P3C3R(order, split.red.step(), out.data(), out.step(), photo.size());
+    require(qoriCopy_8u_P3C3R(order, split.red.step(), out.data(), out.step(), photo.size()));
     return out;
 }
 
@@ -51,16 +51,16 @@ Picture swappedPlanes(const Picture& photo) {
 Picture circle(const Picture& photo) {
     const QorImageSize size = photo.size();
     Picture mask(size, 1), grey(size, 1), out(size, 3);
-    qoriSet_8u_C1R(0, mask.data(), mask.step(), size);
+    require(qoriSet_8u_C1R(0, mask.data(), mask.step(), size));
     const double radius = 0.46 * (size.width < size.height ? size.width : size.height);
     for (int y = 0; y < size.height; ++y) {
         const double dy = y + 0.5 - size.height / 2.0, square = radius * radius - dy * dy;
         const int half = square > 0 ? static_cast<int>(std::sqrt(square)) : 0;
-        if (half > 0) qoriSet_8u_C1R(255, mask.at(size.width / 2 - half, y), mask.step(), {2 * half, 1});
+        if (half > 0) require(qoriSet_8u_C1R(255, mask.at(size.width / 2 - half, y), mask.step(), {2 * half, 1}));
     }
-    qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), grey.data(), grey.step(), size);
-    qoriDup_8u_C1C3R(grey.data(), grey.step(), out.data(), out.step(), size);
-    qoriCopy_8u_C3MR(photo.data(), photo.step(), out.data(), out.step(), size, mask.data(), mask.step());
+    require(qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), grey.data(), grey.step(), size));
+    require(qoriDup_8u_C1C3R(grey.data(), grey.step(), out.data(), out.step(), size));
+    require(qoriCopy_8u_C3MR(photo.data(), photo.step(), out.data(), out.step(), size, mask.data(), mask.step()));
     return out;
 }
 
@@ -69,7 +69,7 @@ Picture channelBars(const Picture& photo) {
     Picture out = copyOf(photo);
     const int bar = photo.width() / 10;
     for (int i = 0; bar > 0 && i < 10; i += 2)
-        qoriSet_8u_C3CR(0, out.at(bar * i, 0) + 2, out.step(), {bar, photo.height()});
+        require(qoriSet_8u_C3CR(0, out.at(bar * i, 0) + 2, out.step(), {bar, photo.height()}));
     return out;
 }
 
@@ -79,9 +79,9 @@ Picture fringes(const Picture& photo) {
     const int shift = photo.width() / 60, width = photo.width() - shift;
     if (width < 1) return out;
     const QorImageSize part{width, photo.height()};
-    qoriCopy_8u_C3C1R(photo.at(shift, 0), photo.step(), plane.data(), plane.step(), part);
-    qoriCopy_8u_C1C3R(plane.data(), plane.step(), out.data(), out.step(), part);
-    qoriCopy_8u_C3CR(photo.data() + 2, photo.step(), out.at(shift, 0) + 2, out.step(), part);
+    require(qoriCopy_8u_C3C1R(photo.at(shift, 0), photo.step(), plane.data(), plane.step(), part));
+    require(qoriCopy_8u_C1C3R(plane.data(), plane.step(), out.data(), out.step(), part));
+    require(qoriCopy_8u_C3CR(photo.data() + 2, photo.step(), out.at(shift, 0) + 2, out.step(), part));
     return out;
 }
 
@@ -90,7 +90,8 @@ Picture lake(const Picture& photo) {
     Picture out = copyOf(photo);
     const int shore = photo.height() * 11 / 20, depth = photo.height() - shore;
     if (shore > 0 && depth <= shore)
-        qoriCopy_8u_C3R(photo.at(0, shore - 1), -photo.step(), out.at(0, shore), out.step(), {photo.width(), depth});
+        require(qoriCopy_8u_C3R(photo.at(0, shore - 1), -photo.step(), out.at(0, shore), out.step(),
+                                {photo.width(), depth}));
     return out;
 }
 
@@ -102,8 +103,8 @@ Picture puzzle(const Picture& photo) {
     if (tile.width < 1 || tile.height < 1) return out;
     for (int i = 0; i < columns * rows; ++i) {
         const int j = (i * 7 + 5) % (columns * rows);
-        qoriCopy_8u_C3R(photo.at(i % columns * tile.width, i / columns * tile.height), photo.step(),
-                        out.at(j % columns * tile.width, j / columns * tile.height), out.step(), tile);
+        require(qoriCopy_8u_C3R(photo.at(i % columns * tile.width, i / columns * tile.height), photo.step(),
+                                out.at(j % columns * tile.width, j / columns * tile.height), out.step(), tile));
     }
     return out;
 }
@@ -114,10 +115,10 @@ Picture framed(const Picture& photo) {
     const auto frame = [&](int inset, int thickness, const uint8_t(&colour)[3]) {
         const int w = photo.width() - 2 * inset, h = photo.height() - 2 * inset;
         if (w <= 2 * thickness || h <= 2 * thickness || thickness < 1) return;
-        qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {w, thickness});
-        qoriSet_8u_C3R(colour, out.at(inset, inset + h - thickness), out.step(), {w, thickness});
-        qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {thickness, h});
-        qoriSet_8u_C3R(colour, out.at(inset + w - thickness, inset), out.step(), {thickness, h});
+        require(qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {w, thickness}));
+        require(qoriSet_8u_C3R(colour, out.at(inset, inset + h - thickness), out.step(), {w, thickness}));
+        require(qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {thickness, h}));
+        require(qoriSet_8u_C3R(colour, out.at(inset + w - thickness, inset), out.step(), {thickness, h}));
     };
     const int mount = photo.height() / 14;
     frame(0, mount, {246, 243, 236});

@@ -2,9 +2,13 @@
 #include "picture.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <fstream>
 #include <iterator>
+#include <map>
+#include <new>
+#include <stdexcept>
 #include <vector>
 
 #define STB_IMAGE_IMPLEMENTATION
@@ -21,25 +25,72 @@
 
 namespace demo {
 
-Picture readPicture(const std::string& file, std::string& reason) {
+namespace {
+
+struct Memory {
+    uint8_t* pixels;
+    int32_t step;
+};
+
+using Shape = std::array<int, 3>;
+
+/// Memory that waits for the next picture of its width, height and channels.
+class Pool {
+public:
+    Pool() = default;
+    Pool(const Pool&) = delete;
+    Pool& operator=(const Pool&) = delete;
+    ~Pool() {
+        for (const auto& [shape, memory] : waiting_) qoriFree(memory.pixels);
+    }
+
+    Memory take(const Shape& shape) {
+        if (auto found = waiting_.find(shape); found != waiting_.end()) return waiting_.extract(found).mapped();
+        const auto [width, height, channels] = shape;
+        Memory memory{};
+        memory.pixels = channels == 3 ? qoriMalloc_8u_C3(width, height, &memory.step)
+                                      : qoriMalloc_8u_C1(width, height, &memory.step);
+        if (memory.pixels == nullptr) throw std::bad_alloc();
+        return memory;
+    }
+
+    void give(const Shape& shape, Memory memory) { waiting_.insert({shape, memory}); }
+
+private:
+    std::multimap<Shape, Memory> waiting_;
+};
+
+Pool& pool() {
+    static Pool pool;
+    return pool;
+}
+
+}  // namespace
+
+void require(QorResult status) {
+    if (status != QOR_OK) throw std::runtime_error("the library returned status " + std::to_string(status));
+}
+
+Picture::Picture(QorImageSize size, int channels) : size_(size), channels_(channels) {
+    const Shape shape{size.width, size.height, channels};
+    const Memory memory = pool().take(shape);
+    step_ = memory.step;
+    pixels_.reset(memory.pixels, [=](uint8_t*) { pool().give(shape, memory); });
+}
+
+Picture readPicture(const std::string& file) {
     int width = 0, height = 0, channels = 0;
     const std::unique_ptr<stbi_uc, void (*)(void*)> pixels(stbi_load(file.c_str(), &width, &height, &channels, 3),
                                                            stbi_image_free);
-    if (!pixels) {
-        reason = stbi_failure_reason();
-        return {};
-    }
+    if (!pixels) throw std::runtime_error("cannot read " + file + ": " + stbi_failure_reason());
     Picture picture({width, height}, 3);
-    if (picture.data() == nullptr) {
-        reason = "out of memory";
-        return {};
-    }
-    qoriCopy_8u_C3R(pixels.get(), 3 * width, picture.data(), picture.step(), picture.size());
+    require(qoriCopy_8u_C3R(pixels.get(), 3 * width, picture.data(), picture.step(), picture.size()));
     return picture;
 }
 
-bool writePng(const std::string& file, const Picture& picture) {
-    return stbi_write_png(file.c_str(), picture.width(), picture.height(), 3, picture.data(), picture.step()) != 0;
+void writePng(const std::string& file, const Picture& picture) {
+    if (!stbi_write_png(file.c_str(), picture.width(), picture.height(), 3, picture.data(), picture.step()))
+        throw std::runtime_error("cannot write " + file);
 }
 
 Picture thumbnail(const Picture& picture, QorImageSize box) {
@@ -47,9 +98,9 @@ Picture thumbnail(const Picture& picture, QorImageSize box) {
     const QorImageSize size{std::max(1, int(std::lround(picture.width() * scale))),
                             std::max(1, int(std::lround(picture.height() * scale)))};
     Picture small(size, 3);
-    if (small.data() != nullptr)
-        stbir_resize_uint8_srgb(picture.data(), picture.width(), picture.height(), picture.step(), small.data(),
-                                size.width, size.height, small.step(), 3, STBIR_ALPHA_CHANNEL_NONE, 0);
+    if (!stbir_resize_uint8_srgb(picture.data(), picture.width(), picture.height(), picture.step(), small.data(),
+                                 size.width, size.height, small.step(), 3, STBIR_ALPHA_CHANNEL_NONE, 0))
+        throw std::bad_alloc();
     return small;
 }
 
@@ -62,7 +113,9 @@ Typeface::Typeface(const std::string& file) {
     std::ifstream in(file, std::ios::binary);
     auto font = std::make_unique<Font>();
     font->file.assign(std::istreambuf_iterator<char>(in), {});
-    if (!font->file.empty() && stbtt_InitFont(&font->info, font->file.data(), 0)) font_ = std::move(font);
+    if (font->file.empty() || !stbtt_InitFont(&font->info, font->file.data(), 0))
+        throw std::runtime_error("cannot read the typeface " + file + " (Debian package fonts-dejavu-core)");
+    font_ = std::move(font);
 }
 
 Typeface::~Typeface() = default;

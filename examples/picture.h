@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // A picture of 8-bit elements in memory from the library.
 #pragma once
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <string>
@@ -9,47 +10,44 @@
 
 namespace demo {
 
+/// Ends the demo on a status other than QOR_OK: panels pass valid images only.
+void require(QorResult status);
+
+/// Copies share the pixels. Pictures of one shape hand their memory on to each other, so that timings show the work and
+/// not the first touch of fresh pages. Throws std::bad_alloc when the memory is not to be had.
 class Picture {
 public:
     Picture() = default;
-    /// Null pixels when the memory is not to be had.
-    Picture(QorImageSize size, int channels) : size_(size), channels_(channels) {
-        pixels_.reset(channels == 3 ? qoriMalloc_8u_C3(size.width, size.height, &step_)
-                                    : qoriMalloc_8u_C1(size.width, size.height, &step_));
-    }
+    Picture(QorImageSize size, int channels);
 
     uint8_t* data() const { return pixels_.get(); }
-    uint8_t* at(int x, int y) const { return data() + y * step_ + x * channels_; }
+    uint8_t* at(int x, int y) const { return data() + ptrdiff_t{step_} * y + x * channels_; }
     int32_t step() const { return step_; }
     QorImageSize size() const { return size_; }
     int width() const { return size_.width; }
     int height() const { return size_.height; }
 
 private:
-    struct Free {
-        void operator()(uint8_t* pixels) const { qoriFree(pixels); }
-    };
-    std::unique_ptr<uint8_t, Free> pixels_;
+    std::shared_ptr<uint8_t> pixels_;
     QorImageSize size_{};
     int channels_ = 0;
     int32_t step_ = 0;
 };
 
-/// PNG, JPEG or PNM as three channels; without pixels, and with a reason, when it cannot be read.
-Picture readPicture(const std::string& file, std::string& reason);
-bool writePng(const std::string& file, const Picture& picture);
+/// PNG, JPEG or binary PNM as three channels. Throws std::runtime_error with the reason when it cannot be read.
+Picture readPicture(const std::string& file);
+void writePng(const std::string& file, const Picture& picture);
 
 /// Scaled to fit into the box, for showing only.
 Picture thumbnail(const Picture& picture, QorImageSize box);
 
-/// Text drawn in a typeface of the system.
+/// Text drawn in a typeface of the system; throws std::runtime_error without one.
 class Typeface {
 public:
     explicit Typeface(const std::string& file);
     ~Typeface();
     Typeface(const Typeface&) = delete;
     Typeface& operator=(const Typeface&) = delete;
-    bool isUsable() const { return font_ != nullptr; }
     void draw(const Picture& target, int x, int baseline, float height, const std::string& text,
               const uint8_t (&colour)[3]) const;
 
