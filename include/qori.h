@@ -1302,6 +1302,254 @@ QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4RSfs(const int16_t* pSrc1, int
 QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
     int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
 
+/* ---- Unary math ----------------------------------------------------------------------------------------------- */
+
+/** Takes the absolute value.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  16s: |-32768| saturates to 32767. 32f: the sign bit is cleared, of NaNs too.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels. 16s: bit 0 of each step is cleared before use, so
+ *            that an odd step is taken as the even number below it.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriAbs_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Squares: dst = saturate(round(src * src * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriSqr_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C4IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_AC4IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C4RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C4IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_AC4IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C4RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C4IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_AC4IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Square root: dst = saturate(round(sqrt(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  Integers: the real root, scaled, is rounded once. Negative 16s values give 0. 32f as IEEE:
+ *            negative values give a NaN.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_AC4IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_AC4IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_AC4IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Exponential: dst = saturate(round(e^src * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  Integers: the real exponential, scaled, is rounded once. 32f: within 1 ulp of the rounded
+ *            exponential, subnormal results too; beyond the range infinity and 0, a NaN gives a NaN.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriExp_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriExp_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriExp_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriExp_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Natural logarithm: dst = saturate(round(ln(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  Integers: the real logarithm, scaled, is rounded once; 0 and negative values give the type's
+ *            minimum (0 or -32768). 32f: within 1 ulp of the rounded logarithm; 0 gives minus infinity,
+ *            negative values and NaNs give a NaN, without a warning.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written. Integers: QOR_WARN_LOG_ZERO or
+ *            QOR_WARN_LOG_NEGATIVE, by the first element at or below 0 in the order of rows; the destination is
+ *            complete.
+ */
+QORI_API QorResult QORI_CALL qoriLn_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriLn_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriLn_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriLn_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
 /* ---- Convert -------------------------------------------------------------------------------------------------- */
 
 /** Converts to a wider type, exactly.
