@@ -195,6 +195,1411 @@ typedef struct QorLibraryVersion {
     const char* buildDateText; /**< Build date as "Mmm dd yyyy". */
 } QorLibraryVersion;
 
+/* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
+
+/** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  Integer sums are exact before scaling, complex ones by part. 32f and 32fc: IEEE single precision,
+ *            no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; 16u and complex elements only, the others take steps of any
+ *            value); then nothing is written.
+ *  Example   qoriAdd_8u_C1RSfs(a, aStep, b, bStep, mean, meanStep, (QorImageSize){640, 480}, 1);   // (a + b) / 2
+ */
+QORI_API QorResult QORI_CALL qoriAdd_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAdd_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
+ *            precision, no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
+ *            written.
+ *  Example   qoriSub_8u_C1IRSfs(background, bgStep, picture, step, roi, 0);   // picture -= background
+ */
+QORI_API QorResult QORI_CALL qoriSub_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSub_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSub_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Multiplies two images: saturate(src1 * src2 * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  Integer products are exact before scaling; complex ones, (a + bi)(c + di) = (ac - bd) + (ad +
+ *            bc)i, by part. 32f and 32fc: IEEE single-precision operations without fusing, no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
+ *            written.
+ *  Example   qoriMul_8u_C1RSfs(a, aStep, b, bStep, dst, dstStep, roi, 8);   // a * b / 256
+ */
+QORI_API QorResult QORI_CALL qoriMul_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMul_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMul_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Multiplies two images as fractions of the largest value: round(src1 * src2 / max), max 255 or 65535.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the second operand and the destination.
+ *  Elements  To nearest; there are no ties. Multiplying by max changes nothing.
+ *  Units     Steps in bytes, checked before the sizes; roiSize in pixels.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ *  Example   qoriMulScale_8u_C1R(alpha, alphaStep, picture, step, dst, dstStep, roi);
+ */
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C1IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C3IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_C4IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_8u_AC4IR(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C1IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C3IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_C4IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4IR(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/* ---- Arithmetic of an image and constants --------------------------------------------------------------------- */
+
+/** Adds constants to an image: saturate((src + value) * 2^-scaleFactor), ties to even.
+ *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
+ *            which keeps channel 3 of the destination.
+ *  Elements  Integer sums are exact before scaling, complex ones by part. 32f and 32fc: IEEE single precision,
+ *            no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value);
+ *            then nothing is written.
+ *  Example   const uint8_t warmer[3] = {0, 4, 16};
+ *            qoriAddC_8u_C3IRSfs(warmer, picture, step, (QorImageSize){640, 480}, 0);
+ */
+QORI_API QorResult QORI_CALL qoriAddC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_C1IRSfs(uint8_t value, uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_C3IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[4],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_C4IRSfs(const uint8_t value[4], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_8u_AC4IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t value, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_C1IRSfs(uint16_t value, uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_C3IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_C4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[4],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_C4IRSfs(const uint16_t value[4], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16u_AC4IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t value, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_C1IRSfs(int16_t value, int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_C3IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_C4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[4],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_C4IRSfs(const int16_t value[4], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16s_AC4IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16sc_C1RSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s value,
+    QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16sc_C1IRSfs(QorComplex16s value, QorComplex16s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16sc_C3RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16sc_C3IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16sc_AC4RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_16sc_AC4IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32sc_C1RSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s value,
+    QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32sc_C1IRSfs(QorComplex32s value, QorComplex32s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32sc_C3RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32sc_C3IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32sc_AC4RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32sc_AC4IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriAddC_32f_C1R(const float* pSrc, int32_t srcStep, float value, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_C1IR(float value, float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_C3R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_C3IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_C4R(const float* pSrc, int32_t srcStep, const float value[4], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_C4IR(const float value[4], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_AC4R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32f_AC4IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f value,
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32fc_C1IR(QorComplex32f value, QorComplex32f* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32fc_C3R(const QorComplex32f* pSrc, int32_t srcStep, const QorComplex32f value[3],
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32fc_C3IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4R(const QorComplex32f* pSrc, int32_t srcStep,
+    const QorComplex32f value[3], QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Subtracts constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even.
+ *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
+ *            which keeps channel 3 of the destination.
+ *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
+ *            precision, no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
+ *            written.
+ *  Example   qoriSubC_16u_C1IRSfs(blackLevel, raw, rawStep, roi, 0);
+ */
+QORI_API QorResult QORI_CALL qoriSubC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_C1IRSfs(uint8_t value, uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_C3IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[4],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_C4IRSfs(const uint8_t value[4], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_8u_AC4IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t value, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_C1IRSfs(uint16_t value, uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_C3IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_C4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[4],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_C4IRSfs(const uint16_t value[4], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16u_AC4IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t value, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_C1IRSfs(int16_t value, int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_C3IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_C4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[4],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_C4IRSfs(const int16_t value[4], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16s_AC4IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16sc_C1RSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s value,
+    QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16sc_C1IRSfs(QorComplex16s value, QorComplex16s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16sc_C3RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16sc_C3IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16sc_AC4RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_16sc_AC4IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32sc_C1RSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s value,
+    QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32sc_C1IRSfs(QorComplex32s value, QorComplex32s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32sc_C3RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32sc_C3IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32sc_AC4RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32sc_AC4IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSubC_32f_C1R(const float* pSrc, int32_t srcStep, float value, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_C1IR(float value, float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_C3R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_C3IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_C4R(const float* pSrc, int32_t srcStep, const float value[4], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_C4IR(const float value[4], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_AC4R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32f_AC4IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f value,
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32fc_C1IR(QorComplex32f value, QorComplex32f* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32fc_C3R(const QorComplex32f* pSrc, int32_t srcStep, const QorComplex32f value[3],
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32fc_C3IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32fc_AC4R(const QorComplex32f* pSrc, int32_t srcStep,
+    const QorComplex32f value[3], QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSubC_32fc_AC4IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Multiplies an image by constants: saturate(src * value * 2^-scaleFactor), ties to even.
+ *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
+ *            which keeps channel 3 of the destination.
+ *  Elements  Integer products are exact before scaling; complex ones, (a + bi)(c + di) = (ac - bd) + (ad +
+ *            bc)i, by part. 32f and 32fc: IEEE single-precision operations without fusing, no scale.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
+ *            written.
+ *  Example   qoriMulC_8u_C1RSfs(src, srcStep, 181, dst, dstStep, roi, 7);   // brighter by half a stop: 181/128 = 2^0.5
+ */
+QORI_API QorResult QORI_CALL qoriMulC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_C1IRSfs(uint8_t value, uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_C3IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[4],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_C4IRSfs(const uint8_t value[4], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_8u_AC4IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t value, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_C1IRSfs(uint16_t value, uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_C3IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_C4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[4],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_C4IRSfs(const uint16_t value[4], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16u_AC4IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t value, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_C1IRSfs(int16_t value, int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_C3IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_C4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[4],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_C4IRSfs(const int16_t value[4], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16s_AC4IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16sc_C1RSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s value,
+    QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16sc_C1IRSfs(QorComplex16s value, QorComplex16s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16sc_C3RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16sc_C3IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16sc_AC4RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_16sc_AC4IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32sc_C1RSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s value,
+    QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32sc_C1IRSfs(QorComplex32s value, QorComplex32s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32sc_C3RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32sc_C3IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32sc_AC4RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32sc_AC4IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulC_32f_C1R(const float* pSrc, int32_t srcStep, float value, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_C1IR(float value, float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_C3R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_C3IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_C4R(const float* pSrc, int32_t srcStep, const float value[4], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_C4IR(const float value[4], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_AC4R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32f_AC4IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f value,
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32fc_C1IR(QorComplex32f value, QorComplex32f* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32fc_C3R(const QorComplex32f* pSrc, int32_t srcStep, const QorComplex32f value[3],
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32fc_C3IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32fc_AC4R(const QorComplex32f* pSrc, int32_t srcStep,
+    const QorComplex32f value[3], QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulC_32fc_AC4IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Divides an image by constants: saturate(src / value * 2^-scaleFactor), ties to even.
+ *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
+ *            which keeps channel 3 of the destination.
+ *  Elements  Integers: the exact quotient is rounded once; complex (c + di) / (a + bi) = ((ca + db) + (da -
+ *            cb)i) / (a^2 + b^2), by part. 32f: the correctly rounded quotient. 32fc: in double precision,
+ *            rounded to single.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_DIV_BY_ZERO (the value of a channel is 0); then nothing
+ *            is written.
+ *  Example   qoriDivC_16s_C1RSfs(src, srcStep, 3, dst, dstStep, roi, -4);   // src / 3 in sixteenths
+ */
+QORI_API QorResult QORI_CALL qoriDivC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_C1IRSfs(uint8_t value, uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_C3IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[4],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_C4IRSfs(const uint8_t value[4], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_8u_AC4IRSfs(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t value, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_C1IRSfs(uint16_t value, uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_C3IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_C4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[4],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_C4IRSfs(const uint16_t value[4], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16u_AC4IRSfs(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t value, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_C1IRSfs(int16_t value, int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_C3IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_C4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[4],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_C4IRSfs(const int16_t value[4], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, const int16_t value[3],
+    int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16s_AC4IRSfs(const int16_t value[3], int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16sc_C1RSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s value,
+    QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16sc_C1IRSfs(QorComplex16s value, QorComplex16s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16sc_C3RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16sc_C3IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16sc_AC4RSfs(const QorComplex16s* pSrc, int32_t srcStep,
+    const QorComplex16s value[3], QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_16sc_AC4IRSfs(const QorComplex16s value[3], QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32sc_C1RSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s value,
+    QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32sc_C1IRSfs(QorComplex32s value, QorComplex32s* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32sc_C3RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32sc_C3IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32sc_AC4RSfs(const QorComplex32s* pSrc, int32_t srcStep,
+    const QorComplex32s value[3], QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32sc_AC4IRSfs(const QorComplex32s value[3], QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDivC_32f_C1R(const float* pSrc, int32_t srcStep, float value, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_C1IR(float value, float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_C3R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_C3IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_C4R(const float* pSrc, int32_t srcStep, const float value[4], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_C4IR(const float value[4], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_AC4R(const float* pSrc, int32_t srcStep, const float value[3], float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32f_AC4IR(const float value[3], float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f value,
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32fc_C1IR(QorComplex32f value, QorComplex32f* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32fc_C3R(const QorComplex32f* pSrc, int32_t srcStep, const QorComplex32f value[3],
+    QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32fc_C3IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4R(const QorComplex32f* pSrc, int32_t srcStep,
+    const QorComplex32f value[3], QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Multiplies an image by constants as fractions of the largest value: round(src * value / max), max 255 or
+ *  65535.
+ *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
+ *            which keeps channel 3 of the destination.
+ *  Elements  To nearest; there are no ties. Multiplying by max changes nothing.
+ *  Units     Steps in bytes; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriMulCScale_8u_C1IR(128, picture, step, roi);   // half as bright
+ */
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_C1IR(uint8_t value, uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_C3R(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_C3IR(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_C4R(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[4],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_C4IR(const uint8_t value[4], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, const uint8_t value[3],
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_8u_AC4IR(const uint8_t value[3], uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t value,
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_C1IR(uint16_t value, uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_C3R(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_C3IR(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_C4R(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[4],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_C4IR(const uint16_t value[4], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, const uint16_t value[3],
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulCScale_16u_AC4IR(const uint16_t value[3], uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+
+/* ---- Division of two images ----------------------------------------------------------------------------------- */
+
+/** Divides the second image by the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even.
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the numerator and the destination.
+ *  Elements  Integers: the exact quotient is rounded once; complex (c + di) / (a + bi) = ((ca + db) + (da -
+ *            cb)i) / (a^2 + b^2), by part. 32f: with r the processor's approximate reciprocal of src1 and e = 1
+ *            - src1 * r, fused, src2 * r * (1 + e + e^2); this is not the correctly rounded quotient, and its
+ *            last bits depend on the processor. 32fc: in double precision, rounded to single. A zero divisor
+ *            gives integers the type's maximum, or for a negative numerator the minimum, and 0 for 0 (complex:
+ *            each part by its own numerator part). Floats get an infinity with the sign of the quotient (32fc:
+ *            of the numerator part), and the NaN 0x7FBFFFFF where the numerator is 0 or NaN.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: quotients are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK, or QOR_WARN_DIV_BY_ZERO when an element that counts had a zero divisor (everything is
+ *            computed); errors in this order: QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or
+ *            height below 1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriDiv_8u_C1IRSfs(shading, shadingStep, picture, step, roi, -7);   // picture = picture * 128 / shading
+ */
+QORI_API QorResult QORI_CALL qoriDiv_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C1RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C1IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C3RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_C3IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_AC4RSfs(const QorComplex16s* pSrc1, int32_t src1Step,
+    const QorComplex16s* pSrc2, int32_t src2Step, QorComplex16s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_16sc_AC4IRSfs(const QorComplex16s* pSrc, int32_t srcStep, QorComplex16s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C1RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C1IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C3RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_C3IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_AC4RSfs(const QorComplex32s* pSrc1, int32_t src1Step,
+    const QorComplex32s* pSrc2, int32_t src2Step, QorComplex32s* pDst, int32_t dstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32sc_AC4IRSfs(const QorComplex32s* pSrc, int32_t srcStep, QorComplex32s* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2, int32_t src2Step,
+    float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C1R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C1IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C3R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_C3IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_AC4R(const QorComplex32f* pSrc1, int32_t src1Step, const QorComplex32f* pSrc2,
+    int32_t src2Step, QorComplex32f* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDiv_32fc_AC4IR(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** Divides the second image by the first, rounding as told: saturate(round(src2 / src1 * 2^-scaleFactor)).
+ *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
+ *            the destination. In place (I), pSrcDst is the numerator and the destination.
+ *  Elements  The exact quotient is rounded once: toward zero, to nearest with ties to even, or to nearest with
+ *            ties away from zero. A zero divisor gives the type's maximum, or for a negative numerator the
+ *            minimum, and 0 for 0.
+ *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: quotients are multiplied by
+ *            2^-scaleFactor.
+ *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK, or QOR_WARN_DIV_BY_ZERO when an element that counts had a zero divisor (everything is
+ *            computed); errors in this order: QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or
+ *            height below 1), QOR_ERR_STEP (a step below 1), QOR_ERR_ROUND_MODE (roundMode is no
+ *            QorRoundingMode); then nothing is written.
+ *  Example   qoriDiv_Round_16u_C1RSfs(exposure, eStep, raw, rawStep, dst, dstStep, roi, roundHalfAway, -8);
+ */
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C1RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C1IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C3RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C3IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_C4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_AC4RSfs(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_8u_AC4IRSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C1RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C1IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C3RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C3IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_C4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_AC4RSfs(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16u_AC4IRSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+
+/* ---- Convert -------------------------------------------------------------------------------------------------- */
+
+/** Converts to a wider type, exactly.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_C3R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_C4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_C3R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_C4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_AC4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_C1R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_C3R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_C4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_AC4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_C1R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_C3R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_C4R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_AC4R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_C1R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_C3R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_C4R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_AC4R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_C3R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_C4R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_AC4R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s16s_C1R(const int8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32u_C1R(const uint16_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts to a wider type, exactly; steps are not checked.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_C1R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts integers to float: exactly from 8 and 16 bits, to the nearest float from 32.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriConvert_8u32f_C3R(src, srcStep, dst, dstStep, (QorImageSize){640, 480});
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_C1R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_C3R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_C4R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_C4R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_AC4R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s32f_C1R(const int32_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32u32f_C1R(const uint32_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Converts signed to unsigned: negative values become 0, others stay.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8s16u_C1Rs(const int8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32u_C1Rs(const int8_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32u_C1Rs(const int16_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s32u_C1Rs(const int32_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts signed to unsigned: negative values become 0, others stay; steps are not checked.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8s8u_C1Rs(const int8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s16u_C1Rs(const int16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts to a narrower integer type, saturating to its range.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_C3R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_C4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_C1R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_C3R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_C4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_AC4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_C1R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_C3R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_C4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_AC4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_C1R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_C3R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_C4R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_AC4R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Converts integers: dst = saturate(round(src * 2^-scaleFactor)), rounding the magnitude.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels. roundMode is a QorRoundingMode; values
+ *            other than 0 and 1 mean roundHalfAway. scaleFactor is any integer.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Notes     Rounding works on the magnitude and restores the sign, so that it is symmetric about zero.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8u8s_C1RSfs(const uint8_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_16u8s_C1RSfs(const uint16_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_16s8s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_16u16s_C1RSfs(const uint16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32s16s_C1RSfs(const int32_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32s16u_C1RSfs(const int32_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u8u_C1RSfs(const uint32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u8s_C1RSfs(const uint32_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u16u_C1RSfs(const uint32_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u16s_C1RSfs(const uint32_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u32s_C1RSfs(const uint32_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+
+/** Converts float to integer: rounded by roundMode, saturated.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels. roundMode is a QorRoundingMode; values other than 0
+ *            and 1 mean roundHalfAway.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Notes     A NaN gives the destination type's minimum: 0, -128 or -32768.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriConvert_32f8u_C1R(src, srcStep, dst, dstStep, roi, roundNearestEven);   // 2.5 becomes 2, 3.5 becomes 4
+ */
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C3R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_AC4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C1R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C3R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C4R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_AC4R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C1R(const float* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C3R(const float* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C4R(const float* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_AC4R(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C1R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C3R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C4R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_AC4R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+
+/** Converts float to integer: dst = saturate(round(src * 2^-scaleFactor)); the product is exact.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels. roundMode is a QorRoundingMode; values
+ *            other than 0 and 1 mean roundHalfAway. scaleFactor is any integer.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Notes     A NaN gives the destination type's minimum; for 32u it gives 4294967295. 32u with scaleFactor
+ *            below -159: every positive value gives 4294967295, however small, and everything else, NaN too,
+ *            gives 0. The in-place form reads the elements as float and leaves 32-bit unsigned integers.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C1RSfs(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C1RSfs(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C1RSfs(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C1RSfs(const float* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f32s_C1RSfs(const float* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1RSfs(const float* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1IRSfs(uint32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t roundMode, int32_t scaleFactor);
+
+/** Unpacks bits into bytes: a set bit gives 255, a clear one 0.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels. Pixel 0 of a row is the bit at srcBitOffset,
+ *            counted from the most significant bit of the row's first byte; 8 and more step into later bytes.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_SIZE (srcBitOffset negative); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_1u8u_C1R(const uint8_t* pSrc, int32_t srcStep, int32_t srcBitOffset,
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+
 /* ---- Copy ----------------------------------------------------------------------------------------------------- */
 
 /** Copies a region pixel by pixel.
@@ -572,6 +1977,111 @@ QORI_API QorComplex32f* QORI_CALL qoriMalloc_32fc_AC4(int32_t width, int32_t hei
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API void QORI_CALL qoriFree(void* ptr);
+
+/* ---- Scale ---------------------------------------------------------------------------------------------------- */
+
+/** Maps 0..255 linearly onto the whole range of the destination type.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  16u: x * 257; 16s: x * 257 - 32768; 32s: x * 16843009 - 2147483648.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16u_C3R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16u_C4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_C3R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_C4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_AC4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_C1R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_C3R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_C4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_AC4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Maps 0..255 linearly onto vMin..vMax: dst = vMin + x * k, k = (vMax - vMin) / 255, in 32-bit float.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_SCALE_RANGE (vMax - vMin at or below 0), QOR_ERR_NULL_PTR (a pointer
+ *            is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step below 1); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+
+/** Maps vMin..vMax linearly onto 0..255: dst = saturate(round(x * k - vMin * k)), k = 255 / (vMax - vMin).
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  One fused multiply-add in 32-bit float, then round to nearest, ties to even. A NaN gives 0.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_SCALE_RANGE (vMax - vMin at or below 0), QOR_ERR_NULL_PTR (a pointer
+ *            is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step below 1); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_32f8u_C3R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_32f8u_C4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_32f8u_AC4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+
+/** Maps the whole range of the source type linearly onto 0..255.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  hintAccurate: round to nearest, ties to even, of x * c for 16u and (x + 32768) * c for 16s, c the
+ *            32-bit float nearest to 255/65535; for 32s of x * (255/4294967295) + 127.5000000296859 in 64-bit
+ *            float. Any other hint: shifts and adds, within 1 of that.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_16u8u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16u8u_C3R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16u8u_C4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16u8u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_C1R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_C3R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_C4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_AC4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_C1R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_C3R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_C4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_AC4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
 
 /* ---- Set ------------------------------------------------------------------------------------------------------ */
 

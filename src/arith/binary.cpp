@@ -1,0 +1,50 @@
+// SPDX-License-Identifier: Apache-2.0
+// Sums, differences and products of two images.
+#include "images.h"
+
+namespace qori::arith {
+namespace {
+
+template <class Op, Layout layout, class T>
+QorResult combine(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale) {
+    const auto run = [&](auto operation) { runBinary<layout>(operation, src1, src2, dst, roi); };
+    if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
+    return QOR_OK;
+}
+
+template <class T, Layout layout>
+QorResult add(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
+    constexpr bool anyStep = std::is_same_v<T, uint8_t> || std::is_same_v<T, int16_t> || std::is_same_v<T, float>;
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
+    return combine<kernels::Sum<T>, layout>(src1, src2, dst, roi, scale);
+}
+
+template <class T, Layout layout>
+QorResult subtract(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
+    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
+    return combine<kernels::Difference<T>, layout>(src1, src2, dst, roi, scale);
+}
+
+template <class T, Layout layout>
+QorResult multiply(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
+    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
+    return combine<kernels::Product<T>, layout>(src1, src2, dst, roi, scale);
+}
+
+template <class T, Layout layout>
+QorResult multiplyFractions(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi) {
+    if (QorResult r = firstOf(nullCheck(src1, src2, dst), stepCheck(src1, src2, dst), sizeCheck(roi))) return r;
+    const auto product = [](Vec<T> a, Vec<T> b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
+    runBinary<layout>(kernels::Binary<T, decltype(product)>{product}, src1, src2, dst, roi);
+    return QOR_OK;
+}
+
+}  // namespace
+}  // namespace qori::arith
+
+#include "entries/arith_binary.inc"

@@ -1,0 +1,147 @@
+// SPDX-License-Identifier: Apache-2.0
+// An image and constants, one per processed channel.
+#include "images.h"
+#include "kernels/arith_divide.h"
+#include "kernels/copy_rows.h"
+
+namespace qori::arith {
+namespace {
+
+enum class Kind { R, IR };
+
+template <Layout layout, class T, class Predicate>
+bool allValues(const T* value, Predicate predicate) {
+    for (int c = 0; c < processedChannels(layout); ++c)
+        if (!predicate(value[c])) return false;
+    return true;
+}
+
+template <class T>
+bool isZeroValue(T value) {
+    if constexpr (kernels::isComplex<T>) return value.re == 0 && value.im == 0;
+    else return value == 0;
+}
+
+/// dst = operation(value, src), per element.
+template <Layout layout, class T, class Operation>
+void runConstant(Operation operation, const T* value, Image<const T> src, Image<T> dst, QorImageSize roi) {
+    [[maybe_unused]] const FloatControl<T> control;
+    T perChannel[channels(layout)];
+    for (int c = 0; c < channels(layout); ++c) perChannel[c] = value[c < processedChannels(layout) ? c : 0];
+    kernels::WithConstant<T, Operation> withConstant{operation, kernels::channelVectors(perChannel, channels(layout))};
+    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), withConstant, false, dst, src);
+}
+
+template <Layout layout, class T>
+void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
+    if (src.data == dst.data && src.step == dst.step) return;
+    if constexpr (keepsAlpha<layout>) {
+        const auto same = [](int, auto block) { return block; };
+        kernels::mapImage<true>(roi, 4, same, false, dst, src);
+    } else {
+        constexpr int pixel = channels(layout) * elementBytes<T>;
+        const bool streaming = streams(streamRules::copy, traffic(roi, 2 * pixel));
+        const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
+        forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); },
+                   walk(src, channels(layout)), walk(dst, channels(layout)));
+        if (streaming) streamFence();
+    }
+}
+
+template <class Op, Layout layout, class T>
+QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale) {
+    const auto run = [&](auto operation) { runConstant<layout>(operation, value, src, dst, roi); };
+    if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
+    return QOR_OK;
+}
+
+template <class T, Layout layout, Kind kind>
+QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
+    constexpr bool anyStep = std::is_same_v<T, uint8_t> ||
+                             (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
+    if constexpr (!kernels::isFloat<T>) {
+        if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
+            copyImage<layout>(src, dst, roi);
+            return QOR_OK;
+        }
+    }
+    if constexpr (std::is_unsigned_v<T>) {
+        constexpr int bits = 8 * elementBytes<T>;
+        if (scale <= -bits && allValues<layout>(value, [](T v) { return v != 0; })) {   // no sum is 0
+            fillConstant<layout>(dst, roi, std::numeric_limits<T>::max());
+            return QOR_OK;
+        }
+    }
+    return combine<kernels::Sum<T>, layout>(value, src, dst, roi, scale);
+}
+
+template <class T, Layout layout>
+QorResult subtractConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
+    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
+    if constexpr (!kernels::isFloat<T>) {
+        if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
+            copyImage<layout>(src, dst, roi);
+            return QOR_OK;
+        }
+    }
+    return combine<kernels::Difference<T>, layout>(value, src, dst, roi, scale);
+}
+
+template <class T, Layout layout>
+QorResult multiplyConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
+    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
+    if constexpr (!kernels::isFloat<T>) {
+        if (allValues<layout>(value, isZeroValue<T>)) {
+            fillConstant<layout>(dst, roi, T{});
+            return QOR_OK;
+        }
+    }
+    if constexpr (std::is_integral_v<T>) {
+        if (scale == 0 && allValues<layout>(value, [](T v) { return v == 1; })) {
+            copyImage<layout>(src, dst, roi);
+            return QOR_OK;
+        }
+    }
+    return combine<kernels::Product<T>, layout>(value, src, dst, roi, scale);
+}
+
+template <class T, Layout layout>
+QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
+    if (!allValues<layout>(value, [](T v) { return !isZeroValue(v); })) return QOR_ERR_DIV_BY_ZERO;
+    if constexpr (std::is_integral_v<T>) {
+        // Up to 2^(scale-1): at most a half, which goes to 0.
+        if (scale > static_cast<int>(std::bit_width(kernels::magnitude<T> - 1))) {
+            fillConstant<layout>(dst, roi, T{});
+            return QOR_OK;
+        }
+    }
+    const auto run = [&](auto division) {
+        runConstant<layout>(kernels::Binary<T, decltype(division)>{division}, value, src, dst, roi);
+    };
+    if constexpr (std::is_same_v<T, float>) {
+        run([](auto d, auto n) __attribute__((always_inline)) { return Vec<float>{_mm256_div_ps(n.v, d.v)}; });
+    } else {
+        kernels::withDivision<T>(scale, run);
+    }
+    return QOR_OK;
+}
+
+template <class T, Layout layout>
+QorResult multiplyConstantFraction(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi) {
+    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
+    const auto product = [](Vec<T> a, Vec<T> b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
+    runConstant<layout>(kernels::Binary<T, decltype(product)>{product}, value, src, dst, roi);
+    return QOR_OK;
+}
+
+}  // namespace
+}  // namespace qori::arith
+
+#include "entries/arith_constant.inc"

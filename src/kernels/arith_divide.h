@@ -1,0 +1,301 @@
+// SPDX-License-Identifier: Apache-2.0
+// Quotients of elements: second / first * 2^-scale, rounded from the exact rational number.
+//
+// Integers go through one floating-point division. A quotient x = N / D (after scaling by a power of two, which is exact)
+// that is not halfway between integers is away from the nearest half by at least 1 / (2 D), that is x / (2 N). The
+// division is off by less than x * 2^-23 in float and x * 2^-52 in double, whatever the rounding mode, and cannot jump
+// over a half, which it represents. So the rounded quotient is exact where N < 2^22 or N < 2^51. Where N is larger
+// because the scale is negative, only quotients that do not saturate matter: N <= 2 D * max.
+//     8u     N <= 2^8 * 2 * 2^8               float
+//     16u 16s  scale >= -6: N < 2^16 * 2^6    float; below: N <= 2^16 * 2 * 2^16   double
+//     16sc   N <= 2^31, or 2^31 * 2 * 2^15    double
+// Whole numbers are farther away, x / N, so that truncation is exact too.
+//
+// A divisor of 0 acts as 2^-60: any numerator but 0 saturates by its sign, 0 gives 0, and nothing traps.
+#pragma once
+#include "arith.h"
+
+namespace qori::kernels {
+
+constexpr double kTiny = 0x1p-60;
+
+/// Scales past these ends make no difference: numerators are 1 to 2^31, divisors up to 2^31, and with the tiny divisor
+/// the least quotient, 2^-33 / 2^-60, still saturates.
+constexpr int kLeastScale = -48, kMostScale = 33;
+
+QORI_INLINE double powerOfTwo(int exponent) { return std::bit_cast<double>(static_cast<int64_t>(1023 + exponent) << 52); }
+
+/// What a division has met: which elements had a zero divisor, by their place among the lanes.
+struct ZeroDivisors {
+    __m256i seen = _mm256_setzero_si256();
+
+    QORI_INLINE void note(__m256i isZero) { seen = _mm256_or_si256(seen, isZero); }
+
+    /// Only the first `count` elements of a tail are there.
+    template <class T>
+    QORI_INLINE void noteFirst(__m256i isZero, ptrdiff_t count) {
+        const __m256i index = _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20, 21,
+                                               22, 23, 24, 25, 26, 27, 28, 29, 30, 31);
+        const auto bytes = static_cast<int8_t>(count * static_cast<ptrdiff_t>(sizeof(T)));
+        note(_mm256_and_si256(isZero, _mm256_cmpgt_epi8(_mm256_set1_epi8(bytes), index)));
+    }
+
+    /// Whether any was met; fourth channels do not count where they are kept.
+    template <bool keepAlpha, class T>
+    bool any() const {
+        Vec<T> counted = fromInteger<T>(seen);
+        if constexpr (keepAlpha) counted = detail::withAlphaOf(counted, zero<T>());
+        return !_mm256_testz_si256(toInteger(counted.v), toInteger(counted.v));
+    }
+};
+
+// --- rounding of float vectors, independent of the control register -------------------------------------------------
+
+QORI_INLINE Vec<float> truncate(Vec<float> x) { return {_mm256_round_ps(x.v, _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC)}; }
+QORI_INLINE Vec<double> truncate(Vec<double> x) { return {_mm256_round_pd(x.v, _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC)}; }
+QORI_INLINE Vec<float> roundToEven(Vec<float> x) { return {_mm256_round_ps(x.v, _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC)}; }
+QORI_INLINE Vec<double> roundToEven(Vec<double> x) { return {_mm256_round_pd(x.v, _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC)}; }
+
+/// The fraction x - trunc(x) is exact; from 1/2 on, one more with the sign of x.
+QORI_INLINE Vec<float> roundHalfFromZero(Vec<float> x) {
+    const __m256 sign = _mm256_set1_ps(-0.f), whole = truncate(x).v, fraction = _mm256_andnot_ps(sign, _mm256_sub_ps(x.v, whole));
+    const __m256 away = _mm256_and_ps(_mm256_cmp_ps(fraction, _mm256_set1_ps(.5f), _CMP_GE_OQ), _mm256_set1_ps(1));
+    return {_mm256_add_ps(whole, _mm256_or_ps(away, _mm256_and_ps(x.v, sign)))};
+}
+QORI_INLINE Vec<double> roundHalfFromZero(Vec<double> x) {
+    const __m256d sign = _mm256_set1_pd(-0.), whole = truncate(x).v, fraction = _mm256_andnot_pd(sign, _mm256_sub_pd(x.v, whole));
+    const __m256d away = _mm256_and_pd(_mm256_cmp_pd(fraction, _mm256_set1_pd(.5), _CMP_GE_OQ), _mm256_set1_pd(1));
+    return {_mm256_add_pd(whole, _mm256_or_pd(away, _mm256_and_pd(x.v, sign)))};
+}
+
+template <QorRoundingMode mode, class F>
+QORI_INLINE Vec<F> rounded(Vec<F> x) {
+    if constexpr (mode == roundTowardZero) return truncate(x);
+    else if constexpr (mode == roundHalfAway) return roundHalfFromZero(x);
+    else return roundToEven(x);
+}
+
+// --- 8u, 16u, 16s ---------------------------------------------------------------------------------------------------
+
+/// Quotients of eight 32-bit integers, clamped to the range of T.
+template <class T, QorRoundingMode mode, class F>
+struct Quotients {
+    explicit Quotients(int32_t scale) : factor(powerOfTwo(-std::clamp(scale, kLeastScale, kMostScale))) {}
+
+    QORI_INLINE __m256i operator()(__m256i numerator, __m256i divisor) const {
+        if constexpr (std::is_same_v<F, float>) {
+            return _mm256_cvttps_epi32(quotient(_mm256_cvtepi32_ps(numerator), _mm256_cvtepi32_ps(divisor)));
+        } else {
+            const auto half = [&](__m128i n, __m128i d) {
+                return _mm256_cvttpd_epi32(quotient(_mm256_cvtepi32_pd(n), _mm256_cvtepi32_pd(d)));
+            };
+            const __m128i low = half(_mm256_castsi256_si128(numerator), _mm256_castsi256_si128(divisor));
+            return _mm256_set_m128i(half(_mm256_extracti128_si256(numerator, 1), _mm256_extracti128_si256(divisor, 1)), low);
+        }
+    }
+
+private:
+    static constexpr T least = std::numeric_limits<T>::min(), most = std::numeric_limits<T>::max();
+
+    QORI_INLINE __m256 quotient(__m256 n, __m256 d) const {
+        const __m256 tiny = _mm256_set1_ps(static_cast<float>(kTiny));
+        if constexpr (std::is_signed_v<T>)
+            d = _mm256_blendv_ps(d, tiny, _mm256_cmp_ps(d, _mm256_setzero_ps(), _CMP_EQ_OQ));
+        else
+            d = _mm256_max_ps(d, tiny);
+        __m256 x = _mm256_div_ps(_mm256_mul_ps(n, _mm256_set1_ps(static_cast<float>(factor))), d);
+        if constexpr (std::is_signed_v<T>) x = _mm256_max_ps(x, _mm256_set1_ps(least));
+        return rounded<mode>(Vec<float>{_mm256_min_ps(x, _mm256_set1_ps(most))}).v;
+    }
+    QORI_INLINE __m256d quotient(__m256d n, __m256d d) const {
+        d = _mm256_blendv_pd(d, _mm256_set1_pd(kTiny), _mm256_cmp_pd(d, _mm256_setzero_pd(), _CMP_EQ_OQ));
+        __m256d x = _mm256_div_pd(_mm256_mul_pd(n, _mm256_set1_pd(factor)), d);
+        x = _mm256_min_pd(_mm256_max_pd(x, _mm256_set1_pd(least)), _mm256_set1_pd(most));
+        return rounded<mode>(Vec<double>{x}).v;
+    }
+    double factor;
+};
+
+/// second / first of real integers.
+template <class T, QorRoundingMode mode, class F>
+struct DivideIntegers {
+    explicit DivideIntegers(int32_t scale) : quotients(scale) {}
+
+    static QORI_INLINE __m256i zeroDivisors(Vec<T> first) {
+        const __m256i none = _mm256_setzero_si256();
+        return sizeof(T) == 1 ? _mm256_cmpeq_epi8(first.v, none) : _mm256_cmpeq_epi16(first.v, none);
+    }
+    QORI_INLINE Vec<T> operator()(Vec<T> first, Vec<T> second) const {
+        if constexpr (sizeof(T) == 1) {
+            const Wide<uint16_t> d = widen<uint16_t>(first), n = widen<uint16_t>(second);
+            return narrow<uint8_t>(divide(d.low, n.low), divide(d.high, n.high));
+        } else {
+            return divide(first, second);
+        }
+    }
+
+private:
+    template <class H>
+    QORI_INLINE Vec<H> divide(Vec<H> first, Vec<H> second) const {
+        const Wide<int32_t> d = widen<int32_t>(first), n = widen<int32_t>(second);
+        return narrow<H>(Vec<int32_t>{quotients(n.low.v, d.low.v)}, Vec<int32_t>{quotients(n.high.v, d.high.v)});
+    }
+    Quotients<T, mode, F> quotients;
+};
+
+/// Calls use(divide) with the division of integers T.
+template <class T, QorRoundingMode mode, class Use>
+void withRoundedDivision(int32_t scale, Use use) {
+    if (sizeof(T) == 1 || scale >= -6) use(DivideIntegers<T, mode, float>{scale});
+    else if constexpr (sizeof(T) != 1) use(DivideIntegers<T, mode, double>{scale});
+}
+
+// --- complex integers -----------------------------------------------------------------------------------------------
+
+/// With first = a + bi and second = c + di: ((ca + db) + (da - cb)i) / (a^2 + b^2). A zero divisor gives each part the
+/// saturation of its own numerator part.
+struct DivideComplex16 {
+    explicit DivideComplex16(int32_t scale) : factor(powerOfTwo(-std::clamp(scale, kLeastScale, kMostScale))) {}
+
+    static QORI_INLINE __m256i zeroDivisors(Vec<QorComplex16s> first) {
+        return _mm256_cmpeq_epi32(first.v, _mm256_setzero_si256());
+    }
+    /// |da - cb| <= 2^30 + 2^15 (2^15 - 1); ca + db and a^2 + b^2 reach 2^31, which fits after 1 is taken off: their
+    /// least values are 2^16 - 2^31 and 0. da - cb comes as da + c(-b - 1) + c, because -b need not fit 16 bits.
+    QORI_INLINE Vec<QorComplex16s> operator()(Vec<QorComplex16s> first, Vec<QorComplex16s> second) const {
+        const __m256i y = first.v, x = second.v, one = _mm256_set1_epi32(1);
+        const __m256i crossed = detail::swapParts(Vec<int16_t>{_mm256_xor_si256(y, _mm256_set1_epi32(static_cast<int32_t>(0xFFFF0000u)))}).v;
+        const __m256i real = _mm256_sub_epi32(_mm256_madd_epi16(x, y), one);
+        const __m256i imaginary = _mm256_add_epi32(_mm256_madd_epi16(x, crossed), _mm256_srai_epi32(_mm256_slli_epi32(x, 16), 16));
+        const __m256i norm = _mm256_sub_epi32(_mm256_madd_epi16(y, y), one);
+        // Where the divisor is zero the sums are too, and the parts of the numerator take their place.
+        const __m256i none = zeroDivisors(first);
+        const __m256i c = _mm256_and_si256(none, _mm256_srai_epi32(_mm256_slli_epi32(x, 16), 16));
+        const __m256i d = _mm256_and_si256(none, _mm256_srai_epi32(x, 16));
+        const auto half = [&](auto part) {
+            const __m256d divisor = _mm256_max_pd(plusOne(part(norm)), _mm256_set1_pd(kTiny));
+            const __m128i re = quotient(plusOne(part(_mm256_add_epi32(real, c))), divisor);
+            const __m128i im = quotient(_mm256_cvtepi32_pd(part(_mm256_add_epi32(imaginary, d))), divisor);
+            return _mm_packs_epi32(_mm_unpacklo_epi32(re, im), _mm_unpackhi_epi32(re, im));
+        };
+        const __m128i low = half([](__m256i v) { return _mm256_castsi256_si128(v); });
+        return {_mm256_set_m128i(half([](__m256i v) { return _mm256_extracti128_si256(v, 1); }), low)};
+    }
+
+private:
+    static QORI_INLINE __m256d plusOne(__m128i v) { return _mm256_add_pd(_mm256_cvtepi32_pd(v), _mm256_set1_pd(1)); }
+    QORI_INLINE __m128i quotient(__m256d n, __m256d d) const {
+        const __m256d x = _mm256_div_pd(_mm256_mul_pd(n, _mm256_set1_pd(factor)), d);
+        return _mm256_cvttpd_epi32(roundToEven({_mm256_min_pd(_mm256_max_pd(x, _mm256_set1_pd(INT16_MIN)), _mm256_set1_pd(INT16_MAX))}).v);
+    }
+    double factor;
+};
+
+/// One quotient in integers, for which no float is wide enough.
+QorComplex32s divideExactly(QorComplex32s divisor, QorComplex32s numerator, int32_t scale);
+
+struct DivideComplex32 {
+    explicit DivideComplex32(int32_t scaleFactor) : scale(scaleFactor) {}
+
+    static QORI_INLINE __m256i zeroDivisors(Vec<QorComplex32s> first) {
+        return _mm256_cmpeq_epi64(first.v, _mm256_setzero_si256());
+    }
+    QORI_INLINE Vec<QorComplex32s> operator()(Vec<QorComplex32s> first, Vec<QorComplex32s> second) const {
+        QorComplex32s y[4], x[4];
+        store(y, first);
+        store(x, second);
+        for (int i = 0; i < 4; ++i) x[i] = divideExactly(y[i], x[i], scale);
+        return load(x);
+    }
+    int32_t scale;
+};
+
+// --- floats ---------------------------------------------------------------------------------------------------------
+
+/// What a zero divisor makes of a numerator: the NaN 0x7FBFFFFF (signalling) of 0 and NaN, else an infinity with the
+/// sign of both.
+QORI_INLINE __m256 overZero(__m256 numerator, __m256 divisor) {
+    const __m256 sign = _mm256_and_ps(_mm256_set1_ps(-0.f), _mm256_xor_ps(numerator, divisor));
+    const __m256 infinite = _mm256_or_ps(sign, _mm256_castsi256_ps(_mm256_set1_epi32(0x7F800000)));
+    const __m256 undefined = _mm256_cmp_ps(numerator, _mm256_setzero_ps(), _CMP_EQ_UQ);
+    return _mm256_blendv_ps(infinite, _mm256_castsi256_ps(_mm256_set1_epi32(0x7FBFFFFF)), undefined);
+}
+
+/// With r the processor's approximate reciprocal of d and e = 1 - d r: n r (1 + e + e^2). Not the correctly rounded
+/// quotient, and it may differ between makes of processors with their reciprocals.
+struct DivideFloats {
+    explicit DivideFloats(int32_t) {}
+
+    static QORI_INLINE __m256i zeroDivisors(Vec<float> first) {
+        return _mm256_castps_si256(_mm256_cmp_ps(first.v, _mm256_setzero_ps(), _CMP_EQ_OQ));
+    }
+    QORI_INLINE Vec<float> operator()(Vec<float> first, Vec<float> second) const {
+        const __m256 none = _mm256_castsi256_ps(zeroDivisors(first)), one = _mm256_set1_ps(1);
+        const __m256 d = _mm256_blendv_ps(first.v, one, none);
+        const __m256 r = _mm256_rcp_ps(d);
+        const __m256 e = _mm256_fnmadd_ps(d, r, one);
+        const __m256 q = _mm256_mul_ps(second.v, r);
+        const __m256 result = _mm256_fmadd_ps(_mm256_fmadd_ps(q, e, q), e, q);
+        if (_mm256_testz_ps(none, none)) return {result};
+        return {_mm256_blendv_ps(result, overZero(second.v, first.v), none)};
+    }
+};
+
+/// In double precision, where squares neither overflow nor vanish, rounded to float at the end.
+struct DivideComplexFloats {
+    explicit DivideComplexFloats(int32_t) {}
+
+    static QORI_INLINE __m256i zeroDivisors(Vec<QorComplex32f> first) {
+        const __m256 none = _mm256_cmp_ps(components(first).v, _mm256_setzero_ps(), _CMP_EQ_OQ);
+        return _mm256_castps_si256(_mm256_and_ps(none, _mm256_permute_ps(none, 0xB1)));
+    }
+    QORI_INLINE Vec<QorComplex32f> operator()(Vec<QorComplex32f> first, Vec<QorComplex32f> second) const {
+        const __m256 y = components(first).v, x = components(second).v;
+        const __m256 none = _mm256_castsi256_ps(zeroDivisors(first));
+        const __m256 d = _mm256_blendv_ps(y, _mm256_set1_ps(1), none);
+        const __m128 low = quotients(_mm256_castps256_ps128(x), _mm256_castps256_ps128(d));
+        const __m256 result = _mm256_set_m128(quotients(_mm256_extractf128_ps(x, 1), _mm256_extractf128_ps(d, 1)), low);
+        return elements<QorComplex32f>({_mm256_blendv_ps(result, overZero(x, _mm256_setzero_ps()), none)});
+    }
+
+private:
+    static QORI_INLINE __m128 quotients(__m128 numerators, __m128 divisors) {
+        const __m256d x = _mm256_cvtps_pd(numerators), y = _mm256_cvtps_pd(divisors);
+        const __m256d squares = _mm256_mul_pd(y, y), norm = _mm256_add_pd(squares, _mm256_permute_pd(squares, 0x5));
+        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                          // ca, da
+        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));   // db, cb
+        const __m256d sums = _mm256_addsub_pd(byReal, _mm256_xor_pd(byImaginary, _mm256_set1_pd(-0.)));
+        return _mm256_cvtpd_ps(_mm256_div_pd(sums, norm));
+    }
+};
+
+// --- row operations -------------------------------------------------------------------------------------------------
+
+/// second / first, remembering zero divisors.
+template <class T, class Divide>
+struct Division {
+    Divide divide;
+    ZeroDivisors zeros;
+
+    using Block = Pack<T, Vec<T>::lanes>;
+    QORI_INLINE Block operator()(int, Block first, Block second) {
+        zeros.note(Divide::zeroDivisors(first.v[0]));
+        return {{divide(first.v[0], second.v[0])}};
+    }
+    QORI_INLINE Block tail(int, ptrdiff_t count, Block first, Block second) {
+        zeros.noteFirst<T>(Divide::zeroDivisors(first.v[0]), count);
+        return {{divide(first.v[0], second.v[0])}};
+    }
+};
+
+/// Calls use(divide) with the division of elements T.
+template <class T, class Use>
+void withDivision(int32_t scale, Use use) {
+    if constexpr (std::is_same_v<T, QorComplex16s>) use(DivideComplex16{scale});
+    else if constexpr (std::is_same_v<T, QorComplex32s>) use(DivideComplex32{scale});
+    else if constexpr (std::is_same_v<T, QorComplex32f>) use(DivideComplexFloats{scale});
+    else if constexpr (std::is_same_v<T, float>) use(DivideFloats{scale});
+    else withRoundedDivision<T, roundNearestEven>(scale, use);
+}
+
+}  // namespace qori::kernels

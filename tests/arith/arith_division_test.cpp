@@ -1,0 +1,149 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "arith.h"
+
+namespace qori::test {
+namespace {
+
+/// No zeros but in fourth channels, where they must not be noticed when alpha is kept.
+template <class T, Layout layout>
+struct ZeroInAlphaOnly {
+    mutable int drawn = 0;
+
+    T operator()() const {
+        if (layout == Layout::AC4 && drawn++ % 4 == 3) return T{};
+        for (;;)
+            if (const T value = NearPowers<T>{}(); !reference::isZero(value)) return value;
+    }
+};
+
+/// invoke(a, b, d, roi, scale, mode) calls the export.
+template <class T, Layout layout, class Sweep>
+void sweep(const char* name, Sweep check) {
+    int turn = 0;
+    forShapesAndScales<T, false>([&](const Shape& shape, int32_t scale) {
+        const int mode = turn / 2 % 3;
+        if (turn++ % 2 == 0) check(shape, scale, mode, NearPowers<T>{});
+        else check(shape, scale, mode, ZeroInAlphaOnly<T, layout>{});
+    });
+    markSwept(name);
+}
+
+template <class T, Layout layout, Kind kind, class Invoke, class Draw>
+void checkDivision(const Shape& shape, int32_t scale, int mode, Draw draw, Invoke invoke) {
+    bool zeroMet = false;
+    checkBinary<T, T, layout, kind>(shape, [&](const TestImage& a, const TestImage& b, const TestImage& d, QorImageSize roi) {
+        EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(a, b, d, roi));
+    }, [&](T a, T b, int) {
+        zeroMet = zeroMet || reference::isZero(a);
+        return reference::divide(a, b, scale, mode);
+    }, draw);
+}
+
+template <class T, Layout layout, Kind kind, class Function>
+void divide(const char* name, Function function) {
+    sweep<T, layout>(name, [&](const Shape& shape, int32_t scale, int, auto draw) {
+        checkDivision<T, layout, kind>(shape, scale, roundNearestEven, draw, [&](auto&... arguments) {
+            return withScale<T>(scale, [&](auto... s) { return callBinary<T, kind>(function, arguments..., s...); });
+        });
+    });
+}
+
+template <class T, Layout layout, Kind kind, class Function>
+void divideRounded(const char* name, Function function) {
+    sweep<T, layout>(name, [&](const Shape& shape, int32_t scale, int mode, auto draw) {
+        checkDivision<T, layout, kind>(shape, scale, mode, draw, [&](auto&... arguments) {
+            return callBinary<T, kind>(function, arguments..., mode, scale);
+        });
+    });
+}
+
+#define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
+    TEST(DivisionSweep, name) { operation<S, Layout::SL, Kind::kind>(#name, &name); }
+#include "members/arith_division.inc"
+#undef QORI_MEMBER
+
+template <class T, Kind kind, class Function>
+void status_divide(Function function) {
+    withScale<T>(0, [&](auto... s) { checkStatuses<T, kind, true, false>(function, s...); });
+}
+template <class T, Kind kind, class Function>
+void status_divideRounded(Function function) {
+    checkStatuses<T, kind, true, false>(function, 7, 0);   // the faulty mode is found last
+    const Shape shape{.width = 4, .height = 2};
+    TestImage a(1, shape, 8), b(2, shape, 8), d(0, shape, 8);
+    for (int mode : {-1, 3, INT32_MAX})
+        QORI_EXPECT_STATUS(QOR_ERR_ROUND_MODE, d, (callBinary<T, kind>(function, a, b, d, shape.roi(), mode, 0)));
+}
+#define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
+    TEST(DivisionStatus, name) { status_##operation<S, Kind::kind>(&name); }
+#include "members/arith_division.inc"
+#undef QORI_MEMBER
+
+/// Every numerator of a type over some divisors, at every scale factor that matters and in every mode.
+template <class T, class Function, class RoundedFunction>
+void checkAllNumerators(const std::vector<T>& divisors, Function function, RoundedFunction roundedFunction) {
+    constexpr int count = 1 << 8 * sizeof(T), bytes = count * static_cast<int>(sizeof(T));
+    std::vector<T> a(count), b(count), d(count);
+    for (size_t i = 0; i < count; ++i) b[i] = static_cast<T>(i);
+    for (T divisor : divisors) {
+        std::fill(a.begin(), a.end(), divisor);
+        for (int s = sizeof(T) == 1 ? -40 : -18; s <= (sizeof(T) == 1 ? 40 : 18); ++s)
+            for (int mode = 0; mode < 4; ++mode) {
+                const auto result = mode == 3
+                    ? call(function, a.data(), bytes, b.data(), bytes, d.data(), bytes, QorImageSize{count, 1}, s)
+                    : call(roundedFunction, a.data(), bytes, b.data(), bytes, d.data(), bytes, QorImageSize{count, 1}, mode, s);
+                ASSERT_EQ(divisor == 0 ? QOR_WARN_DIV_BY_ZERO : QOR_OK, result);
+                for (size_t i = 0; i < count; ++i)
+                    ASSERT_EQ(reference::divide(divisor, b[i], s, mode == 3 ? roundNearestEven : mode), d[i])
+                        << +b[i] << " / " << +divisor << " scale " << s << " mode " << mode;
+            }
+    }
+}
+
+TEST(Division, AllBytePairsAtEveryScaleFactor) {
+    std::vector<uint8_t> all;
+    for (int d = 0; d < 256; ++d) all.push_back(static_cast<uint8_t>(d));
+    checkAllNumerators(all, qoriDiv_8u_C1RSfs, qoriDiv_Round_8u_C1RSfs);
+}
+
+TEST(Division, AllNumeratorsOf16Bits) {
+    checkAllNumerators<uint16_t>({1, 3, 255, 32767, 65535}, qoriDiv_16u_C1RSfs, qoriDiv_Round_16u_C1RSfs);
+    checkAllNumerators<int16_t>({1, -1, 7, -181, 32767, INT16_MIN}, qoriDiv_16s_C1RSfs, qoriDiv_Round_16s_C1RSfs);
+}
+
+TEST(Division, WidestComplexNumbers) {
+    const int32_t extremes[] = {INT32_MIN, INT32_MIN + 1, -1, 0, 1, INT32_MAX};
+    for (int code = 0; code < 6 * 6 * 6 * 6; ++code) {
+        const QorComplex32s a{extremes[code % 6], extremes[code / 6 % 6]}, b{extremes[code / 36 % 6], extremes[code / 216]};
+        const auto narrow = [](QorComplex32s v) { return QorComplex16s{static_cast<int16_t>(v.re >> 16), static_cast<int16_t>(v.im >> 16)}; };
+        const QorComplex16s p = narrow(a), q = narrow(b);
+        const int scale = scaleFactors()[static_cast<size_t>(code) % scaleFactors().size()];
+        QorComplex32s d;
+        QorComplex16s e;
+        call(qoriDiv_32sc_C1RSfs, &a, 8, &b, 8, &d, 8, QorImageSize{1, 1}, scale);
+        call(qoriDiv_16sc_C1RSfs, &p, 4, &q, 4, &e, 4, QorImageSize{1, 1}, scale);
+        const QorComplex32s wanted = reference::divide(a, b, scale);
+        const QorComplex16s wanted16 = reference::divide(p, q, scale);
+        ASSERT_TRUE(wanted.re == d.re && wanted.im == d.im) << "case " << code << " scale " << scale;
+        ASSERT_TRUE(wanted16.re == e.re && wanted16.im == e.im) << "case " << code << " scale " << scale;
+    }
+}
+
+TEST(Division, FloatsOverZero) {
+    const float inf = std::numeric_limits<float>::infinity(), nan = std::numeric_limits<float>::quiet_NaN();
+    const float divisors[] = {0.f, 0.f, 0.f, 0.f, -0.f, -0.f, 0.f, 2.f, 0.f}, numerators[] = {2, -2, 0, nan, 2, -2, -inf, 3, -nan};
+    const uint32_t expected[] = {0x7F800000, 0xFF800000, 0x7FBFFFFF, 0x7FBFFFFF, 0xFF800000, 0x7F800000, 0xFF800000, 0x3FC00000, 0x7FBFFFFF};
+    float results[9];
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_32f_C1R, divisors, 36, numerators, 36, results, 36, QorImageSize{9, 1}));
+    EXPECT_EQ(0, std::memcmp(expected, results, sizeof results));
+}
+
+TEST(Division, WarnsOfAZeroInTheFirstRowOnly) {
+    uint8_t a[4] = {0, 1, 1, 1}, b[4] = {5, 6, 7, 8}, d[4];
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_8u_C1RSfs, a, 2, b, 2, d, 2, QorImageSize{2, 2}, 0));
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_8u_C1RSfs, a, 2, b, 2, d, 2, QorImageSize{1, 2}, 0));
+    EXPECT_EQ(QOR_OK, call(qoriDiv_8u_C1RSfs, a + 1, 2, b, 2, d, 2, QorImageSize{1, 2}, 0));
+}
+
+}  // namespace
+}  // namespace qori::test
