@@ -573,6 +573,586 @@ QORI_API QorComplex32f* QORI_CALL qoriMalloc_32fc_AC4(int32_t width, int32_t hei
  */
 QORI_API void QORI_CALL qoriFree(void* ptr);
 
+/* ---- Norms, sums, means and dot products ---------------------------------------------------------------------- */
+
+/** Adds the elements of each channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   double sum[3];
+ *            qoriSum_8u_C3R(rgb, rgbStep, (QorImageSize){640, 480}, sum);
+ */
+QORI_API QorResult QORI_CALL qoriSum_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum,
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[4],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3],
+    int32_t hint);
+
+/** Averages the elements of each channel: their sum over width * height.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     width * height is taken modulo 2^32 as a signed number. C1 divides the sum; the other layouts
+ *            multiply it by the reciprocal, which may differ in the last bit.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMean_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double* pMean,
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pMean[3],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pMean[4],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3], int32_t hint);
+
+/** Largest magnitude of each channel: max |src|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     |-32768| is 32768. NaN elements are ignored; 0 where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+
+/** Sum of magnitudes of each channel: sum |src|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+
+/** Euclidean norm of each channel: the square root of sum src^2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     32f, fast: squares are summed in single precision, so magnitudes above 1.8e19 overflow to
+ *            infinity.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   double norm;
+ *            qoriNorm_L2_32f_C1R(src, srcStep, roi, &norm, hintAccurate);
+ */
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+
+/** Largest magnitude of the difference in each channel: max |src1 - src2|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     32f: differences in single precision; those that are NaN are ignored.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+
+/** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Largest magnitude of the difference over that of src2, per channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the norm of src2 is 0, the result is the norm of the difference and the status
+ *            QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+
+/** Sum of magnitudes of the difference over that of src2, per channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the norm of src2 is below 2.2250738585072014e-308, the result is the norm of the difference
+ *            and the status QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the sum of squares of src2 is below 2.2250738585072014e-308, the result is the norm of the
+ *            difference and the status QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Dot product of two images, per channel: sum src1 * src2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  8- and 16-bit totals are exact and rounded once. 32u and 32s: products and sums in double
+ *            precision, in the order of the pixels. 32f with hintAccurate: exact products, sums in double
+ *            precision; with any other hint: 48 partial sums in single precision by fused multiply-add, added
+ *            pairwise.
+ *  Units     Steps in bytes, not checked otherwise; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (8u C1 only: a step of 0); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C1R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C3R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C4R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_AC4R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C1R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C3R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C4R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_AC4R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C1R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C3R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C4R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_AC4R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp, int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3], int32_t hint);
+
+/** Weighted sum of vectors: pDst[j] = sum over i of pWeights[i] * ppSrcRows[i][j].
+ *  Shapes    nRows vectors and weights; len elements in each vector and in pDst.
+ *  Elements  Products and sums are rounded to the element type one by one, in the order of the rows.
+ *  Units     len in elements.
+ *  Aliasing  pDst may be one of the rows.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (len or nRows below 1),
+ *            QOR_ERR_NULL_PTR (a row is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDotProdCol_32f_L2(const float* const* ppSrcRows, const float* pWeights, int32_t nRows,
+    float* pDst, int32_t len);
+QORI_API QorResult QORI_CALL qoriDotProdCol_64f_L2(const double* const* ppSrcRows, const double* pWeights,
+    int32_t nRows, double* pDst, int32_t len);
+
 /* ---- Set ------------------------------------------------------------------------------------------------------ */
 
 /** Fills a region with a constant pixel.
