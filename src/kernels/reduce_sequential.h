@@ -21,8 +21,8 @@ QORI_NOINLINE void sequentialDotRow(double* sums, ptrdiff_t pixels, const T* a, 
 
 QORI_INLINE Vec<float> scaled(Vec<float> a, float weight) { return {_mm256_mul_ps(a.v, _mm256_set1_ps(weight))}; }
 QORI_INLINE Vec<double> scaled(Vec<double> a, double weight) { return {_mm256_mul_pd(a.v, _mm256_set1_pd(weight))}; }
-QORI_INLINE Vec<float> operator+(Vec<float> a, Vec<float> b) { return {_mm256_add_ps(a.v, b.v)}; }
-QORI_INLINE Vec<double> operator+(Vec<double> a, Vec<double> b) { return {_mm256_add_pd(a.v, b.v)}; }
+QORI_INLINE Vec<float> added(Vec<float> a, Vec<float> b) { return {_mm256_add_ps(a.v, b.v)}; }
+QORI_INLINE Vec<double> added(Vec<double> a, Vec<double> b) { return {_mm256_add_pd(a.v, b.v)}; }
 
 /// dst[j] = weights[0] * rows[0][j] + weights[1] * rows[1][j] + ..., every product rounded, added in this order.
 template <class T>
@@ -33,13 +33,13 @@ void weightedRows(T* dst, ptrdiff_t length, const T* const* rows, const T* weigh
         Vec<T> sum[vectors];
         for (int v = 0; v < vectors; ++v) sum[v] = scaled(load(rows[0] + j + v * n), weights[0]);
         for (int i = 1; i < count; ++i)
-            for (int v = 0; v < vectors; ++v) sum[v] = sum[v] + scaled(load(rows[i] + j + v * n), weights[i]);
+            for (int v = 0; v < vectors; ++v) sum[v] = added(sum[v], scaled(load(rows[i] + j + v * n), weights[i]));
         for (int v = 0; v < vectors; ++v) store(dst + j + v * n, sum[v]);
     }
     for (; j < length; j += n) {
         const ptrdiff_t rest = length - j;
         Vec<T> sum = scaled(loadUpTo(rows[0] + j, rest), weights[0]);
-        for (int i = 1; i < count; ++i) sum = sum + scaled(loadUpTo(rows[i] + j, rest), weights[i]);
+        for (int i = 1; i < count; ++i) sum = added(sum, scaled(loadUpTo(rows[i] + j, rest), weights[i]));
         storeUpTo(dst + j, sum, rest);
     }
 }
