@@ -2171,6 +2171,269 @@ QORI_API QorResult QORI_CALL qoriDup_8u_C1C3R(const uint8_t* pSrc, int32_t srcSt
 QORI_API QorResult QORI_CALL qoriDup_8u_C1C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
+/* ---- Extrema and counting ------------------------------------------------------------------------------------- */
+
+/** Smallest element of each channel.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMin_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, uint8_t* pMin);
+QORI_API QorResult QORI_CALL qoriMin_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMin);
+QORI_API QorResult QORI_CALL qoriMin_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, int16_t* pMin);
+QORI_API QorResult QORI_CALL qoriMin_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMin);
+QORI_API QorResult QORI_CALL qoriMin_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[3]);
+
+/** Largest element of each channel.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, uint8_t* pMax);
+QORI_API QorResult QORI_CALL qoriMax_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMax_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, int16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMax_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMax);
+QORI_API QorResult QORI_CALL qoriMax_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMax[3]);
+
+/** Smallest and largest element of each channel, in one pass.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   uint8_t darkest, brightest;
+ *            qoriMinMax_8u_C1R(src, srcStep, (QorImageSize){640, 480}, &darkest, &brightest);
+ */
+QORI_API QorResult QORI_CALL qoriMinMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pMin, uint8_t* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[4], uint8_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMin, uint16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[4], uint16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pMin, int16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[4], int16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMin,
+    float* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[3],
+    float pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[4],
+    float pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[3], float pMax[3]);
+
+/** Smallest element of each channel and the first pixel, from the top and then from the left, that holds it.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; where there is nothing else, the result is NaN at (0, 0).
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pMin, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMin, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pMin, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMin,
+    int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+
+/** Largest element of each channel and the first pixel, from the top and then from the left, that holds it.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; where there is nothing else, the result is NaN at (0, 0). The scan
+ *            ends early when every channel has met its type's largest value.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   float peak;
+ *            int32_t x, y;
+ *            qoriMaxIndx_32f_C1R(score, scoreStep, roi, &peak, &x, &y);
+ */
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pMax, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMax, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pMax, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMax,
+    int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+
+/** Smallest and largest element of every block of a grid, and of the whole region.
+ *  Shapes    Blocks of blockSize start at the top left corner; the last column and row of blocks may be
+ *            partial. pDstMin and pDstMax hold one element per block.
+ *  Units     Steps in bytes; roiSize and blockSize in pixels.
+ *  Aliasing  Source and outputs must not overlap.
+ *  Notes     pDstMin or pDstMax may be null, and so may pDstGlobalMin and pDstGlobalMax; what is null is not
+ *            written. The step checks compare numbers of elements with bytes. 32f: NaN elements are ignored;
+ *            NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc is null, or pDstMin and pDstMax both are),
+ *            QOR_ERR_SIZE (a width or height of the region or the block below 1), QOR_ERR_STEP (width greater
+ *            than srcStep, or more blocks in a row than a given output's step); then nothing is written.
+ *  Example   // Extremes of 16 x 16 blocks of a 640 x 480 image.
+ *            qoriBlockMinMax_8u_C1R(src, srcStep, (QorImageSize){640, 480}, mins, 40, maxs, 40, (QorImageSize){16, 16}, &low, &high);
+ */
+QORI_API QorResult QORI_CALL qoriBlockMinMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pDstMin, int32_t dstMinStep, uint8_t* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    uint8_t* pDstGlobalMin, uint8_t* pDstGlobalMax);
+QORI_API QorResult QORI_CALL qoriBlockMinMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pDstMin, int32_t dstMinStep, uint16_t* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    uint16_t* pDstGlobalMin, uint16_t* pDstGlobalMax);
+QORI_API QorResult QORI_CALL qoriBlockMinMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pDstMin, int32_t dstMinStep, int16_t* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    int16_t* pDstGlobalMin, int16_t* pDstGlobalMax);
+QORI_API QorResult QORI_CALL qoriBlockMinMax_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float* pDstMin, int32_t dstMinStep, float* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    float* pDstGlobalMin, float* pDstGlobalMax);
+
+/** Counts the pixels of each channel with lowerBound <= value <= upperBound.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     NaN is in no range.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_BAD_RANGE (an upperBound below its lowerBound);
+ *            then nothing is written.
+ *  Example   int32_t dark;
+ *            qoriCountInRange_8u_C1R(src, srcStep, roi, &dark, 0, 31);
+ */
+QORI_API QorResult QORI_CALL qoriCountInRange_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pCounts, uint8_t lowerBound, uint8_t upperBound);
+QORI_API QorResult QORI_CALL qoriCountInRange_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const uint8_t lowerBound[3], const uint8_t upperBound[3]);
+QORI_API QorResult QORI_CALL qoriCountInRange_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const uint8_t lowerBound[3], const uint8_t upperBound[3]);
+QORI_API QorResult QORI_CALL qoriCountInRange_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pCounts, float lowerBound, float upperBound);
+QORI_API QorResult QORI_CALL qoriCountInRange_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
+QORI_API QorResult QORI_CALL qoriCountInRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
+
 /* ---- Image memory --------------------------------------------------------------------------------------------- */
 
 /** Allocates an image whose rows start on 64-byte boundaries.
@@ -2225,6 +2488,586 @@ QORI_API QorComplex32f* QORI_CALL qoriMalloc_32fc_AC4(int32_t width, int32_t hei
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API void QORI_CALL qoriFree(void* ptr);
+
+/* ---- Norms, sums, means and dot products ---------------------------------------------------------------------- */
+
+/** Adds the elements of each channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   double sum[3];
+ *            qoriSum_8u_C3R(rgb, rgbStep, (QorImageSize){640, 480}, sum);
+ */
+QORI_API QorResult QORI_CALL qoriSum_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum,
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[4],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3],
+    int32_t hint);
+
+/** Averages the elements of each channel: their sum over width * height.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     width * height is taken modulo 2^32 as a signed number. C1 divides the sum; the other layouts
+ *            multiply it by the reciprocal, which may differ in the last bit.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMean_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double* pMean,
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pMean[3],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pMean[4],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3], int32_t hint);
+
+/** Largest magnitude of each channel: max |src|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     |-32768| is 32768. NaN elements are ignored; 0 where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+
+/** Sum of magnitudes of each channel: sum |src|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+
+/** Euclidean norm of each channel: the square root of sum src^2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     32f, fast: squares are summed in single precision, so magnitudes above 1.8e19 overflow to
+ *            infinity.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   double norm;
+ *            qoriNorm_L2_32f_C1R(src, srcStep, roi, &norm, hintAccurate);
+ */
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+
+/** Largest magnitude of the difference in each channel: max |src1 - src2|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     32f: differences in single precision; those that are NaN are ignored.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+
+/** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Largest magnitude of the difference over that of src2, per channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the norm of src2 is 0, the result is the norm of the difference and the status
+ *            QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+
+/** Sum of magnitudes of the difference over that of src2, per channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the norm of src2 is below 2.2250738585072014e-308, the result is the norm of the difference
+ *            and the status QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the sum of squares of src2 is below 2.2250738585072014e-308, the result is the norm of the
+ *            difference and the status QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Dot product of two images, per channel: sum src1 * src2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  8- and 16-bit totals are exact and rounded once. 32u and 32s: products and sums in double
+ *            precision, in the order of the pixels. 32f with hintAccurate: exact products, sums in double
+ *            precision; with any other hint: 48 partial sums in single precision by fused multiply-add, added
+ *            pairwise.
+ *  Units     Steps in bytes, not checked otherwise; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (8u C1 only: a step of 0); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C1R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C3R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C4R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_AC4R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C1R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C3R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C4R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_AC4R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C1R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C3R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C4R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_AC4R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp, int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3], int32_t hint);
+
+/** Weighted sum of vectors: pDst[j] = sum over i of pWeights[i] * ppSrcRows[i][j].
+ *  Shapes    nRows vectors and weights; len elements in each vector and in pDst.
+ *  Elements  Products and sums are rounded to the element type one by one, in the order of the rows.
+ *  Units     len in elements.
+ *  Aliasing  pDst may be one of the rows.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (len or nRows below 1),
+ *            QOR_ERR_NULL_PTR (a row is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDotProdCol_32f_L2(const float* const* ppSrcRows, const float* pWeights, int32_t nRows,
+    float* pDst, int32_t len);
+QORI_API QorResult QORI_CALL qoriDotProdCol_64f_L2(const double* const* ppSrcRows, const double* pWeights,
+    int32_t nRows, double* pDst, int32_t len);
 
 /* ---- Scale ---------------------------------------------------------------------------------------------------- */
 
