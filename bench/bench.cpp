@@ -65,8 +65,13 @@ struct Timed {
     std::vector<double> seconds = {};
 
     double median() {
-        std::nth_element(seconds.begin(), seconds.begin() + static_cast<ptrdiff_t>(seconds.size() / 2), seconds.end());
+        std::sort(seconds.begin(), seconds.end());
         return seconds[seconds.size() / 2];
+    }
+    /// Between the quartiles, as a share of the median.
+    double spread() {
+        const double middle = median();
+        return (seconds[seconds.size() * 3 / 4] - seconds[seconds.size() / 4]) / middle;
     }
 };
 
@@ -104,6 +109,7 @@ void run(benchmark::State& state, const Row& row, Size size) {
     out["GB/s"] = row.bytesPerPixel * pixels / seconds * 1e-9;
     out["ns"] = seconds * 1e9;
     out["roof"] = roof.median() / seconds;
+    out["spread"] = ours.spread();
     if (contenders.plain) out["vs_plain"] = plain.median() / seconds;
     if (contenders.peer) out["vs_peer"] = peer.median() / seconds;
     constexpr double kCopyAtL2 = 51'853, kCopyAtFrame = 15'345;
@@ -115,9 +121,12 @@ void run(benchmark::State& state, const Row& row, Size size) {
 void registerAll() {
     for (const Row& row : allRows())
         for (Size size : row.sizes)
-            benchmark::RegisterBenchmark((row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
-                                         [&row, size](benchmark::State& state) { run(state, row, size); })
-                ->UseManualTime()->Iterations(size.pixels() > 20'000'000 ? 7 : 41)->Unit(benchmark::kMicrosecond);
+            benchmark::RegisterBenchmark(
+                (row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
+                [&row, size](benchmark::State& state) { run(state, row, size); })
+                ->UseManualTime()
+                ->Iterations(size.pixels() > 20'000'000 ? 7 : 41)
+                ->Unit(benchmark::kMicrosecond);
 }
 
 }  // namespace

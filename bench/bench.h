@@ -34,11 +34,15 @@ public:
     Image(Size size, int channels, bool packed = false)
         : step_(static_cast<int32_t>(packed ? size.width * channels * sizeof(T)
                                             : (size.width * channels * sizeof(T) + 63) / 64 * 64)),
-          size_(size), channels_(channels),
-          memory_(static_cast<uint8_t*>(std::aligned_alloc(64, (static_cast<size_t>(step_) * static_cast<size_t>(size.height) + 63) / 64 * 64)), std::free) {
+          size_(size),
+          channels_(channels),
+          memory_(static_cast<uint8_t*>(std::aligned_alloc(
+                      64, (static_cast<size_t>(step_) * static_cast<size_t>(size.height) + 63) / 64 * 64)),
+                  std::free) {
         uint32_t state = 1;
         for (int y = 0; y < size.height; ++y)
-            for (int i = 0; i < size.width * channels; ++i) row(y)[i] = static_cast<T>((state = state * 1664525u + 1013904223u) >> 24);
+            for (int i = 0; i < size.width * channels; ++i)
+                row(y)[i] = static_cast<T>((state = state * 1664525u + 1013904223u) >> 24);
     }
     T* data() const { return reinterpret_cast<T*>(memory_.get()); }
     T* row(int y) const { return reinterpret_cast<T*>(memory_.get() + ptrdiff_t{step_} * y); }
@@ -61,14 +65,14 @@ struct Contenders {
 };
 
 enum class Roofline {
-    copy,   ///< memcpy of as many bytes read and written
-    set,    ///< memset of as many bytes written
-    read    ///< vector loads of as many bytes read
+    copy,  ///< memcpy of as many bytes read and written
+    set,   ///< memset of as many bytes written
+    read   ///< vector loads of as many bytes read
 };
 
 struct Row {
-    std::string operation;                    ///< For example "copy 8u C3".
-    double bytesPerPixel;                     ///< Read plus written.
+    std::string operation;  ///< For example "copy 8u C3".
+    double bytesPerPixel;   ///< Read plus written.
     std::vector<Size> sizes;
     std::function<Contenders(Size)> make;
     Roofline roofline = Roofline::copy;

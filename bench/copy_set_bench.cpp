@@ -15,18 +15,21 @@ Row copyRow(std::string name, Unary<T> function, int from, int to, int bytesRead
             std::vector<Size> sizes = kSizes, double bestAtL2 = 0, double bestAtFrame = 0, bool packed = false) {
     const auto make = [=](Size size) {
         Image<T> src(size, from, packed), dst(size, to, packed);
-        return Contenders{
-            [=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi()); },
-            [=] {
-                for (int y = 0; y < size.height; ++y) {
-                    plain(src.row(y), dst.row(y), size.width);
-                    keep(dst.row(y));
-                }
-            },
-            {}};
+        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi()); },
+                          [=] {
+                              for (int y = 0; y < size.height; ++y) {
+                                  plain(src.row(y), dst.row(y), size.width);
+                                  keep(dst.row(y));
+                              }
+                          },
+                          {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = double(bytesRead + bytesWritten), .sizes = std::move(sizes), .make = make,
-            .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = double(bytesRead + bytesWritten),
+            .sizes = std::move(sizes),
+            .make = make,
+            .bestAtL2 = bestAtL2,
+            .bestAtFrame = bestAtFrame};
 }
 
 template <int n, class T>
@@ -47,26 +50,29 @@ Row splitRow(std::string name, QorResult(QORI_CALL* function)(const T*, int32_t,
         Image<T> src(size, n);
         std::vector<Image<T>> planes(n, Image<T>({1, 1}, 1));
         for (auto& plane : planes) plane = Image<T>(size, 1);
-        return Contenders{
-            [=] {
-                T* pointers[n];
-                for (size_t c = 0; c < n; ++c) pointers[c] = planes[c].data();
-                function(src.data(), src.step(), pointers, planes[0].step(), size.roi());
-            },
-            [=] {
-                for (int y = 0; y < size.height; ++y) {
-                    const T* s = src.row(y);
-                    T* d[n];
-                    for (size_t c = 0; c < n; ++c) d[c] = planes[c].row(y);
-                    for (int x = 0; x < size.width; ++x)
-                        for (int c = 0; c < n; ++c) d[c][x] = s[x * n + c];
-                    keep(d[0]);
-                }
-            },
-            {}};
+        return Contenders{[=] {
+                              T* pointers[n];
+                              for (size_t c = 0; c < n; ++c) pointers[c] = planes[c].data();
+                              function(src.data(), src.step(), pointers, planes[0].step(), size.roi());
+                          },
+                          [=] {
+                              for (int y = 0; y < size.height; ++y) {
+                                  const T* s = src.row(y);
+                                  T* d[n];
+                                  for (size_t c = 0; c < n; ++c) d[c] = planes[c].row(y);
+                                  for (int x = 0; x < size.width; ++x)
+                                      for (int c = 0; c < n; ++c) d[c][x] = s[x * n + c];
+                                  keep(d[0]);
+                              }
+                          },
+                          {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = 2.0 * n * sizeof(T), .sizes = kSizes, .make = make,
-            .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = 2.0 * n * sizeof(T),
+            .sizes = kSizes,
+            .make = make,
+            .bestAtL2 = bestAtL2,
+            .bestAtFrame = bestAtFrame};
 }
 
 template <class T, int n>
@@ -75,29 +81,29 @@ Row mergeRow(std::string name, QorResult(QORI_CALL* function)(const T* const*, i
         Image<T> dst(size, n);
         std::vector<Image<T>> planes(n, Image<T>({1, 1}, 1));
         for (auto& plane : planes) plane = Image<T>(size, 1);
-        return Contenders{
-            [=] {
-                const T* pointers[n];
-                for (size_t c = 0; c < n; ++c) pointers[c] = planes[c].data();
-                function(pointers, planes[0].step(), dst.data(), dst.step(), size.roi());
-            },
-            [=] {
-                for (int y = 0; y < size.height; ++y) {
-                    T* d = dst.row(y);
-                    const T* s[n];
-                    for (size_t c = 0; c < n; ++c) s[c] = planes[c].row(y);
-                    for (int x = 0; x < size.width; ++x)
-                        for (int c = 0; c < n; ++c) d[x * n + c] = s[c][x];
-                    keep(d);
-                }
-            },
-            {}};
+        return Contenders{[=] {
+                              const T* pointers[n];
+                              for (size_t c = 0; c < n; ++c) pointers[c] = planes[c].data();
+                              function(pointers, planes[0].step(), dst.data(), dst.step(), size.roi());
+                          },
+                          [=] {
+                              for (int y = 0; y < size.height; ++y) {
+                                  T* d = dst.row(y);
+                                  const T* s[n];
+                                  for (size_t c = 0; c < n; ++c) s[c] = planes[c].row(y);
+                                  for (int x = 0; x < size.width; ++x)
+                                      for (int c = 0; c < n; ++c) d[x * n + c] = s[c][x];
+                                  keep(d);
+                              }
+                          },
+                          {}};
     };
     return {.operation = std::move(name), .bytesPerPixel = 2.0 * n * sizeof(T), .sizes = kSizes, .make = make};
 }
 
 template <class T, int n>
-Row maskedRow(std::string name, QorResult(QORI_CALL* function)(const T*, int32_t, T*, int32_t, QorImageSize, const uint8_t*, int32_t),
+Row maskedRow(std::string name,
+              QorResult(QORI_CALL* function)(const T*, int32_t, T*, int32_t, QorImageSize, const uint8_t*, int32_t),
               double bestAtL2 = 0, double bestAtFrame = 0) {
     const auto make = [=](Size size) {
         Image<T> src(size, n), dst(size, n);
@@ -118,33 +124,43 @@ Row maskedRow(std::string name, QorResult(QORI_CALL* function)(const T*, int32_t
             {}};
     };
     // Source and destination are read, the destination is written.
-    return {.operation = std::move(name), .bytesPerPixel = 3.0 * n * sizeof(T) + 1, .sizes = kSizes, .make = make,
-            .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = 3.0 * n * sizeof(T) + 1,
+            .sizes = kSizes,
+            .make = make,
+            .bestAtL2 = bestAtL2,
+            .bestAtFrame = bestAtFrame};
 }
 
 template <class T, int n, class Function>
-Row fillRow(std::string name, Function function, std::vector<Size> sizes = kSizes, double bestAtL2 = 0, double bestAtFrame = 0,
-            bool packed = false) {
+Row fillRow(std::string name, Function function, std::vector<Size> sizes = kSizes, double bestAtL2 = 0,
+            double bestAtFrame = 0, bool packed = false) {
     const auto make = [=](Size size) {
         Image<T> dst(size, n, packed);
-        return Contenders{
-            [=] {
-                const T values[4] = {1, 2, 3, 4};
-                if constexpr (n == 1) function(values[0], dst.data(), dst.step(), size.roi());
-                else function(values, dst.data(), dst.step(), size.roi());
-            },
-            [=] {
-                for (int y = 0; y < size.height; ++y) {
-                    T* d = dst.row(y);
-                    for (int x = 0; x < size.width; ++x)
-                        for (int c = 0; c < n; ++c) d[x * n + c] = static_cast<T>(c + 1);
-                    keep(d);
-                }
-            },
-            {}};
+        return Contenders{[=] {
+                              const T values[4] = {1, 2, 3, 4};
+                              if constexpr (n == 1)
+                                  function(values[0], dst.data(), dst.step(), size.roi());
+                              else
+                                  function(values, dst.data(), dst.step(), size.roi());
+                          },
+                          [=] {
+                              for (int y = 0; y < size.height; ++y) {
+                                  T* d = dst.row(y);
+                                  for (int x = 0; x < size.width; ++x)
+                                      for (int c = 0; c < n; ++c) d[x * n + c] = static_cast<T>(c + 1);
+                                  keep(d);
+                              }
+                          },
+                          {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = double(n * sizeof(T)), .sizes = std::move(sizes), .make = make,
-            .roofline = Roofline::set, .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = double(n * sizeof(T)),
+            .sizes = std::move(sizes),
+            .make = make,
+            .roofline = Roofline::set,
+            .bestAtL2 = bestAtL2,
+            .bestAtFrame = bestAtFrame};
 }
 
 std::vector<Size> withSmall() {

@@ -41,7 +41,7 @@ int32_t largestCache(unsigned leaf) {
     for (unsigned index = 0; index < 16; ++index) {
         unsigned eax = 0, ebx = 0, ecx = 0, edx = 0;
         if (!__get_cpuid_count(leaf, index, &eax, &ebx, &ecx, &edx)) break;
-        const unsigned type = eax & 31u;   // 0 none, 1 data, 2 instruction, 3 unified
+        const unsigned type = eax & 31u;  // 0 none, 1 data, 2 instruction, 3 unified
         if (type == 0) break;
         if (type == 2) continue;
         const uint64_t ways = (ebx >> 22) + 1u, partitions = (ebx >> 12 & 1023u) + 1u, line = (ebx & 4095u) + 1u;
@@ -86,5 +86,4 @@ int32_t QORCORE_CALL qorGetMaxCacheSizeB(int32_t* pSize) {
     *pSize = processor.maxCacheBytes;
     return processor.maxCacheBytes > 0 ? 0 : kUnknown;
 }
-
 }

@@ -33,3 +33,14 @@ target_link_libraries(companion PRIVATE qorcore_link qori_warnings)
 target_link_options(companion PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
 set_target_properties(companion PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 add_test(NAME companion COMMAND companion)
+
+# The README's example is compiled and run as it stands there.
+set(readme ${PROJECT_SOURCE_DIR}/README.md)
+set(example ${CMAKE_CURRENT_BINARY_DIR}/readme_example.c)
+add_custom_command(OUTPUT ${example} COMMAND ${python} ${checks}/readme_example.py ${readme} ${example}
+    DEPENDS ${readme} ${checks}/readme_example.py VERBATIM)
+add_executable(readme_example ${example})
+target_link_libraries(readme_example PRIVATE qorik5_link)
+set_target_properties(readme_example PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
+add_test(NAME readme_example COMMAND readme_example)
+set_tests_properties(readme_example PROPERTIES PASS_REGULAR_EXPRESSION "green of pixel \\(9, 9\\): 128")

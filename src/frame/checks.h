@@ -13,10 +13,14 @@ constexpr QorResult firstOf(Results... results) {
 }
 
 template <class T>
-bool isNull(T* pointer) { return pointer == nullptr; }
+bool isNull(T* pointer) {
+    return pointer == nullptr;
+}
 
 template <class T>
-bool isNull(Image<T> image) { return image.data == nullptr; }
+bool isNull(Image<T> image) {
+    return image.data == nullptr;
+}
 
 /// The array first, then each of its entries.
 template <class T, int n>
@@ -32,9 +36,7 @@ QorResult nullCheck(Arguments... arguments) {
     return (isNull(arguments) || ...) ? QOR_ERR_NULL_PTR : QOR_OK;
 }
 
-inline QorResult sizeCheck(QorImageSize size) {
-    return size.width < 1 || size.height < 1 ? QOR_ERR_SIZE : QOR_OK;
-}
+inline QorResult sizeCheck(QorImageSize size) { return size.width < 1 || size.height < 1 ? QOR_ERR_SIZE : QOR_OK; }
 
 template <class... Images>
 QorResult stepCheck(Images... images) {

@@ -13,8 +13,10 @@ namespace {
 /// Four-byte elements follow the rule of the widening moves, smaller ones that of channel splitting.
 template <class T>
 bool streamsChannels(QorImageSize roi, int channelsRead, int channelsWritten) {
-    if constexpr (sizeof(T) == 4) return streams(streamRules::widening, traffic(roi, 4 * (channelsRead + channelsWritten)));
-    else return streams(streamRules::channelSplit, traffic(roi, elementBytes<T> * (channelsRead + channelsWritten)));
+    if constexpr (sizeof(T) == 4)
+        return streams(streamRules::widening, traffic(roi, 4 * (channelsRead + channelsWritten)));
+    else
+        return streams(streamRules::channelSplit, traffic(roi, elementBytes<T> * (channelsRead + channelsWritten)));
 }
 
 template <class T, int n>
@@ -22,8 +24,9 @@ QorResult copyPixels(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streaming = streams(streamRules::copy, traffic(roi, 2 * n * elementBytes<T>));
     const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * n * elementBytes<T>); },
-               walk(src, n), walk(dst, n));
+    forEachRow(
+        roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * n * elementBytes<T>); },
+        walk(src, n), walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -31,9 +34,12 @@ QorResult copyPixels(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T>
 QorResult copyColour(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    forEachRow(roi, [](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::selectRow<4 * elementBytes<T>, 3 * elementBytes<T>>(asBytes(d), asBytes(s), pixels);
-    }, walk(src, 4), walk(dst, 4));
+    forEachRow(
+        roi,
+        [](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::selectRow<4 * elementBytes<T>, 3 * elementBytes<T>>(asBytes(d), asBytes(s), pixels);
+        },
+        walk(src, 4), walk(dst, 4));
     return QOR_OK;
 }
 
@@ -41,9 +47,12 @@ template <class T, Layout layout>
 QorResult copyMasked(Image<const T> src, Image<T> dst, QorImageSize roi, Image<const uint8_t> mask) {
     if (QorResult r = firstOf(nullCheck(src, dst, mask), sizeCheck(roi))) return r;
     constexpr int pixel = channels(layout) * elementBytes<T>, selected = processedChannels(layout) * elementBytes<T>;
-    forEachRow(roi, [](ptrdiff_t pixels, const T* s, T* d, const uint8_t* m) {
-        kernels::maskedRow<pixel, selected>(asBytes(d), asBytes(s), m, pixels);
-    }, walk(src, channels(layout)), walk(dst, channels(layout)), walk(mask, 1));
+    forEachRow(
+        roi,
+        [](ptrdiff_t pixels, const T* s, T* d, const uint8_t* m) {
+            kernels::maskedRow<pixel, selected>(asBytes(d), asBytes(s), m, pixels);
+        },
+        walk(src, channels(layout)), walk(dst, channels(layout)), walk(mask, 1));
     return QOR_OK;
 }
 
@@ -51,9 +60,12 @@ template <class T, int n>
 QorResult extractChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streaming = streamsChannels<T>(roi, n, 1);
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::extractRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
-    }, walk(src, n), walk(dst, 1));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::extractRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
+        },
+        walk(src, n), walk(dst, 1));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -61,18 +73,24 @@ QorResult extractChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T, int n>
 QorResult insertChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    forEachRow(roi, [](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::insertRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels);
-    }, walk(src, 1), walk(dst, n));
+    forEachRow(
+        roi,
+        [](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::insertRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels);
+        },
+        walk(src, 1), walk(dst, n));
     return QOR_OK;
 }
 
 template <class T, int n>
 QorResult copyChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    forEachRow(roi, [](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::selectRow<n * elementBytes<T>, elementBytes<T>>(asBytes(d), asBytes(s), pixels);
-    }, walk(src, n), walk(dst, n));
+    forEachRow(
+        roi,
+        [](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::selectRow<n * elementBytes<T>, elementBytes<T>>(asBytes(d), asBytes(s), pixels);
+        },
+        walk(src, n), walk(dst, n));
     return QOR_OK;
 }
 
@@ -80,9 +98,12 @@ template <class T>
 QorResult dropAlpha(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streaming = streams(streamRules::copy, traffic(roi, 7 * elementBytes<T>));
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::dropAlphaRow<elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
-    }, walk(src, 4), walk(dst, 3));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::dropAlphaRow<elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
+        },
+        walk(src, 4), walk(dst, 3));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -90,9 +111,12 @@ QorResult dropAlpha(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T>
 QorResult fillColour(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    forEachRow(roi, [](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::fillColourRow<elementBytes<T>>(asBytes(d), asBytes(s), pixels);
-    }, walk(src, 3), walk(dst, 4));
+    forEachRow(
+        roi,
+        [](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::fillColourRow<elementBytes<T>>(asBytes(d), asBytes(s), pixels);
+        },
+        walk(src, 3), walk(dst, 4));
     return QOR_OK;
 }
 
@@ -100,9 +124,12 @@ template <class T, int n>
 QorResult splitPlanes(Image<const T> src, Planes<T, n> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streaming = streamsChannels<T>(roi, n, n);
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* s, PlaneRows<T, n> d) {
-        kernels::splitRow<n, elementBytes<T>>(asBytes(d).data(), asBytes(s), pixels, streaming);
-    }, walk(src, n), walk(dst));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* s, PlaneRows<T, n> d) {
+            kernels::splitRow<n, elementBytes<T>>(asBytes(d).data(), asBytes(s), pixels, streaming);
+        },
+        walk(src, n), walk(dst));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -111,9 +138,12 @@ template <class T, int n>
 QorResult mergePlanes(Planes<const T, n> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streaming = streamsChannels<T>(roi, n, n);
-    forEachRow(roi, [&](ptrdiff_t pixels, PlaneRows<const T, n> s, T* d) {
-        kernels::mergeRow<n, elementBytes<T>>(asBytes(d), asBytes(s).data(), pixels, streaming);
-    }, walk(src), walk(dst, n));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, PlaneRows<const T, n> s, T* d) {
+            kernels::mergeRow<n, elementBytes<T>>(asBytes(d), asBytes(s).data(), pixels, streaming);
+        },
+        walk(src), walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -122,9 +152,12 @@ template <class T, int n>
 QorResult duplicate(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streaming = streamsChannels<T>(roi, 1, n);
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) {
-        kernels::duplicateRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
-    }, walk(src, 1), walk(dst, n));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* s, T* d) {
+            kernels::duplicateRow<n, elementBytes<T>>(asBytes(d), asBytes(s), pixels, streaming);
+        },
+        walk(src, 1), walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -132,11 +165,17 @@ QorResult duplicate(Image<const T> src, Image<T> dst, QorImageSize roi) {
 QorResult copyManaged(Image<const uint8_t> src, Image<uint8_t> dst, QorImageSize roi, int32_t copyFlags) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const bool streamStores = copyFlags & copyStreamStore;
-    forEachRow(roi, [&](ptrdiff_t pixels, const uint8_t* s, uint8_t* d) {
-        if (copyFlags & copyStreamLoad) kernels::copyRowStreamLoad(d, s, pixels, streamStores);
-        else if (streamStores) kernels::copyRowStreaming(d, s, pixels);
-        else kernels::copyRow(d, s, pixels);
-    }, walk(src, 1), walk(dst, 1));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const uint8_t* s, uint8_t* d) {
+            if (copyFlags & copyStreamLoad)
+                kernels::copyRowStreamLoad(d, s, pixels, streamStores);
+            else if (streamStores)
+                kernels::copyRowStreaming(d, s, pixels);
+            else
+                kernels::copyRow(d, s, pixels);
+        },
+        walk(src, 1), walk(dst, 1));
     if (streamStores) streamFence();
     return QOR_OK;
 }

@@ -13,10 +13,14 @@ struct Walk {
 };
 
 template <class T>
-Walk<Image<T>> walk(Image<T> image, int channels) { return {image, static_cast<int32_t>(sizeof(T)) * channels}; }
+Walk<Image<T>> walk(Image<T> image, int channels) {
+    return {image, static_cast<int32_t>(sizeof(T)) * channels};
+}
 
 template <class T, int n>
-Walk<Planes<T, n>> walk(Planes<T, n> planes) { return {planes, static_cast<int32_t>(sizeof(T))}; }
+Walk<Planes<T, n>> walk(Planes<T, n> planes) {
+    return {planes, static_cast<int32_t>(sizeof(T))};
+}
 
 /// Whether the region is one contiguous run of pixels in every image, with a pixel count that 32 bits hold.
 template <class... Rows>

@@ -16,8 +16,11 @@ enum class Layout { C1, C2, C3, C4, AC4, P2, P3, P4, C3C, C4C };
 constexpr int channels(Layout layout) {
     switch (layout) {
         case Layout::C1: return 1;
-        case Layout::C2: case Layout::P2: return 2;
-        case Layout::C3: case Layout::P3: case Layout::C3C: return 3;
+        case Layout::C2:
+        case Layout::P2: return 2;
+        case Layout::C3:
+        case Layout::P3:
+        case Layout::C3C: return 3;
         default: return 4;
     }
 }
@@ -26,7 +29,8 @@ constexpr int channels(Layout layout) {
 constexpr int processedChannels(Layout layout) {
     switch (layout) {
         case Layout::AC4: return 3;
-        case Layout::C3C: case Layout::C4C: return 1;
+        case Layout::C3C:
+        case Layout::C4C: return 1;
         default: return channels(layout);
     }
 }

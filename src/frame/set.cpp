@@ -15,7 +15,8 @@ QorResult setPixels(const T* value, Image<T> dst, QorImageSize roi) {
     const bool streaming = streams(rule, traffic(roi, n * elementBytes<T>));
     const auto fill = streaming ? kernels::fillRowStreaming : kernels::fillRow;
     const kernels::Pattern pattern = kernels::patternOf<n>(value);
-    forEachRow(roi, [&](ptrdiff_t pixels, T* d) { fill(asBytes(d), pattern, pixels * n * elementBytes<T>); }, walk(dst, n));
+    forEachRow(
+        roi, [&](ptrdiff_t pixels, T* d) { fill(asBytes(d), pattern, pixels * n * elementBytes<T>); }, walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -25,9 +26,12 @@ QorResult setColour(const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(value, dst), sizeCheck(roi))) return r;
     const T pixel[4] = {value[0], value[1], value[2], T{}};
     const kernels::Pattern pattern = kernels::patternOf<4>(pixel);
-    forEachRow(roi, [&](ptrdiff_t pixels, T* d) {
-        kernels::selectFillRow<4 * elementBytes<T>, 3 * elementBytes<T>>(asBytes(d), pattern, pixels);
-    }, walk(dst, 4));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, T* d) {
+            kernels::selectFillRow<4 * elementBytes<T>, 3 * elementBytes<T>>(asBytes(d), pattern, pixels);
+        },
+        walk(dst, 4));
     return QOR_OK;
 }
 
@@ -38,9 +42,12 @@ QorResult setMasked(const T* value, Image<T> dst, QorImageSize roi, Image<const 
     T values[channels(layout)] = {};
     for (int i = 0; i < processedChannels(layout); ++i) values[i] = value[i];
     const kernels::Pattern pattern = kernels::patternOf<channels(layout)>(values);
-    forEachRow(roi, [&](ptrdiff_t pixels, T* d, const uint8_t* m) {
-        kernels::maskedFillRow<pixel, selected>(asBytes(d), pattern, m, pixels);
-    }, walk(dst, channels(layout)), walk(mask, 1));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, T* d, const uint8_t* m) {
+            kernels::maskedFillRow<pixel, selected>(asBytes(d), pattern, m, pixels);
+        },
+        walk(dst, channels(layout)), walk(mask, 1));
     return QOR_OK;
 }
 
@@ -49,9 +56,12 @@ QorResult setChannel(const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(dst), sizeCheck(roi))) return r;
     T pixel[n] = {*value};
     const kernels::Pattern pattern = kernels::patternOf<n>(pixel);
-    forEachRow(roi, [&](ptrdiff_t pixels, T* d) {
-        kernels::selectFillRow<n * elementBytes<T>, elementBytes<T>>(asBytes(d), pattern, pixels);
-    }, walk(dst, n));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, T* d) {
+            kernels::selectFillRow<n * elementBytes<T>, elementBytes<T>>(asBytes(d), pattern, pixels);
+        },
+        walk(dst, n));
     return QOR_OK;
 }
 

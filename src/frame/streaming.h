@@ -8,8 +8,8 @@ namespace qori {
 
 struct StreamRule {
     enum class Limit { cache, aboveCache, halfCache, aboveHalfCache };
-    int32_t queryAbove;   ///< Bytes of traffic up to which the cache size is not even asked for.
-    Limit limit;          ///< What the traffic must reach (or exceed) to stream.
+    int32_t queryAbove;  ///< Bytes of traffic up to which the cache size is not even asked for.
+    Limit limit;         ///< What the traffic must reach (or exceed) to stream.
 };
 
 namespace streamRules {

@@ -12,7 +12,7 @@ struct alignas(32) ByteTable {
     uint8_t at[32];
 };
 
-inline constexpr uint8_t kNone = 0x80;   // the shuffle writes 0
+inline constexpr uint8_t kNone = 0x80;  // the shuffle writes 0
 inline constexpr uint8_t kAll = 0xFF;
 
 /// fill(i) for both halves.
@@ -83,7 +83,8 @@ constexpr auto maskWindows() {
         Window& window = all[static_cast<size_t>(k)];
         const int first = 32 * k / pixelBytes;
         window.begin = first > 16 ? 16 : first;
-        for (int i = 0; i < 32; ++i) window.index.at[i] = static_cast<uint8_t>((32 * k + i) / pixelBytes - window.begin);
+        for (int i = 0; i < 32; ++i)
+            window.index.at[i] = static_cast<uint8_t>((32 * k + i) / pixelBytes - window.begin);
     }
     return all;
 }

@@ -54,7 +54,8 @@ struct Split {
         Bytes a[channels];
         for (int k = 0; k < channels; ++k) a[k] = loadSpans<channels, spans>(from[0], k);
         if constexpr (channels == 3) {
-            static constexpr ByteTable take[3] = {takeMixed<3, element>(0), takeMixed<3, element>(1), takeMixed<3, element>(2)};
+            static constexpr ByteTable take[3] = {takeMixed<3, element>(0), takeMixed<3, element>(1),
+                                                  takeMixed<3, element>(2)};
             for (int c = 0; c < 3; ++c)
                 storeAllSpans<spans, streaming>(to[static_cast<size_t>(c)],
                                                 {shuffleHalves(mix3<element>(a[0], a[1], a[2], c), table(take[c]))});
@@ -79,7 +80,8 @@ struct Merge {
         Bytes a[channels];
         for (size_t c = 0; c < channels; ++c) a[c] = loadSpans<1, spans>(from[c], 0);
         if constexpr (channels == 3) {
-            static constexpr ByteTable put[3] = {putMixed<3, element>(0), putMixed<3, element>(1), putMixed<3, element>(2)};
+            static constexpr ByteTable put[3] = {putMixed<3, element>(0), putMixed<3, element>(1),
+                                                 putMixed<3, element>(2)};
             static constexpr ByteTable second[3] = {selectChannel<3, element>(1, 0), selectChannel<3, element>(1, 1),
                                                     selectChannel<3, element>(1, 2)};
             static constexpr ByteTable third[3] = {selectChannel<3, element>(2, 0), selectChannel<3, element>(2, 1),
@@ -100,7 +102,9 @@ struct Merge {
 /// Where half k of a span of one-channel pixels is accessed: the last one begins early, so that it ends with the
 /// channel's last element and not with the pixel.
 template <int channels, int element>
-constexpr int channelHalf(int k) { return k < channels - 1 ? 16 * k : 16 * k - (channels - 1) * element; }
+constexpr int channelHalf(int k) {
+    return k < channels - 1 ? 16 * k : 16 * k - (channels - 1) * element;
+}
 
 template <int channels, int element, int spans>
 QORI_INLINE Bytes loadChannelHalf(const uint8_t* in, int k) {
@@ -127,7 +131,8 @@ struct Extract {
         static constexpr auto take = tables<channels>(moves);
         Bytes gathered = shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], 0), table(take[0]));
         for (int k = 1; k < channels; ++k)
-            gathered = gathered | shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], k), table(take[static_cast<size_t>(k)]));
+            gathered = gathered | shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], k),
+                                                table(take[static_cast<size_t>(k)]));
         storeAllSpans<spans, streaming>(to[0], {gathered});
     }
 };
@@ -136,7 +141,7 @@ template <int channels, int element>
 struct Insert {
     static constexpr int span = 16 / element;
     static constexpr bool mayStream = false;
-    static constexpr std::array<Run, 2> in = {wholePixels(element), oneChannel(channels * element, element)};
+    static constexpr std::array<Run, 2> in = {wholePixels(element), oneChannel(channels* element, element)};
     static constexpr std::array<Run, 1> out = {oneChannel(channels * element, element)};
 
     /// Half k's bytes from the plane's half; none between the elements.
@@ -158,7 +163,8 @@ struct Insert {
         Bytes halves[channels];
         for (int k = 0; k < channels; ++k) {
             const auto t = static_cast<size_t>(k);
-            halves[k] = blend(loadChannelHalf<channels, element, spans>(from[1], k), shuffleHalves(elements, table(spread[t])), table(select[t]));
+            halves[k] = blend(loadChannelHalf<channels, element, spans>(from[1], k),
+                              shuffleHalves(elements, table(spread[t])), table(select[t]));
         }
         for (int k = 0; k < channels; ++k)
             storeSpans<channels, spans>(to[0] + channelHalf<channels, element>(k) - 16 * k, k, halves[k]);
@@ -173,7 +179,8 @@ struct Duplicate {
     static constexpr std::array<Run, 1> out = {wholePixels(channels * element)};
 
     static constexpr ByteTable moves(int k) {
-        return bothHalves([=](int i) { return (16 * k + i) / (channels * element) * element + (16 * k + i) % element; });
+        return bothHalves(
+            [=](int i) { return (16 * k + i) / (channels * element) * element + (16 * k + i) % element; });
     }
 
     template <int spans, bool streaming, class Out, class In>
@@ -197,7 +204,7 @@ struct DropAlpha {
     /// Bytes of destination half `half` that come from source half `source`.
     static constexpr ByteTable moves(int half, int source) {
         return bothHalves([=](int i) {
-            const int colour = 16 * half + i;   // byte index among colour bytes only
+            const int colour = 16 * half + i;  // byte index among colour bytes only
             const int from = colour / (3 * element) * 4 * element + colour % (3 * element);
             return from / 16 == source ? from % 16 : kNone;
         });
@@ -209,7 +216,8 @@ struct DropAlpha {
         static constexpr ByteTable second[3] = {moves(0, 1), moves(1, 2), moves(2, 3)};
         Bytes a[4], halves[3];
         for (int k = 0; k < 4; ++k) a[k] = loadSpans<4, spans>(from[0], k);
-        for (int k = 0; k < 3; ++k) halves[k] = shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k]));
+        for (int k = 0; k < 3; ++k)
+            halves[k] = shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k]));
         storeAllSpans<spans, streaming>(to[0], halves);
     }
 };
@@ -236,7 +244,8 @@ struct FillColour {
         alignas(32) static constexpr auto colour = selectWithinPixel<4 * element>(3 * element);
         Bytes halves[4];
         for (int k = 0; k < 4; ++k) {
-            const Bytes elements = shuffleHalves(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k), table(spread[static_cast<size_t>(k)]));
+            const Bytes elements = shuffleHalves(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k),
+                                                 table(spread[static_cast<size_t>(k)]));
             halves[k] = blend(loadSpans<4, spans>(from[1], k), elements, load(colour.data()));
         }
         storeAllSpans<spans, streaming>(to[0], halves);
@@ -284,16 +293,16 @@ void fillColourRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels) {
     mapSpans(FillColour<element>{}, std::array{dst}, std::array<const uint8_t*, 2>{src, dst}, pixels);
 }
 
-#define QORI_INSTANTIATE_CHANNELS(channels, element)                                            \
+#define QORI_INSTANTIATE_CHANNELS(channels, element)                                             \
     template void splitRow<channels, element>(uint8_t* const*, const uint8_t*, ptrdiff_t, bool); \
     template void mergeRow<channels, element>(uint8_t*, const uint8_t* const*, ptrdiff_t, bool); \
-    template void extractRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t, bool);            \
+    template void extractRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t, bool);      \
     template void insertRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t);             \
     template void duplicateRow<channels, element>(uint8_t*, const uint8_t*, ptrdiff_t, bool)
-#define QORI_INSTANTIATE(element)                                                       \
-    QORI_INSTANTIATE_CHANNELS(3, element);                                              \
-    QORI_INSTANTIATE_CHANNELS(4, element);                                              \
-    template void dropAlphaRow<element>(uint8_t*, const uint8_t*, ptrdiff_t, bool);     \
+#define QORI_INSTANTIATE(element)                                                   \
+    QORI_INSTANTIATE_CHANNELS(3, element);                                          \
+    QORI_INSTANTIATE_CHANNELS(4, element);                                          \
+    template void dropAlphaRow<element>(uint8_t*, const uint8_t*, ptrdiff_t, bool); \
     template void fillColourRow<element>(uint8_t*, const uint8_t*, ptrdiff_t)
 QORI_INSTANTIATE(1);
 QORI_INSTANTIATE(2);

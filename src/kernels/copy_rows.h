@@ -14,8 +14,8 @@ void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
 /// As copyRow, reading the source with non-temporal loads from its first 64-byte boundary on.
 void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool streamStores);
 
-/// A pixel repeated over 128 bytes. Pixels take 1, 2, 3, 4, 6, 8, 12 or 16 bytes, so that 96 bytes hold whole pixels and
-/// any 32 bytes from an offset below 96 can be loaded.
+/// A pixel repeated over 128 bytes. Pixels take 1, 2, 3, 4, 6, 8, 12 or 16 bytes, so that 96 bytes hold whole pixels
+/// and any 32 bytes from an offset below 96 can be loaded.
 struct Pattern {
     static constexpr int period = 96;
     alignas(32) uint8_t bytes[128];
@@ -25,18 +25,20 @@ template <int pixelBytes>
 Pattern repeatPixel(const uint8_t* pixel) {
     static constexpr auto index = [] {
         std::array<ByteTable, 4> tables{};
-        for (int i = 0; i < 128; ++i) tables[static_cast<size_t>(i / 32)].at[i % 32] = static_cast<uint8_t>(i % pixelBytes);
+        for (int i = 0; i < 128; ++i)
+            tables[static_cast<size_t>(i / 32)].at[i % 32] = static_cast<uint8_t>(i % pixelBytes);
         return tables;
     }();
     const Bytes both{_mm256_broadcastsi128_si256(_mm256_castsi256_si128(loadPartial(pixel, pixelBytes).v))};
     Pattern pattern;
-    for (int k = 0; k < 4; ++k) store(pattern.bytes + 32 * k, shuffleHalves(both, load(index[static_cast<size_t>(k)].at)));
+    for (int k = 0; k < 4; ++k)
+        store(pattern.bytes + 32 * k, shuffleHalves(both, load(index[static_cast<size_t>(k)].at)));
     return pattern;
 }
 
 template <int channels, class T>
 Pattern patternOf(const T* pixel) {
-    return repeatPixel<channels * static_cast<int>(sizeof(T))>(reinterpret_cast<const uint8_t*>(pixel));
+    return repeatPixel<channels* static_cast<int>(sizeof(T))>(reinterpret_cast<const uint8_t*>(pixel));
 }
 
 void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes);

@@ -15,7 +15,7 @@ namespace qori::kernels {
 /// One row's worth of consecutive pixels in one image.
 struct Run {
     int pixelBytes;
-    int lastBytes;   ///< Bytes of the row's last pixel that may be touched: less where a channel of interest is meant.
+    int lastBytes;  ///< Bytes of the row's last pixel that may be touched: less where a channel of interest is meant.
 };
 
 constexpr Run wholePixels(int pixelBytes) { return {pixelBytes, pixelBytes}; }
@@ -24,20 +24,24 @@ constexpr Run oneChannel(int pixelBytes, int elementBytes) { return {pixelBytes,
 /// Half k of a span with `channels` halves, and of the next span where two are done.
 template <int channels, int spans>
 QORI_INLINE Bytes loadSpans(const uint8_t* in, int k) {
-    if constexpr (spans == 2) return loadHalves(in + 16 * k, in + 16 * (channels + k));
-    else return {_mm256_castsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(in + 16 * k)))};
+    if constexpr (spans == 2)
+        return loadHalves(in + 16 * k, in + 16 * (channels + k));
+    else
+        return {_mm256_castsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(in + 16 * k)))};
 }
 
 template <int channels, int spans>
 QORI_INLINE void storeSpans(uint8_t* out, int k, Bytes a) {
-    if constexpr (spans == 2) storeHalves(out + 16 * k, out + 16 * (channels + k), a);
-    else _mm_storeu_si128(reinterpret_cast<__m128i*>(out + 16 * k), _mm256_castsi256_si128(a.v));
+    if constexpr (spans == 2)
+        storeHalves(out + 16 * k, out + 16 * (channels + k), a);
+    else
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(out + 16 * k), _mm256_castsi256_si128(a.v));
 }
 
 /// All halves of one or two spans. Two spans are first laid end to end, so that whole vectors are stored.
 template <int spans, bool streaming, int channels>
 QORI_INLINE void storeAllSpans(uint8_t* out, const Bytes (&halves)[channels]) {
-    constexpr int low = 0x20, high = 0x31;   // the low halves of both, the high halves of both
+    constexpr int low = 0x20, high = 0x31;  // the low halves of both, the high halves of both
     if constexpr (spans == 1) {
         for (int k = 0; k < channels; ++k) storeSpans<channels, 1>(out, k, halves[k]);
     } else if constexpr (channels == 1) {
@@ -56,15 +60,12 @@ QORI_INLINE void storeAllSpans(uint8_t* out, const Bytes (&halves)[channels]) {
 
 namespace detail {
 
-template <class Kernel>
-constexpr int spanBytes(const Run& run) { return run.pixelBytes * Kernel::span; }
-
 /// Fewer pixels than a span, through buffers of a span's size. A run that is read and written appears among the
 /// inputs with the same pointer.
 template <class Kernel, size_t ins, size_t outs>
 QORI_INLINE void shortRow(const Kernel& kernel, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
                           ptrdiff_t pixels) {
-    constexpr int kMost = 64;   // four channels
+    constexpr int kMost = 64;  // four channels
     alignas(32) uint8_t buffers[ins + outs][kMost];
     std::array<const uint8_t*, ins> from;
     std::array<uint8_t*, outs> to;
@@ -119,13 +120,13 @@ QORI_INLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out, 
                 kernel.template run<1, false>(out, in);
                 advance(head - done < span ? head - done : span);
             }
-            while (pixels >= 2 * span) {
+            for (ptrdiff_t groups = pixels / (2 * span); groups > 0; --groups) {
                 kernel.template run<2, true>(out, in);
                 advance(2 * span);
             }
         }
     }
-    while (pixels >= 2 * span) {
+    for (ptrdiff_t groups = pixels / (2 * span); groups > 0; --groups) {
         kernel.template run<2, false>(out, in);
         advance(2 * span);
     }

@@ -2,8 +2,8 @@
 // Element-wise row kernels: one loop for every operation, type and layout. A block is as many elements as one vector of
 // the smallest element type holds, so that each image contributes whole vectors to it.
 //
-// An operation is a callable: Pack<D, n> op(int phase, Pack<S, n>... sources), where phase runs 0, 1, 2, 0, ... over the
-// blocks of a row: with 1, 3 or 4 channels, constants per channel repeat after three blocks. It may keep state (a
+// An operation is a callable: Pack<D, n> op(int phase, Pack<S, n>... sources), where phase runs 0, 1, 2, 0, ... over
+// the blocks of a row: with 1, 3 or 4 channels, constants per channel repeat after three blocks. It may keep state (a
 // warning seen) and may offer
 //     Pack<D, n> tail(int phase, ptrdiff_t count, Pack<S, n>... sources)   for the last, partial block, whose elements
 //                                                                           from count on are zeros and never stored;
@@ -38,7 +38,8 @@ QORI_INLINE Pack<T, n> loadPack(const T* p) {
 template <class T, int n>
 QORI_INLINE Pack<T, n> loadPackUpTo(const T* p, ptrdiff_t count) {
     Pack<T, n> pack;
-    for (int i = 0; i < Pack<T, n>::vectors; ++i) pack.v[i] = loadUpTo(p + i * Vec<T>::lanes, count - i * Vec<T>::lanes);
+    for (int i = 0; i < Pack<T, n>::vectors; ++i)
+        pack.v[i] = loadUpTo(p + i * Vec<T>::lanes, count - i * Vec<T>::lanes);
     return pack;
 }
 
@@ -46,7 +47,8 @@ QORI_INLINE Pack<T, n> loadPackUpTo(const T* p, ptrdiff_t count) {
 template <class T>
 QORI_INLINE Vec<T> withAlphaOf(Vec<T> a, Vec<T> old) {
     if constexpr (sizeof(T) == 1) {
-        return fromInteger<T>(_mm256_blendv_epi8(toInteger(a.v), toInteger(old.v), _mm256_set1_epi32(static_cast<int>(0xFF000000u))));
+        return fromInteger<T>(
+            _mm256_blendv_epi8(toInteger(a.v), toInteger(old.v), _mm256_set1_epi32(static_cast<int>(0xFF000000u))));
     } else if constexpr (sizeof(T) == 2) {
         return fromInteger<T>(_mm256_blend_epi16(toInteger(a.v), toInteger(old.v), 0x88));
     } else if constexpr (sizeof(T) == 4) {
@@ -78,8 +80,10 @@ QORI_INLINE void storePackUpTo(T* p, Pack<T, n> pack, ptrdiff_t count) {
 
 template <class Op, class... Packs>
 QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
-    if constexpr (requires { op.tail(phase, count, packs...); }) return op.tail(phase, count, packs...);
-    else return op(phase, packs...);
+    if constexpr (requires { op.tail(phase, count, packs...); })
+        return op.tail(phase, count, packs...);
+    else
+        return op(phase, packs...);
 }
 
 }  // namespace detail
@@ -94,14 +98,16 @@ QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, co
         ptrdiff_t i = 0;
         for (; i <= elements - 3 * n; i += 3 * n) {
             for (int phase = 0; phase < 3; ++phase)
-                detail::storePack<keepAlpha, streams>(dst + i + phase * n, op(phase, detail::loadPack<S, n>(src + i + phase * n)...));
+                detail::storePack<keepAlpha, streams>(dst + i + phase * n,
+                                                      op(phase, detail::loadPack<S, n>(src + i + phase * n)...));
         }
         int phase = 0;
         for (; i <= elements - n; i += n, ++phase)
             detail::storePack<keepAlpha, streams>(dst + i, op(phase, detail::loadPack<S, n>(src + i)...));
         if (i < elements) {
             const ptrdiff_t rest = elements - i;
-            detail::storePackUpTo<keepAlpha>(dst + i, detail::applyTail(op, phase, rest, detail::loadPackUpTo<S, n>(src + i, rest)...), rest);
+            detail::storePackUpTo<keepAlpha>(
+                dst + i, detail::applyTail(op, phase, rest, detail::loadPackUpTo<S, n>(src + i, rest)...), rest);
         }
     };
     if constexpr (mayStream) {
@@ -113,9 +119,10 @@ QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, co
 /// mapRow over a region of `channels` interleaved channels.
 template <bool keepAlpha = false, class Op, class D, class... S>
 void mapImage(QorImageSize roi, int channels, Op&& op, bool streaming, Image<D> dst, Image<const S>... src) {
-    forEachRow(roi, [&](ptrdiff_t pixels, D* d, const S*... s) {
-        mapRow<keepAlpha>(op, pixels * channels, streaming, d, s...);
-    }, walk(dst, channels), walk(src, channels)...);
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, D* d, const S*... s) { mapRow<keepAlpha>(op, pixels * channels, streaming, d, s...); },
+        walk(dst, channels), walk(src, channels)...);
     if (streaming) streamFence();
 }
 

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Rows of which only selected bytes are replaced, by another row's bytes or by a constant pixel: alpha kept, one channel
-// of interest, masks. Kept bytes inside a written vector are rewritten with their own value.
+// Rows of which only selected bytes are replaced, by another row's bytes or by a constant pixel: alpha kept, one
+// channel of interest, masks. Kept bytes inside a written vector are rewritten with their own value.
 #pragma once
 #include "copy_rows.h"
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The vocabulary of the kernels: vectors of 32 bytes and the operations on them, named after what they do. `.v` is the
-// register, for an operation that has one user. Partial loads and stores touch exactly the elements that they are given.
+// register, for an operation that has one user. Partial loads and stores touch exactly the elements that they are
+// given.
 #pragma once
 #include <immintrin.h>
 
@@ -41,9 +42,12 @@ QORI_INLINE __m256i toInteger(__m256d v) { return _mm256_castpd_si256(v); }
 
 template <class T>
 QORI_INLINE Vec<T> fromInteger(__m256i v) {
-    if constexpr (std::is_same_v<T, float>) return {_mm256_castsi256_ps(v)};
-    else if constexpr (std::is_same_v<T, double>) return {_mm256_castsi256_pd(v)};
-    else return {v};
+    if constexpr (std::is_same_v<T, float>)
+        return {_mm256_castsi256_ps(v)};
+    else if constexpr (std::is_same_v<T, double>)
+        return {_mm256_castsi256_pd(v)};
+    else
+        return {v};
 }
 
 // --- whole vectors --------------------------------------------------------------------------------------------------
@@ -68,12 +72,16 @@ QORI_INLINE void streamFence() { _mm_sfence(); }
 
 template <bool streaming, class T>
 QORI_INLINE void storeAs(T* p, Vec<T> a) {
-    if constexpr (streaming) stream(p, a);
-    else store(p, a);
+    if constexpr (streaming)
+        stream(p, a);
+    else
+        store(p, a);
 }
 
 template <class T>
-QORI_INLINE Vec<T> zero() { return fromInteger<T>(_mm256_setzero_si256()); }
+QORI_INLINE Vec<T> zero() {
+    return fromInteger<T>(_mm256_setzero_si256());
+}
 
 /// 16 bytes at low and 16 at high.
 QORI_INLINE Bytes loadHalves(const uint8_t* low, const uint8_t* high) {
@@ -104,7 +112,9 @@ QORI_INLINE Word loadWord(const uint8_t* p) {
 }
 
 template <class Word>
-QORI_INLINE void storeWord(uint8_t* p, Word word) { __builtin_memcpy(p, &word, sizeof word); }
+QORI_INLINE void storeWord(uint8_t* p, Word word) {
+    __builtin_memcpy(p, &word, sizeof word);
+}
 
 /// The n bytes at p (1 to 15), zeros behind them: two loads that overlap, the second shifted into place.
 QORI_INLINE __m128i loadBelow16(const uint8_t* p, int n) {
@@ -177,8 +187,10 @@ QORI_INLINE Vec<T> loadUpTo(const T* p, ptrdiff_t n) {
 
 template <class T>
 QORI_INLINE void storeUpTo(T* p, Vec<T> a, ptrdiff_t n) {
-    if (n >= Vec<T>::lanes) store(p, a);
-    else if (n > 0) storePartial(p, a, n);
+    if (n >= Vec<T>::lanes)
+        store(p, a);
+    else if (n > 0)
+        storePartial(p, a, n);
 }
 
 // --- bytes ----------------------------------------------------------------------------------------------------------

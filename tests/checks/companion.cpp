@@ -40,13 +40,14 @@ int main() {
     void* blocks[8];
     for (int i = 0; i < 8; ++i) {
         blocks[i] = qorMalloc(1 + 37 * i);
-        expect(blocks[i] != nullptr && reinterpret_cast<uintptr_t>(blocks[i]) % 64 == 0, "blocks start on 64-byte boundaries");
+        expect(blocks[i] != nullptr && reinterpret_cast<uintptr_t>(blocks[i]) % 64 == 0,
+               "blocks start on 64-byte boundaries");
         if (blocks[i] != nullptr) std::memset(blocks[i], 0xA5, static_cast<size_t>(1 + 37 * i));
     }
     for (void* block : blocks) qorFree(block);
     qorFree(nullptr);
     for (int32_t length : {0, -1, INT32_MIN}) expect(qorMalloc(length) == nullptr, "nonsense lengths give null");
-    qorFree(qorMalloc(INT32_MAX));   // null or a block, but no crash
+    qorFree(qorMalloc(INT32_MAX));  // null or a block, but no crash
 
     constexpr uint64_t fma = 0x10, avx2 = 0x20;
     expect((qorGetEnabledCpuFeatures() & (fma | avx2)) == (fma | avx2), "this processor has AVX2 and FMA");

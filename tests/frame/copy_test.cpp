@@ -14,8 +14,10 @@ template <class T, Layout SL, Layout DL, Kind kind, class Function>
 void checkPacked(Function function, const Shape& shape) {
     constexpr int element = sizeof(T);
     // A channel of interest may be any of the pixel's; the pointers move, the reference sees a view from there.
-    const int srcChannel = channels(SL) > 1 && (channels(DL) == 1 || isChannelOfInterest(SL)) ? shape.width % channels(SL) : 0;
-    const int dstChannel = channels(DL) > 1 && (channels(SL) == 1 || isChannelOfInterest(DL)) ? (shape.width + 1) % channels(DL) : 0;
+    const int srcChannel =
+        channels(SL) > 1 && (channels(DL) == 1 || isChannelOfInterest(SL)) ? shape.width % channels(SL) : 0;
+    const int dstChannel =
+        channels(DL) > 1 && (channels(SL) == 1 || isChannelOfInterest(DL)) ? (shape.width + 1) % channels(DL) : 0;
     TestImage src(kSrcSlot, shape, element * channels(SL)), dst(kDstSlot, shape, element * channels(DL));
     TestImage mask(kMaskSlot, shape, 1);
     src.fill<T>(channels(SL), [] { return static_cast<T>(random().value<T>()); });
@@ -30,9 +32,11 @@ void checkPacked(Function function, const Shape& shape) {
     reference::copy(from, to, shape.roi(), reference::routes(SL, DL), kind == Kind::MR ? &maskView : nullptr);
     QorResult result;
     if constexpr (kind == Kind::MR)
-        result = call(function, src.data<T>(), src.step(), dst.data<T>(), dst.step(), shape.roi(), mask.data<uint8_t>(), mask.step());
+        result = call(function, src.data<T>(), src.step(), dst.data<T>(), dst.step(), shape.roi(), mask.data<uint8_t>(),
+                      mask.step());
     else
-        result = call(function, src.data<T>() + srcChannel, src.step(), dst.data<T>() + dstChannel, dst.step(), shape.roi());
+        result =
+            call(function, src.data<T>() + srcChannel, src.step(), dst.data<T>() + dstChannel, dst.step(), shape.roi());
     ASSERT_EQ(QOR_OK, result);
     QORI_EXPECT_UNCHANGED(dst, expected);
     QORI_EXPECT_UNCHANGED(src, srcBefore);
@@ -56,14 +60,18 @@ void checkPlanar(Function function, const Shape& shape) {
     for (int c = 0; c < n; ++c) {
         auto whole = packedExpected.view<T>(n);
         auto plane = planesExpected[static_cast<size_t>(c)].template view<T>(1);
-        if (split) reference::copy(whole, plane, shape.roi(), {{c, 0}}, nullptr);
-        else reference::copy(plane, whole, shape.roi(), {{0, c}}, nullptr);
+        if (split)
+            reference::copy(whole, plane, shape.roi(), {{c, 0}}, nullptr);
+        else
+            reference::copy(plane, whole, shape.roi(), {{0, c}}, nullptr);
     }
     QorResult result;
     if constexpr (split)
-        result = call(function, packed.data<T>(), packed.step(), static_cast<T* const*>(pointers), planes[0].step(), shape.roi());
+        result = call(function, packed.data<T>(), packed.step(), static_cast<T* const*>(pointers), planes[0].step(),
+                      shape.roi());
     else
-        result = call(function, const_cast<const T* const*>(pointers), planes[0].step(), packed.data<T>(), packed.step(), shape.roi());
+        result = call(function, const_cast<const T* const*>(pointers), planes[0].step(), packed.data<T>(),
+                      packed.step(), shape.roi());
     ASSERT_EQ(QOR_OK, result);
     QORI_EXPECT_UNCHANGED(packed, packedExpected);
     for (size_t c = 0; c < n; ++c) QORI_EXPECT_UNCHANGED(planes[c], planesExpected[c]);
@@ -72,9 +80,12 @@ void checkPlanar(Function function, const Shape& shape) {
 template <class T, Layout SL, Layout DL, Kind kind, class Function>
 void sweep(const char* name, Function function) {
     const auto check = [&](const Shape& shape) {
-        if constexpr (isPlanar(DL)) checkPlanar<T, SL, true>(function, shape);
-        else if constexpr (isPlanar(SL)) checkPlanar<T, DL, false>(function, shape);
-        else checkPacked<T, SL, DL, kind>(function, shape);
+        if constexpr (isPlanar(DL))
+            checkPlanar<T, SL, true>(function, shape);
+        else if constexpr (isPlanar(SL))
+            checkPlanar<T, DL, false>(function, shape);
+        else
+            checkPacked<T, SL, DL, kind>(function, shape);
     };
     forShapes(smallShapes(), check);
     forStreamingChoices(static_cast<int>(sizeof(T)) * (channels(SL) + channels(DL)), kAboveEveryBound, check);
@@ -87,17 +98,18 @@ void checkDuplicate(decltype(&qoriDup_8u_C1C3R) function, const Shape& shape) {
     src.fill<uint8_t>(1, [] { return random().value<uint8_t>(); });
     const Snapshot srcBefore = src.snapshot();
     Snapshot expected = dst.snapshot();
-    for (int c = 0; c < n; ++c) reference::copy(src.view<uint8_t>(1), expected.view<uint8_t>(n), shape.roi(), {{0, c}}, nullptr);
+    for (int c = 0; c < n; ++c)
+        reference::copy(src.view<uint8_t>(1), expected.view<uint8_t>(n), shape.roi(), {{0, c}}, nullptr);
     ASSERT_EQ(QOR_OK, call(function, src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(), shape.roi()));
     QORI_EXPECT_UNCHANGED(dst, expected);
     QORI_EXPECT_UNCHANGED(src, srcBefore);
 }
 
 // One function per operation of the registry; a new operation does not compile until it has its own.
-#define QORI_SAME_SWEEP(operation)                                             \
-    template <class T, Layout SL, Layout DL, Kind kind, class Function>        \
-    void operation(const char* name, Function function) {                      \
-        sweep<T, SL, DL, kind>(name, function);                                \
+#define QORI_SAME_SWEEP(operation)                                      \
+    template <class T, Layout SL, Layout DL, Kind kind, class Function> \
+    void operation(const char* name, Function function) {               \
+        sweep<T, SL, DL, kind>(name, function);                         \
     }
 QORI_SAME_SWEEP(copyPixels)
 QORI_SAME_SWEEP(copyColour)
@@ -168,14 +180,16 @@ TEST(Copy, AsksForTheCacheOnlyAboveEachBound) {
     };
     auto* words = reinterpret_cast<int32_t*>(memory.data());
     int32_t* planes[3] = {words + (1 << 19), words + (1 << 19) + 50'000, words + (1 << 19) + 100'000};
-    const auto split = [&](QorImageSize roi) { return qoriCopy_32s_C3P3R(words, roi.width * 12, planes, roi.width * 4, roi); };
-    EXPECT_EQ(0, queriesOf(split, {43'690, 1}));   // 24 bytes a pixel: 1,048,560
+    const auto split = [&](QorImageSize roi) {
+        return qoriCopy_32s_C3P3R(words, roi.width * 12, planes, roi.width * 4, roi);
+    };
+    EXPECT_EQ(0, queriesOf(split, {43'690, 1}));  // 24 bytes a pixel: 1,048,560
     EXPECT_EQ(1, queriesOf(split, {43'691, 1}));
     uint8_t* bytePlanes[3] = {memory.data() + (3 << 20), memory.data() + (4 << 20), memory.data() + (5 << 20)};
     const auto splitBytes = [&](QorImageSize roi) {
         return qoriCopy_8u_C3P3R(memory.data(), roi.width * 3, bytePlanes, roi.width, roi);
     };
-    EXPECT_EQ(0, queriesOf(splitBytes, {87'381, 1}));   // 6 bytes a pixel: 524,286
+    EXPECT_EQ(0, queriesOf(splitBytes, {87'381, 1}));  // 6 bytes a pixel: 524,286
     EXPECT_EQ(1, queriesOf(splitBytes, {87'382, 1}));
 }
 

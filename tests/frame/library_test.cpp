@@ -36,7 +36,7 @@ void checkAllocator(const char* name, Function allocate, uint32_t pixelBytes) {
         const int64_t rowBytes = int64_t{width} * pixelBytes;
         EXPECT_EQ((rowBytes + 63) / 64 * 64, step);
         EXPECT_EQ(0u, reinterpret_cast<uintptr_t>(image) % 64);
-        std::memset(image, 0xAB, static_cast<size_t>(step) * static_cast<size_t>(height));   // all of it is ours
+        std::memset(image, 0xAB, static_cast<size_t>(step) * static_cast<size_t>(height));  // all of it is ours
         qoriFree(image);
     }
     const int live = qorTestLiveBlocks();

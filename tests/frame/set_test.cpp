@@ -32,8 +32,10 @@ void check(Function function, const Shape& shape) {
             return call(function, value, dst.data<T>() + channel, dst.step(), shape.roi());
     };
     QorResult result;
-    if constexpr (L == Layout::C1 || oneChannel) result = run(values[0]);
-    else result = run(static_cast<const T*>(values));
+    if constexpr (L == Layout::C1 || oneChannel)
+        result = run(values[0]);
+    else
+        result = run(static_cast<const T*>(values));
     ASSERT_EQ(QOR_OK, result);
     QORI_EXPECT_UNCHANGED(dst, expected);
 }
@@ -41,7 +43,8 @@ void check(Function function, const Shape& shape) {
 template <class T, Layout L, Kind kind, class Function>
 void sweep(const char* name, Function function) {
     forShapes(smallShapes(), [&](const Shape& shape) { check<T, L, kind>(function, shape); });
-    forStreamingChoices(static_cast<int>(sizeof(T)) * channels(L), kAboveEveryBound, [&](const Shape& shape) { check<T, L, kind>(function, shape); });
+    forStreamingChoices(static_cast<int>(sizeof(T)) * channels(L), kAboveEveryBound,
+                        [&](const Shape& shape) { check<T, L, kind>(function, shape); });
     markSwept(name);
 }
 

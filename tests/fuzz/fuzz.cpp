@@ -19,7 +19,7 @@ namespace {
 
 constexpr int kArenas = 8;
 constexpr size_t kArenaBytes = 1 << 16;
-constexpr int kMostWidth = 70, kMostHeight = 6, kMostStep = 2000;   // stays within half an arena
+constexpr int kMostWidth = 70, kMostHeight = 6, kMostStep = 2000;  // stays within half an arena
 
 /// Takes values off the input; zeros when it has run out.
 class Input {
@@ -70,28 +70,33 @@ T argument(Input& in) {
         in.stepFollows = true;
         return reinterpret_cast<T>(in.memory());
     } else if constexpr (std::is_same_v<T, QorImageSize>) {
-        const auto part = [&](int most) { const auto v = in.take<uint8_t>(); return v >= 250 ? 250 - v : 1 + v % most; };
+        const auto part = [&](int most) {
+            const auto v = in.take<uint8_t>();
+            return v >= 250 ? 250 - v : 1 + v % most;
+        };
         const int width = part(kMostWidth);
         return {width, part(kMostHeight)};
     } else if constexpr (std::is_same_v<T, int32_t>) {
-        return isStep ? in.take<int16_t>() % kMostStep : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>() : in.take<int8_t>();
+        return isStep                        ? in.take<int16_t>() % kMostStep
+               : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
+                                             : in.take<int8_t>();
     } else {
         return in.take<T>();
     }
 }
 
 bool isStatus(QorResult result) {
-    return result == QOR_OK || result == QOR_WARN_DIV_BY_ZERO || result == QOR_WARN_LOG_ZERO || result == QOR_WARN_LOG_NEGATIVE ||
-           (result <= QOR_ERR_BAD_ARG && result >= QOR_ERR_DIRECTION);
+    return result == QOR_OK || result == QOR_WARN_DIV_BY_ZERO || result == QOR_WARN_LOG_ZERO ||
+           result == QOR_WARN_LOG_NEGATIVE || (result <= QOR_ERR_BAD_ARG && result >= QOR_ERR_DIRECTION);
 }
 
 template <class... Arguments>
-bool callWith(Input& in, QorResult (QORI_CALL *function)(Arguments...)) {
+bool callWith(Input& in, QorResult(QORI_CALL* function)(Arguments...)) {
     // Braces fix the order in which the arguments take from the input.
     struct Call {
-        QorResult (QORI_CALL *function)(Arguments...);
+        QorResult(QORI_CALL* function)(Arguments...);
         QorResult result;
-        Call(QorResult (QORI_CALL *f)(Arguments...), Arguments... arguments) : function(f), result(f(arguments...)) {}
+        Call(QorResult(QORI_CALL* f)(Arguments...), Arguments... arguments) : function(f), result(f(arguments...)) {}
     };
     return isStatus(Call{function, argument<Arguments>(in)...}.result);
 }
@@ -127,7 +132,8 @@ int main(int argc, char** argv) {
     uint64_t state = argc > 2 ? std::strtoull(argv[2], nullptr, 10) : 1;
     for (long i = 0; i < runs; ++i) {
         uint8_t data[96];
-        for (uint8_t& byte : data) byte = static_cast<uint8_t>((state = state * 6364136223846793005u + 1442695040888963407u) >> 56);
+        for (uint8_t& byte : data)
+            byte = static_cast<uint8_t>((state = state * 6364136223846793005u + 1442695040888963407u) >> 56);
         LLVMFuzzerTestOneInput(data, sizeof data);
     }
     std::printf("%ld random calls over %zu exports\n", runs, std::size(qori::test::kTargets));

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Calls exports the way an awkward caller would: from a stack aligned to 4 bytes only (32 bits) and under every rounding
-// mode in turn, and checks that the control register comes back as it was.
+// Calls exports the way an awkward caller would: from a stack aligned to 4 bytes only (32 bits) and under every
+// rounding mode in turn, and checks that the control register comes back as it was.
 #pragma once
 #include <gtest/gtest.h>
 #include <immintrin.h>
@@ -48,7 +48,8 @@ auto call(Function function, Arguments... arguments) {
     Result result{};
     auto body = [&] { result = function(arguments...); };
     _mm_setcsr(during);
-    detail::onStack((circumstance >> 2 & 3u) * 4, [](void* context) { (*static_cast<decltype(body)*>(context))(); }, &body);
+    detail::onStack((circumstance >> 2 & 3u) * 4, [](void* context) { (*static_cast<decltype(body)*>(context))(); },
+                    &body);
     const unsigned after = _mm_getcsr();
     _mm_setcsr(before);
     EXPECT_EQ(during & ~kFlags, after & ~kFlags) << "the control register was left changed";

@@ -25,7 +25,8 @@ struct GuardedPages {
 inline GuardedPages mapGuarded(size_t bytes) {
     const size_t size = (bytes + kPage - 1) / kPage * kPage;
 #ifdef _WIN32
-    auto* base = static_cast<uint8_t*>(VirtualAlloc(nullptr, size + 2 * kPage, MEM_RESERVE | MEM_COMMIT, PAGE_READWRITE));
+    auto* base =
+        static_cast<uint8_t*>(VirtualAlloc(nullptr, size + 2 * kPage, MEM_RESERVE | MEM_COMMIT, PAGE_READWRITE));
     if (base == nullptr) return {};
     DWORD old;
     VirtualProtect(base, kPage, PAGE_NOACCESS, &old);

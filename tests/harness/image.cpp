@@ -7,7 +7,7 @@
 namespace qori::test {
 namespace {
 
-constexpr ptrdiff_t kMargin = 64;          // checked bytes on the side without a guard page
+constexpr ptrdiff_t kMargin = 64;  // checked bytes on the side without a guard page
 constexpr size_t kArena = size_t{16} << 20;
 constexpr int kSlots = 8;
 constexpr uint8_t kPoison = 0x99;
@@ -65,8 +65,7 @@ TestImage::TestImage(int slot, const Shape& shape, int pixelBytes)
     const ptrdiff_t rowBytes = ptrdiff_t{shape.width} * pixelBytes;
     const ptrdiff_t pitch = rowBytes + shape.padding;
     const ptrdiff_t span = (shape.height - 1) * pitch + rowBytes;
-    uint8_t* const first = shape.atBegin ? pages.begin + shape.shift
-                                         : pages.begin + pages.size - shape.shift - span;
+    uint8_t* const first = shape.atBegin ? pages.begin + shape.shift : pages.begin + pages.size - shape.shift - span;
     begin_ = std::max(pages.begin, first - kMargin);
     end_ = std::min(pages.begin + pages.size, first + span + kMargin);
     step_ = shape.flipped ? -pitch : pitch;

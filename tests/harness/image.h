@@ -17,8 +17,11 @@ enum class Kind { none, R, IR, MR };
 constexpr int channels(Layout layout) {
     switch (layout) {
         case Layout::C1: return 1;
-        case Layout::C2: case Layout::P2: return 2;
-        case Layout::C3: case Layout::P3: case Layout::C3C: return 3;
+        case Layout::C2:
+        case Layout::P2: return 2;
+        case Layout::C3:
+        case Layout::P3:
+        case Layout::C3C: return 3;
         default: return 4;
     }
 }
@@ -28,9 +31,9 @@ constexpr bool isChannelOfInterest(Layout layout) { return layout == Layout::C3C
 /// Where an image lies and how its rows follow each other. `shift` moves it from the guard page by some bytes.
 struct Shape {
     int width = 1, height = 1;
-    int padding = 0;          ///< Bytes between the end of a row and the next.
-    bool flipped = false;     ///< Negative step.
-    bool atBegin = false;     ///< Flush against the page before, else against the page behind.
+    int padding = 0;       ///< Bytes between the end of a row and the next.
+    bool flipped = false;  ///< Negative step.
+    bool atBegin = false;  ///< Flush against the page before, else against the page behind.
     int shift = 0;
 
     QorImageSize roi() const { return {width, height}; }
@@ -71,7 +74,9 @@ struct Snapshot {
     ptrdiff_t step;
 
     template <class T>
-    View<T> view(int channels) { return {bytes.data() + originOffset, step, channels}; }
+    View<T> view(int channels) {
+        return {bytes.data() + originOffset, step, channels};
+    }
 };
 
 class TestImage {
@@ -80,11 +85,15 @@ public:
     TestImage(int slot, const Shape& shape, int pixelBytes);
 
     template <class T>
-    T* data() const { return reinterpret_cast<T*>(origin_); }
+    T* data() const {
+        return reinterpret_cast<T*>(origin_);
+    }
     int32_t step() const { return static_cast<int32_t>(step_); }
 
     template <class T>
-    View<T> view(int channels) const { return {origin_, step_, channels}; }
+    View<T> view(int channels) const {
+        return {origin_, step_, channels};
+    }
 
     /// Calls next() for each element of the region, row by row.
     template <class T, class Next>
@@ -100,9 +109,9 @@ public:
     std::string difference(const Snapshot& expected) const;
 
 private:
-    uint8_t* begin_;    // everything that is checked
+    uint8_t* begin_;  // everything that is checked
     uint8_t* end_;
-    uint8_t* origin_;   // pixel (0, 0)
+    uint8_t* origin_;  // pixel (0, 0)
     ptrdiff_t step_;
     int width_, height_, pixelBytes_;
 };

@@ -6,7 +6,9 @@
 
 namespace qori::test {
 
-constexpr int processedChannels(Layout layout) { return layout == Layout::AC4 ? 3 : isChannelOfInterest(layout) ? 1 : channels(layout); }
+constexpr int processedChannels(Layout layout) {
+    return layout == Layout::AC4 ? 3 : isChannelOfInterest(layout) ? 1 : channels(layout);
+}
 
 /// Draws any value of the type, extremes more often.
 template <class T>

@@ -40,8 +40,14 @@ public:
             return {value<Part>(), value<Part>()};
         } else {
             using Limits = std::numeric_limits<T>;
-            constexpr T extremes[] = {Limits::min(), Limits::max(), 0, 1, static_cast<T>(Limits::max() - 1),
-                                      static_cast<T>(Limits::max() / 2), static_cast<T>(-1), static_cast<T>(Limits::min() + 1)};
+            constexpr T extremes[] = {Limits::min(),
+                                      Limits::max(),
+                                      0,
+                                      1,
+                                      static_cast<T>(Limits::max() - 1),
+                                      static_cast<T>(Limits::max() / 2),
+                                      static_cast<T>(-1),
+                                      static_cast<T>(Limits::min() + 1)};
             return oneIn(4) ? extremes[below(8)] : static_cast<T>(bits());
         }
     }

@@ -32,11 +32,11 @@ void forStreamingChoices(int bytesPerPixel, int trafficBytes, Check check) {
 #define QORI_EXPECT_UNCHANGED(image, snapshot) EXPECT_EQ("", (image).difference(snapshot))
 
 /// A status expected of a call that must leave `output` alone.
-#define QORI_EXPECT_STATUS(expected, output, callExpression)      \
-    do {                                                          \
-        const auto before_ = (output).snapshot();                 \
-        EXPECT_EQ(expected, callExpression) << #callExpression;   \
-        EXPECT_EQ("", (output).difference(before_));              \
+#define QORI_EXPECT_STATUS(expected, output, callExpression)    \
+    do {                                                        \
+        const auto before_ = (output).snapshot();               \
+        EXPECT_EQ(expected, callExpression) << #callExpression; \
+        EXPECT_EQ("", (output).difference(before_));            \
     } while (false)
 
 }  // namespace qori::test

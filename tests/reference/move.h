@@ -8,7 +8,7 @@
 namespace qori::test::reference {
 
 struct Route {
-    int from, to;   // channels
+    int from, to;  // channels
 };
 
 /// Channels that a copy moves. Channel-of-interest images are addressed from their element, which is channel 0 there.

@@ -50,14 +50,15 @@ void QORCORE_CALL qorFree(void* pointer) {
     for (Block& block : blocks) {
         if (block.begin != pointer) continue;
         bool damaged = false;
-        for (uint8_t* p = block.begin + block.length; p < block.pages.begin + block.pages.size; ++p) damaged |= *p != kCanary;
+        for (uint8_t* p = block.begin + block.length; p < block.pages.begin + block.pages.size; ++p)
+            damaged |= *p != kCanary;
         damagedBlocks += damaged;
         unmapGuarded(block.pages);
         block = {};
         --liveBlocks;
         return;
     }
-    ++damagedBlocks;   // not a block of ours
+    ++damagedBlocks;  // not a block of ours
 }
 
 uint64_t QORCORE_CALL qorGetEnabledCpuFeatures(void) {
@@ -78,5 +79,4 @@ int qorTestCacheQueries(void) { return cacheQueries; }
 int qorTestFeatureQueries(void) { return featureQueries; }
 int qorTestLiveBlocks(void) { return liveBlocks; }
 int qorTestDamagedBlocks(void) { return damagedBlocks; }
-
 }

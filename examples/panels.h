@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+// What the demo shows: one small function a panel, and a line in its family's list.
+#pragma once
+#include <span>
+
+#include "picture.h"
+
+namespace demo {
+
+struct Panel {
+    const char* caption;
+    const char* functions;                  ///< The exports that do the work.
+    Picture (*make)(const Picture& photo);  ///< Three channels, of the photograph's size.
+};
+
+std::span<const Panel> copyPanels();
+
+}  // namespace demo
