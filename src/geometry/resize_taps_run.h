@@ -63,7 +63,7 @@ private:
 
     /// Pixels per strip, such that the filtered rows of a strip stay in the second-level cache.
     static int32_t stripOf(int32_t width, int32_t rowTaps) {
-        constexpr int32_t kRingFloats = 32768;
+        constexpr int32_t kRingFloats = 24576;
         const int32_t fits = kRingFloats / (rowTaps + kernels::kTapRows) / channels / kernels::kTapChunk * kernels::kTapChunk;
         const int32_t pixels = fits > kernels::kTapChunk ? fits : kernels::kTapChunk;
         return width < pixels ? width : pixels;

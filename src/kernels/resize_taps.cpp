@@ -19,6 +19,13 @@ QORI_INLINE __m128i loadWords(const void* p, ptrdiff_t n) {
 QORI_INLINE __m256 toFloats(const uint16_t* p, ptrdiff_t n) { return _mm256_cvtepi32_ps(_mm256_cvtepu16_epi32(loadWords(p, n))); }
 QORI_INLINE __m256 toFloats(const int16_t* p, ptrdiff_t n) { return _mm256_cvtepi32_ps(_mm256_cvtepi16_epi32(loadWords(p, n))); }
 
+/// Asks for the cache line some way behind p; a hint that touches nothing.
+template <class T>
+QORI_INLINE void prefetchAhead(const T* p) {
+    constexpr uintptr_t kBytes = 512;
+    _mm_prefetch(reinterpret_cast<const char*>(reinterpret_cast<uintptr_t>(p) + kBytes), _MM_HINT_T0);
+}
+
 /// Within each half, rows become columns: v[j] holds element j of all four in its low half, element 4 + j in its high.
 QORI_INLINE void turnQuads(__m256 v[4]) {
     const __m256 a = _mm256_unpacklo_ps(v[0], v[1]), b = _mm256_unpackhi_ps(v[0], v[1]);
@@ -29,9 +36,27 @@ QORI_INLINE void turnQuads(__m256 v[4]) {
     v[3] = _mm256_shuffle_ps(b, d, 0xEE);
 }
 
+/// Turns four elements of eight rows, given as four vectors of a row each half, into vectors of a column each.
+QORI_INLINE void turnFloats(const float* const rows[kTapRows], ptrdiff_t at, float* out) {
+    __m256 v[4];
+    for (int j = 0; j < 4; ++j) {
+        const __m256 upper = _mm256_castps128_ps256(_mm_loadu_ps(rows[j] + at));
+        v[j] = _mm256_insertf128_ps(upper, _mm_loadu_ps(rows[4 + j] + at), 1);
+    }
+    turnQuads(v);
+    for (int j = 0; j < 4; ++j) _mm256_storeu_ps(out + 8 * j, v[j]);
+}
+
 /// Turns n (1 to 8) elements of eight rows into as many vectors; the vectors behind them are written too.
 template <class T>
 QORI_INLINE void turnIn(const T* const rows[kTapRows], ptrdiff_t at, ptrdiff_t n, float* out) {
+    if constexpr (std::is_same_v<T, float>) {
+        if (n >= 8) {
+            turnFloats(rows, at, out);
+            turnFloats(rows, at + 4, out + 32);
+            return;
+        }
+    }
     __m256 upper[4], lower[4];
     for (int j = 0; j < 4; ++j) upper[j] = toFloats(rows[j] + at, n);
     for (int j = 0; j < 4; ++j) lower[j] = toFloats(rows[4 + j] + at, n);
@@ -45,19 +70,26 @@ QORI_INLINE void turnIn(const T* const rows[kTapRows], ptrdiff_t at, ptrdiff_t n
 
 /// Turns eight vectors of eight rows back into eight elements of each row.
 QORI_INLINE void turnOut(const float* in, float* const out[kTapRows], ptrdiff_t at) {
-    __m256 low[4], high[4];
-    for (int j = 0; j < 4; ++j) low[j] = _mm256_loadu_ps(in + 8 * j);
-    for (int j = 0; j < 4; ++j) high[j] = _mm256_loadu_ps(in + 8 * (4 + j));
-    turnQuads(low);
-    turnQuads(high);
-    for (int j = 0; j < 4; ++j) {
-        _mm256_storeu_ps(out[j] + at, _mm256_permute2f128_ps(low[j], high[j], 0x20));
-        _mm256_storeu_ps(out[4 + j] + at, _mm256_permute2f128_ps(low[j], high[j], 0x31));
+    // Four rows at a time: columns c and 4 + c side by side turn into eight elements of a row.
+    for (int half = 0; half < 2; ++half) {
+        __m256 v[4];
+        for (int c = 0; c < 4; ++c) {
+            const __m256 low = _mm256_castps128_ps256(_mm_loadu_ps(in + 8 * c + 4 * half));
+            v[c] = _mm256_insertf128_ps(low, _mm_loadu_ps(in + 8 * (4 + c) + 4 * half), 1);
+        }
+        turnQuads(v);
+        for (int j = 0; j < 4; ++j) _mm256_storeu_ps(out[4 * half + j] + at, v[j]);
     }
 }
 
 template <class T>
-QORI_NOINLINE void turnRows(const T* const rows[kTapRows], ptrdiff_t at, ptrdiff_t elements, ptrdiff_t legalEnd, float* out) {
+QORI_NOINLINE void turnRows(const T* const from[kTapRows], ptrdiff_t at, ptrdiff_t elements, ptrdiff_t legalEnd, float* out) {
+    const T* rows[kTapRows];   // not reloaded after every store
+    for (int j = 0; j < kTapRows; ++j) rows[j] = from[j];
+    // Eight rows at once are more streams than processors follow by themselves.
+    const auto bytes = elements * static_cast<ptrdiff_t>(sizeof(T));
+    for (int j = 0; j < kTapRows; ++j)
+        for (ptrdiff_t b = 0; b < bytes; b += 64) prefetchAhead(reinterpret_cast<const uint8_t*>(rows[j] + at) + b);
     ptrdiff_t done = 0;
     // Elements beyond the ones asked for, but inside the row, keep the vectors whole.
     for (; done < elements && at + done + 8 <= legalEnd; done += 8) turnIn(rows, at + done, 8, out + 8 * done);
@@ -90,6 +122,7 @@ QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t coun
     const __m256 first = _mm256_broadcast_ss(weights);
     for (int c = 0; c < channels; ++c) sum[c] = _mm256_mul_ps(first, _mm256_loadu_ps(column + 8 * c));
     const int32_t n = taps > 0 ? taps : count;
+#pragma GCC unroll 12
     for (int32_t k = 1; k < n; ++k) {
         const __m256 weight = _mm256_broadcast_ss(weights + k);
         column += 8 * channels;
@@ -113,59 +146,72 @@ auto chooseSum(int32_t taps) {
         case 2: return sumGroup<channels, 2>;
         case 4: return sumGroup<channels, 4>;
         case 6: return sumGroup<channels, 6>;
+        case 8: return sumGroup<channels, 8>;
+        case 10: return sumGroup<channels, 10>;
+        case 12: return sumGroup<channels, 12>;
         default: return sumGroup<channels, 0>;
     }
 }
 
-/// Rounds to nearest and saturates 32 sums.
+/// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; above, sums are
+/// cut where they saturate anyway.
+QORI_INLINE __m256i toIntegers(__m256 sum) { return _mm256_cvtps_epi32(_mm256_min_ps(sum, _mm256_set1_ps(0x1p30f))); }
+
+/// Rounds and saturates 32 sums.
 QORI_INLINE void storeSums(uint8_t* dst, const __m256 sum[4], ptrdiff_t n) {
     __m256i whole[4];
-    for (int j = 0; j < 4; ++j) {
-        const __m256 low = _mm256_max_ps(sum[j], _mm256_setzero_ps());   // not a number becomes 0
-        whole[j] = _mm256_cvtps_epi32(_mm256_min_ps(low, _mm256_set1_ps(255)));
-    }
+    for (int j = 0; j < 4; ++j) whole[j] = toIntegers(sum[j]);
     const __m256i packed = _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
     storeUpTo(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))}, n);
 }
 
-template <class T, int lowest, int highest, class Pack>
+template <class T, class Pack>
 QORI_INLINE void storeWords(T* dst, const __m256 sum[4], ptrdiff_t n, Pack pack) {
     __m256i whole[4];
-    for (int j = 0; j < 4; ++j) {
-        const __m256 low = _mm256_max_ps(sum[j], _mm256_set1_ps(lowest));
-        whole[j] = _mm256_cvtps_epi32(_mm256_min_ps(low, _mm256_set1_ps(highest)));
-    }
+    for (int j = 0; j < 4; ++j) whole[j] = toIntegers(sum[j]);
     storeUpTo(dst, Vec<T>{_mm256_permute4x64_epi64(pack(whole[0], whole[1]), 0xD8)}, n);
     storeUpTo(dst + 16, Vec<T>{_mm256_permute4x64_epi64(pack(whole[2], whole[3]), 0xD8)}, n - 16);
 }
 
 QORI_INLINE void storeSums(uint16_t* dst, const __m256 sum[4], ptrdiff_t n) {
-    storeWords<uint16_t, 0, 65535>(dst, sum, n, [](__m256i a, __m256i b) { return _mm256_packus_epi32(a, b); });
+    storeWords<uint16_t>(dst, sum, n, [](__m256i a, __m256i b) { return _mm256_packus_epi32(a, b); });
 }
 
 QORI_INLINE void storeSums(int16_t* dst, const __m256 sum[4], ptrdiff_t n) {
-    storeWords<int16_t, -32768, 32767>(dst, sum, n, [](__m256i a, __m256i b) { return _mm256_packs_epi32(a, b); });
+    storeWords<int16_t>(dst, sum, n, [](__m256i a, __m256i b) { return _mm256_packs_epi32(a, b); });
 }
 
 QORI_INLINE void storeSums(float* dst, const __m256 sum[4], ptrdiff_t n) {
     for (int j = 0; j < 4; ++j) storeUpTo(dst + 8 * j, Vec<float>{sum[j]}, n - 8 * j);
 }
 
+/// Sums kTapBlock elements. `taps` 0 is any number.
+template <class T, int taps, bool scaled>
+QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_t count, float scale, ptrdiff_t at, T* dst,
+                          ptrdiff_t elements) {
+    const int32_t n = taps > 0 ? taps : count;
+    __m256 sum[4];
+    const __m256 first = _mm256_broadcast_ss(weights);
+    for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(first, _mm256_loadu_ps(rows[0] + at + 8 * j));
+#pragma GCC unroll 12
+    for (int32_t k = 1; k < n; ++k) {
+        const __m256 weight = _mm256_broadcast_ss(weights + k);
+        for (int j = 0; j < 4; ++j) sum[j] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(rows[k] + at + 8 * j), sum[j]);
+    }
+    if constexpr (scaled)
+        for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
+    storeSums(dst + at, sum, elements);
+}
+
 template <class T, int taps, bool scaled>
 QORI_NOINLINE void sumColumn(const float* const* rows, const float* weights, int32_t count, float scale, T* dst, ptrdiff_t elements) {
-    const int32_t n = taps > 0 ? taps : count;
-    for (ptrdiff_t i = 0; i < elements; i += kTapBlock) {
-        __m256 sum[4];
-        const __m256 first = _mm256_broadcast_ss(weights);
-        for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(first, _mm256_loadu_ps(rows[0] + i + 8 * j));
-        for (int32_t k = 1; k < n; ++k) {
-            const __m256 weight = _mm256_broadcast_ss(weights + k);
-            for (int j = 0; j < 4; ++j) sum[j] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(rows[k] + i + 8 * j), sum[j]);
-        }
-        if constexpr (scaled)
-            for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
-        storeSums(dst + i, sum, elements - i);
+    ptrdiff_t i = 0;
+    for (; i + kTapBlock <= elements; i += kTapBlock) {
+        prefetchAhead(dst + i);
+        if constexpr (sizeof(T) == 4) prefetchAhead(dst + i + 16);
+        sumBlock<T, taps, scaled>(rows, weights, count, scale, i, dst, kTapBlock);
     }
+    if (i < elements) sumBlock<T, taps, scaled>(rows, weights, count, scale, i, dst, elements - i);
 }
 
 /// Source columns that a group may span before it is made smaller.
