@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "checks.h"
+#include "resize_half_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
 #include "rounding_scope.h"
@@ -77,20 +78,15 @@ QorResult resizeGetSize(QorImageSize src, QorImageSize dst, int32_t interpolatio
     return QOR_OK;
 }
 
-template <class Way>
-int64_t bufferBytes(const ResizePlan& plan, Tile tile) {
-    WorkBuffer buffer(nullptr);
-    const Way counted(plan, tile, buffer);
-    return buffer.bytes();
-}
-
-/// The way to resize T by a plan.
+/// Calls visit with the way to resize T by a plan.
 template <class T, int channels, class Visit>
 auto withWay(const ResizePlan& plan, Visit visit) {
     if constexpr (std::is_same_v<T, double>) {
         return visit.template operator()<DoubleLinearTile<channels>>();
     } else {
         if (plan.interpolation == interpNearest) return visit.template operator()<NearestTile<T, channels>>();
+        if constexpr (HalfTile<T, channels>::exists)
+            if (HalfTile<T, channels>::suits(plan)) return visit.template operator()<HalfTile<T, channels>>();
         if constexpr (std::is_same_v<T, uint8_t>)
             if (plan.interpolation == interpLinear && plan.antialiasing == 0) return visit.template operator()<FixedLinearTile<channels>>();
         return visit.template operator()<TapsTile<T, channels>>();
@@ -99,7 +95,11 @@ auto withWay(const ResizePlan& plan, Visit visit) {
 
 template <class T>
 int64_t bufferBytes(const ResizePlan& plan, Tile tile, int32_t channels) {
-    const auto count = [&]<class Way>() { return bufferBytes<Way>(plan, tile); };
+    const auto count = [&]<class Way>() {
+        WorkBuffer buffer(nullptr);
+        const Way counted(plan, tile, buffer);
+        return buffer.bytes();
+    };
     switch (channels) {
         case 1: return withWay<T, 1>(plan, count);
         case 3: return withWay<T, 3>(plan, count);
@@ -115,9 +115,7 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (numChannels != 1 && numChannels != 3 && numChannels != 4) return QOR_ERR_CHANNELS_UNSUPPORTED;
     if (QorResult r = sizeCheck(dst)) return r;
     const RoundNearestScope rounding;   // as in the operation
-    // The 16-bit forms report as 32f does.
-    using Element = std::conditional_t<sizeof(T) == 2, float, T>;
-    const int64_t bytes = bufferBytes<Element>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
+    const int64_t bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
     if (bytes >= kSizeLimit) return QOR_ERR_SIZE;
     *pBufSize = static_cast<int32_t>(bytes);
     return trimWarning(plan, dst);
@@ -242,53 +240,47 @@ OpenSides openSides(Border border) {
     return {open(borderReadTop), open(borderReadBottom), open(borderReadLeft), open(borderReadRight)};
 }
 
-template <class Way, class T>
+template <class T, int channels>
 QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open, const QorResizePlan* pPlan,
                   uint8_t* pBuffer) {
     const RoundNearestScope rounding;
     const ResizePlan& plan = *planOf(pPlan);
     WorkBuffer buffer(pBuffer);
-    Way(plan, trimmed(plan, offset.x, offset.y, size.width, size.height), buffer).run(src, dst, open);
+    const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);
+    withWay<T, channels>(plan, [&]<class Way>() { Way(plan, tile, buffer).run(src, dst, open); });
     return trimWarning(plan, size);
 }
 
-template <class Way, int32_t interpolation, class T>
+template <class T, int channels, int32_t interpolation>
 QorResult resizeInside(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan, uint8_t* pBuffer) {
     if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
     if (QorResult r = planCheck(*planOf(pPlan), interpolation, false)) return r;
-    return runTile<Way>(src, dst, offset, size, {}, pPlan, pBuffer);
+    return runTile<T, channels>(src, dst, offset, size, {}, pPlan, pBuffer);
 }
 
-/// Interpolation 0 stands for antialiasing.
-template <class Way, int32_t interpolation, class T>
+constexpr int32_t kAnyAntialiasing = 0;
+
+template <class T, int channels, int32_t interpolation>
 QorResult resizeBordered(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, Border border,
                          const QorResizePlan* pPlan, uint8_t* pBuffer) {
     if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
-    if (QorResult r = firstOf(planCheck(*planOf(pPlan), interpolation, interpolation == 0), borderCheck(border))) return r;
-    return runTile<Way>(src, dst, offset, size, openSides(border), pPlan, pBuffer);
+    constexpr bool antialiasing = interpolation == kAnyAntialiasing;
+    if (QorResult r = firstOf(planCheck(*planOf(pPlan), interpolation, antialiasing), borderCheck(border))) return r;
+    return runTile<T, channels>(src, dst, offset, size, openSides(border), pPlan, pBuffer);
 }
 
-template <class T, int channels, class... Arguments>
-QorResult resizeNearest(Arguments... arguments) { return resizeInside<NearestTile<T, channels>, interpNearest, T>(arguments...); }
-
-template <class T, int channels, class... Arguments>
-QorResult resizeSuper(Arguments... arguments) { return resizeInside<TapsTile<T, channels>, interpSuper, T>(arguments...); }
-
-template <class T, int channels, class... Arguments>
-QorResult resizeLinear(Arguments... arguments) {
-    if constexpr (std::is_same_v<T, uint8_t>) return resizeBordered<FixedLinearTile<channels>, interpLinear, T>(arguments...);
-    else if constexpr (std::is_same_v<T, double>) return resizeBordered<DoubleLinearTile<channels>, interpLinear, T>(arguments...);
-    else return resizeBordered<TapsTile<T, channels>, interpLinear, T>(arguments...);
-}
-
-template <class T, int channels, class... Arguments>
-QorResult resizeCubic(Arguments... arguments) { return resizeBordered<TapsTile<T, channels>, interpCubic, T>(arguments...); }
-
-template <class T, int channels, class... Arguments>
-QorResult resizeLanczos(Arguments... arguments) { return resizeBordered<TapsTile<T, channels>, interpLanczos, T>(arguments...); }
-
-template <class T, int channels, class... Arguments>
-QorResult resizeAntialiasing(Arguments... arguments) { return resizeBordered<TapsTile<T, channels>, 0, T>(arguments...); }
+template <class T, int channels>
+constexpr auto resizeNearest = resizeInside<T, channels, interpNearest>;
+template <class T, int channels>
+constexpr auto resizeSuper = resizeInside<T, channels, interpSuper>;
+template <class T, int channels>
+constexpr auto resizeLinear = resizeBordered<T, channels, interpLinear>;
+template <class T, int channels>
+constexpr auto resizeCubic = resizeBordered<T, channels, interpCubic>;
+template <class T, int channels>
+constexpr auto resizeLanczos = resizeBordered<T, channels, interpLanczos>;
+template <class T, int channels>
+constexpr auto resizeAntialiasing = resizeBordered<T, channels, kAnyAntialiasing>;
 
 }  // namespace
 }  // namespace qori::geometry

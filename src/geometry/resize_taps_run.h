@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Tiles of the weighted forms: linear in single precision, cubic, Lanczos, super and antialiasing.
 #pragma once
+#include "kernels/resize_lines.h"
 #include "resize_run.h"
 
 namespace qori::geometry {
@@ -38,13 +39,23 @@ class TapsTile {
 public:
     TapsTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer) : source_{plan, tile} {
         const double ratio = plan.horizontal.ratio();
-        stripPixels_ = stripOf(tile.width, plan.rowTaps);
+        byLines_ = kernels::suitsLines(ratio, plan.columnTaps, channels);
+        stripPixels_ = byLines_ ? lineStripOf(tile.width) : stripOf(tile.width, plan.rowTaps);
         ringRows_ = plan.rowTaps + kernels::kTapRows;
         ringStep_ = static_cast<ptrdiff_t>(roundUp(int64_t{stripPixels_} * channels, kernels::kTapBlock));
         pixels_ = buffer.take<kernels::PixelTaps>(tile.width);
         pairs_ = isLinear() ? buffer.take<float>(2 * int64_t{tile.width}) : nullptr;
-        columns_ = buffer.take<float>(kernels::tapColumnFloats(ratio, plan.columnTaps, channels));
-        results_ = buffer.take<float>(8 * kernels::kTapChunk * channels);
+        if (byLines_) {
+            line_ = buffer.take<float>(lineColumns(ratio) * channels + kernels::LineFilter::kOverrun + 8);
+            lines_.taps = plan.columnTaps;
+            lines_.channels = channels;
+            lines_.bases = buffer.take<int32_t>(ringStep_ / 8);
+            lines_.order = buffer.take<int32_t>(ringStep_);
+            lines_.weights = buffer.take<float>(ringStep_ * plan.columnTaps);
+        } else {
+            columns_ = buffer.take<float>(kernels::tapColumnFloats(ratio, plan.columnTaps, channels));
+            results_ = buffer.take<float>(8 * kernels::kTapChunk * channels);
+        }
         ring_ = buffer.take<float>(int64_t{ringRows_} * ringStep_);
         tapRows_ = buffer.take<const float*>(plan.rowTaps);
     }
@@ -69,6 +80,18 @@ private:
         return width < pixels ? width : pixels;
     }
 
+    /// Strips whose tables and filtered rows stay in the first-level cache.
+    static int32_t lineStripOf(int32_t width) {
+        constexpr int32_t kElements = 4096;
+        constexpr int32_t pixels = kElements / channels / kernels::kTapChunk * kernels::kTapChunk;
+        return width < pixels ? width : pixels;
+    }
+
+    /// Source columns that a strip reaches at most.
+    int64_t lineColumns(double ratio) const {
+        return static_cast<int64_t>((stripPixels_ - 1) * ratio) + 1 + source_.plan.columnTaps;
+    }
+
     void listPixels() {
         const ResizePlan& plan = source_.plan;
         const Axis& axis = plan.horizontal;
@@ -88,6 +111,7 @@ private:
         const kernels::RowFilter filter{pixels_ + x, isLinear() ? pairs_ : plan.table<float>(plan.horizontal.weightTable),
                                         plan.columnTaps, width, source_.columns.first, source_.columns.last,
                                         kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps), columns_, results_};
+        if (byLines_) listStrip(filter);
         RowSequence sequence(plan, tile, source_.rows);
         const float scale = plan.interpolation == interpSuper
             ? static_cast<float>(1 / (plan.horizontal.ratio() * plan.vertical.ratio())) : 1.0f;
@@ -119,8 +143,37 @@ private:
         return pair;
     }
 
+    /// The columns that a strip's taps reach, and how many of them lie outside the legal ones.
+    struct LineEnds {
+        int32_t first, left, right;   // from source column `first`, with so many repeated at the ends
+        ptrdiff_t elements;           // of legal columns
+        bool whole;                   // Rows of floats serve as lines: windows stay among the legal columns.
+    };
+
+    void listStrip(const kernels::RowFilter& filter) {
+        const int32_t first = filter.pixels[0].first, last = filter.pixels[filter.width - 1].first + filter.taps - 1;
+        const Range& legal = source_.columns;
+        const int32_t from = legal.clamp(first), to = legal.clamp(last);
+        ends_ = {from, from - first, last - to, ptrdiff_t{to - from + 1} * channels,
+                 from == first && ptrdiff_t{legal.last - to} * channels >= kernels::LineFilter::kOverrun};
+        kernels::listLine(lines_, filter.pixels, filter.width, filter.weights, first);
+    }
+
+    void filterNextLine(RowSequence& sequence, int32_t& filtered) {
+        const int32_t row = sequence.next();
+        const T* from = source_.at(row, ends_.first);
+        const float* line = line_;
+        if constexpr (std::is_same_v<T, float>) {
+            if (ends_.whole) line = from;
+        }
+        if (line == line_)
+            kernels::expandLine<T, channels>(from, ends_.elements, ends_.left, ends_.right, source_.at(row + 1, ends_.first), line_);
+        kernels::filterLine(lines_, line, ringRow(filtered++));
+    }
+
     /// Filters the next eight rows of the sequence; where there are fewer, the last is done again.
     void filterNext(const kernels::RowFilter& filter, RowSequence& sequence, int32_t& filtered, int32_t& newest) {
+        if (byLines_) return filterNextLine(sequence, filtered);
         const T* rows[kernels::kTapRows];
         float* out[kernels::kTapRows];
         int32_t last = newest;
@@ -142,8 +195,14 @@ private:
     ptrdiff_t ringStep_;
     kernels::PixelTaps* pixels_;
     float* pairs_;
-    float* columns_;
-    float* results_;
+    bool byLines_;
+    // By turning rows.
+    float* columns_ = nullptr;
+    float* results_ = nullptr;
+    // By lines.
+    float* line_ = nullptr;
+    kernels::LineFilter lines_{};
+    LineEnds ends_{};
     float* ring_;
     const float** tapRows_;
 };

@@ -1,30 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "resize_taps.h"
 
+#include "resize_floats.h"
+
 namespace qori::kernels {
 namespace {
-
-QORI_INLINE __m256 toFloats(const float* p, ptrdiff_t n) { return loadUpTo(p, n).v; }
-
-QORI_INLINE __m256 toFloats(const uint8_t* p, ptrdiff_t n) {
-    const __m128i bytes = n >= 8 ? _mm_loadl_epi64(reinterpret_cast<const __m128i*>(p)) : detail::loadBelow16(p, static_cast<int>(n));
-    return _mm256_cvtepi32_ps(_mm256_cvtepu8_epi32(bytes));
-}
-
-QORI_INLINE __m128i loadWords(const void* p, ptrdiff_t n) {
-    const auto* bytes = static_cast<const uint8_t*>(p);
-    return n >= 8 ? _mm_loadu_si128(reinterpret_cast<const __m128i*>(bytes)) : detail::loadBelow16(bytes, 2 * static_cast<int>(n));
-}
-
-QORI_INLINE __m256 toFloats(const uint16_t* p, ptrdiff_t n) { return _mm256_cvtepi32_ps(_mm256_cvtepu16_epi32(loadWords(p, n))); }
-QORI_INLINE __m256 toFloats(const int16_t* p, ptrdiff_t n) { return _mm256_cvtepi32_ps(_mm256_cvtepi16_epi32(loadWords(p, n))); }
-
-/// Asks for the cache line some way behind p; a hint that touches nothing.
-template <class T>
-QORI_INLINE void prefetchAhead(const T* p) {
-    constexpr uintptr_t kBytes = 512;
-    _mm_prefetch(reinterpret_cast<const char*>(reinterpret_cast<uintptr_t>(p) + kBytes), _MM_HINT_T0);
-}
 
 /// Within each half, rows become columns: v[j] holds element j of all four in its low half, element 4 + j in its high.
 QORI_INLINE void turnQuads(__m256 v[4]) {
