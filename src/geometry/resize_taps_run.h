@@ -39,7 +39,7 @@ class TapsTile {
 public:
     TapsTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer) : source_{plan, tile} {
         const double ratio = plan.horizontal.ratio();
-        byLines_ = kernels::suitsLines(ratio, plan.columnTaps, channels);
+        byLines_ = kernels::suitsLines(ratio);
         stripPixels_ = byLines_ ? lineStripOf(tile.width) : stripOf(tile.width, plan.rowTaps);
         ringRows_ = plan.rowTaps + kernels::kTapRows;
         ringStep_ = static_cast<ptrdiff_t>(roundUp(int64_t{stripPixels_} * channels, kernels::kTapBlock));

@@ -54,14 +54,6 @@ void repeatFloats(const float* pixel, float* out, int32_t count) {
 
 }  // namespace
 
-bool suitsLines(double ratio, int32_t taps, int channels) {
-    // Indices of pixels n apart differ by at most n * ratio rounded up. Eight results are 7 pixels apart with one channel,
-    // 3 with three (from the last channel of one to the first of another), 1 with four.
-    constexpr int kMostTaps = 6;
-    const double widest = channels == 1 ? 15.0 / 7 : channels == 3 ? 5.0 / 3 : 3.0;
-    return ratio <= 1 || (ratio <= widest && taps <= kMostTaps);
-}
-
 void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t origin) {
     const ptrdiff_t elements = ptrdiff_t{width} * filter.channels;
     filter.groups = (elements + 7) / 8;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Weighted sums along a row by permutation, for enlargements and mild reductions with few taps. The source row lies as a
+// Weighted sums along a row by permutation, for enlargements. The source row lies as a
 // line of floats; the taps of eight neighbouring results come from one window of eight floats, or two side by side, in
 // the same arrangement for every tap. The sums are those of resize_taps.h, bit for bit.
 #pragma once
@@ -7,8 +7,9 @@
 
 namespace qori::kernels {
 
-/// Whether eight neighbouring results always find their taps in two windows, and cheaper than by turning rows.
-bool suitsLines(double ratio, int32_t taps, int channels);
+/// Whether lines are the cheaper way. The taps of eight neighbouring results then lie in two windows: their indices differ
+/// by 7 at most, or with three channels by 3 pixels and with four by 1.
+constexpr bool suitsLines(double ratio) { return ratio <= 1; }
 
 struct LineFilter {
     static constexpr int kOverrun = 16;   ///< Floats behind a line's last that may be read.
