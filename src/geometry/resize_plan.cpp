@@ -131,6 +131,19 @@ void fillSuperAxis(const Builder& builder, const Axis& axis, int32_t taps) {
     }
 }
 
+/// The number of columns after which the stored weights repeat, where it is small enough to pay.
+int32_t periodOf(const ResizePlan& plan, int32_t floatsPerColumn) {
+    constexpr int32_t kMost = 8;
+    const Axis& axis = plan.horizontal;
+    const int32_t period = axis.targetReduced;
+    if (period > kMost) return 0;
+    const auto* weights = plan.table<float>(axis.weightTable);
+    const int64_t repeated = int64_t{period} * floatsPerColumn, all = int64_t{axis.targetLength} * floatsPerColumn;
+    for (int64_t i = repeated; i < all; ++i)
+        if (weights[i] != weights[i - repeated]) return 0;
+    return period;
+}
+
 }  // namespace
 
 int32_t ResizePlan::lastTap(const Axis& axis, int32_t position) const {
@@ -203,6 +216,7 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
             weights[i] = pairs ? w << 16 | (16384 - w) : w;
         });
     }
+    if (!fixedPoint) builder.plan->columnPeriod = periodOf(*builder.plan, 1);
 }
 
 void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
@@ -226,6 +240,7 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
             for (int32_t k = 0; k < 2 * half; ++k) *weights++ = static_cast<float>(normalises ? weight(k) / sum : weight(k));
         });
     }
+    plan.columnPeriod = periodOf(plan, plan.columnTaps);
 }
 
 void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
@@ -234,6 +249,7 @@ void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
     ResizePlan& plan = *builder.plan;
     plan.columnTaps = static_cast<int32_t>(superTaps(plan.horizontal));
     plan.rowTaps = static_cast<int32_t>(superTaps(plan.vertical));
+    plan.columnPeriod = plan.horizontal.targetReduced;
     fillSuperAxis(builder, plan.horizontal, plan.columnTaps);
     fillSuperAxis(builder, plan.vertical, plan.rowTaps);
 }

@@ -33,6 +33,7 @@ struct ResizePlan {
     QorBorderExtent border;
     Axis vertical, horizontal;
     int32_t columnTaps, rowTaps;     ///< Weights per position of the two directions.
+    int32_t columnPeriod;            ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
 
     template <class T>
     const T* table(int32_t offset) const {

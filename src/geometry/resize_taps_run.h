@@ -97,8 +97,9 @@ private:
         const Axis& axis = plan.horizontal;
         const auto* fractions = plan.table<float>(axis.weightTable);
         for (int32_t x = 0; x < source_.tile.width; ++x) {
-            const int32_t position = source_.tile.x + x;
-            pixels_[x] = {plan.firstTap(axis, position), isLinear() ? 2 * x : plan.weightSet(axis, position) * plan.columnTaps};
+            const int32_t position = source_.tile.x + x, period = plan.columnPeriod;
+            const int32_t set = isLinear() ? (period > 0 ? x % period : x) : period > 0 ? position % period : position;
+            pixels_[x] = {plan.firstTap(axis, position), set * plan.columnTaps};
             if (!isLinear()) continue;
             pairs_[2 * x] = 1 - fractions[position];
             pairs_[2 * x + 1] = fractions[position];
@@ -110,7 +111,7 @@ private:
         const Tile& tile = source_.tile;
         const kernels::RowFilter filter{pixels_ + x, isLinear() ? pairs_ : plan.table<float>(plan.horizontal.weightTable),
                                         plan.columnTaps, width, source_.columns.first, source_.columns.last,
-                                        kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps), columns_, results_};
+                                        kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps), plan.columnPeriod, columns_, results_};
         if (byLines_) listStrip(filter);
         RowSequence sequence(plan, tile, source_.rows);
         const float scale = plan.interpolation == interpSuper

@@ -111,8 +111,31 @@ QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t coun
     for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, sum[c]);
 }
 
+/// Pixels whose weights repeat, one phase after the other, so that the weights stay in registers.
+template <int channels, int taps>
+QORI_NOINLINE void sumPhases(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* results) {
+    const int32_t origin = pixels[0].first;
+    for (int32_t phase = 0; phase < filter.period; ++phase) {
+        const float* weights = filter.weights + pixels[phase].weights;
+        __m256 weight[taps];
+        for (int k = 0; k < taps; ++k) weight[k] = _mm256_broadcast_ss(weights + k);
+        for (int32_t i = phase; i < count; i += filter.period) {
+            const float* column = filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels);
+            for (int c = 0; c < channels; ++c, column += 8) {
+                __m256 sum = _mm256_mul_ps(weight[0], _mm256_loadu_ps(column));
+#pragma GCC unroll 12
+                for (int k = 1; k < taps; ++k)
+                    sum = _mm256_fmadd_ps(weight[k], _mm256_loadu_ps(column + 8 * channels * k), sum);
+                _mm256_storeu_ps(results + 8 * (ptrdiff_t{i} * channels + c), sum);
+            }
+        }
+    }
+}
+
 template <int channels, int taps>
 QORI_NOINLINE void sumGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
+    if constexpr (taps > 0)
+        if (filter.period > 0 && 2 * filter.period <= count) return sumPhases<channels, taps>(filter, pixels, count, out);
     const int32_t origin = pixels[0].first;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
         sumTaps<channels, taps>(filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels),

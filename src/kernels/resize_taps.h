@@ -27,6 +27,7 @@ struct RowFilter {
     int32_t width;            ///< Destination pixels.
     int32_t legalFirst, legalLast;   ///< Source columns that may be read.
     int32_t group;            ///< Destination pixels, at most kTapChunk, whose columns are turned together.
+    int32_t period;           ///< Pixels after which the weights repeat, or 0.
     float* columns;           ///< Room for the turned columns of a group: tapColumnFloats().
     float* results;           ///< kTapChunk pixels of eight rows.
 };
