@@ -125,11 +125,18 @@ private:
             lastNeeded = last;
             while (filtered < needed) filterNext(filter, sequence, filtered, newest);
             const int32_t place = needed - (last - first + 1);
-            for (int32_t k = 0; k < plan.rowTaps; ++k)
-                tapRows_[k] = ringRow(place + source_.rows.clamp(tap + k) - first);
+            listTapRows(tap, first, place % ringRows_);
             float pair[2];
             kernels::filterColumn<T>(tapRows_, rowWeights(tile.y + y, pair), plan.rowTaps, scale,
                                      advance(dst.row(y), ptrdiff_t{x} * channels * elementBytes<T>), ptrdiff_t{width} * channels);
+        }
+    }
+
+    /// Points the taps of a destination row at the ring's rows, of which source row `first` lies in `place`.
+    void listTapRows(int32_t tap, int32_t first, int32_t place) const {
+        for (int32_t k = 0; k < source_.plan.rowTaps; ++k) {
+            const int32_t at = place + source_.rows.clamp(tap + k) - first;   // less than twice around
+            tapRows_[k] = ring_ + (at < ringRows_ ? at : at - ringRows_) * ringStep_;
         }
     }
 
