@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Resize of whole images; plans and buffers are made outside the timing. A peer resizes the planes of a packed image one
-// by one and always widens its filter on reductions, so it stands beside the antialiasing forms there.
+// Resize of whole images; plans and buffers are made outside the timing. A peer resizes the planes of a packed image
+// one by one and always widens its filter on reductions, so it stands beside the antialiasing forms there.
 #include "bench.h"
 
 #ifdef QORI_BENCH_ZIMG
@@ -17,26 +17,28 @@ constexpr Sizes kDown{{1920, 1080}, {1280, 720}}, kHalf{{3840, 2160}, {1920, 108
 
 using Block = std::shared_ptr<uint8_t>;
 
-Block allocate(size_t bytes) { return {static_cast<uint8_t*>(std::aligned_alloc(64, (bytes + 63) / 64 * 64)), std::free}; }
+Block allocate(size_t bytes) {
+    return {static_cast<uint8_t*>(std::aligned_alloc(64, (bytes + 63) / 64 * 64)), std::free};
+}
 
 /// The exports of one element type and layout.
 template <class T, int channels>
 struct Exports;
-#define QORI_EXPORTS(T, t, n)                                               \
-    template <>                                                             \
-    struct Exports<T, n> {                                                  \
-        static constexpr auto getSize = qoriResizeGetSize_##t;              \
-        static constexpr auto getBufferSize = qoriResizeGetBufferSize_##t;  \
-        static constexpr auto nearestInit = qoriResizeNearestInit_##t;      \
-        static constexpr auto linearInit = qoriResizeLinearInit_##t;        \
-        static constexpr auto cubicInit = qoriResizeCubicInit_##t;          \
-        static constexpr auto lanczosInit = qoriResizeLanczosInit_##t;      \
-        static constexpr auto superInit = qoriResizeSuperInit_##t;          \
-        static constexpr auto nearest = qoriResizeNearest_##t##_C##n##R;    \
-        static constexpr auto linear = qoriResizeLinear_##t##_C##n##R;      \
-        static constexpr auto cubic = qoriResizeCubic_##t##_C##n##R;        \
-        static constexpr auto lanczos = qoriResizeLanczos_##t##_C##n##R;    \
-        static constexpr auto super = qoriResizeSuper_##t##_C##n##R;        \
+#define QORI_EXPORTS(T, t, n)                                                 \
+    template <>                                                               \
+    struct Exports<T, n> {                                                    \
+        static constexpr auto getSize = qoriResizeGetSize_##t;                \
+        static constexpr auto getBufferSize = qoriResizeGetBufferSize_##t;    \
+        static constexpr auto nearestInit = qoriResizeNearestInit_##t;        \
+        static constexpr auto linearInit = qoriResizeLinearInit_##t;          \
+        static constexpr auto cubicInit = qoriResizeCubicInit_##t;            \
+        static constexpr auto lanczosInit = qoriResizeLanczosInit_##t;        \
+        static constexpr auto superInit = qoriResizeSuperInit_##t;            \
+        static constexpr auto nearest = qoriResizeNearest_##t##_C##n##R;      \
+        static constexpr auto linear = qoriResizeLinear_##t##_C##n##R;        \
+        static constexpr auto cubic = qoriResizeCubic_##t##_C##n##R;          \
+        static constexpr auto lanczos = qoriResizeLanczos_##t##_C##n##R;      \
+        static constexpr auto super = qoriResizeSuper_##t##_C##n##R;          \
         static constexpr auto widened = qoriResizeAntialiasing_##t##_C##n##R; \
     };
 QORI_EXPORTS(uint8_t, 8u, 1)
@@ -60,22 +62,31 @@ std::function<void()> oursOf(QorInterpolationKind kind, bool antialiasing, Image
         case interpNearest: E::nearestInit(from, to, plan); break;
         case interpSuper: E::superInit(from, to, plan); break;
         case interpLinear:
-            if (antialiasing) qoriResizeAntialiasingLinearInit(from, to, plan, scratch);
-            else E::linearInit(from, to, plan);
+            if (antialiasing)
+                qoriResizeAntialiasingLinearInit(from, to, plan, scratch);
+            else
+                E::linearInit(from, to, plan);
             break;
         case interpCubic:
-            if (antialiasing) qoriResizeAntialiasingCubicInit(from, to, 0, 0.5f, plan, scratch);
-            else E::cubicInit(from, to, 0, 0.5f, plan, scratch);
+            if (antialiasing)
+                qoriResizeAntialiasingCubicInit(from, to, 0, 0.5f, plan, scratch);
+            else
+                E::cubicInit(from, to, 0, 0.5f, plan, scratch);
             break;
         case interpLanczos:
-            if (antialiasing) qoriResizeAntialiasingLanczosInit(from, to, kLobes, plan, scratch);
-            else E::lanczosInit(from, to, kLobes, plan, scratch);
+            if (antialiasing)
+                qoriResizeAntialiasingLanczosInit(from, to, kLobes, plan, scratch);
+            else
+                E::lanczosInit(from, to, kLobes, plan, scratch);
             break;
     }
     E::getBufferSize(plan, to, channels, &bufferBytes);
     const Block buffer = allocate(static_cast<size_t>(bufferBytes));
     const auto inside = [=](auto function) -> std::function<void()> {
-        return [=] { function(src.data(), src.step(), dst.data(), dst.step(), {0, 0}, to, reinterpret_cast<QorResizePlan*>(memory.get()), buffer.get()); };
+        return [=] {
+            function(src.data(), src.step(), dst.data(), dst.step(), {0, 0}, to,
+                     reinterpret_cast<QorResizePlan*>(memory.get()), buffer.get());
+        };
     };
     const auto bordered = [=](auto function) -> std::function<void()> {
         return [=] {
@@ -116,7 +127,8 @@ std::function<void()> peerOf(QorInterpolationKind kind, int planes, Sizes sizes)
     params.filter_param_a = kind == interpCubic ? 0 : kLobes;
     params.filter_param_b = 0.5;
     const zimg_image_format from = format(sizes.src), to = format(sizes.dst);
-    const std::shared_ptr<zimg_filter_graph> graph(zimg_filter_graph_build(&from, &to, &params), zimg_filter_graph_free);
+    const std::shared_ptr<zimg_filter_graph> graph(zimg_filter_graph_build(&from, &to, &params),
+                                                   zimg_filter_graph_free);
     size_t bytes = 0;
     zimg_filter_graph_get_tmp_size(graph.get(), &bytes);
     const Block buffer = allocate(bytes);
@@ -144,20 +156,26 @@ const char* nameOf(QorInterpolationKind kind) {
 }
 
 template <class T>
-constexpr const char* kTypeName = sizeof(T) == 1 ? "8u" : sizeof(T) == 2 ? "16u" : "32f";
+constexpr const char* kTypeName = sizeof(T) == 1   ? "8u"
+                                  : sizeof(T) == 2 ? "16u"
+                                                   : "32f";
 
 template <class T, int channels>
 Row row(QorInterpolationKind kind, bool antialiasing, Sizes sizes, double best) {
     const double ratio = static_cast<double>(sizes.src.pixels()) / static_cast<double>(sizes.dst.pixels());
     const auto make = [=](Size) {
-        Contenders all{oursOf<T, channels>(kind, antialiasing, Image<T>(sizes.src, channels), Image<T>(sizes.dst, channels), sizes), {}, {}};
+        Contenders all{oursOf<T, channels>(kind, antialiasing, Image<T>(sizes.src, channels),
+                                           Image<T>(sizes.dst, channels), sizes),
+                       {},
+                       {}};
 #ifdef QORI_BENCH_ZIMG
         if (kind != interpSuper && (antialiasing || ratio < 1)) all.peer = peerOf<T>(kind, channels, sizes);
 #endif
         return all;
     };
-    return {.operation = std::string("resize ") + (antialiasing ? "antialias " : "") + nameOf(kind) + " " + kTypeName<T> + " C" +
-                         std::to_string(channels) + " from " + std::to_string(sizes.src.width) + "x" + std::to_string(sizes.src.height),
+    return {.operation = std::string("resize ") + (antialiasing ? "antialias " : "") + nameOf(kind) + " " +
+                         kTypeName<T> + " C" + std::to_string(channels) + " from " + std::to_string(sizes.src.width) +
+                         "x" + std::to_string(sizes.src.height),
             .bytesPerPixel = channels * sizeof(T) * (1 + ratio),
             .sizes = {sizes.dst},
             .make = make,

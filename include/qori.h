@@ -228,6 +228,304 @@ typedef struct QorLibraryVersion {
     const char* buildDateText; /**< Build date as "Mmm dd yyyy". */
 } QorLibraryVersion;
 
+/* ---- Convert -------------------------------------------------------------------------------------------------- */
+
+/** Converts to a wider type, exactly.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_C3R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_C4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_C3R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_C4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u16s_AC4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_C1R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_C3R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_C4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32s_AC4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_C1R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_C3R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_C4R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32s_AC4R(const int8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_C1R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_C3R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_C4R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32s_AC4R(const int16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_C3R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_C4R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_AC4R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s16s_C1R(const int8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32u_C1R(const uint16_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts to a wider type, exactly; steps are not checked.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_16u32s_C1R(const uint16_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts integers to float: exactly from 8 and 16 bits, to the nearest float from 32.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriConvert_8u32f_C3R(src, srcStep, dst, dstStep, (QorImageSize){640, 480});
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_C1R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_C3R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_C4R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_C4R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32f_AC4R(const int16_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s32f_C1R(const int32_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32u32f_C1R(const uint32_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Converts signed to unsigned: negative values become 0, others stay.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8s16u_C1Rs(const int8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_8s32u_C1Rs(const int8_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s32u_C1Rs(const int16_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s32u_C1Rs(const int32_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts signed to unsigned: negative values become 0, others stay; steps are not checked.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8s8u_C1Rs(const int8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s16u_C1Rs(const int16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Converts to a narrower integer type, saturating to its range.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_C3R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_C4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16u8u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_C1R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_C3R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_C4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_16s8u_AC4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_C1R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_C3R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_C4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8u_AC4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_C1R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_C3R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_C4R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriConvert_32s8s_AC4R(const int32_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Converts integers: dst = saturate(round(src * 2^-scaleFactor)), rounding the magnitude.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels. roundMode is a QorRoundingMode; values
+ *            other than 0 and 1 mean roundHalfAway. scaleFactor is any integer.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Notes     Rounding works on the magnitude and restores the sign, so that it is symmetric about zero.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_8u8s_C1RSfs(const uint8_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_16u8s_C1RSfs(const uint16_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_16s8s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_16u16s_C1RSfs(const uint16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32s16s_C1RSfs(const int32_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32s16u_C1RSfs(const int32_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u8u_C1RSfs(const uint32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u8s_C1RSfs(const uint32_t* pSrc, int32_t srcStep, int8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u16u_C1RSfs(const uint32_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u16s_C1RSfs(const uint32_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32u32s_C1RSfs(const uint32_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+
+/** Converts float to integer: rounded by roundMode, saturated.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels. roundMode is a QorRoundingMode; values other than 0
+ *            and 1 mean roundHalfAway.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Notes     A NaN gives the destination type's minimum: 0, -128 or -32768.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   qoriConvert_32f8u_C1R(src, srcStep, dst, dstStep, roi, roundNearestEven);   // 2.5 becomes 2, 3.5 becomes 4
+ */
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C3R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_AC4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C1R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C3R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C4R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_AC4R(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C1R(const float* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C3R(const float* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C4R(const float* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_AC4R(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C1R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C3R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C4R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_AC4R(const float* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode);
+
+/** Converts float to integer: dst = saturate(round(src * 2^-scaleFactor)); the product is exact.
+ *  Units     Steps in bytes, any value, not checked; roiSize in pixels. roundMode is a QorRoundingMode; values
+ *            other than 0 and 1 mean roundHalfAway. scaleFactor is any integer.
+ *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
+ *            they must not overlap.
+ *  Notes     A NaN gives the destination type's minimum; for 32u it gives 4294967295. 32u with scaleFactor
+ *            below -159: every positive value gives 4294967295, however small, and everything else, NaN too,
+ *            gives 0. The in-place form reads the elements as float and leaves 32-bit unsigned integers.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_32f8u_C1RSfs(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f8s_C1RSfs(const float* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f16u_C1RSfs(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f16s_C1RSfs(const float* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f32s_C1RSfs(const float* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1RSfs(const float* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1IRSfs(uint32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t roundMode, int32_t scaleFactor);
+
+/** Unpacks bits into bytes: a set bit gives 255, a clear one 0.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels. Pixel 0 of a row is the bit at srcBitOffset,
+ *            counted from the most significant bit of the row's first byte; 8 and more step into later bytes.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_SIZE (srcBitOffset negative); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriConvert_1u8u_C1R(const uint8_t* pSrc, int32_t srcStep, int32_t srcBitOffset,
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize);
+
 /* ---- Copy ----------------------------------------------------------------------------------------------------- */
 
 /** Copies a region pixel by pixel.
@@ -1110,6 +1408,111 @@ QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C3R(const float* pSrc, i
 QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
     const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/* ---- Scale ---------------------------------------------------------------------------------------------------- */
+
+/** Maps 0..255 linearly onto the whole range of the destination type.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  16u: x * 257; 16s: x * 257 - 32768; 32s: x * 16843009 - 2147483648.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16u_C3R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16u_C4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_C3R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_C4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u16s_AC4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_C1R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_C3R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_C4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriScale_8u32s_AC4R(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Maps 0..255 linearly onto vMin..vMax: dst = vMin + x * k, k = (vMax - vMin) / 255, in 32-bit float.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_SCALE_RANGE (vMax - vMin at or below 0), QOR_ERR_NULL_PTR (a pointer
+ *            is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step below 1); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+
+/** Maps vMin..vMax linearly onto 0..255: dst = saturate(round(x * k - vMin * k)), k = 255 / (vMax - vMin).
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  One fused multiply-add in 32-bit float, then round to nearest, ties to even. A NaN gives 0.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_SCALE_RANGE (vMax - vMin at or below 0), QOR_ERR_NULL_PTR (a pointer
+ *            is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step below 1); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_32f8u_C3R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_32f8u_C4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+QORI_API QorResult QORI_CALL qoriScale_32f8u_AC4R(const float* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, float vMin, float vMax);
+
+/** Maps the whole range of the source type linearly onto 0..255.
+ *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  hintAccurate: round to nearest, ties to even, of x * c for 16u and (x + 32768) * c for 16s, c the
+ *            32-bit float nearest to 255/65535; for 32s of x * (255/4294967295) + 127.5000000296859 in 64-bit
+ *            float. Any other hint: shifts and adds, within 1 of that.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriScale_16u8u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16u8u_C3R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16u8u_C4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16u8u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_C1R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_C3R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_C4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_16s8u_AC4R(const int16_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_C1R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_C3R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_C4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriScale_32s8u_AC4R(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t hint);
 
 /* ---- Set ------------------------------------------------------------------------------------------------------ */
 

@@ -51,7 +51,8 @@ double interpolate(const std::array<double, size>& table, double at) {
 
 /// The kernel with 2 or 3 lobes at 0 <= t < lobes, linear between samples 1/200 or 1/100 apart.
 inline double lanczos(int32_t lobes, double t) {
-    return lobes == 2 ? detail::interpolate(detail::kLanczos2, t * 200) : detail::interpolate(detail::kLanczos3, t * 100);
+    return lobes == 2 ? detail::interpolate(detail::kLanczos2, t * 200)
+                      : detail::interpolate(detail::kLanczos3, t * 100);
 }
 
 }  // namespace qori::geometry

@@ -14,7 +14,9 @@ const ResizePlan* planOf(const QorResizePlan* block) { return reinterpret_cast<c
 
 QorResult tagCheck(const ResizePlan* plan) { return plan->tag == ResizePlan::kTag ? QOR_OK : QOR_ERR_CONTEXT; }
 
-QorResult emptyCheck(QorImageSize size) { return size.width == 0 || size.height == 0 ? QOR_WARN_NOTHING_TO_DO : QOR_OK; }
+QorResult emptyCheck(QorImageSize size) {
+    return size.width == 0 || size.height == 0 ? QOR_WARN_NOTHING_TO_DO : QOR_OK;
+}
 
 /// Null pointers, then lengths of 0, then negative ones.
 template <class... Pointers>
@@ -32,8 +34,11 @@ QorResult reductionCheck(QorImageSize src, QorImageSize dst) {
 
 QorResult kindCheck(int32_t interpolation, bool antialiasing) {
     switch (interpolation) {
-        case interpNearest: case interpSuper: return antialiasing ? QOR_ERR_UNSUPPORTED_MODE : QOR_OK;
-        case interpLinear: case interpCubic: case interpLanczos: return QOR_OK;
+        case interpNearest:
+        case interpSuper: return antialiasing ? QOR_ERR_UNSUPPORTED_MODE : QOR_OK;
+        case interpLinear:
+        case interpCubic:
+        case interpLanczos: return QOR_OK;
         case 0: return QOR_ERR_UNSUPPORTED_MODE;
         default: return QOR_ERR_INTERPOLATION;
     }
@@ -42,7 +47,8 @@ QorResult kindCheck(int32_t interpolation, bool antialiasing) {
 QorResult kindSizeCheck(QorImageSize src, QorImageSize dst, int32_t interpolation) {
     switch (interpolation) {
         case interpLinear: return sourceCheck(src, 2);
-        case interpCubic: case interpLanczos: return sourceCheck(src, 4);
+        case interpCubic:
+        case interpLanczos: return sourceCheck(src, 4);
         case interpSuper: return reductionCheck(src, dst);
         default: return QOR_OK;
     }
@@ -66,8 +72,8 @@ Tile trimmed(const ResizePlan& plan, int32_t x, int32_t y, int32_t width, int32_
 
 // --- queries --------------------------------------------------------------------------------------------------------
 
-QorResult resizeGetSize(QorImageSize src, QorImageSize dst, int32_t interpolation, int32_t antialiasing, int32_t* pPlanSize,
-                        int32_t* pInitBufSize) {
+QorResult resizeGetSize(QorImageSize src, QorImageSize dst, int32_t interpolation, int32_t antialiasing,
+                        int32_t* pPlanSize, int32_t* pInitBufSize) {
     if (QorResult r = initCheck(src, dst, pPlanSize, pInitBufSize)) return r;
     if (QorResult r = kindCheck(interpolation, antialiasing != 0)) return r;
     if (QorResult r = kindSizeCheck(src, dst, interpolation)) return r;
@@ -88,7 +94,8 @@ auto withWay(const ResizePlan& plan, Visit visit) {
         if constexpr (HalfTile<T, channels>::exists)
             if (HalfTile<T, channels>::suits(plan)) return visit.template operator()<HalfTile<T, channels>>();
         if constexpr (std::is_same_v<T, uint8_t>)
-            if (plan.interpolation == interpLinear && plan.antialiasing == 0) return visit.template operator()<FixedLinearTile<channels>>();
+            if (plan.interpolation == interpLinear && plan.antialiasing == 0)
+                return visit.template operator()<FixedLinearTile<channels>>();
         return visit.template operator()<TapsTile<T, channels>>();
     }
 }
@@ -114,7 +121,7 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (QorResult r = tagCheck(&plan)) return r;
     if (numChannels != 1 && numChannels != 3 && numChannels != 4) return QOR_ERR_CHANNELS_UNSUPPORTED;
     if (QorResult r = sizeCheck(dst)) return r;
-    const RoundNearestScope rounding;   // as in the operation
+    const RoundNearestScope rounding;  // as in the operation
     const int64_t bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
     if (bytes >= kSizeLimit) return QOR_ERR_SIZE;
     *pBufSize = static_cast<int32_t>(bytes);
@@ -137,8 +144,10 @@ QorResult resizeGetSrcOffset(const QorResizePlan* pPlan, QorPoint2D dstOffset, Q
     return QOR_OK;
 }
 
-QorResult resizeGetSrcRoi(const QorResizePlan* pPlan, QorImageRect dst, QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect) {
-    if (QorResult r = firstOf(nullCheck(pPlan, pSrcRect, pTrimmedDstRect), sizeCheck({dst.width, dst.height}))) return r;
+QorResult resizeGetSrcRoi(const QorResizePlan* pPlan, QorImageRect dst, QorImageRect* pSrcRect,
+                          QorImageRect* pTrimmedDstRect) {
+    if (QorResult r = firstOf(nullCheck(pPlan, pSrcRect, pTrimmedDstRect), sizeCheck({dst.width, dst.height})))
+        return r;
     const ResizePlan& plan = *planOf(pPlan);
     if (QorResult r = tagCheck(&plan)) return r;
     if (QorResult r = offsetCheck(plan, dst.x, dst.y)) return r;
@@ -165,13 +174,15 @@ QorResult resizeLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pP
     return QOR_OK;
 }
 
-QorResult initCubic(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan, uint8_t* pInitBuf, bool antialiasing) {
+QorResult initCubic(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan, uint8_t* pInitBuf,
+                    bool antialiasing) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 4))) return r;
     fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::cubic, 2, b, c}, antialiasing);
     return QOR_OK;
 }
 
-QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan, uint8_t* pInitBuf, bool antialiasing) {
+QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan, uint8_t* pInitBuf,
+                      bool antialiasing) {
     if (QorResult r = initCheck(src, dst, pPlan, pInitBuf)) return r;
     if (lobes != 2 && lobes != 3) return QOR_ERR_UNSUPPORTED_MODE;
     const auto support = static_cast<int32_t>(lobes);
@@ -180,11 +191,13 @@ QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorRes
     return QOR_OK;
 }
 
-QorResult resizeCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan, uint8_t* pInitBuf) {
+QorResult resizeCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
+                          uint8_t* pInitBuf) {
     return initCubic(src, dst, b, c, pPlan, pInitBuf, false);
 }
 
-QorResult resizeLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan, uint8_t* pInitBuf) {
+QorResult resizeLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan,
+                            uint8_t* pInitBuf) {
     return initLanczos(src, dst, lobes, pPlan, pInitBuf, false);
 }
 
@@ -200,18 +213,21 @@ QorResult resizeAntialiasingLinearInit(QorImageSize src, QorImageSize dst, QorRe
     return QOR_OK;
 }
 
-QorResult resizeAntialiasingCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan, uint8_t* pInitBuf) {
+QorResult resizeAntialiasingCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
+                                      uint8_t* pInitBuf) {
     return initCubic(src, dst, b, c, pPlan, pInitBuf, true);
 }
 
-QorResult resizeAntialiasingLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan, uint8_t* pInitBuf) {
+QorResult resizeAntialiasingLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan,
+                                        uint8_t* pInitBuf) {
     return initLanczos(src, dst, lobes, pPlan, pInitBuf, true);
 }
 
 // --- operations -----------------------------------------------------------------------------------------------------
 
 template <class T>
-QorResult tileCheck(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan, uint8_t* pBuffer) {
+QorResult tileCheck(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan,
+                    uint8_t* pBuffer) {
     if (QorResult r = firstOf(nullCheck(src, dst, pPlan, pBuffer), emptyCheck(size))) return r;
     return firstOf(tagCheck(planOf(pPlan)), sizeCheck(size), offsetCheck(*planOf(pPlan), offset.x, offset.y));
 }
@@ -241,8 +257,8 @@ OpenSides openSides(Border border) {
 }
 
 template <class T, int channels>
-QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open, const QorResizePlan* pPlan,
-                  uint8_t* pBuffer) {
+QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open,
+                  const QorResizePlan* pPlan, uint8_t* pBuffer) {
     const RoundNearestScope rounding;
     const ResizePlan& plan = *planOf(pPlan);
     WorkBuffer buffer(pBuffer);
@@ -252,7 +268,8 @@ QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageS
 }
 
 template <class T, int channels, int32_t interpolation>
-QorResult resizeInside(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan, uint8_t* pBuffer) {
+QorResult resizeInside(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size,
+                       const QorResizePlan* pPlan, uint8_t* pBuffer) {
     if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
     if (QorResult r = planCheck(*planOf(pPlan), interpolation, false)) return r;
     return runTile<T, channels>(src, dst, offset, size, {}, pPlan, pBuffer);

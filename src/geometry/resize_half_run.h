@@ -28,7 +28,8 @@ public:
             const T* upper = source_.at(2 * (tile.y + y), 2 * tile.x);
             const T* lower = source_.at(2 * (tile.y + y) + 1, 2 * tile.x);
             if constexpr (std::is_same_v<T, float>)
-                kernels::halveRow32f(upper, lower, dst.row(y), tile.width, isSuper ? 1.0f : 0.5f, isSuper ? 0.25f : 1.0f);
+                kernels::halveRow32f(upper, lower, dst.row(y), tile.width, isSuper ? 1.0f : 0.5f,
+                                     isSuper ? 0.25f : 1.0f);
             else
                 kernels::halveRow8u<channels>(upper, lower, dst.row(y), tile.width, isSuper);
         }

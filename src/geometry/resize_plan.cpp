@@ -88,7 +88,9 @@ struct Builder {
     }
 
     template <class T>
-    T* table(int32_t offset) const { return reinterpret_cast<T*>(reinterpret_cast<uint8_t*>(plan) + offset); }
+    T* table(int32_t offset) const {
+        return reinterpret_cast<T*>(reinterpret_cast<uint8_t*>(plan) + offset);
+    }
 
     void setReach(int32_t halfWidth, int32_t halfHeight) const {
         plan->halfWidth = halfWidth;
@@ -119,7 +121,8 @@ void fillSuperAxis(const Builder& builder, const Axis& axis, int32_t taps) {
     constexpr double kNothing = 1e-7;
     const int64_t source = axis.sourceReduced, target = axis.targetReduced;
     for (int64_t i = 0; i < target; ++i) {
-        // In units of 1 / target source pixels, so that nothing is lost: the footprint is [i * source, (i + 1) * source).
+        // In units of 1 / target source pixels, so that nothing is lost: the footprint is [i * source, (i + 1) *
+        // source).
         const int64_t begin = i * source, end = begin + source, first = begin / target;
         indices[i] = static_cast<int32_t>(first);
         for (int32_t k = 0; k < taps; ++k) {
@@ -165,7 +168,7 @@ PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation,
     const auto place = [&](int64_t bytes) {
         const int64_t start = at;
         at += bytes;
-        return static_cast<int32_t>(start);   // wraps only where planBytes is refused
+        return static_cast<int32_t>(start);  // wraps only where planBytes is refused
     };
     layout.verticalIndices = place(rows.indices);
     layout.horizontalIndices = place(columns.indices);
@@ -206,7 +209,8 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
     for (Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
         if (!fixedPoint) {
             auto* fractions = builder.table<float>(axis->weightTable);
-            builder.forPositions(*axis, [=](int32_t i, double fraction) { fractions[i] = static_cast<float>(fraction); });
+            builder.forPositions(*axis,
+                                 [=](int32_t i, double fraction) { fractions[i] = static_cast<float>(fraction); });
             continue;
         }
         auto* weights = builder.table<int32_t>(axis->weightTable);
@@ -221,7 +225,7 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
 
 void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
     const RoundNearestScope rounding;
-    const int32_t interpolation = filter.shape == Filter::Shape::linear   ? interpLinear
+    const int32_t interpolation = filter.shape == Filter::Shape::linear  ? interpLinear
                                   : filter.shape == Filter::Shape::cubic ? interpCubic
                                                                          : interpLanczos;
     const Builder builder(block, src, dst, interpolation, antialiasing);
@@ -237,7 +241,8 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
             const auto weight = [&](int32_t k) { return filter(scale * (k - (half - 1) - fraction)); };
             double sum = 0;
             for (int32_t k = 0; k < 2 * half; ++k) sum += weight(k);
-            for (int32_t k = 0; k < 2 * half; ++k) *weights++ = static_cast<float>(normalises ? weight(k) / sum : weight(k));
+            for (int32_t k = 0; k < 2 * half; ++k)
+                *weights++ = static_cast<float>(normalises ? weight(k) / sum : weight(k));
         });
     }
     plan.columnPeriod = periodOf(plan, plan.columnTaps);

@@ -17,9 +17,9 @@ constexpr int64_t roundUp(int64_t n, int64_t multiple) { return (n + multiple - 
 /// One direction. A position is a pixel of the destination, an index one of the source.
 struct Axis {
     int32_t sourceLength, targetLength;
-    int32_t sourceReduced, targetReduced;   ///< The lengths divided by their greatest common divisor.
-    int32_t indexTable, weightTable;        ///< Bytes from the start of the record.
-    int32_t leading, trailing;              ///< Positions whose filter begins before, or ends behind, the source.
+    int32_t sourceReduced, targetReduced;  ///< The lengths divided by their greatest common divisor.
+    int32_t indexTable, weightTable;       ///< Bytes from the start of the record.
+    int32_t leading, trailing;             ///< Positions whose filter begins before, or ends behind, the source.
 
     double ratio() const { return static_cast<double>(sourceReduced) / targetReduced; }
 };
@@ -28,12 +28,12 @@ struct ResizePlan {
     static constexpr uint32_t kTag = 0x4B617389;
     uint32_t tag;
     int32_t interpolation;
-    int32_t halfWidth, halfHeight;   ///< Half of the filter's taps; 0 for nearest and super.
+    int32_t halfWidth, halfHeight;  ///< Half of the filter's taps; 0 for nearest and super.
     int32_t antialiasing;
     QorBorderExtent border;
     Axis vertical, horizontal;
-    int32_t columnTaps, rowTaps;     ///< Weights per position of the two directions.
-    int32_t columnPeriod;            ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
+    int32_t columnTaps, rowTaps;  ///< Weights per position of the two directions.
+    int32_t columnPeriod;         ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
 
     template <class T>
     const T* table(int32_t offset) const {
@@ -74,7 +74,7 @@ PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation,
 /// Which filter a plan weighs its taps with.
 struct Filter {
     enum class Shape { linear, cubic, lanczos } shape;
-    int32_t support;   ///< Source pixels that the filter reaches to either side.
+    int32_t support;  ///< Source pixels that the filter reaches to either side.
     double b = 0, c = 0;
 
     double operator()(double distance) const;

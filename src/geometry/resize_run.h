@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
-// Resizing one tile. Each way of doing it is a class that takes its memory from a work buffer in its constructor, so that
-// the query for the buffer's size and the operation cannot disagree, and then runs.
+// Resizing one tile. Each way of doing it is a class that takes its memory from a work buffer in its constructor, so
+// that the query for the buffer's size and the operation cannot disagree, and then runs.
 #pragma once
-#include "resize_plan.h"
 #include "kernels/resize_gather.h"
 #include "kernels/resize_taps.h"
+#include "resize_plan.h"
 
 namespace qori::geometry {
 
@@ -48,7 +48,8 @@ struct OpenSides {
 
 /// Indices that `count` positions are made of, within the source except on open sides. Every other index is as good as
 /// the nearest of these.
-inline Range tapRange(const ResizePlan& plan, const Axis& axis, int32_t position, int32_t count, bool openLow, bool openHigh) {
+inline Range tapRange(const ResizePlan& plan, const Axis& axis, int32_t position, int32_t count, bool openLow,
+                      bool openHigh) {
     Range range{plan.firstTap(axis, position), plan.lastTap(axis, position + count - 1)};
     if (!openLow && range.first < 0) range.first = 0;
     if (!openHigh && range.last >= axis.sourceLength) range.last = axis.sourceLength - 1;
@@ -61,7 +62,7 @@ struct TileSource {
     const ResizePlan& plan;
     Tile tile;
     Range columns{}, rows{};
-    Image<const T> image{};   ///< At pixel (0, 0) of the whole source.
+    Image<const T> image{};  ///< At pixel (0, 0) of the whole source.
 
     void open(Image<const T> src, OpenSides open) {
         columns = tapRange(plan, plan.horizontal, tile.x, tile.width, open.left, open.right);
@@ -103,7 +104,9 @@ template <class T, int channels>
 class NearestTile {
 public:
     NearestTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
-        : source_{plan, tile}, rows_(buffer), rowBytes_(ptrdiff_t{tile.width} * kPixel),
+        : source_{plan, tile},
+          rows_(buffer),
+          rowBytes_(ptrdiff_t{tile.width} * kPixel),
           tables_(buffer.take<uint8_t>(2 * groups() * kernels::Gather::kLaneBytes)) {}
 
     void run(Image<const T> src, Image<T> dst, OpenSides) {
@@ -116,8 +119,10 @@ public:
         for (int32_t y = 0; y < tile.height; ++y) {
             const int32_t index = source_.plan.index(axis, tile.y + y);
             uint8_t* to = asBytes(dst.row(y));
-            if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1)) repeatRow(to, asBytes(dst.row(y - 1)));
-            else kernels::gatherRow(gather, rows_.row(index), to, rowBytes_, elementBytes<T>);
+            if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1))
+                repeatRow(to, asBytes(dst.row(y - 1)));
+            else
+                kernels::gatherRow(gather, rows_.row(index), to, rowBytes_, elementBytes<T>);
         }
     }
 
@@ -127,7 +132,8 @@ private:
     ptrdiff_t groups() const { return (rowBytes_ + 31) / 32; }
 
     void repeatRow(uint8_t* to, const uint8_t* from) const {
-        for (ptrdiff_t i = 0; i < rowBytes_; i += 32) storeUpTo(to + i, loadUpTo(from + i, rowBytes_ - i), rowBytes_ - i);
+        for (ptrdiff_t i = 0; i < rowBytes_; i += 32)
+            storeUpTo(to + i, loadUpTo(from + i, rowBytes_ - i), rowBytes_ - i);
     }
 
     kernels::Gather buildTables() const {
@@ -192,8 +198,12 @@ template <int channels>
 class FixedLinearTile {
 public:
     FixedLinearTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
-        : source_{plan, tile}, rows_(buffer), elements_(ptrdiff_t{tile.width} * channels), padded_(roundUp(elements_, 32)),
-          tables_(buffer.take<uint8_t>(padded_ / 8 * kernels::Gather::kLaneBytes)), weights_(buffer.take<int16_t>(padded_)),
+        : source_{plan, tile},
+          rows_(buffer),
+          elements_(ptrdiff_t{tile.width} * channels),
+          padded_(roundUp(elements_, 32)),
+          tables_(buffer.take<uint8_t>(padded_ / 8 * kernels::Gather::kLaneBytes)),
+          weights_(buffer.take<int16_t>(padded_)),
           pair_(buffer, padded_) {}
 
     void run(Image<const uint8_t> src, Image<uint8_t> dst, OpenSides open) {
@@ -251,7 +261,8 @@ template <int channels>
 class DoubleLinearTile {
 public:
     DoubleLinearTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
-        : source_{plan, tile}, fractions_(buffer.take<double>(tile.width)),
+        : source_{plan, tile},
+          fractions_(buffer.take<double>(tile.width)),
           pair_(buffer, roundUp(int64_t{tile.width} * channels, 4)) {}
 
     void run(Image<const double> src, Image<double> dst, OpenSides open) {
@@ -277,7 +288,8 @@ private:
         const auto* from = asBytes(source_.at(row, 0));
         for (int32_t x = 0; x < source_.tile.width; ++x) {
             const int32_t index = source_.plan.index(source_.plan.horizontal, source_.tile.x + x);
-            const ptrdiff_t a = ptrdiff_t{legal.clamp(index)} * channels, b = ptrdiff_t{legal.clamp(index + 1)} * channels;
+            const ptrdiff_t a = ptrdiff_t{legal.clamp(index)} * channels,
+                            b = ptrdiff_t{legal.clamp(index + 1)} * channels;
             for (int c = 0; c < channels; ++c, ++out) {
                 double p[2];
                 __builtin_memcpy(&p[0], from + 8 * (a + c), 8);

@@ -6,7 +6,8 @@
 
 namespace qori::geometry {
 
-/// The source rows that a tile is made of, each once, in ascending order. Destination row y is made of consecutive ones.
+/// The source rows that a tile is made of, each once, in ascending order. Destination row y is made of consecutive
+/// ones.
 class RowSequence {
 public:
     RowSequence(const ResizePlan& plan, Tile tile, Range legal) : plan_(plan), tile_(tile), legal_(legal) { enter(0); }
@@ -75,7 +76,8 @@ private:
     /// Pixels per strip, such that the filtered rows of a strip stay in the second-level cache.
     static int32_t stripOf(int32_t width, int32_t rowTaps) {
         constexpr int32_t kRingFloats = 24576;
-        const int32_t fits = kRingFloats / (rowTaps + kernels::kTapRows) / channels / kernels::kTapChunk * kernels::kTapChunk;
+        const int32_t fits =
+            kRingFloats / (rowTaps + kernels::kTapRows) / channels / kernels::kTapChunk * kernels::kTapChunk;
         const int32_t pixels = fits > kernels::kTapChunk ? fits : kernels::kTapChunk;
         return width < pixels ? width : pixels;
     }
@@ -109,14 +111,22 @@ private:
     void runStrip(Image<T> dst, int32_t x, int32_t width) {
         const ResizePlan& plan = source_.plan;
         const Tile& tile = source_.tile;
-        const kernels::RowFilter filter{pixels_ + x, isLinear() ? pairs_ : plan.table<float>(plan.horizontal.weightTable),
-                                        plan.columnTaps, width, source_.columns.first, source_.columns.last,
-                                        kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps), plan.columnPeriod, columns_, results_};
+        const kernels::RowFilter filter{pixels_ + x,
+                                        isLinear() ? pairs_ : plan.table<float>(plan.horizontal.weightTable),
+                                        plan.columnTaps,
+                                        width,
+                                        source_.columns.first,
+                                        source_.columns.last,
+                                        kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps),
+                                        plan.columnPeriod,
+                                        columns_,
+                                        results_};
         if (byLines_) listStrip(filter);
         RowSequence sequence(plan, tile, source_.rows);
         const float scale = plan.interpolation == interpSuper
-            ? static_cast<float>(1 / (plan.horizontal.ratio() * plan.vertical.ratio())) : 1.0f;
-        int32_t filtered = 0, newest = INT32_MIN, needed = 0;   // rows in the ring, counted from the tile's first
+                                ? static_cast<float>(1 / (plan.horizontal.ratio() * plan.vertical.ratio()))
+                                : 1.0f;
+        int32_t filtered = 0, newest = INT32_MIN, needed = 0;  // rows in the ring, counted from the tile's first
         int32_t lastNeeded = 0;
         for (int32_t y = 0; y < tile.height; ++y) {
             const int32_t tap = plan.firstTap(plan.vertical, tile.y + y);
@@ -128,14 +138,15 @@ private:
             listTapRows(tap, first, place % ringRows_);
             float pair[2];
             kernels::filterColumn<T>(tapRows_, rowWeights(tile.y + y, pair), plan.rowTaps, scale,
-                                     advance(dst.row(y), ptrdiff_t{x} * channels * elementBytes<T>), ptrdiff_t{width} * channels);
+                                     advance(dst.row(y), ptrdiff_t{x} * channels * elementBytes<T>),
+                                     ptrdiff_t{width} * channels);
         }
     }
 
     /// Points the taps of a destination row at the ring's rows, of which source row `first` lies in `place`.
     void listTapRows(int32_t tap, int32_t first, int32_t place) const {
         for (int32_t k = 0; k < source_.plan.rowTaps; ++k) {
-            const int32_t at = place + source_.rows.clamp(tap + k) - first;   // less than twice around
+            const int32_t at = place + source_.rows.clamp(tap + k) - first;  // less than twice around
             tapRows_[k] = ring_ + (at < ringRows_ ? at : at - ringRows_) * ringStep_;
         }
     }
@@ -153,9 +164,9 @@ private:
 
     /// The columns that a strip's taps reach, and how many of them lie outside the legal ones.
     struct LineEnds {
-        int32_t first, left, right;   // from source column `first`, with so many repeated at the ends
-        ptrdiff_t elements;           // of legal columns
-        bool whole;                   // Rows of floats serve as lines: windows stay among the legal columns.
+        int32_t first, left, right;  // from source column `first`, with so many repeated at the ends
+        ptrdiff_t elements;          // of legal columns
+        bool whole;                  // Rows of floats serve as lines: windows stay among the legal columns.
     };
 
     void listStrip(const kernels::RowFilter& filter) {
@@ -175,7 +186,8 @@ private:
             if (ends_.whole) line = from;
         }
         if (line == line_)
-            kernels::expandLine<T, channels>(from, ends_.elements, ends_.left, ends_.right, source_.at(row + 1, ends_.first), line_);
+            kernels::expandLine<T, channels>(from, ends_.elements, ends_.left, ends_.right,
+                                             source_.at(row + 1, ends_.first), line_);
         kernels::filterLine(lines_, line, ringRow(filtered++));
     }
 

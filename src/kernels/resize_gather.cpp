@@ -43,7 +43,8 @@ QORI_NOINLINE void gatherRowOf(const Gather& gather, const uint8_t* row, uint8_t
 
 template <class T>
 void moveElements(const int32_t* offsets, const uint8_t* row, uint8_t* dst, ptrdiff_t bytes) {
-    for (ptrdiff_t i = 0; i < bytes; i += static_cast<ptrdiff_t>(sizeof(T))) __builtin_memcpy(dst + i, row + offsets[i], sizeof(T));
+    for (ptrdiff_t i = 0; i < bytes; i += static_cast<ptrdiff_t>(sizeof(T)))
+        __builtin_memcpy(dst + i, row + offsets[i], sizeof(T));
 }
 
 /// With a = 64 (p0 - p1), the product a * -2w is 128 w (p1 - p0), below 2^29, and the rounding high multiply gives
@@ -127,8 +128,8 @@ void linearRow8u(const Gather& gather, const uint8_t* row, const int16_t* weight
 }
 
 void linearColumn8u(const int16_t* h0, const int16_t* h1, int32_t w, uint8_t* dst, ptrdiff_t elements) {
-    // (h0 * 2^14 + (h1 - h0) w + 2^19) >> 20 is (h0 + ((h1 - h0) 4w >> 16) + 32) >> 6: the parts dropped early are below
-    // the last bit that counts. 4w must be a signed factor, so from 2^15 on the sum starts at h1 with 4w - 2^16.
+    // (h0 * 2^14 + (h1 - h0) w + 2^19) >> 20 is (h0 + ((h1 - h0) 4w >> 16) + 32) >> 6: the parts dropped early are
+    // below the last bit that counts. 4w must be a signed factor, so from 2^15 on the sum starts at h1 with 4w - 2^16.
     const bool nearFirst = w < 8192;
     const int16_t* origin = nearFirst ? h0 : h1;
     const __m256i factor = _mm256_set1_epi16(static_cast<int16_t>(nearFirst ? 4 * w : 4 * w - 65536));

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Gathering bytes of a row by table. A lane is 16 bytes of the result; each comes from anywhere in the row, but
-// neighbours come from near each other, so a lane is one to four loads of 16 bytes (windows), each shuffled, joined by or.
-// A lane whose bytes lie further apart makes the whole row fall back to moving elements one by one.
+// neighbours come from near each other, so a lane is one to four loads of 16 bytes (windows), each shuffled, joined by
+// or. A lane whose bytes lie further apart makes the whole row fall back to moving elements one by one.
 #pragma once
 #include "simd.h"
 
@@ -12,11 +12,11 @@ struct Gather {
     /// Bytes of tables per lane, offsets included.
     static constexpr int kLaneBytes = kLane * 4 + kMostWindows * (kLane + 4);
 
-    int32_t windows = 0;             ///< Per lane; 0 to move elements one by one.
-    ptrdiff_t groups = 0;            ///< Pairs of lanes.
-    const int32_t* offsets = nullptr;   ///< Byte of the row for each byte of the result.
-    const int32_t* bases = nullptr;     ///< Per group and window: starts of both lanes' loads.
-    const uint8_t* masks = nullptr;     ///< Per group and window: 32 shuffle indices, negative for another window's bytes.
+    int32_t windows = 0;               ///< Per lane; 0 to move elements one by one.
+    ptrdiff_t groups = 0;              ///< Pairs of lanes.
+    const int32_t* offsets = nullptr;  ///< Byte of the row for each byte of the result.
+    const int32_t* bases = nullptr;    ///< Per group and window: starts of both lanes' loads.
+    const uint8_t* masks = nullptr;  ///< Per group and window: 32 shuffle indices, negative for another window's bytes.
 };
 
 /// Builds the tables for `groups` pairs of lanes whose 32 offsets each are already stored at the start of `memory`, for
@@ -39,12 +39,12 @@ QORI_INLINE Bytes gatherGroup(const uint8_t* row, const int32_t*& base, const ui
 /// dst[i] = row[offset of i] for `bytes` bytes, moved in elements of `elementBytes`.
 void gatherRow(const Gather& gather, const uint8_t* row, uint8_t* dst, ptrdiff_t bytes, int elementBytes);
 
-/// The fixed-point horizontal pass of linear 8u. A group is 16 pairs of neighbours (p0, p1); `weights` holds -2w per pair,
-/// w in 0..16384. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.
+/// The fixed-point horizontal pass of linear 8u. A group is 16 pairs of neighbours (p0, p1); `weights` holds -2w per
+/// pair, w in 0..16384. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.
 void linearRow8u(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out);
 
-/// The vertical pass: dst = (h0 * (16384 - w) + h1 * w + 0x80000) >> 20. Rows are in the order of linearOrder() and hold
-/// whole blocks of 32 elements.
+/// The vertical pass: dst = (h0 * (16384 - w) + h1 * w + 0x80000) >> 20. Rows are in the order of linearOrder() and
+/// hold whole blocks of 32 elements.
 void linearColumn8u(const int16_t* h0, const int16_t* h1, int32_t w, uint8_t* dst, ptrdiff_t elements);
 
 /// Place of element i in a row of linearRow8u: within each 32 the second and third eight change places, so that packing

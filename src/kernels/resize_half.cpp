@@ -40,7 +40,8 @@ QORI_INLINE __m256i halve(const uint8_t* a, const uint8_t* b, int first) {
 /// 4 strides of both rows become 2 strides of results.
 template <int channels, bool toEven>
 QORI_INLINE void halveBlock(const uint8_t* a, const uint8_t* b, uint8_t* dst) {
-    const Bytes packed{_mm256_packus_epi16(halve<channels, toEven>(a, b, 0), halve<channels, toEven>(a, b, kStride<channels>))};
+    const Bytes packed{
+        _mm256_packus_epi16(halve<channels, toEven>(a, b, 0), halve<channels, toEven>(a, b, kStride<channels>))};
     if constexpr (channels == 3) {
         const __m128i close = _mm_setr_epi8(0, 1, 2, 3, 4, 5, 8, 9, 10, 11, 12, 13, -1, -1, -1, -1);
         storeHalves(dst, dst + 12, shuffleHalves(packed, {_mm256_broadcastsi128_si256(close)}));
@@ -52,7 +53,8 @@ QORI_INLINE void halveBlock(const uint8_t* a, const uint8_t* b, uint8_t* dst) {
 template <int channels, bool toEven>
 QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, uint8_t* dst, ptrdiff_t bytes) {
     constexpr int kResult = 2 * kStride<channels>;
-    constexpr int kExcess = 16 - kStride<channels>;   // bytes beyond the block that are read and, for three channels, written
+    constexpr int kExcess =
+        16 - kStride<channels>;  // bytes beyond the block that are read and, for three channels, written
     ptrdiff_t i = 0;
     for (; i + kResult + kExcess <= bytes; i += kResult) {
         prefetchAhead(a + 2 * i);
@@ -84,7 +86,9 @@ template void halveRow8u<4>(const uint8_t*, const uint8_t*, uint8_t*, ptrdiff_t,
 
 void halveRow32f(const float* a, const float* b, float* dst, ptrdiff_t pixels, float weight, float scale) {
     const __m256 weights = _mm256_set1_ps(weight), scales = _mm256_set1_ps(scale);
-    const auto mix = [=](__m256 first, __m256 second) { return _mm256_fmadd_ps(weights, second, _mm256_mul_ps(weights, first)); };
+    const auto mix = [=](__m256 first, __m256 second) {
+        return _mm256_fmadd_ps(weights, second, _mm256_mul_ps(weights, first));
+    };
     const auto across = [=](const float* row, ptrdiff_t n) {
         const __m256 low = toFloats(row, 2 * n), high = toFloats(row + 8, 2 * n - 8);
         return mix(_mm256_shuffle_ps(low, high, 0x88), _mm256_shuffle_ps(low, high, 0xDD));

@@ -6,7 +6,7 @@
 namespace qori::kernels {
 namespace {
 
-constexpr int32_t kSecond = INT32_MIN;   // the sign bit selects the second window; permutation looks at three bits only
+constexpr int32_t kSecond = INT32_MIN;  // the sign bit selects the second window; permutation looks at three bits only
 
 template <bool twoWindows, int taps>
 QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, float* out) {
@@ -87,7 +87,8 @@ template <class T, int channels>
 void expandLine(const T* row, ptrdiff_t elements, int32_t left, int32_t right, const T* nextRow, float* line) {
     float* const inside = line + ptrdiff_t{left} * channels;
     constexpr ptrdiff_t kPerLine = 64 / static_cast<ptrdiff_t>(sizeof(T));
-    for (ptrdiff_t i = 0; i < elements; i += kPerLine) _mm_prefetch(reinterpret_cast<const char*>(nextRow + i), _MM_HINT_T0);
+    for (ptrdiff_t i = 0; i < elements; i += kPerLine)
+        _mm_prefetch(reinterpret_cast<const char*>(nextRow + i), _MM_HINT_T0);
     ptrdiff_t i = 0;
     for (; i + 8 <= elements; i += 8) _mm256_storeu_ps(inside + i, toFloats(row + i, 8));
     if (i < elements) _mm256_storeu_ps(inside + i, toFloats(row + i, elements - i));
@@ -95,9 +96,9 @@ void expandLine(const T* row, ptrdiff_t elements, int32_t left, int32_t right, c
     repeatFloats<channels>(inside + elements - channels, inside + elements, right);
 }
 
-#define QORI_LINES(T)                                                                            \
-    template void expandLine<T, 1>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*);     \
-    template void expandLine<T, 3>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*);     \
+#define QORI_LINES(T)                                                                        \
+    template void expandLine<T, 1>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*); \
+    template void expandLine<T, 3>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*); \
     template void expandLine<T, 4>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*);
 QORI_LINES(uint8_t)
 QORI_LINES(uint16_t)

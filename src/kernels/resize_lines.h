@@ -7,19 +7,19 @@
 
 namespace qori::kernels {
 
-/// Whether lines are the cheaper way. The taps of eight neighbouring results then lie in two windows: their indices differ
-/// by 7 at most, or with three channels by 3 pixels and with four by 1.
+/// Whether lines are the cheaper way. The taps of eight neighbouring results then lie in two windows: their indices
+/// differ by 7 at most, or with three channels by 3 pixels and with four by 1.
 constexpr bool suitsLines(double ratio) { return ratio <= 1; }
 
 struct LineFilter {
-    static constexpr int kOverrun = 16;   ///< Floats behind a line's last that may be read.
+    static constexpr int kOverrun = 16;  ///< Floats behind a line's last that may be read.
 
     int32_t taps = 0, channels = 0;
-    ptrdiff_t groups = 0;        ///< Of eight results.
+    ptrdiff_t groups = 0;  ///< Of eight results.
     bool twoWindows = false;
-    int32_t* bases = nullptr;    ///< Per group: where the window of the first tap begins.
-    int32_t* order = nullptr;    ///< Per result: place in the window; negative with the low bits' place in the second.
-    float* weights = nullptr;    ///< Per group and tap: eight weights.
+    int32_t* bases = nullptr;  ///< Per group: where the window of the first tap begins.
+    int32_t* order = nullptr;  ///< Per result: place in the window; negative with the low bits' place in the second.
+    float* weights = nullptr;  ///< Per group and tap: eight weights.
 };
 
 /// Fills the filter's tables for `width` pixels; the line begins at source column `origin`. Results behind the last

@@ -63,8 +63,9 @@ QORI_INLINE void turnOut(const float* in, float* const out[kTapRows], ptrdiff_t 
 }
 
 template <class T>
-QORI_NOINLINE void turnRows(const T* const from[kTapRows], ptrdiff_t at, ptrdiff_t elements, ptrdiff_t legalEnd, float* out) {
-    const T* rows[kTapRows];   // not reloaded after every store
+QORI_NOINLINE void turnRows(const T* const from[kTapRows], ptrdiff_t at, ptrdiff_t elements, ptrdiff_t legalEnd,
+                            float* out) {
+    const T* rows[kTapRows];  // not reloaded after every store
     for (int j = 0; j < kTapRows; ++j) rows[j] = from[j];
     // Eight rows at once are more streams than processors follow by themselves.
     const auto bytes = elements * static_cast<ptrdiff_t>(sizeof(T));
@@ -90,7 +91,8 @@ void turnColumns(const RowFilter& filter, const T* const rows[kTapRows], int32_t
     const int32_t to = last > filter.legalLast ? filter.legalLast : last;
     constexpr ptrdiff_t pixel = 8 * channels;
     float* const inside = filter.columns + (from - first) * pixel;
-    turnRows(rows, ptrdiff_t{from} * channels, ptrdiff_t{to - from + 1} * channels, (ptrdiff_t{filter.legalLast} + 1) * channels, inside);
+    turnRows(rows, ptrdiff_t{from} * channels, ptrdiff_t{to - from + 1} * channels,
+             (ptrdiff_t{filter.legalLast} + 1) * channels, inside);
     repeatPixel<channels>(inside, filter.columns, from - first);
     repeatPixel<channels>(inside + (to - from) * pixel, inside + (to - from + 1) * pixel, last - to);
 }
@@ -135,7 +137,8 @@ QORI_NOINLINE void sumPhases(const RowFilter& filter, const PixelTaps* pixels, i
 template <int channels, int taps>
 QORI_NOINLINE void sumGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
     if constexpr (taps > 0)
-        if (filter.period > 0 && 2 * filter.period <= count) return sumPhases<channels, taps>(filter, pixels, count, out);
+        if (filter.period > 0 && 2 * filter.period <= count)
+            return sumPhases<channels, taps>(filter, pixels, count, out);
     const int32_t origin = pixels[0].first;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
         sumTaps<channels, taps>(filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels),
@@ -156,15 +159,16 @@ auto chooseSum(int32_t taps) {
     }
 }
 
-/// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; above, sums are
-/// cut where they saturate anyway.
+/// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; above, sums
+/// are cut where they saturate anyway.
 QORI_INLINE __m256i toIntegers(__m256 sum) { return _mm256_cvtps_epi32(_mm256_min_ps(sum, _mm256_set1_ps(0x1p30f))); }
 
 /// Rounds and saturates 32 sums.
 QORI_INLINE void storeSums(uint8_t* dst, const __m256 sum[4], ptrdiff_t n) {
     __m256i whole[4];
     for (int j = 0; j < 4; ++j) whole[j] = toIntegers(sum[j]);
-    const __m256i packed = _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
+    const __m256i packed =
+        _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
     storeUpTo(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))}, n);
 }
 
@@ -190,8 +194,8 @@ QORI_INLINE void storeSums(float* dst, const __m256 sum[4], ptrdiff_t n) {
 
 /// Sums kTapBlock elements. `taps` 0 is any number.
 template <class T, int taps, bool scaled>
-QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_t count, float scale, ptrdiff_t at, T* dst,
-                          ptrdiff_t elements) {
+QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_t count, float scale, ptrdiff_t at,
+                          T* dst, ptrdiff_t elements) {
     const int32_t n = taps > 0 ? taps : count;
     __m256 sum[4];
     const __m256 first = _mm256_broadcast_ss(weights);
@@ -207,7 +211,8 @@ QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_
 }
 
 template <class T, int taps, bool scaled>
-QORI_NOINLINE void sumColumn(const float* const* rows, const float* weights, int32_t count, float scale, T* dst, ptrdiff_t elements) {
+QORI_NOINLINE void sumColumn(const float* const* rows, const float* weights, int32_t count, float scale, T* dst,
+                             ptrdiff_t elements) {
     ptrdiff_t i = 0;
     for (; i + kTapBlock <= elements; i += kTapBlock) {
         prefetchAhead(dst + i);
@@ -251,7 +256,8 @@ void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* c
 }
 
 template <class T>
-void filterColumn(const float* const* rows, const float* weights, int32_t taps, float scale, T* dst, ptrdiff_t elements) {
+void filterColumn(const float* const* rows, const float* weights, int32_t taps, float scale, T* dst,
+                  ptrdiff_t elements) {
     if (scale != 1) return sumColumn<T, 0, true>(rows, weights, taps, scale, dst, elements);
     switch (taps) {
         case 2: return sumColumn<T, 2, false>(rows, weights, taps, scale, dst, elements);
@@ -261,10 +267,10 @@ void filterColumn(const float* const* rows, const float* weights, int32_t taps, 
     }
 }
 
-#define QORI_TAPS(T)                                                                                            \
-    template void filterRows<T, 1>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]);         \
-    template void filterRows<T, 3>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]);         \
-    template void filterRows<T, 4>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]);         \
+#define QORI_TAPS(T)                                                                                    \
+    template void filterRows<T, 1>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
+    template void filterRows<T, 3>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
+    template void filterRows<T, 4>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
     template void filterColumn<T>(const float* const*, const float*, int32_t, float, T*, ptrdiff_t);
 QORI_TAPS(uint8_t)
 QORI_TAPS(uint16_t)

@@ -14,22 +14,22 @@ using reference::Method;
 template <class T>
 struct Exports;
 
-#define QORI_QUERIES(t)                                                          \
-    static constexpr const char* suffix = #t;                                    \
-    static constexpr auto getSize = qoriResizeGetSize_##t;                       \
-    static constexpr auto getBufferSize = qoriResizeGetBufferSize_##t;           \
-    static constexpr auto getBorderSize = qoriResizeGetBorderSize_##t;           \
-    static constexpr auto getSrcOffset = qoriResizeGetSrcOffset_##t;             \
-    static constexpr auto getSrcRoi = qoriResizeGetSrcRoi_##t;                   \
+#define QORI_QUERIES(t)                                                \
+    static constexpr const char* suffix = #t;                          \
+    static constexpr auto getSize = qoriResizeGetSize_##t;             \
+    static constexpr auto getBufferSize = qoriResizeGetBufferSize_##t; \
+    static constexpr auto getBorderSize = qoriResizeGetBorderSize_##t; \
+    static constexpr auto getSrcOffset = qoriResizeGetSrcOffset_##t;   \
+    static constexpr auto getSrcRoi = qoriResizeGetSrcRoi_##t;         \
     static constexpr auto linearInit = qoriResizeLinearInit_##t;
-#define QORI_EXPORTS(T, t)                                                       \
-    template <>                                                                  \
-    struct Exports<T> {                                                          \
-        QORI_QUERIES(t)                                                          \
-        static constexpr auto nearestInit = qoriResizeNearestInit_##t;           \
-        static constexpr auto cubicInit = qoriResizeCubicInit_##t;               \
-        static constexpr auto lanczosInit = qoriResizeLanczosInit_##t;           \
-        static constexpr auto superInit = qoriResizeSuperInit_##t;               \
+#define QORI_EXPORTS(T, t)                                             \
+    template <>                                                        \
+    struct Exports<T> {                                                \
+        QORI_QUERIES(t)                                                \
+        static constexpr auto nearestInit = qoriResizeNearestInit_##t; \
+        static constexpr auto cubicInit = qoriResizeCubicInit_##t;     \
+        static constexpr auto lanczosInit = qoriResizeLanczosInit_##t; \
+        static constexpr auto superInit = qoriResizeSuperInit_##t;     \
     };
 QORI_EXPORTS(uint8_t, 8u)
 QORI_EXPORTS(uint16_t, 16u)
@@ -45,7 +45,9 @@ struct Exports<double> {
 enum Slot { kSrc, kDst, kPlan, kInit, kBuffer, kTileSrc, kPlanCopy };
 
 /// A block of bytes that ends at a guard page, at whatever alignment that gives.
-inline TestImage block(Slot slot, int bytes, int shift = 0) { return {slot, {.width = bytes, .height = 1, .shift = shift}, 1}; }
+inline TestImage block(Slot slot, int bytes, int shift = 0) {
+    return {slot, {.width = bytes, .height = 1, .shift = shift}, 1};
+}
 
 template <class T>
 QorResult initPlan(const Method& m, QorImageSize src, QorImageSize dst, QorResizePlan* plan, uint8_t* init) {
@@ -53,7 +55,8 @@ QorResult initPlan(const Method& m, QorImageSize src, QorImageSize dst, QorResiz
     const auto lobes = static_cast<uint32_t>(m.lobes);
     if (m.antialiasing) {
         if (m.interpolation == interpLinear) return call(qoriResizeAntialiasingLinearInit, src, dst, plan, init);
-        if (m.interpolation == interpCubic) return call(qoriResizeAntialiasingCubicInit, src, dst, m.b, m.c, plan, init);
+        if (m.interpolation == interpCubic)
+            return call(qoriResizeAntialiasingCubicInit, src, dst, m.b, m.c, plan, init);
         return call(qoriResizeAntialiasingLanczosInit, src, dst, lobes, plan, init);
     }
     if (m.interpolation == interpLinear) return call(E::linearInit, src, dst, plan);
@@ -70,7 +73,8 @@ QorResult initPlan(const Method& m, QorImageSize src, QorImageSize dst, QorResiz
 template <class T>
 QorResizePlan* makePlan(const Method& m, QorImageSize src, QorImageSize dst) {
     int32_t planBytes = -1, initBytes = -1;
-    EXPECT_EQ(QOR_OK, call(Exports<T>::getSize, src, dst, m.interpolation, int32_t{m.antialiasing}, &planBytes, &initBytes));
+    EXPECT_EQ(QOR_OK,
+              call(Exports<T>::getSize, src, dst, m.interpolation, int32_t{m.antialiasing}, &planBytes, &initBytes));
     const int shift = random().below(64);
     TestImage plan = block(kPlan, planBytes, shift), init = block(kInit, initBytes, random().below(2) * 3);
     const Snapshot around = plan.snapshot(), initAround = init.snapshot();
@@ -87,12 +91,14 @@ QorResizePlan* makePlan(const Method& m, QorImageSize src, QorImageSize dst) {
 
 /// Any operation of the family with one argument list.
 template <class T, class Function>
-QorResult operate(Function function, const T* src, int32_t srcStep, T* dst, int32_t dstStep, QorPoint2D offset, QorImageSize size,
-                  int32_t border, const QorResizePlan* plan, uint8_t* buffer) {
-    if constexpr (std::is_invocable_v<Function, const T*, int32_t, T*, int32_t, QorPoint2D, QorImageSize, const QorResizePlan*, uint8_t*>)
+QorResult operate(Function function, const T* src, int32_t srcStep, T* dst, int32_t dstStep, QorPoint2D offset,
+                  QorImageSize size, int32_t border, const QorResizePlan* plan, uint8_t* buffer) {
+    if constexpr (std::is_invocable_v<Function, const T*, int32_t, T*, int32_t, QorPoint2D, QorImageSize,
+                                      const QorResizePlan*, uint8_t*>)
         return call(function, src, srcStep, dst, dstStep, offset, size, plan, buffer);
     else
-        return call(function, src, srcStep, dst, dstStep, offset, size, border, static_cast<const T*>(nullptr), plan, buffer);
+        return call(function, src, srcStep, dst, dstStep, offset, size, border, static_cast<const T*>(nullptr), plan,
+                    buffer);
 }
 
 struct Job {
@@ -105,10 +111,11 @@ struct Job {
 
 inline std::string describe(const Job& job) {
     const Method& m = job.method;
-    return "interpolation " + std::to_string(m.interpolation) + (m.antialiasing ? " antialiasing" : "") + ", lobes " + std::to_string(m.lobes) +
-           ", B " + std::to_string(m.b) + ", C " + std::to_string(m.c) + ", " + std::to_string(job.src.width) + "x" +
-           std::to_string(job.src.height) + " to " + std::to_string(job.dst.width) + "x" + std::to_string(job.dst.height) +
-           ", border " + std::to_string(job.border);
+    return "interpolation " + std::to_string(m.interpolation) + (m.antialiasing ? " antialiasing" : "") + ", lobes " +
+           std::to_string(m.lobes) + ", B " + std::to_string(m.b) + ", C " + std::to_string(m.c) + ", " +
+           std::to_string(job.src.width) + "x" + std::to_string(job.src.height) + " to " +
+           std::to_string(job.dst.width) + "x" + std::to_string(job.dst.height) + ", border " +
+           std::to_string(job.border);
 }
 
 }  // namespace qori::test

@@ -8,8 +8,10 @@ using reference::Tap;
 
 template <class T>
 T drawPixel() {
-    if constexpr (std::is_floating_point_v<T>) return static_cast<T>(static_cast<int32_t>(random().bits())) / T(1 << 20);
-    else return random().value<T>();
+    if constexpr (std::is_floating_point_v<T>)
+        return static_cast<T>(static_cast<int32_t>(random().bits())) / T(1 << 20);
+    else
+        return random().value<T>();
 }
 
 /// A source with memory beyond it on the open sides only, as wide as the filter reaches.
@@ -20,7 +22,10 @@ struct Source {
     TestImage image;
 
     explicit Source(const Job& j)
-        : job(j), left(j.open(borderReadLeft) ? reachX() : 0), top(j.open(borderReadTop) ? reachY() : 0), image(kSrc, shape(), channels * int{sizeof(T)}) {
+        : job(j),
+          left(j.open(borderReadLeft) ? reachX() : 0),
+          top(j.open(borderReadTop) ? reachY() : 0),
+          image(kSrc, shape(), channels * int{sizeof(T)}) {
         image.fill<T>(channels, drawPixel<T>);
     }
     int reachX() const { return reference::halfWidth(job.method, job.src.width, job.dst.width); }
@@ -28,10 +33,14 @@ struct Source {
     Shape shape() const {
         return {.width = job.src.width + left + (job.open(borderReadRight) ? reachX() : 0),
                 .height = job.src.height + top + (job.open(borderReadBottom) ? reachY() : 0),
-                .padding = random().below(3) * random().below(40), .flipped = random().oneIn(3), .atBegin = random().oneIn(2), .shift = random().below(3)};
+                .padding = random().below(3) * random().below(40),
+                .flipped = random().oneIn(3),
+                .atBegin = random().oneIn(2),
+                .shift = random().below(3)};
     }
     const T* pixel(int x, int y) const {
-        return reinterpret_cast<const T*>(image.data<uint8_t>() + ptrdiff_t{image.step()} * (top + y) + ptrdiff_t{int{sizeof(T)} * channels} * (left + x));
+        return reinterpret_cast<const T*>(image.data<uint8_t>() + ptrdiff_t{image.step()} * (top + y) +
+                                          ptrdiff_t{int{sizeof(T)} * channels} * (left + x));
     }
     T get(int x, int y, int c) const {
         if (!job.open(borderReadLeft)) x = std::max(x, 0);
@@ -69,13 +78,15 @@ template <class T, int channels>
 void expectImage(const Source<T, channels>& source, const TestImage& dst) {
     const Job& job = source.job;
     std::vector<std::vector<Tap>> columns;
-    for (int x = 0; x < job.dst.width; ++x) columns.push_back(reference::taps(job.method, job.src.width, job.dst.width, x));
+    for (int x = 0; x < job.dst.width; ++x)
+        columns.push_back(reference::taps(job.method, job.src.width, job.dst.width, x));
     for (int y = 0; y < job.dst.height; ++y) {
         const std::vector<Tap> rows = reference::taps(job.method, job.src.height, job.dst.height, y);
         for (int x = 0; x < job.dst.width; ++x)
             for (int c = 0; c < channels; ++c) {
-                expectPixel<T>(job, columns[static_cast<size_t>(x)], rows, [&](int sx, int sy) { return source.get(sx, sy, c); },
-                               dst.view<T>(channels).get(x, y, c));
+                expectPixel<T>(
+                    job, columns[static_cast<size_t>(x)], rows, [&](int sx, int sy) { return source.get(sx, sy, c); },
+                    dst.view<T>(channels).get(x, y, c));
                 if (testing::Test::HasFailure()) FAIL() << "at pixel (" << x << ", " << y << ") channel " << c;
             }
     }
@@ -93,7 +104,9 @@ uint8_t* makeBuffer(const QorResizePlan* plan, QorImageSize tile, int channels) 
 QorImageRect tapBox(const Job& job, QorImageRect dst) {
     const auto ends = [&](int srcLength, int dstLength, int from, int count, int& first, int& length) {
         first = std::max(0, reference::taps(job.method, srcLength, dstLength, from).front().index);
-        length = std::min(srcLength - 1, reference::taps(job.method, srcLength, dstLength, from + count - 1).back().index) - first + 1;
+        length =
+            std::min(srcLength - 1, reference::taps(job.method, srcLength, dstLength, from + count - 1).back().index) -
+            first + 1;
     };
     QorImageRect box;
     ends(job.src.width, job.dst.width, dst.x, dst.width, box.x, box.width);
@@ -103,7 +116,8 @@ QorImageRect tapBox(const Job& job, QorImageRect dst) {
 
 /// Makes a tile from a copy of the source rectangle that the query reports, and of nothing else.
 template <class T, int channels, class Function>
-void runTileAlone(Function function, const Source<T, channels>& source, const TestImage& dst, QorImageRect tile, const QorResizePlan* plan) {
+void runTileAlone(Function function, const Source<T, channels>& source, const TestImage& dst, QorImageRect tile,
+                  const QorResizePlan* plan) {
     const Job& job = source.job;
     QorImageRect from, trimmed;
     ASSERT_EQ(QOR_OK, call(Exports<T>::getSrcRoi, plan, tile, &from, &trimmed));
@@ -114,17 +128,21 @@ void runTileAlone(Function function, const Source<T, channels>& source, const Te
     ASSERT_EQ(QOR_OK, call(Exports<T>::getSrcOffset, plan, QorPoint2D{tile.x, tile.y}, &at));
     ASSERT_EQ(int64_t{tile.x} * job.src.width / job.dst.width, at.x);
     ASSERT_EQ(int64_t{tile.y} * job.src.height / job.dst.height, at.y);
-    const TestImage part(kTileSrc, {.width = from.width, .height = from.height, .padding = random().below(9), .atBegin = random().oneIn(2)},
-                         channels * int{sizeof(T)});
+    const TestImage part(
+        kTileSrc,
+        {.width = from.width, .height = from.height, .padding = random().below(9), .atBegin = random().oneIn(2)},
+        channels * int{sizeof(T)});
     for (int y = 0; y < from.height; ++y)
         for (int x = 0; x < from.width; ++x)
-            for (int c = 0; c < channels; ++c) part.view<T>(channels).set(x, y, c, source.get(from.x + x, from.y + y, c));
+            for (int c = 0; c < channels; ++c)
+                part.view<T>(channels).set(x, y, c, source.get(from.x + x, from.y + y, c));
     constexpr ptrdiff_t pixel = int{sizeof(T)} * channels;
     const auto* src = part.data<uint8_t>() + ptrdiff_t{part.step()} * (at.y - from.y) + pixel * (at.x - from.x);
     auto* to = dst.data<uint8_t>() + ptrdiff_t{dst.step()} * tile.y + pixel * tile.x;
     const QorImageSize size{tile.width, tile.height};
-    ASSERT_EQ(QOR_OK, operate<T>(function, reinterpret_cast<const T*>(src), part.step(), reinterpret_cast<T*>(to), dst.step(),
-                                 {tile.x, tile.y}, size, job.border, plan, makeBuffer<T>(plan, size, channels)));
+    ASSERT_EQ(QOR_OK,
+              operate<T>(function, reinterpret_cast<const T*>(src), part.step(), reinterpret_cast<T*>(to), dst.step(),
+                         {tile.x, tile.y}, size, job.border, plan, makeBuffer<T>(plan, size, channels)));
 }
 
 /// A random partition of the destination, in random order.
@@ -149,11 +167,16 @@ void checkJob(Function function, const Job& job) {
     const Source<T, channels> source(job);
     const Snapshot sourceBefore = source.image.snapshot();
     const QorResizePlan* plan = makePlan<T>(job.method, job.src, job.dst);
-    const TestImage dst(kDst, {.width = job.dst.width, .height = job.dst.height, .padding = random().below(20), .flipped = random().oneIn(3),
-                               .atBegin = random().oneIn(2)}, channels * int{sizeof(T)});
+    const TestImage dst(kDst,
+                        {.width = job.dst.width,
+                         .height = job.dst.height,
+                         .padding = random().below(20),
+                         .flipped = random().oneIn(3),
+                         .atBegin = random().oneIn(2)},
+                        channels * int{sizeof(T)});
     const Snapshot untouched = dst.snapshot();
-    ASSERT_EQ(QOR_OK, operate<T>(function, source.pixel(0, 0), source.image.step(), dst.data<T>(), dst.step(), {0, 0}, job.dst, job.border,
-                                 plan, makeBuffer<T>(plan, job.dst, channels)));
+    ASSERT_EQ(QOR_OK, operate<T>(function, source.pixel(0, 0), source.image.step(), dst.data<T>(), dst.step(), {0, 0},
+                                 job.dst, job.border, plan, makeBuffer<T>(plan, job.dst, channels)));
     expectImage(source, dst);
     QORI_EXPECT_UNCHANGED(source.image, sourceBefore);
     // In tiles, cleared first: the same bytes, and none around them.
@@ -168,8 +191,9 @@ void checkJob(Function function, const Job& job) {
         ASSERT_EQ(QOR_OK, call(Exports<T>::getSrcOffset, plan, QorPoint2D{tile.x, tile.y}, &at));
         const QorImageSize size{tile.width, tile.height};
         auto* to = dst.data<uint8_t>() + ptrdiff_t{dst.step()} * tile.y + ptrdiff_t{int{sizeof(T)} * channels} * tile.x;
-        ASSERT_EQ(QOR_OK, operate<T>(function, source.pixel(at.x, at.y), source.image.step(), reinterpret_cast<T*>(to), dst.step(), {tile.x, tile.y},
-                                     size, job.border, plan, makeBuffer<T>(plan, size, channels)));
+        ASSERT_EQ(QOR_OK, operate<T>(function, source.pixel(at.x, at.y), source.image.step(), reinterpret_cast<T*>(to),
+                                     dst.step(), {tile.x, tile.y}, size, job.border, plan,
+                                     makeBuffer<T>(plan, size, channels)));
     }
     QORI_EXPECT_UNCHANGED(dst, whole);
     Snapshot cleared = whole;
@@ -198,15 +222,18 @@ QorImageSize drawLengths(int least, bool reducesOnly) {
 }
 
 Job drawJob(Method method) {
-    const int least = method.interpolation == interpLanczos ? 2 * method.lobes : method.interpolation == interpCubic ? 4
-                      : method.interpolation == interpLinear ? 2 : 1;
+    const int least = method.interpolation == interpLanczos  ? 2 * method.lobes
+                      : method.interpolation == interpCubic  ? 4
+                      : method.interpolation == interpLinear ? 2
+                                                             : 1;
     const bool reduces = method.interpolation == interpSuper;
     const QorImageSize x = drawLengths(least, reduces);
     QorImageSize y = drawLengths(least, reduces);
     while (y.width > 90) y = drawLengths(least, reduces);
     Job job{method, {x.width, y.width}, {x.height, std::min(y.height, 90)}};
     const bool bordered = method.interpolation != interpNearest && !reduces;
-    if (bordered && random().oneIn(2)) job.border = random().oneIn(4) ? borderReadAll : borderReplicate | 16 * random().below(16);
+    if (bordered && random().oneIn(2))
+        job.border = random().oneIn(4) ? borderReadAll : borderReplicate | 16 * random().below(16);
     return job;
 }
 
@@ -219,8 +246,10 @@ void markUsed(const Method& m) {
                              : m.interpolation == interpSuper  ? "Super"
                                                                : "Lanczos";
     const std::string type = std::string("_") + Exports<T>::suffix;
-    markSwept(m.antialiasing ? ("qoriResizeAntialiasing" + kind + "Init").c_str() : ("qoriResize" + kind + "Init" + type).c_str());
-    for (const char* query : {"GetBufferSize", "GetSrcOffset", "GetSrcRoi"}) markSwept(("qoriResize" + (query + type)).c_str());
+    markSwept(m.antialiasing ? ("qoriResizeAntialiasing" + kind + "Init").c_str()
+                             : ("qoriResize" + kind + "Init" + type).c_str());
+    for (const char* query : {"GetBufferSize", "GetSrcOffset", "GetSrcRoi"})
+        markSwept(("qoriResize" + (query + type)).c_str());
 }
 
 template <class T, int channels, class Function>
@@ -232,9 +261,12 @@ void sweep(const char* name, Function function, std::vector<Method> methods, int
 }
 
 constexpr float kThird = 1.0f / 3;
-const std::vector<Method> kCubics = {{.interpolation = interpCubic, .b = 0, .c = 0.5f}, {.interpolation = interpCubic, .b = 1, .c = 0},
-                                     {.interpolation = interpCubic, .b = 0.5f, .c = 0.3f}, {.interpolation = interpCubic, .b = kThird, .c = kThird}};
-const std::vector<Method> kLanczoses = {{.interpolation = interpLanczos, .lobes = 2}, {.interpolation = interpLanczos, .lobes = 3}};
+const std::vector<Method> kCubics = {{.interpolation = interpCubic, .b = 0, .c = 0.5f},
+                                     {.interpolation = interpCubic, .b = 1, .c = 0},
+                                     {.interpolation = interpCubic, .b = 0.5f, .c = 0.3f},
+                                     {.interpolation = interpCubic, .b = kThird, .c = kThird}};
+const std::vector<Method> kLanczoses = {{.interpolation = interpLanczos, .lobes = 2},
+                                        {.interpolation = interpLanczos, .lobes = 3}};
 
 std::vector<Method> antialiasingMethods() {
     std::vector<Method> all = kCubics;
@@ -245,9 +277,11 @@ std::vector<Method> antialiasingMethods() {
 }
 
 // What each operation of the registry is swept with; a new one does not compile until it is here.
-#define QORI_METHODS(operation, methods, jobs)                                                \
-    template <class T, int channels, class Function>                                          \
-    void operation(const char* name, Function function) { sweep<T, channels>(name, function, methods, jobs); }
+#define QORI_METHODS(operation, methods, jobs)             \
+    template <class T, int channels, class Function>       \
+    void operation(const char* name, Function function) {  \
+        sweep<T, channels>(name, function, methods, jobs); \
+    }
 QORI_METHODS(resizeNearest, {Method{.interpolation = interpNearest}}, 240)
 QORI_METHODS(resizeLinear, {Method{.interpolation = interpLinear}}, 240)
 QORI_METHODS(resizeCubic, kCubics, 160)
@@ -257,7 +291,8 @@ QORI_METHODS(resizeAntialiasing, antialiasingMethods(), 210)
 #undef QORI_METHODS
 
 #define QORI_SWEEP_(...)
-#define QORI_SWEEP_R(name, operation, S, SL) TEST(ResizeSweep, name) { operation<S, channels(Layout::SL)>(#name, &name); }
+#define QORI_SWEEP_R(name, operation, S, SL) \
+    TEST(ResizeSweep, name) { operation<S, channels(Layout::SL)>(#name, &name); }
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) QORI_SWEEP_##kind(name, operation, S, SL)
 #include "members/resize.inc"
 #undef QORI_MEMBER
@@ -275,11 +310,12 @@ TYPED_TEST(ResizeQueries, PlanSizesFollowTheirFormulas) {
     using E = Exports<TypeParam>;
     const auto sizes = [](QorImageSize dst, int32_t interpolation) {
         std::pair<int32_t, int32_t> result{-1, -1};
-        EXPECT_EQ(QOR_OK, call(E::getSize, QorImageSize{4000, 4000}, dst, interpolation, 0, &result.first, &result.second));
+        EXPECT_EQ(QOR_OK,
+                  call(E::getSize, QorImageSize{4000, 4000}, dst, interpolation, 0, &result.first, &result.second));
         return result;
     };
     using Pair = std::pair<int32_t, int32_t>;
-    const QorImageSize odd{33, 65};   // rounded up: 64 and 96
+    const QorImageSize odd{33, 65};  // rounded up: 64 and 96
     EXPECT_EQ(Pair(4 * 160 + 244, 64), sizes(odd, interpNearest));
     EXPECT_EQ(Pair(8 * 160 + 244, 64), sizes(odd, interpLinear));
     EXPECT_EQ(Pair(4 * 160 + 4 * (256 + 384) + 244, 4 * 160 + 64), sizes(odd, interpCubic));
@@ -300,7 +336,7 @@ TYPED_TEST(ResizeQueries, RefusesSizesBeyond32Bits) {
     EXPECT_EQ(QOR_ERR_SIZE, status({1 << 29, 1 << 29}, interpNearest, 0));
     EXPECT_EQ(QOR_ERR_SIZE, status({1 << 27, 1}, interpCubic, 0));
     EXPECT_EQ(QOR_ERR_SIZE, status({4, 1 << 28}, interpLanczos, 0));
-    EXPECT_EQ(QOR_ERR_SIZE, status({1 << 10, 1 << 10}, interpLanczos, 1));   // 12 taps per source pixel
+    EXPECT_EQ(QOR_ERR_SIZE, status({1 << 10, 1 << 10}, interpLanczos, 1));  // 12 taps per source pixel
     EXPECT_EQ(7, plan);
     EXPECT_EQ(7, init);
     EXPECT_EQ(QOR_OK, status({(1 << 28) - 96, 1}, interpLinear, 0));
@@ -312,7 +348,8 @@ TYPED_TEST(ResizeQueries, BordersAreTheReachOfTheFilter) {
     const auto expectBorder = [](const Method& m, QorImageSize src, QorImageSize dst) {
         QorBorderExtent border{-1, -1, -1, -1};
         EXPECT_EQ(QOR_OK, call(E::getBorderSize, makePlan<TypeParam>(m, src, dst), &border));
-        const int x = reference::halfWidth(m, src.width, dst.width), y = reference::halfWidth(m, src.height, dst.height);
+        const int x = reference::halfWidth(m, src.width, dst.width),
+                  y = reference::halfWidth(m, src.height, dst.height);
         EXPECT_TRUE(border.left == x && border.right == x && border.top == y && border.bottom == y) << m.interpolation;
     };
     expectBorder({.interpolation = interpLinear}, {60, 50}, {20, 90});
@@ -335,8 +372,8 @@ TEST(Resize, IdentityMovesPixels) {
         const QorResizePlan* plan = makePlan<uint8_t>(job.method, job.src, job.dst);
         const TestImage dst(kDst, {.width = 37, .height = 9}, 3);
         const auto run = [&](auto function) {
-            return operate<uint8_t>(function, source.pixel(0, 0), source.image.step(), dst.data<uint8_t>(), dst.step(), {0, 0}, job.dst, job.border,
-                                    plan, makeBuffer<uint8_t>(plan, job.dst, 3));
+            return operate<uint8_t>(function, source.pixel(0, 0), source.image.step(), dst.data<uint8_t>(), dst.step(),
+                                    {0, 0}, job.dst, job.border, plan, makeBuffer<uint8_t>(plan, job.dst, 3));
         };
         EXPECT_EQ(QOR_OK, interpolation == interpNearest  ? run(qoriResizeNearest_8u_C3R)
                           : interpolation == interpLinear ? run(qoriResizeLinear_8u_C3R)
@@ -345,7 +382,8 @@ TEST(Resize, IdentityMovesPixels) {
                                                           : run(qoriResizeLanczos_8u_C3R));
         for (int y = 0; y < 9; ++y)
             for (int x = 0; x < 37; ++x)
-                for (int c = 0; c < 3; ++c) ASSERT_EQ(source.get(x, y, c), dst.view<uint8_t>(3).get(x, y, c)) << interpolation;
+                for (int c = 0; c < 3; ++c)
+                    ASSERT_EQ(source.get(x, y, c), dst.view<uint8_t>(3).get(x, y, c)) << interpolation;
     }
 }
 
@@ -362,10 +400,11 @@ TEST(Resize, SizeQueryChecksInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetSize_8u(none, ok, 3, 0, plan, nullptr));
     QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, status(negative, none, 3, 0));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status(ok, negative, 3, 0));
-    for (int32_t bad : {-1, 3, 4, 5, 7, 9, 15, 17, INT32_MAX}) QORI_EXPECT_STATUS(QOR_ERR_INTERPOLATION, out, status(ok, ok, bad, 1));
+    for (int32_t bad : {-1, 3, 4, 5, 7, 9, 15, 17, INT32_MAX})
+        QORI_EXPECT_STATUS(QOR_ERR_INTERPOLATION, out, status(ok, ok, bad, 1));
     QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status(ok, ok, 0, 0));
     QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status(ok, ok, interpNearest, -1));
-    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status({1, 1}, ok, interpSuper, 2));   // before the sizes of super
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status({1, 1}, ok, interpSuper, 2));  // before the sizes of super
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({1, 2}, ok, interpLinear, 0));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({9, 3}, ok, interpCubic, 1));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({3, 9}, ok, interpLanczos, 0));
@@ -394,7 +433,8 @@ TEST(Resize, InitialisersCheckInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeAntialiasingCubicInit({3, 10}, ok, 0, 0.5f, plan, init));
     for (uint32_t lobes : {0u, 1u, 4u, 0x80000002u}) {
         QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, qoriResizeLanczosInit_16s({3, 3}, ok, lobes, plan, init));
-        QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, qoriResizeAntialiasingLanczosInit({3, 3}, ok, lobes, plan, init));
+        QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out,
+                           qoriResizeAntialiasingLanczosInit({3, 3}, ok, lobes, plan, init));
     }
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeLanczosInit_32f({3, 10}, ok, 2, plan, init));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeAntialiasingLanczosInit({10, 5}, ok, 3, plan, init));
@@ -408,21 +448,23 @@ struct Fixture {
     TestImage src, dst, memory;
 
     explicit Fixture(const Method& m)
-        : plan(makePlan<uint8_t>(m, {20, 20}, {12, 15})), src(kSrc, {.width = 20, .height = 20}, 1),
-          dst(kDst, {.width = 64, .height = 40}, 1), memory(block(kBuffer, 1 << 17)) {
+        : plan(makePlan<uint8_t>(m, {20, 20}, {12, 15})),
+          src(kSrc, {.width = 20, .height = 20}, 1),
+          dst(kDst, {.width = 64, .height = 40}, 1),
+          memory(block(kBuffer, 1 << 17)) {
         src.fill<uint8_t>(1, drawPixel<uint8_t>);
     }
     template <class Function>
     QorResult run(Function function, QorPoint2D offset, QorImageSize size, int32_t border = borderReplicate) const {
-        return operate<uint8_t>(function, src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(), offset, size, border, plan,
-                                memory.data<uint8_t>());
+        return operate<uint8_t>(function, src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(), offset,
+                                size, border, plan, memory.data<uint8_t>());
     }
 };
 
 TEST(Resize, OperationsCheckInOrder) {
     const Fixture f({.interpolation = interpLinear});
     const auto linear = qoriResizeLinear_8u_C1R;
-    const auto *s = f.src.data<uint8_t>();
+    const auto* s = f.src.data<uint8_t>();
     auto *d = f.dst.data<uint8_t>(), *b = f.memory.data<uint8_t>();
     const QorImageSize ok{12, 15}, none{0, -1};
     const QorPoint2D zero{0, 0}, outside{12, 0};
@@ -433,13 +475,14 @@ TEST(Resize, OperationsCheckInOrder) {
     QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, f.dst, f.run(linear, outside, none, 2));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, f.dst, f.run(linear, outside, {4, -1}, 2));
     const QorPoint2D badOffsets[] = {{-1, 0}, {0, -1}, outside, {0, 15}, {INT32_MIN, 0}};
-    for (QorPoint2D bad : badOffsets)
-        QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, f.dst, f.run(linear, bad, ok, 2));
+    for (QorPoint2D bad : badOffsets) QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, f.dst, f.run(linear, bad, ok, 2));
     QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(qoriResizeCubic_8u_C1R, zero, ok, 0x100));
     QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(qoriResizeNearest_8u_C1R, zero, ok));
     QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(qoriResizeAntialiasing_8u_C1R, zero, ok));
-    for (int32_t bad : {8, 9, 0x101, -1, 1 << 30}) QORI_EXPECT_STATUS(QOR_ERR_BORDER, f.dst, f.run(linear, zero, ok, bad));
-    for (int32_t bad : {0, 2, 3, 4, 5, 7, 0xF0, 0x10}) QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(linear, zero, ok, bad));
+    for (int32_t bad : {8, 9, 0x101, -1, 1 << 30})
+        QORI_EXPECT_STATUS(QOR_ERR_BORDER, f.dst, f.run(linear, zero, ok, bad));
+    for (int32_t bad : {0, 2, 3, 4, 5, 7, 0xF0, 0x10})
+        QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(linear, zero, ok, bad));
     const Fixture widened({.interpolation = interpLinear, .antialiasing = true});
     QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, widened.dst, widened.run(linear, zero, ok));
     // Another tag: nothing takes the block for a plan, and the tag is looked at before the size.
@@ -462,7 +505,8 @@ TEST(Resize, QueriesOfAPlanCheckInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetBufferSize_8u(fake, {0, 1}, 3, nullptr));
     QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, size(fake, {0, 1}, 2));
     QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, out, size(fake, {-1, 1}, 2));
-    for (int32_t channels : {0, 2, 5, -1}) QORI_EXPECT_STATUS(QOR_ERR_CHANNELS_UNSUPPORTED, out, size(f.plan, {-1, 1}, channels));
+    for (int32_t channels : {0, 2, 5, -1})
+        QORI_EXPECT_STATUS(QOR_ERR_CHANNELS_UNSUPPORTED, out, size(f.plan, {-1, 1}, channels));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, size(f.plan, {1, -1}, 3));
     EXPECT_EQ(QOR_OK, size(f.plan, {12, 15}, 3));
     EXPECT_EQ(QOR_WARN_ADJUSTED, size(f.plan, {13, 15}, 3));
@@ -477,7 +521,9 @@ TEST(Resize, QueriesOfAPlanCheckInOrder) {
     for (QorPoint2D bad : badOffsets)
         QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, out, qoriResizeGetSrcOffset_32f(f.plan, bad, point));
     auto* rects = out.data<QorImageRect>();
-    const auto roi = [&](const QorResizePlan* plan, QorImageRect rect) { return qoriResizeGetSrcRoi_16s(plan, rect, rects, rects + 1); };
+    const auto roi = [&](const QorResizePlan* plan, QorImageRect rect) {
+        return qoriResizeGetSrcRoi_16s(plan, rect, rects, rects + 1);
+    };
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, roi(nullptr, {0, 0, 0, 0}));
     QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, roi(fake, {-1, 0, 0, 1}));
     QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, out, roi(fake, {-1, 0, 1, 1}));
@@ -494,7 +540,7 @@ TEST(Resize, TilesBeyondTheDestinationAreTrimmed) {
     EXPECT_EQ(QOR_WARN_ADJUSTED, f.run(qoriResizeNearest_8u_C1R, {0, 0}, {13, 15}));
     EXPECT_EQ(QOR_WARN_ADJUSTED, f.run(qoriResizeNearest_8u_C1R, {0, 0}, {12, 40}));
     EXPECT_EQ(QOR_OK, f.run(qoriResizeNearest_8u_C1R, {5, 0}, {12, 15}));
-    Snapshot expected = f.dst.snapshot();   // only the plan's 12 x 15 pixels may differ
+    Snapshot expected = f.dst.snapshot();  // only the plan's 12 x 15 pixels may differ
     const auto now = expected.view<uint8_t>(1), before = const_cast<Snapshot&>(untouched).view<uint8_t>(1);
     for (int y = 0; y < 15; ++y)
         for (int x = 0; x < 12; ++x) now.set(x, y, 0, before.get(x, y));

@@ -33,7 +33,9 @@ void checkUnary(const Shape& shape, Invoke invoke, Reference reference, Draw dra
             for (int c = 0; c < processedChannels(layout); ++c) to.set(x, y, c, reference(from.get(x, y, c), c));
     invoke(src, dst, shape.roi());
     QORI_EXPECT_UNCHANGED(dst, expected);
-    if (kind != Kind::IR) QORI_EXPECT_UNCHANGED(src, srcBefore);
+    if (kind != Kind::IR) {
+        QORI_EXPECT_UNCHANGED(src, srcBefore);
+    }
 }
 
 /// invoke(src1, src2, dst, roi); reference(a, b, channel) with a of src1 and b of src2 (in place: of the destination).
@@ -56,7 +58,9 @@ void checkBinary(const Shape& shape, Invoke invoke, Reference reference, Draw dr
     invoke(src1, src2, dst, shape.roi());
     QORI_EXPECT_UNCHANGED(dst, expected);
     QORI_EXPECT_UNCHANGED(src1, src1Before);
-    if (kind != Kind::IR) QORI_EXPECT_UNCHANGED(src2, src2Before);
+    if (kind != Kind::IR) {
+        QORI_EXPECT_UNCHANGED(src2, src2Before);
+    }
 }
 
 }  // namespace qori::test

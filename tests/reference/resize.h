@@ -37,12 +37,14 @@ inline double kernel(const Method& m, double distance) {
     if (m.interpolation == interpLinear) return std::max(0.0, 1 - t);
     if (m.interpolation == interpCubic) {
         if (t < 1) return ((12 - 9 * b - 6 * c) * t * t * t + (-18 + 12 * b + 6 * c) * t * t + 6 - 2 * b) / 6;
-        if (t < 2) return ((-b - 6 * c) * t * t * t + (6 * b + 30 * c) * t * t + (-12 * b - 48 * c) * t + 8 * b + 24 * c) / 6;
+        if (t < 2)
+            return ((-b - 6 * c) * t * t * t + (6 * b + 30 * c) * t * t + (-12 * b - 48 * c) * t + 8 * b + 24 * c) / 6;
         return 0;
     }
     const int perPixel = m.lobes == 2 ? 200 : 100;
     const double at = t * perPixel, below = std::floor(at);
-    const double first = lanczosSample(m.lobes, below / perPixel), second = lanczosSample(m.lobes, (below + 1) / perPixel);
+    const double first = lanczosSample(m.lobes, below / perPixel),
+                 second = lanczosSample(m.lobes, (below + 1) / perPixel);
     return t >= m.lobes ? 0 : first + (at - below) * (second - first);
 }
 
@@ -58,7 +60,7 @@ inline int halfWidth(const Method& m, int src, int dst) {
 }
 
 inline std::vector<Tap> superTaps(int64_t src, int64_t dst, int64_t i) {
-    std::vector<Tap> taps;   // in units of 1 / dst source pixels
+    std::vector<Tap> taps;  // in units of 1 / dst source pixels
     for (int64_t s = i * src / dst; s * dst < (i + 1) * src; ++s) {
         const int64_t covered = std::min((s + 1) * dst, (i + 1) * src) - std::max(s * dst, i * src);
         taps.push_back({static_cast<int>(s), static_cast<double>(covered) / static_cast<double>(src)});
