@@ -3,7 +3,7 @@
 #include "resize_half_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
-#include "rounding_scope.h"
+#include "frame/control_scope.h"
 
 namespace qori::geometry {
 namespace {
@@ -121,7 +121,7 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (QorResult r = tagCheck(&plan)) return r;
     if (numChannels != 1 && numChannels != 3 && numChannels != 4) return QOR_ERR_CHANNELS_UNSUPPORTED;
     if (QorResult r = sizeCheck(dst)) return r;
-    const RoundNearestScope rounding;  // as in the operation
+    const ControlScope scope;  // as in the operation
     const int64_t bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
     if (bytes >= kSizeLimit) return QOR_ERR_SIZE;
     *pBufSize = static_cast<int32_t>(bytes);
@@ -259,7 +259,7 @@ OpenSides openSides(Border border) {
 template <class T, int channels>
 QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open,
                   const QorResizePlan* pPlan, uint8_t* pBuffer) {
-    const RoundNearestScope rounding;
+    const ControlScope scope;
     const ResizePlan& plan = *planOf(pPlan);
     WorkBuffer buffer(pBuffer);
     const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);

@@ -2,7 +2,7 @@
 #include "resize_plan.h"
 
 #include "lanczos_table.h"
-#include "rounding_scope.h"
+#include "frame/control_scope.h"
 
 namespace qori::geometry {
 namespace {
@@ -193,7 +193,7 @@ double Filter::operator()(double distance) const {
 }
 
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
-    const RoundNearestScope rounding;
+    const ControlScope scope;
     const Builder builder(block, src, dst, interpNearest, false);
     for (const Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
         auto* indices = builder.table<int32_t>(axis->indexTable);
@@ -203,7 +203,7 @@ void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
 }
 
 void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint) {
-    const RoundNearestScope rounding;
+    const ControlScope scope;
     const Builder builder(block, src, dst, interpLinear, false);
     builder.setReach(1, 1);
     for (Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
@@ -224,7 +224,7 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
 }
 
 void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
-    const RoundNearestScope rounding;
+    const ControlScope scope;
     const int32_t interpolation = filter.shape == Filter::Shape::linear  ? interpLinear
                                   : filter.shape == Filter::Shape::cubic ? interpCubic
                                                                          : interpLanczos;
@@ -249,7 +249,7 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
 }
 
 void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
-    const RoundNearestScope rounding;
+    const ControlScope scope;
     const Builder builder(block, src, dst, interpSuper, false);
     ResizePlan& plan = *builder.plan;
     plan.columnTaps = static_cast<int32_t>(superTaps(plan.horizontal));

@@ -6,43 +6,24 @@
 namespace qori::kernels {
 namespace {
 
-constexpr int32_t kSecond = INT32_MIN;  // the sign bit selects the second window; permutation looks at three bits only
-
-template <bool twoWindows, int taps>
+template <int taps>
 QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, float* out) {
     const int32_t n = taps > 0 ? taps : filter.taps;
     const int32_t* bases = filter.bases;
     const int32_t* order = filter.order;
     const float* weights = filter.weights;
     const ptrdiff_t pixel = filter.channels;
-    for (ptrdiff_t g = 0; g < filter.groups; ++g, order += 8, out += 8) {
+    for (ptrdiff_t g = 0; g < filter.groups; ++g, order += 8, weights += 8 * n, out += 8) {
         const float* window = line + bases[g];
-        prefetchAhead(window);
         const __m256i places = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(order));
-        const auto gather = [&] {
-            const __m256 first = _mm256_permutevar8x32_ps(_mm256_loadu_ps(window), places);
-            if constexpr (!twoWindows) return first;
-            const __m256 second = _mm256_permutevar8x32_ps(_mm256_loadu_ps(window + 8), places);
-            return _mm256_blendv_ps(first, second, _mm256_castsi256_ps(places));
-        };
+        const auto gather = [&] { return _mm256_permutevar8x32_ps(_mm256_loadu_ps(window), places); };
         __m256 sum = _mm256_mul_ps(_mm256_loadu_ps(weights), gather());
 #pragma GCC unroll 8
         for (int32_t k = 1; k < n; ++k) {
             window += pixel;
             sum = _mm256_fmadd_ps(_mm256_loadu_ps(weights + 8 * k), gather(), sum);
         }
-        weights += 8 * n;
         _mm256_storeu_ps(out, sum);
-    }
-}
-
-template <bool twoWindows>
-auto chooseLine(int32_t taps) {
-    switch (taps) {
-        case 2: return filterLineOf<twoWindows, 2>;
-        case 4: return filterLineOf<twoWindows, 4>;
-        case 6: return filterLineOf<twoWindows, 6>;
-        default: return filterLineOf<twoWindows, 0>;
     }
 }
 
@@ -57,7 +38,6 @@ void repeatFloats(const float* pixel, float* out, int32_t count) {
 void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t origin) {
     const ptrdiff_t elements = ptrdiff_t{width} * filter.channels;
     filter.groups = (elements + 7) / 8;
-    filter.twoWindows = false;
     int32_t pixel = 0, channel = 0;
     for (ptrdiff_t g = 0; g < filter.groups; ++g) {
         int32_t places[8], base = INT32_MAX;
@@ -71,16 +51,17 @@ void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const 
             pixel += channel == 0;
         }
         filter.bases[g] = base;
-        for (int i = 0; i < 8; ++i) {
-            const int32_t place = places[i] - base;
-            filter.twoWindows |= place >= 8;
-            filter.order[8 * g + i] = place >= 8 ? kSecond | (place - 8) : place;
-        }
+        for (int i = 0; i < 8; ++i) filter.order[8 * g + i] = places[i] - base;
     }
 }
 
 void filterLine(const LineFilter& filter, const float* line, float* out) {
-    (filter.twoWindows ? chooseLine<true>(filter.taps) : chooseLine<false>(filter.taps))(filter, line, out);
+    switch (filter.taps) {
+        case 2: return filterLineOf<2>(filter, line, out);
+        case 4: return filterLineOf<4>(filter, line, out);
+        case 6: return filterLineOf<6>(filter, line, out);
+        default: return filterLineOf<0>(filter, line, out);
+    }
 }
 
 template <class T, int channels>

@@ -1,24 +1,24 @@
 // SPDX-License-Identifier: Apache-2.0
-// Weighted sums along a row by permutation, for enlargements. The source row lies as a
-// line of floats; the taps of eight neighbouring results come from one window of eight floats, or two side by side, in
-// the same arrangement for every tap. The sums are those of resize_taps.h, bit for bit.
+// Weighted sums along a row by permutation, for enlargements. The source row lies as a line of floats; the taps of
+// eight neighbouring results come from one window of eight floats, in the same arrangement for every tap. The sums are
+// those of resize_taps.h, bit for bit.
 #pragma once
 #include "resize_taps.h"
 
 namespace qori::kernels {
 
-/// Whether lines are the cheaper way. The taps of eight neighbouring results then lie in two windows: their indices
-/// differ by 7 at most, or with three channels by 3 pixels and with four by 1.
+/// Whether lines are the way. Indices of pixels n apart then differ by n at most, so those of the elements of eight
+/// neighbouring results by 7: with three channels, results that begin with a pixel's last channel look 9 elements on
+/// only where the next pixel is another one, and then none of them looks at the first two channels before.
 constexpr bool suitsLines(double ratio) { return ratio <= 1; }
 
 struct LineFilter {
-    static constexpr int kOverrun = 16;  ///< Floats behind a line's last that may be read.
+    static constexpr int kOverrun = 8;  ///< Floats behind a line's last that may be read.
 
     int32_t taps = 0, channels = 0;
-    ptrdiff_t groups = 0;  ///< Of eight results.
-    bool twoWindows = false;
+    ptrdiff_t groups = 0;      ///< Of eight results.
     int32_t* bases = nullptr;  ///< Per group: where the window of the first tap begins.
-    int32_t* order = nullptr;  ///< Per result: place in the window; negative with the low bits' place in the second.
+    int32_t* order = nullptr;  ///< Per result: place in the window.
     float* weights = nullptr;  ///< Per group and tap: eight weights.
 };
 

@@ -252,10 +252,20 @@ void markUsed(const Method& m) {
         markSwept(("qoriResize" + (query + type)).c_str());
 }
 
+/// Wide enough for rows to be done in several strips.
+Job drawWideJob(Method method) {
+    const bool reduces = method.interpolation == interpSuper;
+    const int32_t src = 3000 + random().below(6000), dst = 2500 + random().below(2500);
+    return {method, {src, 6 + random().below(3)}, {reduces ? std::min(src, dst) : dst, 1 + random().below(6)}};
+}
+
 template <class T, int channels, class Function>
-void sweep(const char* name, Function function, std::vector<Method> methods, int jobs) {
-    for (int i = 0; i < jobs && !testing::Test::HasFailure(); ++i)
-        checkJob<T, channels>(function, drawJob(methods[static_cast<size_t>(i) % methods.size()]));
+void sweep(const char* name, Function function, const std::vector<Method>& methods, int jobs) {
+    constexpr int kWide = 4;
+    for (int i = 0; i < jobs + kWide && !testing::Test::HasFailure(); ++i) {
+        const Method& method = methods[static_cast<size_t>(i) % methods.size()];
+        checkJob<T, channels>(function, i < jobs ? drawJob(method) : drawWideJob(method));
+    }
     markSwept(name);
     for (const Method& m : methods) markUsed<T>(m);
 }
@@ -384,6 +394,35 @@ TEST(Resize, IdentityMovesPixels) {
             for (int x = 0; x < 37; ++x)
                 for (int c = 0; c < 3; ++c)
                     ASSERT_EQ(source.get(x, y, c), dst.view<uint8_t>(3).get(x, y, c)) << interpolation;
+    }
+}
+
+TEST(Resize, MeansOfFourRoundTiesToEven) {
+    // Every sum of four bytes, in 8u and in the wider type whose plan takes the general way.
+    const QorImageSize src{2 * 1021, 2}, dst{1021, 1};
+    const TestImage bytes(kSrc, {.width = src.width, .height = 2}, 1),
+        words(kTileSrc, {.width = src.width, .height = 2}, 2);
+    for (int x = 0; x < src.width; ++x)
+        for (int y = 0; y < 2; ++y) {
+            const int sum = x / 2, place = 2 * y + x % 2, value = (sum + place) / 4;
+            bytes.view<uint8_t>(1).set(x, y, 0, static_cast<uint8_t>(value));
+            words.view<uint16_t>(1).set(x, y, 0, static_cast<uint16_t>(value));
+        }
+    const TestImage means(kDst, {.width = dst.width, .height = 1}, 1),
+        wide(kPlanCopy, {.width = dst.width, .height = 1}, 2);
+    const Method method{.interpolation = interpSuper};
+    const QorResizePlan* plan = makePlan<uint8_t>(method, src, dst);
+    ASSERT_EQ(QOR_OK,
+              operate<uint8_t>(qoriResizeSuper_8u_C1R, bytes.data<uint8_t>(), bytes.step(), means.data<uint8_t>(),
+                               means.step(), {0, 0}, dst, 0, plan, makeBuffer<uint8_t>(plan, dst, 1)));
+    plan = makePlan<uint16_t>(method, src, dst);
+    ASSERT_EQ(QOR_OK,
+              operate<uint16_t>(qoriResizeSuper_16u_C1R, words.data<uint16_t>(), words.step(), wide.data<uint16_t>(),
+                                wide.step(), {0, 0}, dst, 0, plan, makeBuffer<uint16_t>(plan, dst, 1)));
+    for (int sum = 0; sum <= 1020; ++sum) {
+        const int whole = sum / 4, rest = sum % 4, expected = whole + (rest == 3 || (rest == 2 && whole % 2 == 1));
+        ASSERT_EQ(expected, means.view<uint8_t>(1).get(sum, 0)) << sum;
+        ASSERT_EQ(expected, wide.view<uint16_t>(1).get(sum, 0)) << sum;
     }
 }
 
