@@ -201,7 +201,7 @@ public:
         : source_{plan, tile},
           rows_(buffer),
           elements_(ptrdiff_t{tile.width} * channels),
-          padded_(roundUp(elements_, 32)),
+          padded_(static_cast<ptrdiff_t>(roundUp(elements_, 32))),
           tables_(buffer.take<uint8_t>(padded_ / 8 * kernels::Gather::kLaneBytes)),
           weights_(buffer.take<int16_t>(padded_)),
           pair_(buffer, padded_) {}
