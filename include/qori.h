@@ -183,6 +183,39 @@ typedef enum QorCopyFlags {
     copyStreamLoad = 2   /**< Streaming loads, for write-combining memory such as mapped frame buffers. */
 } QorCopyFlags;
 
+/** What a neighbourhood operation sees beyond the image: a kind, combined with flags for sides that are read instead. */
+typedef enum QorBorderMode {
+    borderConstant = 0,       /**< A missing pixel takes the border value of its channel. */
+    borderReplicate = 1,      /**< A missing pixel copies the nearest pixel of the image. */
+    borderReadAll = 6,        /**< Nothing is missing: pixels on all sides are read from memory. */
+    borderReadTop = 0x10,     /**< Flag: rows above are read from memory. */
+    borderReadBottom = 0x20,  /**< Flag: rows below are read from memory. */
+    borderReadLeft = 0x40,    /**< Flag: columns to the left are read from memory. */
+    borderReadRight = 0x80    /**< Flag: columns to the right are read from memory. */
+} QorBorderMode;
+
+/** How a resized pixel is made. */
+typedef enum QorInterpolationKind {
+    interpNearest = 1, /**< The nearest pixel. */
+    interpLinear = 2,  /**< 2 x 2 pixels, weighted by distance. */
+    interpCubic = 6,   /**< 4 x 4 pixels, two-parameter cubic filters. */
+    interpSuper = 8,   /**< The mean of the area covered; reductions only. */
+    interpLanczos = 16 /**< 4 x 4 or 6 x 6 pixels, windowed sinc. */
+} QorInterpolationKind;
+
+/** Widths around an image, in pixels. */
+typedef struct QorBorderExtent {
+    int32_t left;
+    int32_t top;
+    int32_t right;
+    int32_t bottom;
+} QorBorderExtent;
+
+/** Tables of a resize, in the caller's memory: as many bytes as qoriResizeGetSize reports, at any address. The plan
+ *  begins at the next multiple of 64 and may be copied to a block whose address is equal modulo 64. Once filled it is
+ *  only read: any number of threads may use it at once. */
+typedef struct QorResizePlan QorResizePlan;
+
 /** Version record of the library. */
 typedef struct QorLibraryVersion {
     int32_t versionMajor;
@@ -3068,6 +3101,511 @@ QORI_API QorResult QORI_CALL qoriDotProdCol_32f_L2(const float* const* ppSrcRows
     float* pDst, int32_t len);
 QORI_API QorResult QORI_CALL qoriDotProdCol_64f_L2(const double* const* ppSrcRows, const double* pWeights,
     int32_t nRows, double* pDst, int32_t len);
+
+/* ---- Resize --------------------------------------------------------------------------------------------------- */
+
+/** Reports how many bytes a plan and the buffer for its initialisation take.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     antialiasing: 0 for the plain forms, any other value for the antialiasing ones (linear, cubic,
+ *            Lanczos).
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (width or height below 1), QOR_ERR_INTERPOLATION (not 0 or a
+ *            QorInterpolationKind), QOR_ERR_UNSUPPORTED_MODE (0; antialiasing of nearest or super),
+ *            QOR_ERR_SIZE (source below 2 pixels for linear, 4 for cubic and Lanczos, below the destination for
+ *            super; a result of 2^31 or more); then nothing is written.
+ *  Example   int32_t planBytes, initBytes, bufferBytes;
+ *            qoriResizeGetSize_8u(srcSize, dstSize, interpCubic, 0, &planBytes, &initBytes);
+ *            QorResizePlan* plan = malloc(planBytes);
+ *            uint8_t* init = malloc(initBytes);
+ *            qoriResizeCubicInit_8u(srcSize, dstSize, 0.0f, 0.5f, plan, init);
+ *            qoriResizeGetBufferSize_8u(plan, dstSize, 3, &bufferBytes);
+ *            uint8_t* buffer = malloc(bufferBytes);
+ *            qoriResizeCubic_8u_C3R(src, srcStep, dst, dstStep, (QorPoint2D){0, 0}, dstSize, borderReplicate, NULL, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetSize_8u(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_16u(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_16s(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_32f(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_64f(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+
+/** Reports how many bytes of work buffer a tile takes; each thread needs a buffer of its own.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     Also returns QOR_WARN_ADJUSTED where the tile is wider or higher than the plan's destination; the
+ *            size is stored.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4),
+ *            QOR_ERR_SIZE (a negative length; a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_8u(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_16u(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_16s(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_32f(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_64f(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+
+/** Reports how many pixels around the source the filter of a plan may reach; zeros for nearest and super.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_8u(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_16u(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_16s(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_32f(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_64f(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+
+/** Reports the source pixel at which pSrc must point for a tile: floor(dstOffset * source length / destination
+ *  length).
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan),
+ *            QOR_ERR_OUT_OF_RANGE (an offset is negative or outside the plan's destination); then nothing is
+ *            written.
+ *  Example   QorPoint2D at;   // the lower half of an image, as a tile of its own
+ *            qoriResizeGetSrcOffset_8u(plan, (QorPoint2D){0, 360}, &at);
+ *            qoriResizeLinear_8u_C1R(src + at.y * srcStep + at.x, srcStep, dst + 360 * dstStep, dstStep, (QorPoint2D){0, 360},
+ *                                    (QorImageSize){1280, 360}, borderReplicate, NULL, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_8u(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_16u(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_16s(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_32f(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_64f(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+
+/** Reports the smallest source rectangle that holds every pixel that a destination rectangle is made of.
+ *  Shapes    The destination rectangle is trimmed to the plan's destination first and reported so; the source
+ *            rectangle is clipped to the source.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_CONTEXT (no plan), QOR_ERR_OUT_OF_RANGE (the origin is negative or outside the plan's
+ *            destination); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_8u(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_16u(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_16s(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_32f(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_64f(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+
+/** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination -
+ *  1e-10).
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_8u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_16u(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_16s(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_32f(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan);
+
+/** Fills the plan of a linear resize. The 8u plan holds 14-bit weights and serves 8u only; the others are one.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 2); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_8u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_16u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_16s(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_32f(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_64f(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+
+/** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the
+ *  B-spline.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     valueB and valueC are not checked.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 4); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_8u(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_16u(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_16s(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_32f(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a Lanczos resize with 2 or 3 lobes; the weights of each position sum to 1.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length), QOR_ERR_UNSUPPORTED_MODE (numLobes not 2 or 3), QOR_ERR_SIZE
+ *            (a source side below 4 with 2 lobes, 6 with 3); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_8u(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_16u(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_16s(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_32f(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a super-sampling reduction: each pixel is the mean of the source area that it covers.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below the destination's); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_8u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_16u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_16s(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_32f(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+
+/** Fills the plan of a linear resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The weights of each position sum to 1. Along an axis that is not reduced the filter is the plain
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 2); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasingLinearInit(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a cubic resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The weights of each position sum to 1. Along an axis that is not reduced the filter is the plain
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 4); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasingCubicInit(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a Lanczos resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The weights of each position sum to 1. Along an axis that is not reduced the filter is the plain
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length), QOR_ERR_UNSUPPORTED_MODE (numLobes not 2 or 3), QOR_ERR_SIZE
+ *            (a source side below 4 with 2 lobes, 6 with 3); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasingLanczosInit(QorImageSize srcSize, QorImageSize dstSize,
+    uint32_t numLobes, QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Resizes a tile by the nearest source pixel, moved bit for bit.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
+ *            the tile's first.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED where dstSize
+ *            alone exceeds it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
+ *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
+ *            another interpolation); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeNearest_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Reduces a tile to means of areas, in single precision; integers round to nearest, ties to even.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
+ *            the tile's first.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED where dstSize
+ *            alone exceeds it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
+ *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
+ *            another interpolation); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeSuper_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single
+ *  precision.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
+ *            the tile's first.
+ *  Elements  8u: h = (p0 * (16384 - w) + p1 * w + 128) >> 8 along rows, then (h0 * (16384 - w) + h1 * w +
+ *            0x80000) >> 20. 16u and 16s round to nearest, ties to even, and saturate.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     borderReplicate repeats the source's edge, except on sides whose borderRead flag is set: there,
+ *            and with borderReadAll, pixels beyond the source are read from memory. pBorderValue is not used
+ *            and may be null. The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED
+ *            where dstSize alone exceeds it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
+ *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
+ *            another interpolation), QOR_ERR_BORDER (bits outside 0xF7), QOR_ERR_UNSUPPORTED_MODE (neither
+ *            borderReplicate nor borderReadAll); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const double* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C3R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const double* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const double* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and
+ *  saturate.
+ *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; 4 x 4 source pixels make one.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     A source element that is not finite reaches every result whose 4 x 4 pixels hold it.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile by Lanczos filtering in single precision; integers round to nearest, ties to even, and
+ *  saturate.
+ *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; 4 x 4 (2 lobes) or 6 x 6 source pixels make
+ *            one.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and
+ *  saturate.
+ *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; the filter spans twice
+ *            qoriResizeGetBorderSize source pixels.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
 
 /* ---- Scale ---------------------------------------------------------------------------------------------------- */
 
