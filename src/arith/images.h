@@ -30,6 +30,17 @@ struct NoFloatControl {
 template <class T>
 using FloatControl = std::conditional_t<kernels::isFloat<T>, DefaultFloatControl, NoFloatControl>;
 
+/// Stores past the cache once the images do not fit it: the destination is then not read before it is written. In place
+/// it has been read anyway.
+inline constexpr StreamRule kStreamRule{1'048'576, StreamRule::Limit::cache};
+
+template <Layout layout, class T, class... Sources>
+bool streamsTo([[maybe_unused]] Image<T> dst, QorImageSize roi, Sources... sources) {
+    constexpr int bytes = static_cast<int>(1 + sizeof...(sources)) * channels(layout) * elementBytes<T>;
+    const bool inPlace = ((asBytes(sources.data) == asBytes(dst.data)) || ...);
+    return !inPlace && streams(kStreamRule, traffic(roi, bytes));
+}
+
 template <Layout layout>
 constexpr bool keepsAlpha = layout == Layout::AC4;
 
@@ -37,7 +48,7 @@ constexpr bool keepsAlpha = layout == Layout::AC4;
 template <Layout layout, class Operation, class T>
 void runBinary(Operation&& operation, Image<const T> first, Image<const T> second, Image<T> dst, QorImageSize roi) {
     [[maybe_unused]] const FloatControl<T> control;
-    const bool streaming = false;
+    const bool streaming = streamsTo<layout>(dst, roi, first, second);
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, first, second);
 }
 
@@ -45,7 +56,7 @@ template <Layout layout, class T>
 void fillConstant(Image<T> dst, QorImageSize roi, T value) {
     const T values[1] = {value};
     kernels::Fill<T> fill{kernels::channelVectors(values, 1).v[0]};
-    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, false, dst);
+    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, streamsTo<layout>(dst, roi), dst);
 }
 
 }  // namespace qori::arith

@@ -30,8 +30,8 @@ struct NearPowers {
         } else {
             if (random().oneIn(2)) return random().value<T>();
             const auto power = static_cast<T>(T{1} << random().below(8 * static_cast<int>(sizeof(T)) - std::is_signed_v<T>));
-            const auto near = static_cast<T>(power + static_cast<T>(random().below(3)) - 1);
-            return std::is_signed_v<T> && random().oneIn(2) ? static_cast<T>(-near) : near;
+            const auto beside = static_cast<T>(power + static_cast<T>(random().below(3)) - 1);
+            return std::is_signed_v<T> && random().oneIn(2) ? static_cast<T>(-beside) : beside;
         }
     }
 };
