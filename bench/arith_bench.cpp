@@ -61,19 +61,20 @@ Row binary(std::string name, double bestAtL2, double bestAtFrame, Function funct
         const Images<T, channels> images(size);
         return Contenders{
             [=] {
-                function(images.a.data(), images.a.step(), images.b.data(), images.b.step(), images.dst.data(), images.dst.step(),
-                         size.roi(), scale...);
+                function(images.a.data(), images.a.step(), images.b.data(), images.b.step(), images.dst.data(),
+                         images.dst.step(), size.roi(), scale...);
             },
             [=] { plainRows<channels>(images.a, images.b, images.dst, size, element); },
             {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = 3.0 * channels * sizeof(T), .sizes = withSmall(), .make = make,
-            .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name), .bytesPerPixel = 3.0 * channels * sizeof(T), .sizes = withSmall(),
+            .make = make, .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
 }
 
 /// element(value, a); every channel has a value of its own.
 template <class T, int channels = 1, class Function, class Element, class... Scale>
-Row constant(std::string name, double bestAtL2, double bestAtFrame, Function function, Element element, Scale... scale) {
+Row constant(std::string name, double bestAtL2, double bestAtFrame, Function function, Element element,
+             Scale... scale) {
     const auto make = [=](Size size) {
         const Images<T, channels> images(size);
         return Contenders{
@@ -83,7 +84,8 @@ Row constant(std::string name, double bestAtL2, double bestAtFrame, Function fun
                     if constexpr (channels == 1) return values[0];
                     else return values;
                 }();
-                function(images.a.data(), images.a.step(), value, images.dst.data(), images.dst.step(), size.roi(), scale...);
+                function(images.a.data(), images.a.step(), value, images.dst.data(), images.dst.step(), size.roi(),
+                         scale...);
             },
             [=] {
                 const int width = size.width, height = size.height;   // the closure's might change with the stores
@@ -94,15 +96,15 @@ Row constant(std::string name, double bestAtL2, double bestAtFrame, Function fun
                 for (int y = 0; y < height; ++y) {
                     const T* s = images.a.row(y);
                     T* d = images.dst.row(y);
-                    for (int x = 0; x < width; ++x)
-                        for (int c = 0; c < channels; ++c) d[x * channels + c] = element(values[c], s[x * channels + c]);
+                    for (int x = 0; x < width * channels; x += channels)
+                        for (int c = 0; c < channels; ++c) d[x + c] = element(values[c], s[x + c]);
                     keep(d);
                 }
             },
             {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = 2.0 * channels * sizeof(T), .sizes = withSmall(), .make = make,
-            .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name), .bytesPerPixel = 2.0 * channels * sizeof(T), .sizes = withSmall(),
+            .make = make, .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
 }
 
 template <class T>
@@ -126,25 +128,44 @@ template <class T>
 constexpr auto product = [](T a, T b) { return clamped<T>(a * b); };
 template <class T, int s>
 constexpr auto scaledProduct = [](T a, T b) { return clamped<T>(roundShift(a * b, s)); };
-constexpr auto product16u = [](uint16_t a, uint16_t b) { return static_cast<uint16_t>(std::min(uint32_t{a} * b, 65535u)); };
+constexpr auto product16u = [](uint16_t a, uint16_t b) {
+    return static_cast<uint16_t>(std::min(uint32_t{a} * b, 65535u));
+};
 constexpr auto complexProduct = [](QorComplex16s a, QorComplex16s b) {
-    return QorComplex16s{clamped<int16_t>(int64_t{a.re} * b.re - a.im * b.im), clamped<int16_t>(int64_t{a.re} * b.im + int64_t{a.im} * b.re)};
+    return QorComplex16s{clamped<int16_t>(int64_t{a.re} * b.re - a.im * b.im),
+                         clamped<int16_t>(int64_t{a.re} * b.im + int64_t{a.im} * b.re)};
 };
 constexpr auto complexProduct32 = [](QorComplex32s a, QorComplex32s b) {
     return QorComplex32s{clamped<int32_t>(int64_t{a.re} * b.re - int64_t{a.im} * b.im),
                          clamped<int32_t>(int64_t{a.re} * b.im + int64_t{a.im} * b.re)};
 };
+/// Exact, as the sums need more bits than a double has.
+constexpr auto wideQuotient = [](QorComplex32s a, QorComplex32s b) {
+    __extension__ using Wide = __int128;
+    const Wide norm = Wide{a.re} * a.re + Wide{a.im} * a.im;
+    if (norm == 0) return QorComplex32s{};
+    const auto rounded = [&](Wide n) {
+        const Wide q = n / norm, twice = 2 * (n % norm), size = twice < 0 ? -twice : twice;
+        const bool away = size > norm || (size == norm && q % 2 != 0);
+        return clamped<int32_t>(static_cast<int64_t>(q) + (away ? (n < 0 ? -1 : 1) : 0));
+    };
+    return QorComplex32s{rounded(Wide{b.re} * a.re + Wide{b.im} * a.im),
+                         rounded(Wide{b.im} * a.re - Wide{b.re} * a.im)};
+};
 constexpr auto complexQuotient = [](auto a, auto b) {
     const double norm = double(a.re) * a.re + double(a.im) * a.im;
     if (norm == 0) return decltype(a){};
     const double re = double(b.re) * a.re + double(b.im) * a.im, im = double(b.im) * a.re - double(b.re) * a.im;
-    if constexpr (std::is_same_v<decltype(a.re), float>) return decltype(a){static_cast<float>(re / norm), static_cast<float>(im / norm)};
-    else return decltype(a){static_cast<decltype(a.re)>(std::nearbyint(re / norm)), static_cast<decltype(a.re)>(std::nearbyint(im / norm))};
+    using Part = decltype(a.re);
+    const auto element = [](double x, double y) { return decltype(a){static_cast<Part>(x), static_cast<Part>(y)}; };
+    if constexpr (std::is_same_v<Part, float>) return element(re / norm, im / norm);
+    else return element(std::nearbyint(re / norm), std::nearbyint(im / norm));
 };
 bool zeroMet = false;
 template <class T>
 constexpr auto quotient = [](T a, T b) {
-    return a == 0 ? T(b == 0 ? 0 : std::numeric_limits<T>::max()) : clamped<T>(static_cast<int>(std::nearbyint(float(b) / float(a))));
+    if (a == 0) return T(b == 0 ? 0 : std::numeric_limits<T>::max());
+    return clamped<T>(static_cast<int>(std::nearbyint(float(b) / float(a))));
 };
 /// With the results and the note of zero divisors.
 constexpr auto floatQuotient = [](float a, float b) {
@@ -155,7 +176,8 @@ constexpr auto floatQuotient = [](float a, float b) {
 };
 constexpr auto fractionProduct = [](auto a, auto b) {
     using T = decltype(a);
-    return static_cast<T>((uint32_t{a} * b + (std::numeric_limits<T>::max() >> 1) + 1u) / std::numeric_limits<T>::max());
+    constexpr uint32_t max = std::numeric_limits<T>::max();
+    return static_cast<T>((uint32_t{a} * b + max / 2) / max);
 };
 
 const Rows rows{{
@@ -182,7 +204,7 @@ const Rows rows{{
     binary<int16_t>("div 16s C1 sfs 0", 0, 0, qoriDiv_16s_C1RSfs, quotient<int16_t>, 0),
     binary<float>("div 32f C1", 3'324, 2'352, qoriDiv_32f_C1R, floatQuotient),
     binary<QorComplex16s>("div 16sc C1 sfs 0", 0, 0, qoriDiv_16sc_C1RSfs, complexQuotient, 0),
-    binary<QorComplex32s>("div 32sc C1 sfs 0", 0, 0, qoriDiv_32sc_C1RSfs, complexQuotient, 0),
+    binary<QorComplex32s>("div 32sc C1 sfs 0", 0, 0, qoriDiv_32sc_C1RSfs, wideQuotient, 0),
     binary<QorComplex32f>("div 32fc C1", 0, 0, qoriDiv_32fc_C1R, complexQuotient),
     constant<uint8_t>("addC 8u C1 sfs 0", 26'507, 14'076, qoriAddC_8u_C1RSfs, sum<uint8_t>, 0),
     constant<uint8_t, 3>("addC 8u C3 sfs 0", 8'590, 4'712, qoriAddC_8u_C3RSfs, sum<uint8_t>, 0),

@@ -134,7 +134,8 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
     }
     const auto run = [&]<class Divide>(Divide division) {
         if constexpr (requires { typename Divide::Prepared; })
-            runUnary<layout>(kernels::DivisionByConstants<T, Divide>(division, constantsOf<layout>(value)), src, dst, roi);
+            runUnary<layout>(kernels::DivisionByConstants<T, Divide>{division, constantsOf<layout>(value)}, src, dst,
+                             roi);
         else
             runConstant<layout>(kernels::Binary<T, Divide>{division}, value, src, dst, roi);
     };
@@ -149,7 +150,7 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
 template <class T, Layout layout>
 QorResult multiplyConstantFraction(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
-    const auto product = [](Vec<T> a, Vec<T> b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
+    const auto product = [](auto a, auto b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
     runConstant<layout>(kernels::Binary<T, decltype(product)>{product}, value, src, dst, roi);
     return QOR_OK;
 }
