@@ -354,8 +354,8 @@ QORI_API QorResult QORI_CALL qoriAdd_32fc_AC4IR(const QorComplex32f* pSrc, int32
 /** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even.
  *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
  *            the destination. In place (I), pSrcDst is the second operand and the destination.
- *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
- *            precision, no scale.
+ *  Elements  Integer differences are exact before scaling, complex by part. 32f, 32fc: IEEE single precision,
+ *            unscaled.
  *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
  *            2^-scaleFactor.
  *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
@@ -757,8 +757,8 @@ QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4IR(const QorComplex32f value[3], Q
 /** Subtracts constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even.
  *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
  *            which keeps channel 3 of the destination.
- *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
- *            precision, no scale.
+ *  Elements  Integer differences are exact before scaling, complex by part. 32f, 32fc: IEEE single precision,
+ *            unscaled.
  *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
@@ -1097,8 +1097,7 @@ QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4R(const QorComplex32f* pSrc, int32
 QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
     int32_t srcDstStep, QorImageSize roiSize);
 
-/** Multiplies an image by constants as fractions of the largest value: round(src * value / max), max 255 or
- *  65535.
+/** Multiplies an image by constants as fractions of the maximum: round(src * value / max), max 255 or 65535.
  *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
  *            which keeps channel 3 of the destination.
  *  Elements  To nearest; there are no ties. Multiplying by max changes nothing.

@@ -10,11 +10,20 @@ namespace qori::arith {
 
 /// Nothing, for integer elements.
 struct NoFloatControl {
-    NoFloatControl() {}   // user-provided, so that an unused variable is no warning
+    NoFloatControl() {}  // user-provided, so that an unused variable is no warning
 };
 
 template <class T>
 using FloatControl = std::conditional_t<kernels::isFloat<T>, ControlScope, NoFloatControl>;
+
+/// Stores past the cache once the images fill half of it: the destination is then not read before it is written. In
+/// place it has been read anyway.
+template <Layout layout, class T, class... Sources>
+bool streamsTo([[maybe_unused]] Image<T> dst, QorImageSize roi, Sources... sources) {
+    constexpr int bytes = static_cast<int>(1 + sizeof...(sources)) * channels(layout) * elementBytes<T>;
+    const bool inPlace = ((asBytes(sources.data) == asBytes(dst.data)) || ...);
+    return !inPlace && streams(streamRules::copy, traffic(roi, bytes));
+}
 
 template <Layout layout>
 constexpr bool keepsAlpha = layout == Layout::AC4;
@@ -23,7 +32,7 @@ constexpr bool keepsAlpha = layout == Layout::AC4;
 template <Layout layout, class Operation, class T>
 void runBinary(Operation&& operation, Image<const T> first, Image<const T> second, Image<T> dst, QorImageSize roi) {
     [[maybe_unused]] const FloatControl<T> control;
-    const bool streaming = streams(streamRules::copy, traffic(roi, 3 * channels(layout) * elementBytes<T>));
+    const bool streaming = streamsTo<layout>(dst, roi, first, second);
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, first, second);
 }
 
@@ -31,7 +40,7 @@ template <Layout layout, class T>
 void fillConstant(Image<T> dst, QorImageSize roi, T value) {
     const T values[1] = {value};
     kernels::Fill<T> fill{kernels::channelVectors(values, 1).v[0]};
-    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, false, dst);
+    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, streamsTo<layout>(dst, roi), dst);
 }
 
 }  // namespace qori::arith

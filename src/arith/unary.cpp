@@ -136,8 +136,7 @@ struct Logarithm {
 template <Layout layout, class T, class Op>
 QorResult runUnary(Op&& op, Image<const T> src, Image<T> dst, QorImageSize roi) {
     const ControlScope scope;
-    const bool streaming = streams(streamRules::copy, traffic(roi, 2 * channels(layout) * elementBytes<T>));
-    mapImage<keepsAlpha<layout>>(roi, channels(layout), op, streaming, dst, src);
+    mapImage<keepsAlpha<layout>>(roi, channels(layout), op, streamsTo<layout>(dst, roi, src), dst, src);
     return QOR_OK;
 }
 

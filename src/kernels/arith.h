@@ -146,7 +146,7 @@ struct Product {
     using W = std::conditional_t<std::is_signed_v<C>, SignedLane<C>, std::make_unsigned_t<SignedLane<C>>>;
     // 8u: 65,025. 16u: 65,535^2. 16s: 2^30. Complex parts reach 2^31 and 2^63, which the lane does not
     // hold and mendMinimum() lowers by 256.
-    static constexpr uint64_t limit = isComplex<T> ? 2 * magnitude<C> * magnitude<C> - 256 : magnitude<C> * magnitude<C>;
+    static constexpr uint64_t square = magnitude<C> * magnitude<C>, limit = isComplex<T> ? 2 * square - 256 : square;
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) requires isFloat<T> {
         const __m256 a = components(first).v, b = components(second).v;
@@ -234,7 +234,8 @@ bool withScaledOperation(int32_t scale, Run run) {
             }
         }
         return withScaleRule<C, typename Op::W, Op::limit>(scale, [&](auto rule) {
-            if constexpr (std::is_same_v<decltype(rule), Saturate<C, typename Op::W>> && requires(Vec<T> a) { Op::exact(a, a); }) {
+            constexpr bool unscaled = std::is_same_v<decltype(rule), Saturate<C, typename Op::W>>;
+            if constexpr (unscaled && requires(Vec<T> a) { Op::exact(a, a); }) {
                 binary(exact);
             } else {
                 binary([rule](Vec<T> a, Vec<T> b) __attribute__((always_inline)) {

@@ -55,7 +55,8 @@ QorComplex32s divideExactly(QorComplex32s divisor, QorComplex32s numerator, int3
     const auto [c, d] = numerator;
     const uint64_t norm = product(a, a) + product(b, b);
     if (norm == 0) return {limitBySign(c), limitBySign(d)};
-    return {roundedPart(product(c, a) + product(d, b), norm, scale), roundedPart(product(d, a) - product(c, b), norm, scale)};
+    return {roundedPart(product(c, a) + product(d, b), norm, scale),
+            roundedPart(product(d, a) - product(c, b), norm, scale)};
 }
 
 }  // namespace qori::kernels

@@ -4,7 +4,7 @@
 // by one of four rules that a call chooses once: Saturate (scale 0), LeftShift (below 0), RoundShift and, where its
 // addition could leave the lane, RoundShiftSticky (above 0). Scales that turn every value into 0 have no rule.
 //
-//     withScaleRule<uint8_t, int16_t, 510>(scale, [&](auto rule) { ... narrow<uint8_t>(rule(w.low), rule(w.high)) ... })
+//     withScaleRule<uint8_t, int16_t, 510>(scale, [&](auto rule) { ... narrow<uint8_t>(rule(v.low), rule(v.high)); })
 #pragma once
 #include <algorithm>
 #include <bit>
@@ -61,8 +61,8 @@ struct Lane {
 
 // --- elements to lanes of twice their width and back ----------------------------------------------------------------
 
-/// One vector of elements in two vectors of lanes, in the order that narrow() undoes: the interleaving of the halves for
-/// 8 and 16 bits, even and odd elements for 32 bits.
+/// One vector of elements in two vectors of lanes, in the order that narrow() undoes: the interleaving of the halves
+/// for 8 and 16 bits, even and odd elements for 32 bits.
 template <class W>
 struct Wide {
     Vec<W> low, high;
@@ -116,9 +116,9 @@ struct Saturate {
     }
 };
 
-/// Scale below 0: values that would leave the element are first brought to the nearest that just does, so that the shift
-/// stays inside the lane: with n = -scale, (max >> n) + 1 shifted is at most max + 2^n <= 2 * (max + 1). Beyond the
-/// element's width (n is cut there) every value but 0 saturates.
+/// Scale below 0: values that would leave the element are first brought to the nearest that just does, so that the
+/// shift stays inside the lane: with n = -scale, (max >> n) + 1 shifted is at most max + 2^n <= 2 * (max + 1). Beyond
+/// the element's width (n is cut there) every value but 0 saturates.
 template <class T, class W>
 struct LeftShift {
     explicit LeftShift(int32_t scale) {
@@ -139,8 +139,8 @@ struct LeftShift {
     __m128i count;
 };
 
-/// Scale above 0: (v + odd + 2^(scale-1) - 1) >> scale, odd being the lowest bit of v >> scale. An exact half reaches the
-/// next integer only where odd is 1. |v| + 2^(scale-1) must fit the lane.
+/// Scale above 0: (v + odd + 2^(scale-1) - 1) >> scale, odd being the lowest bit of v >> scale. An exact half reaches
+/// the next integer only where odd is 1. |v| + 2^(scale-1) must fit the lane.
 template <class W>
 struct RoundShift {
     explicit RoundShift(int32_t scale)
@@ -155,9 +155,9 @@ struct RoundShift {
     __m128i count;
 };
 
-/// Scale above 2, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling exact halves
-/// from values beside them. |v| / 2 + 2^(scale-2) is at most 3/4 of 2^bits (unsigned lanes, scale up to their width) and
-/// 3/4 of 2^(bits-1) (signed ones, scale below it).
+/// Scale above 2, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling exact
+/// halves from values beside them. |v| / 2 + 2^(scale-2) is at most 3/4 of 2^bits (unsigned lanes, scale up to their
+/// width) and 3/4 of 2^(bits-1) (signed ones, scale below it).
 template <class W>
 struct RoundShiftSticky {
     explicit RoundShiftSticky(int32_t scale) : rest(scale - 1) {}

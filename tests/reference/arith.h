@@ -21,10 +21,12 @@ struct Exact {
 };
 inline Exact exact(int64_t v) { return {v < 0, v < 0 ? 0 - static_cast<uint64_t>(v) : static_cast<uint64_t>(v)}; }
 inline Exact operator-(Exact a) { return {!a.negative, a.magnitude}; }
-inline Exact operator*(Exact a, Exact b) { return {a.negative != b.negative, a.magnitude * b.magnitude}; }   // up to 2^32 each
+/// Of magnitudes up to 2^32.
+inline Exact operator*(Exact a, Exact b) { return {a.negative != b.negative, a.magnitude * b.magnitude}; }
 inline Exact operator+(Exact a, Exact b) {
     if (a.negative == b.negative) return {a.negative, a.magnitude + b.magnitude};
-    return a.magnitude >= b.magnitude ? Exact{a.negative, a.magnitude - b.magnitude} : Exact{b.negative, b.magnitude - a.magnitude};
+    if (a.magnitude < b.magnitude) return {b.negative, b.magnitude - a.magnitude};
+    return {a.negative, a.magnitude - b.magnitude};
 }
 
 /// 192 bits: numerators up to 2^63 * 2^100 and denominators up to 2^63 * 2^66, with room to double them.
@@ -80,12 +82,15 @@ inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int sca
 template <class T>
 T saturated(bool negative, uint64_t magnitude) {
     using Limits = std::numeric_limits<T>;
-    if (negative) return magnitude >= exact(Limits::min()).magnitude ? Limits::min() : static_cast<T>(-static_cast<int64_t>(magnitude));
+    if (negative && magnitude >= exact(Limits::min()).magnitude) return Limits::min();
+    if (negative) return static_cast<T>(-static_cast<int64_t>(magnitude));
     return magnitude >= static_cast<uint64_t>(Limits::max()) ? Limits::max() : static_cast<T>(magnitude);
 }
 
 template <class T>
-T scaled(Exact v, int scale) { return saturated<T>(v.negative, scaledQuotient(v.magnitude, 1, scale, roundNearestEven)); }
+T scaled(Exact v, int scale) {
+    return saturated<T>(v.negative, scaledQuotient(v.magnitude, 1, scale, roundNearestEven));
+}
 
 template <class T>
 constexpr bool isComplex = requires(T t) { t.re; };
