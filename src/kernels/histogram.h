@@ -3,7 +3,6 @@
 // one element.
 #pragma once
 #include <algorithm>
-#include <array>
 
 #include "simd.h"
 
@@ -150,23 +149,32 @@ struct FloatBins {
     QORI_INLINE int32_t operator()(float value) const { return levelsUpTo(value, levels, count) - 1; }
 };
 
-/// Finds bins of 16-bit elements among increasing levels: the upper byte narrows the search.
+/// Finds bins of 16-bit elements among increasing levels: cells of 32 values narrow the search, mostly to nothing.
 struct WordBins {
-    const int32_t* levels;
-    std::array<int32_t, 257> below;   ///< Levels below lowest + 256 i.
-    int32_t lowest;
+    static constexpr int kCellBits = 5;
+    static constexpr int32_t kCells = 65'536 >> kCellBits;
+    struct Cell {
+        int32_t below;    ///< Levels that are not above the cell's first value.
+        int32_t inside;   ///< Levels among its other values.
+    };
 
-    /// `lowest` is the least value of the element type.
+    const int32_t* levels;
+    int32_t lowest;   ///< Least value of the element type.
+    Cell cells[kCells];
+
     WordBins(const int32_t* l, int32_t n, int32_t least) : levels(l), lowest(least) {
-        int32_t k = 0;
-        for (int32_t i = 0; i <= 256; ++i) {
-            while (k < n && levels[k] < least + 256 * i) ++k;
-            below[static_cast<size_t>(i)] = k;
+        int32_t k = 0, first = least;
+        for (Cell& cell : cells) {
+            while (k < n && levels[k] <= first) ++k;
+            cell.below = k;
+            first += 1 << kCellBits;
+            while (k < n && levels[k] < first) ++k;
+            cell.inside = k - cell.below;
         }
     }
     QORI_INLINE int32_t operator()(int32_t value) const {
-        const auto upper = static_cast<size_t>((value - lowest) >> 8);
-        return below[upper] + levelsUpTo(value, levels + below[upper], below[upper + 1] - below[upper]) - 1;
+        const Cell cell = cells[(value - lowest) >> kCellBits];
+        return cell.below + levelsUpTo(value, levels + cell.below, cell.inside) - 1;
     }
 };
 
