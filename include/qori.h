@@ -216,6 +216,9 @@ typedef struct QorBorderExtent {
  *  only read: any number of threads may use it at once. */
 typedef struct QorResizePlan QorResizePlan;
 
+/** Levels of a prepared histogram: a block of the size that qoriHistogramGetBufferSize reports, aligned to 4 bytes. */
+typedef struct QorHistogramSpec QorHistogramSpec;
+
 /** Version record of the library. */
 typedef struct QorLibraryVersion {
     int32_t versionMajor;
@@ -2465,6 +2468,196 @@ QORI_API QorResult QORI_CALL qoriCountInRange_32f_C3R(const float* pSrc, int32_t
     int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
 QORI_API QorResult QORI_CALL qoriCountInRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
     int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
+
+/* ---- Histograms ----------------------------------------------------------------------------------------------- */
+
+/** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1].
+ *  Shapes    nLevels levels make nLevels - 1 bins. Multi-channel forms take one array of bins, one of levels
+ *            and one count per channel (three for AC4).
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     A value equal to the last level is not counted. Levels need not ascend: a pixel counts in every
+ *            bin that holds it, and a bin whose lower level is not below its upper one stays 0. NaN counts
+ *            nowhere.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_HIST_LEVELS (an nLevels below 2); then nothing is
+ *            written.
+ *  Example   int32_t levels[3] = {0, 128, 256}, dark_bright[2];
+ *            qoriHistogramRange_8u_C1R(src, srcStep, roi, dark_bright, levels, 3);
+ */
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const float* const pLevels[3], const int32_t nLevels[3]);
+
+/** Counts the pixels between levels spaced evenly from lowerLevel to upperLevel, and returns the levels.
+ *  Shapes    nLevels levels make nLevels - 1 bins. Multi-channel forms take one array of bins, one of levels,
+ *            one count and one pair of bounds per channel (three for AC4).
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     What upperLevel - lowerLevel leaves over, divided by the number of bins, widens the first bins by
+ *            one each, in the direction of the levels. Counting is that of qoriHistogramRange: descending
+ *            levels give empty bins.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_HIST_LEVELS (an nLevels below 2); then nothing is
+ *            written.
+ *  Example   int32_t levels[257], histogram[256];
+ *            qoriHistogramEven_8u_C1R(src, srcStep, roi, histogram, levels, 257, 0, 256);
+ */
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, int32_t* pLevels, int32_t nLevels, int32_t lowerLevel, int32_t upperLevel);
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], int32_t* const pLevels[4], const int32_t nLevels[4], const int32_t lowerLevel[4],
+    const int32_t upperLevel[4]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, int32_t* pLevels, int32_t nLevels, int32_t lowerLevel, int32_t upperLevel);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], int32_t* const pLevels[4], const int32_t nLevels[4], const int32_t lowerLevel[4],
+    const int32_t upperLevel[4]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, int32_t* pLevels, int32_t nLevels, int32_t lowerLevel, int32_t upperLevel);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], int32_t* const pLevels[4], const int32_t nLevels[4], const int32_t lowerLevel[4],
+    const int32_t upperLevel[4]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+
+/** Sizes of the record and of the scratch buffer of the prepared histograms.
+ *  Units     Sizes in bytes. nLevels holds one count per channel. The record takes 48 + 4 times the sum of
+ *            nLevels; the buffer takes 1024 (8u), 262144 (16u, 16s) or 0 (32f) per channel. roiSize and uniform
+ *            do not change the sizes.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     dataType is a QorDataType. One that is not supported is reported only after the record's size and
+ *            a buffer size of 0 have been written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_HIST_LEVELS (an nLevels
+ *            below 2), QOR_ERR_DATA_TYPE; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogramGetBufferSize(int32_t dataType, QorImageSize roiSize, const int32_t* nLevels,
+    int32_t numChannels, int32_t uniform, int32_t* pSpecSize, int32_t* pBufferSize);
+
+/** Prepares a histogram with given levels.
+ *  Shapes    pLevels holds one array of float levels per channel, nLevels one count per channel.
+ *  Elements  For integer types the levels are truncated towards zero.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     The record points into itself on 32-bit systems: do not move it.
+ *  Returns   QOR_OK; in this order QOR_ERR_DATA_TYPE (before anything else), QOR_ERR_NULL_PTR (a pointer is
+ *            null), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), for each channel
+ *            QOR_ERR_NULL_PTR, QOR_ERR_HIST_LEVELS (nLevels below 2), QOR_ERR_BAD_RANGE (levels do not
+ *            increase); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogramInit(int32_t dataType, const float* const* pLevels, const int32_t* nLevels,
+    int32_t numChannels, QorHistogramSpec* pSpec);
+
+/** Prepares a histogram with levels spaced uniformly from pLowerLevel to pUpperLevel.
+ *  Shapes    One lower and one upper level and one count per channel.
+ *  Elements  32f: level k is the fused k * width + lower, in double precision; integer types: k * width +
+ *            lower, truncated towards zero.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     Returns QOR_WARN_ADJUSTED, with the record filled, where the bins of an integer type come out
+ *            narrower than 1: some are empty. The record points into itself on 32-bit systems: do not move it.
+ *  Returns   QOR_OK; in this order QOR_ERR_DATA_TYPE (before anything else), QOR_ERR_NULL_PTR (a pointer is
+ *            null), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), for each channel
+ *            QOR_ERR_HIST_LEVELS (nLevels below 2), QOR_ERR_BAD_RANGE (lower level not below the upper one);
+ *            then nothing is written.
+ *  Example   float lower = 0, upper = 65536;
+ *            int32_t count = 257, specSize, bufferSize;
+ *            qoriHistogramGetBufferSize(qor16u, roi, &count, 1, 1, &specSize, &bufferSize);
+ *            QorHistogramSpec* spec = malloc(specSize);
+ *            uint8_t* buffer = malloc(bufferSize);
+ *            qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, spec);
+ *            qoriHistogram_16u_C1R(src, srcStep, roi, histogram, spec, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriHistogramUniformInit(int32_t dataType, const float* pLowerLevel,
+    const float* pUpperLevel, const int32_t* nLevels, int32_t numChannels, QorHistogramSpec* pSpec);
+
+/** Reads the levels of a prepared histogram back, as floats.
+ *  Shapes    ppLevels holds one array per channel, with room for that channel's nLevels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_BAD_ARG (the record is not a
+ *            prepared histogram), QOR_ERR_NULL_PTR (a channel's array is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogramGetLevels(const QorHistogramSpec* pSpec, float* const* ppLevels);
+
+/** Counts the pixels between the levels of a prepared histogram.
+ *  Shapes    pHist: an array of nLevels - 1 bins, or an array of one such per channel.
+ *  Units     srcStep in bytes, at least one row of pixels; roiSize in pixels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     The record must be of the function's type and channels; only its identifier is checked. It is only
+ *            read: calls may share it, each with a buffer of its own. pBuffer must not be null even where its
+ *            size is 0. Levels outside the type's range are taken as its ends. NaN counts nowhere.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (srcStep below 1 or below the bytes of a row), QOR_ERR_BAD_ARG (the record is not
+ *            a prepared histogram); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogram_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
 
 /* ---- Image memory --------------------------------------------------------------------------------------------- */
 

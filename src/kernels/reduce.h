@@ -8,6 +8,7 @@
 // A measure says what is accumulated:
 //     Lanes                            accumulators of one vector position, see reduce_lanes.h
 //     static void feed(Lanes&, Vec<T>...)   adds one vector of each source; zeros add nothing
+//     optionally loadVector(p) and loadRest(p, n)   where vectors are not simply loaded
 // Lanes offer
 //     Total                            type of a channel's result
 //     static constexpr int banks       vectors of a round, in threes: more than 3 where latency would bind
@@ -42,6 +43,18 @@ typename Lanes::Total joinChannel(const typename Lanes::Total* values, int chann
         if (n % 2 != 0) own[n / 2] = own[n - 1];
     }
     return own[0];
+}
+
+template <class Measure, class T>
+QORI_INLINE auto loadFor(const T* p) {
+    if constexpr (requires { Measure::loadVector(p); }) return Measure::loadVector(p);
+    else return load(p);
+}
+
+template <class Measure, class T>
+QORI_INLINE auto loadRestFor(const T* p, ptrdiff_t n) {
+    if constexpr (requires { Measure::loadRest(p, n); }) return Measure::loadRest(p, n);
+    else return loadPartial(p, n);
 }
 
 }  // namespace detail
@@ -110,16 +123,17 @@ QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdif
         const ptrdiff_t rounds = std::min((elements - i) / round, sums.left);
         for (const ptrdiff_t end = i + rounds * round; i < end; i += round) {
 #pragma GCC unroll 6
-            for (int v = 0; v < vectors; ++v) Measure::feed(lanes[v], load(first + i + v * n), load(more + i + v * n)...);
+            for (int v = 0; v < vectors; ++v) Measure::feed(lanes[v], detail::loadFor<Measure>(first + i + v * n), detail::loadFor<Measure>(more + i + v * n)...);
         }
         for (int v = 0; v < vectors; ++v) sums.lanes[v] = lanes[v];
         if ((sums.left -= rounds) == 0) sums.spill(channels);
     }
     if (i == elements) return;
     int v = 0;
-    for (; elements - i >= n; i += n, ++v) Measure::feed(sums.lanes[v], load(first + i), load(more + i)...);
-    if (i < elements)
-        Measure::feed(sums.lanes[v], loadPartial(first + i, elements - i), loadPartial(more + i, elements - i)...);
+    for (; elements - i >= n; i += n, ++v) 
+        Measure::feed(sums.lanes[v], detail::loadFor<Measure>(first + i), detail::loadFor<Measure>(more + i)...);
+    if (const ptrdiff_t rest = elements - i; rest > 0)
+        Measure::feed(sums.lanes[v], detail::loadRestFor<Measure>(first + i, rest), detail::loadRestFor<Measure>(more + i, rest)...);
     if (--sums.left == 0) sums.spill(channels);
 }
 

@@ -134,24 +134,27 @@ QORI_INLINE bool anyBetter(const ExtremumLanes<Order>& lanes, const ChannelVecto
     return same != ~0u;
 }
 
-/// The first pixel of a row whose element of the channel equals value, or -1.
+/// Which bytes of each vector of a round belong to a channel, as bits.
+struct ChannelBits {
+    uint32_t bits[3];
+
+    ChannelBits(int elementBytes, int channels, int channel) : bits{} {
+        for (int at = channel * elementBytes; at < 96; at += channels * elementBytes)
+            bits[at / 32] |= ((1u << elementBytes) - 1) << at % 32;
+    }
+};
+
+/// The index of a row's first element of a channel that equals value, or -1.
 template <class T>
-QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t pixels, int channels, int channel, T value) {
+QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const ChannelBits& channel, T value) {
     constexpr int n = Vec<T>::lanes;
-    uint8_t flags[4] = {};
-    flags[channel] = 255;
-    alignas(32) uint8_t bytes[96];
-    for (int i = 0; i < 96; ++i) bytes[i] = flags[i / static_cast<int>(sizeof(T)) % channels];
-    uint32_t mine[3];
-    for (int v = 0; v < 3; ++v) mine[v] = topBits(load(bytes + 32 * v));
-    const ptrdiff_t elements = pixels * channels;
     const Vec<T> wanted = filled(value);
     int phase = 0;
     for (ptrdiff_t i = 0; i < elements; i += n) {
-        const uint32_t found = detail::equalBytes(loadUpTo(src + i, elements - i), wanted) & mine[phase];
+        const uint32_t found = detail::equalBytes(loadUpTo(src + i, elements - i), wanted) & channel.bits[phase];
         if (found != 0) {
             const ptrdiff_t at = i + __builtin_ctz(found) / static_cast<int>(sizeof(T));
-            return at < elements ? at / channels : -1;   // zeros behind the row may equal the value
+            return at < elements ? at : -1;   // zeros behind the row may equal the value
         }
         phase = phase == 2 ? 0 : phase + 1;
     }

@@ -101,32 +101,28 @@ struct Products<float> {
 };
 
 /// In double precision from the element on: the difference too is taken there.
-struct AccurateMagnitudes {
+struct Accurate {
     using Lanes = DoubleLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a) { lanes.add(toDoubles(magnitude(a))); }
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a, Vec<float> b) { lanes.add(magnitude(toDoubles(a) - toDoubles(b))); }
+    QORI_INLINE static Doubles loadVector(const float* p) { return loadDoubles(p); }
+    QORI_INLINE static Doubles loadRest(const float* p, ptrdiff_t n) { return toDoubles(loadPartial(p, n)); }
 };
 
-struct AccurateSquares {
-    using Lanes = DoubleLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a) {
-        const Doubles d = toDoubles(a);
-        lanes.add(d, d);
-    }
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a, Vec<float> b) {
-        const Doubles d = toDoubles(a) - toDoubles(b);
-        lanes.add(d, d);
-    }
+struct AccurateMagnitudes : Accurate {
+    QORI_INLINE static void feed(Lanes& lanes, Doubles a) { lanes.add(magnitude(a)); }
+    QORI_INLINE static void feed(Lanes& lanes, Doubles a, Doubles b) { lanes.add(magnitude(a - b)); }
 };
 
-struct AccurateValues {
-    using Lanes = DoubleLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a) { lanes.add(toDoubles(a)); }
+struct AccurateSquares : Accurate {
+    QORI_INLINE static void feed(Lanes& lanes, Doubles a) { lanes.add(a, a); }
+    QORI_INLINE static void feed(Lanes& lanes, Doubles a, Doubles b) { lanes.add(a - b, a - b); }
 };
 
-struct AccurateProducts {
-    using Lanes = DoubleLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a, Vec<float> b) { lanes.add(toDoubles(a), toDoubles(b)); }
+struct AccurateValues : Accurate {
+    QORI_INLINE static void feed(Lanes& lanes, Doubles a) { lanes.add(a); }
+};
+
+struct AccurateProducts : Accurate {
+    QORI_INLINE static void feed(Lanes& lanes, Doubles a, Doubles b) { lanes.add(a, b); }
 };
 
 /// For one channel of bytes, neighbours may be added: these need fewer operations than their general forms.

@@ -82,24 +82,46 @@ QorResult minMax(Image<const T> src, QorImageSize roi, T* pMin, T* pMax) {
 
 // --- positions ------------------------------------------------------------------------------------------------------
 
-/// A stretch of a row: rows are taken in pieces, so that the search for a position stays short.
+/// A part of the region: several rows, or a stretch of one. Lanes run through the whole region and are looked at after
+/// each piece, so that rows cost what they cost a plain extremum; the search for a position stays within one piece.
 struct Piece {
     int32_t x, y;
+    QorImageSize size;
 };
 
 constexpr int32_t kPieceElements = 12'288;
+
+/// Calls use(piece) for each piece, from the top and from the left, until it returns false.
+template <class Use>
+void forEachPiece(QorImageSize roi, int channels, Use use) {
+    const int32_t pixels = kPieceElements / channels, width = std::min(roi.width, pixels), height = pixels / width;
+    for (int32_t y = 0; y < roi.height;) {
+        const int32_t rows = std::min(height, roi.height - y);
+        for (int32_t x = 0; x < roi.width;) {
+            const int32_t columns = std::min(width, roi.width - x);
+            if (!use(Piece{x, y, {columns, rows}})) return;
+            x += columns;
+        }
+        y += rows;
+    }
+}
+
+template <class T>
+Image<const T> imageOf(Image<const T> src, int channels, const Piece& piece) {
+    return {src.row(piece.y) + ptrdiff_t{piece.x} * channels, src.step};
+}
 
 template <class Order>
 struct Best {
     using T = typename Order::Element;
     T value = Order::start;
-    Piece piece{0, 0};
+    Piece piece{};
     bool found = false;
 };
 
 /// Keeps the first piece that holds each channel's extremum; false when no later piece can change any.
 template <class Order, class T>
-bool keepBetter(const ExtremumLanes<Order>& lanes, int stored, int results, Piece piece, Best<Order>* best) {
+bool keepBetter(const ExtremumLanes<Order>& lanes, int stored, int results, const Piece& piece, Best<Order>* best) {
     bool open = false;
     for (int c = 0; c < results; ++c) {
         const T value = lanes.ofChannel(stored, c);
@@ -111,36 +133,33 @@ bool keepBetter(const ExtremumLanes<Order>& lanes, int stored, int results, Piec
 
 template <class Order, class T>
 void scanPieces(QorImageSize roi, int stored, int results, Image<const T> src, Best<Order>* best) {
-    const int32_t piecePixels = kPieceElements / stored;
     ExtremumLanes<Order> lanes;
     // The fourth channel of AC4 takes part in the lanes, but nothing of it is better than the limit.
     T values[4] = {Order::start, Order::start, Order::start, results < stored ? Order::limit : Order::start};
     auto pattern = kernels::channelVectors(values, stored);
-    for (int32_t y = 0; y < roi.height; ++y) {
-        const T* row = src.row(y);
-        for (int32_t x = 0; x < roi.width; x += std::min(piecePixels, roi.width - x)) {
-            const ptrdiff_t pixels = std::min(piecePixels, roi.width - x);
-            kernels::extremaRow<T, Order>(pixels * stored, row + ptrdiff_t{x} * stored, lanes);
-            if (!kernels::anyBetter(lanes, pattern)) continue;
-            if (!keepBetter<Order, T>(lanes, stored, results, {x, y}, best)) return;
-            for (int c = 0; c < results; ++c) values[c] = best[c].value;
-            pattern = kernels::channelVectors(values, stored);
-        }
-    }
+    forEachPiece(roi, stored, [&](const Piece& piece) {
+        joinRegion(piece.size, stored, imageOf(src, stored, piece), lanes);
+        if (!kernels::anyBetter(lanes, pattern)) return true;
+        if (!keepBetter<Order, T>(lanes, stored, results, piece, best)) return false;
+        for (int c = 0; c < results; ++c) values[c] = best[c].value;
+        pattern = kernels::channelVectors(values, stored);
+        return true;
+    });
 }
 
-/// The first pixel of the region that equals value in a channel; NaN at the first pixel where there is none.
+/// The first pixel of the region whose element equals value; false, with (0, 0), where there is none.
 template <class T>
-T locateAnywhere(QorImageSize roi, int stored, int channel, Image<const T> src, T value, int32_t* x, int32_t* y) {
+bool locate(QorImageSize roi, int stored, int channel, Image<const T> src, T value, int32_t* x, int32_t* y) {
+    const kernels::ChannelBits bits(elementBytes<T>, stored, channel);
     *x = *y = 0;
     for (int32_t row = 0; row < roi.height; ++row) {
-        const ptrdiff_t at = kernels::findInRow(src.row(row), roi.width, stored, channel, value);
+        const ptrdiff_t at = kernels::findInRow(src.row(row), ptrdiff_t{roi.width} * stored, bits, value);
         if (at < 0) continue;
-        *x = static_cast<int32_t>(at);
+        *x = static_cast<int32_t>(at / stored);
         *y = row;
-        return value;
+        return true;
     }
-    return kNan<T>;
+    return false;
 }
 
 template <class Order, class T>
@@ -148,15 +167,12 @@ QORI_NOINLINE void extremumAndPosition(QorImageSize roi, int stored, int results
     Best<Order> best[4];
     scanPieces<Order>(roi, stored, results, src, best);
     for (int c = 0; c < results; ++c) {
-        const auto& [value, piece, found] = best[c];
-        if (!found) {   // no element is better than the start
-            out[c] = locateAnywhere(roi, stored, c, src, Order::start, &xs[c], &ys[c]);
-            continue;
-        }
-        const ptrdiff_t pixels = std::min(kPieceElements / stored, roi.width - piece.x);
-        out[c] = value;
-        xs[c] = piece.x + static_cast<int32_t>(kernels::findInRow(src.row(piece.y) + ptrdiff_t{piece.x} * stored, pixels, stored, c, value));
-        ys[c] = piece.y;
+        // Without an element better than the start, the start itself may be anywhere.
+        const Piece piece = best[c].found ? best[c].piece : Piece{0, 0, roi};
+        const bool located = locate(piece.size, stored, c, imageOf(src, stored, piece), best[c].value, &xs[c], &ys[c]);
+        out[c] = located ? best[c].value : kNan<T>;
+        xs[c] += piece.x;
+        ys[c] += piece.y;
     }
 }
 
