@@ -15,7 +15,8 @@ COLUMNS = [("Mpix/s", "Mpix/s", "{:,.0f}"), ("GB/s", "GB/s", "{:.1f}"), ("ns", "
 
 def load(path):
     rows = []
-    for run in json.loads(Path(path).read_text())["benchmarks"]:
+    text = Path(path).read_text()           # empty when no name matched
+    for run in json.loads(text)["benchmarks"] if text else []:
         operation, size = run["name"].split("/")[:2]
         rows.append((operation, size, run))
     return rows
