@@ -1,26 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // How the arithmetic families run a row operation: over two images, or over one image and constants.
 #pragma once
-#include <immintrin.h>
-
 #include "frame/checks.h"
+#include "frame/control_scope.h"
 #include "frame/streaming.h"
 #include "kernels/arith.h"
 
 namespace qori::arith {
-
-/// Float arithmetic rounds to nearest and traps nothing, whatever the caller has set; his setting returns at the end.
-class DefaultFloatControl {
-public:
-    DefaultFloatControl() : callers_(_mm_getcsr()) { _mm_setcsr(kRoundNearestMaskAll); }
-    ~DefaultFloatControl() { _mm_setcsr(callers_); }
-    DefaultFloatControl(const DefaultFloatControl&) = delete;
-    DefaultFloatControl& operator=(const DefaultFloatControl&) = delete;
-
-private:
-    static constexpr unsigned kRoundNearestMaskAll = 0x1F80;
-    unsigned callers_;
-};
 
 /// Nothing, for integer elements.
 struct NoFloatControl {
@@ -28,7 +14,7 @@ struct NoFloatControl {
 };
 
 template <class T>
-using FloatControl = std::conditional_t<kernels::isFloat<T>, DefaultFloatControl, NoFloatControl>;
+using FloatControl = std::conditional_t<kernels::isFloat<T>, ControlScope, NoFloatControl>;
 
 template <Layout layout>
 constexpr bool keepsAlpha = layout == Layout::AC4;
@@ -37,7 +23,7 @@ constexpr bool keepsAlpha = layout == Layout::AC4;
 template <Layout layout, class Operation, class T>
 void runBinary(Operation&& operation, Image<const T> first, Image<const T> second, Image<T> dst, QorImageSize roi) {
     [[maybe_unused]] const FloatControl<T> control;
-    const bool streaming = false;
+    const bool streaming = streams(streamRules::copy, traffic(roi, 3 * channels(layout) * elementBytes<T>));
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, first, second);
 }
 
