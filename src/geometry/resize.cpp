@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "checks.h"
+#include "frame/control_scope.h"
 #include "resize_half_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
-#include "frame/control_scope.h"
 
 namespace qori::geometry {
 namespace {

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "resize_plan.h"
 
-#include "lanczos_table.h"
 #include "frame/control_scope.h"
+#include "lanczos_table.h"
 
 namespace qori::geometry {
 namespace {

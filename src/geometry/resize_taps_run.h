@@ -82,7 +82,7 @@ private:
         return width < pixels ? width : pixels;
     }
 
-    /// Strips whose tables and filtered rows stay in the first-level cache.
+    /// Strips whose tables stay in the second-level cache. Longer ones follow the source better than shorter ones.
     static int32_t lineStripOf(int32_t width) {
         constexpr int32_t kElements = 4096;
         constexpr int32_t pixels = kElements / channels / kernels::kTapChunk * kernels::kTapChunk;
