@@ -9,9 +9,14 @@ namespace qori::bench {
 namespace {
 
 template <class T>
-struct PartOf { using type = T; };
-template <class T> requires requires(T t) { t.re; }
-struct PartOf<T> { using type = decltype(T::re); };
+struct PartOf {
+    using type = T;
+};
+template <class T>
+requires requires(T t) { t.re; }
+struct PartOf<T> {
+    using type = decltype(T::re);
+};
 
 /// An image of any element type. No element is zero and few results saturate.
 template <class T>
@@ -59,16 +64,19 @@ template <class T, int channels = 1, class Function, class Element, class... Sca
 Row binary(std::string name, double bestAtL2, double bestAtFrame, Function function, Element element, Scale... scale) {
     const auto make = [=](Size size) {
         const Images<T, channels> images(size);
-        return Contenders{
-            [=] {
-                function(images.a.data(), images.a.step(), images.b.data(), images.b.step(), images.dst.data(),
-                         images.dst.step(), size.roi(), scale...);
-            },
-            [=] { plainRows<channels>(images.a, images.b, images.dst, size, element); },
-            {}};
+        return Contenders{[=] {
+                              function(images.a.data(), images.a.step(), images.b.data(), images.b.step(),
+                                       images.dst.data(), images.dst.step(), size.roi(), scale...);
+                          },
+                          [=] { plainRows<channels>(images.a, images.b, images.dst, size, element); },
+                          {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = 3.0 * channels * sizeof(T), .sizes = withSmall(),
-            .make = make, .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = 3.0 * channels * sizeof(T),
+            .sizes = withSmall(),
+            .make = make,
+            .bestAtL2 = bestAtL2,
+            .bestAtFrame = bestAtFrame};
 }
 
 /// element(value, a); every channel has a value of its own.
@@ -77,34 +85,40 @@ Row constant(std::string name, double bestAtL2, double bestAtFrame, Function fun
              Scale... scale) {
     const auto make = [=](Size size) {
         const Images<T, channels> images(size);
-        return Contenders{
-            [=] {
-                const T values[4] = {T(3), T(5), T(7), T(9)};
-                const auto value = [&] {
-                    if constexpr (channels == 1) return values[0];
-                    else return values;
-                }();
-                function(images.a.data(), images.a.step(), value, images.dst.data(), images.dst.step(), size.roi(),
-                         scale...);
-            },
-            [=] {
-                const int width = size.width, height = size.height;   // the closure's might change with the stores
-                T hidden[4] = {T(3), T(5), T(7), T(9)};
-                keep(hidden);
-                T values[channels];   // never shown to anyone, so that the stores below cannot change it
-                std::copy_n(hidden, channels, values);
-                for (int y = 0; y < height; ++y) {
-                    const T* s = images.a.row(y);
-                    T* d = images.dst.row(y);
-                    for (int x = 0; x < width * channels; x += channels)
-                        for (int c = 0; c < channels; ++c) d[x + c] = element(values[c], s[x + c]);
-                    keep(d);
-                }
-            },
-            {}};
+        return Contenders{[=] {
+                              const T values[4] = {T(3), T(5), T(7), T(9)};
+                              const auto value = [&] {
+                                  if constexpr (channels == 1)
+                                      return values[0];
+                                  else
+                                      return values;
+                              }();
+                              function(images.a.data(), images.a.step(), value, images.dst.data(), images.dst.step(),
+                                       size.roi(), scale...);
+                          },
+                          [=] {
+                              const int width = size.width,
+                                        height = size.height;  // the closure's might change with the stores
+                              T hidden[4] = {T(3), T(5), T(7), T(9)};
+                              keep(hidden);
+                              T values[channels];  // never shown to anyone, so that the stores below cannot change it
+                              std::copy_n(hidden, channels, values);
+                              for (int y = 0; y < height; ++y) {
+                                  const T* s = images.a.row(y);
+                                  T* d = images.dst.row(y);
+                                  for (int x = 0; x < width * channels; x += channels)
+                                      for (int c = 0; c < channels; ++c) d[x + c] = element(values[c], s[x + c]);
+                                  keep(d);
+                              }
+                          },
+                          {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = 2.0 * channels * sizeof(T), .sizes = withSmall(),
-            .make = make, .bestAtL2 = bestAtL2, .bestAtFrame = bestAtFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = 2.0 * channels * sizeof(T),
+            .sizes = withSmall(),
+            .make = make,
+            .bestAtL2 = bestAtL2,
+            .bestAtFrame = bestAtFrame};
 }
 
 template <class T>
@@ -158,8 +172,10 @@ constexpr auto complexQuotient = [](auto a, auto b) {
     const double re = double(b.re) * a.re + double(b.im) * a.im, im = double(b.im) * a.re - double(b.re) * a.im;
     using Part = decltype(a.re);
     const auto element = [](double x, double y) { return decltype(a){static_cast<Part>(x), static_cast<Part>(y)}; };
-    if constexpr (std::is_same_v<Part, float>) return element(re / norm, im / norm);
-    else return element(std::nearbyint(re / norm), std::nearbyint(im / norm));
+    if constexpr (std::is_same_v<Part, float>)
+        return element(re / norm, im / norm);
+    else
+        return element(std::nearbyint(re / norm), std::nearbyint(im / norm));
 };
 bool zeroMet = false;
 template <class T>
@@ -195,9 +211,10 @@ const Rows rows{{
     binary<int16_t>("mul 16s C1 sfs 8", 0, 0, qoriMul_16s_C1RSfs, scaledProduct<int16_t, 8>, 8),
     binary<QorComplex16s>("mul 16sc C1 sfs 0", 0, 0, qoriMul_16sc_C1RSfs, complexProduct, 0),
     binary<QorComplex32s>("mul 32sc C1 sfs 0", 0, 0, qoriMul_32sc_C1RSfs, complexProduct32, 0),
-    binary<QorComplex32f>("mul 32fc C1", 0, 0, qoriMul_32fc_C1R, [](QorComplex32f a, QorComplex32f b) {
-        return QorComplex32f{a.re * b.re - a.im * b.im, a.re * b.im + a.im * b.re};
-    }),
+    binary<QorComplex32f>("mul 32fc C1", 0, 0, qoriMul_32fc_C1R,
+                          [](QorComplex32f a, QorComplex32f b) {
+                              return QorComplex32f{a.re * b.re - a.im * b.im, a.re * b.im + a.im * b.re};
+                          }),
     binary<uint8_t>("mulScale 8u C1", 0, 0, qoriMulScale_8u_C1R, fractionProduct),
     binary<uint16_t>("mulScale 16u C1", 0, 0, qoriMulScale_16u_C1R, fractionProduct),
     binary<uint8_t>("div 8u C1 sfs 0", 0, 0, qoriDiv_8u_C1RSfs, quotient<uint8_t>, 0),

@@ -19,17 +19,22 @@ Row reductionRow(std::string name, Ours ours, Plain plain, Best best = {}, std::
     const auto make = [=](Size size) {
         std::vector<Image<T>> images;
         for (int i = 0; i < sources; ++i) images.push_back(Image<T>(size, n));
-        return Contenders{
-            [=] { ours(images, size.roi()); },
-            [=] {
-                double sums[4] = {};
-                for (int y = 0; y < size.height; ++y) plain(images[0].row(y), images[sources - 1].row(y), size.width, sums);
-                keep(sums);
-            },
-            {}};
+        return Contenders{[=] { ours(images, size.roi()); },
+                          [=] {
+                              double sums[4] = {};
+                              for (int y = 0; y < size.height; ++y)
+                                  plain(images[0].row(y), images[sources - 1].row(y), size.width, sums);
+                              keep(sums);
+                          },
+                          {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = double(n * sources * sizeof(T)), .sizes = std::move(sizes), .make = make,
-            .roofline = Roofline::read, .bestAtL2 = best.atL2, .bestAtFrame = best.atFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = double(n * sources * sizeof(T)),
+            .sizes = std::move(sizes),
+            .make = make,
+            .roofline = Roofline::read,
+            .bestAtL2 = best.atL2,
+            .bestAtFrame = best.atFrame};
 }
 
 /// One term per element, added as the compiler likes: in 64-bit integers, or in the float type of Real.
@@ -39,7 +44,8 @@ auto plainSum(Term term) {
         using Total = std::conditional_t<std::is_floating_point_v<T>, Real, int64_t>;
         Total row[n] = {};
         for (int x = 0; x < width; ++x)
-            for (int c = 0; c < n; ++c) row[c] += static_cast<Total>(term(static_cast<Total>(a[x * n + c]), static_cast<Total>(b[x * n + c])));
+            for (int c = 0; c < n; ++c)
+                row[c] += static_cast<Total>(term(static_cast<Total>(a[x * n + c]), static_cast<Total>(b[x * n + c])));
         for (int c = 0; c < n; ++c) sums[c] += static_cast<double>(row[c]);
     };
 }
@@ -84,28 +90,38 @@ const Rows norms{{
     reductionRow<uint8_t, 4, 1>("sum 8u C4", unary(qoriSum_8u_C4R), plainSum<uint8_t, 4>(kValue)),
     reductionRow<uint16_t, 1, 1>("sum 16u C1", unary(qoriSum_16u_C1R), plainSum<uint16_t, 1>(kValue)),
     reductionRow<int16_t, 3, 1>("sum 16s C3", unary(qoriSum_16s_C3R), plainSum<int16_t, 3>(kValue)),
-    reductionRow<float, 1, 1>("sum 32f C1 fast", unary(qoriSum_32f_C1R, hintFast), plainSum<float, 1>(kValue), {11'570, 5'701}),
-    reductionRow<float, 1, 1>("sum 32f C1 accurate", unary(qoriSum_32f_C1R, hintAccurate), plainSum<float, 1, double>(kValue), {11'521, 5'723}),
+    reductionRow<float, 1, 1>("sum 32f C1 fast", unary(qoriSum_32f_C1R, hintFast), plainSum<float, 1>(kValue),
+                              {11'570, 5'701}),
+    reductionRow<float, 1, 1>("sum 32f C1 accurate", unary(qoriSum_32f_C1R, hintAccurate),
+                              plainSum<float, 1, double>(kValue), {11'521, 5'723}),
     reductionRow<float, 3, 1>("sum 32f C3 fast", unary(qoriSum_32f_C3R, hintFast), plainSum<float, 3>(kValue)),
     reductionRow<uint8_t, 1, 1>("norm Inf 8u C1", unary(qoriNorm_Inf_8u_C1R), plainLargest<uint8_t, 1>()),
     reductionRow<uint8_t, 3, 1>("norm Inf 8u C3", unary(qoriNorm_Inf_8u_C3R), plainLargest<uint8_t, 3>()),
-    reductionRow<float, 1, 1>("norm L1 32f C1 fast", unary(qoriNorm_L1_32f_C1R, hintFast), plainSum<float, 1>([](auto a, auto) { return std::abs(a); })),
-    reductionRow<uint8_t, 1, 1>("norm L2 8u C1", unary(qoriNorm_L2_8u_C1R), plainSum<uint8_t, 1>(kSquare), {54'766, 28'426}),
+    reductionRow<float, 1, 1>("norm L1 32f C1 fast", unary(qoriNorm_L1_32f_C1R, hintFast),
+                              plainSum<float, 1>([](auto a, auto) { return std::abs(a); })),
+    reductionRow<uint8_t, 1, 1>("norm L2 8u C1", unary(qoriNorm_L2_8u_C1R), plainSum<uint8_t, 1>(kSquare),
+                                {54'766, 28'426}),
     reductionRow<uint8_t, 3, 1>("norm L2 8u C3", unary(qoriNorm_L2_8u_C3R), plainSum<uint8_t, 3>(kSquare)),
     reductionRow<uint8_t, 4, 1>("norm L2 8u C4", unary(qoriNorm_L2_8u_C4R), plainSum<uint8_t, 4>(kSquare)),
     reductionRow<uint16_t, 1, 1>("norm L2 16u C1", unary(qoriNorm_L2_16u_C1R), plainSum<uint16_t, 1>(kSquare)),
     reductionRow<float, 1, 1>("norm L2 32f C1 fast", unary(qoriNorm_L2_32f_C1R, hintFast), plainSum<float, 1>(kSquare)),
     reductionRow<float, 3, 1>("norm L2 32f C3 fast", unary(qoriNorm_L2_32f_C3R, hintFast), plainSum<float, 3>(kSquare)),
-    reductionRow<uint8_t, 1, 2>("normdiff L1 8u C1", binary(qoriNormDiff_L1_8u_C1R), plainSum<uint8_t, 1>(kDistance), {76'990, 14'682}),
+    reductionRow<uint8_t, 1, 2>("normdiff L1 8u C1", binary(qoriNormDiff_L1_8u_C1R), plainSum<uint8_t, 1>(kDistance),
+                                {76'990, 14'682}),
     reductionRow<uint8_t, 3, 2>("normdiff L1 8u C3", binary(qoriNormDiff_L1_8u_C3R), plainSum<uint8_t, 3>(kDistance)),
-    reductionRow<uint8_t, 1, 2>("normdiff L2 8u C1", binary(qoriNormDiff_L2_8u_C1R), plainSum<uint8_t, 1>(kSquaredDistance), {43'406, 14'723}),
-    reductionRow<uint8_t, 3, 2>("normdiff L2 8u C3", binary(qoriNormDiff_L2_8u_C3R), plainSum<uint8_t, 3>(kSquaredDistance)),
+    reductionRow<uint8_t, 1, 2>("normdiff L2 8u C1", binary(qoriNormDiff_L2_8u_C1R),
+                                plainSum<uint8_t, 1>(kSquaredDistance), {43'406, 14'723}),
+    reductionRow<uint8_t, 3, 2>("normdiff L2 8u C3", binary(qoriNormDiff_L2_8u_C3R),
+                                plainSum<uint8_t, 3>(kSquaredDistance)),
     reductionRow<uint8_t, 1, 2>("normrel L1 8u C1", binary(qoriNormRel_L1_8u_C1R), plainSum<uint8_t, 1>(kDistance)),
-    reductionRow<uint8_t, 1, 2>("dot product 8u C1", binary(qoriDotProd_8u64f_C1R), plainSum<uint8_t, 1>(kProduct), {42'924, 14'939}),
+    reductionRow<uint8_t, 1, 2>("dot product 8u C1", binary(qoriDotProd_8u64f_C1R), plainSum<uint8_t, 1>(kProduct),
+                                {42'924, 14'939}),
     reductionRow<uint8_t, 3, 2>("dot product 8u C3", binary(qoriDotProd_8u64f_C3R), plainSum<uint8_t, 3>(kProduct)),
     reductionRow<int16_t, 1, 2>("dot product 16s C1", binary(qoriDotProd_16s64f_C1R), plainSum<int16_t, 1>(kProduct)),
-    reductionRow<float, 1, 2>("dot product 32f C1 fast", binary(qoriDotProd_32f64f_C1R, hintFast), plainSum<float, 1>(kProduct), {8'997, 3'502}),
-    reductionRow<float, 1, 2>("dot product 32f C1 accurate", binary(qoriDotProd_32f64f_C1R, hintAccurate), plainSum<float, 1, double>(kProduct)),
+    reductionRow<float, 1, 2>("dot product 32f C1 fast", binary(qoriDotProd_32f64f_C1R, hintFast),
+                              plainSum<float, 1>(kProduct), {8'997, 3'502}),
+    reductionRow<float, 1, 2>("dot product 32f C1 accurate", binary(qoriDotProd_32f64f_C1R, hintAccurate),
+                              plainSum<float, 1, double>(kProduct)),
 }};
 
 template <class T, int n, class Function>
@@ -165,26 +181,34 @@ Row indexRow(std::string name, Function function, Best best) {
     const auto make = [=](Size size) {
         std::vector<Image<T>> images{Image<T>(size, 1)};
         for (int y = 0; y < size.height; ++y)
-            for (int x = 0; x < size.width; ++x) images[0].row(y)[x] = std::min(images[0].row(y)[x], static_cast<T>(200));
+            for (int x = 0; x < size.width; ++x)
+                images[0].row(y)[x] = std::min(images[0].row(y)[x], static_cast<T>(200));
         images[0].row(size.height - 1)[size.width - 1] = 201;
         const auto ours = indexed<T>(function);
         return Contenders{[=] { ours(images, size.roi()); },
                           [=] {
                               double sums[2] = {-1, 0};
-                              for (int y = 0; y < size.height; ++y) plainIndex<T>(images[0].row(y), nullptr, size.width, sums);
+                              for (int y = 0; y < size.height; ++y)
+                                  plainIndex<T>(images[0].row(y), nullptr, size.width, sums);
                               keep(sums);
                           },
                           {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = sizeof(T), .sizes = kSizes, .make = make, .roofline = Roofline::read,
-            .bestAtL2 = best.atL2, .bestAtFrame = best.atFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = sizeof(T),
+            .sizes = kSizes,
+            .make = make,
+            .roofline = Roofline::read,
+            .bestAtL2 = best.atL2,
+            .bestAtFrame = best.atFrame};
 }
 
 const auto blocks8u = [](const auto& images, QorImageSize roi) {
     static std::vector<uint8_t> low(1 << 20), high(1 << 20);
     uint8_t all[2];
     const int step = (roi.width + 15) / 16;
-    qoriBlockMinMax_8u_C1R(images[0].data(), images[0].step(), roi, low.data(), step, high.data(), step, {16, 16}, all, all + 1);
+    qoriBlockMinMax_8u_C1R(images[0].data(), images[0].step(), roi, low.data(), step, high.data(), step, {16, 16}, all,
+                           all + 1);
     keep(low.data());
 };
 
@@ -199,12 +223,15 @@ const Rows extrema{{
     reductionRow<uint8_t, 3, 1>("max 8u C3", extremum<uint8_t, 3>(qoriMax_8u_C3R), plainLargest<uint8_t, 3>()),
     reductionRow<uint16_t, 1, 1>("max 16u C1", extremum<uint16_t, 1>(qoriMax_16u_C1R), plainLargest<uint16_t, 1>()),
     reductionRow<float, 1, 1>("max 32f C1", extremum<float, 1>(qoriMax_32f_C1R), plainLargest<float, 1>()),
-    reductionRow<uint8_t, 1, 1>("minMax 8u C1", bothExtrema<uint8_t, 1>(qoriMinMax_8u_C1R), plainMinMax<uint8_t>, {71'798, 29'263}),
-    reductionRow<float, 1, 1>("minMax 32f C1", bothExtrema<float, 1>(qoriMinMax_32f_C1R), plainMinMax<float>, {2'580, 1'665}),
+    reductionRow<uint8_t, 1, 1>("minMax 8u C1", bothExtrema<uint8_t, 1>(qoriMinMax_8u_C1R), plainMinMax<uint8_t>,
+                                {71'798, 29'263}),
+    reductionRow<float, 1, 1>("minMax 32f C1", bothExtrema<float, 1>(qoriMinMax_32f_C1R), plainMinMax<float>,
+                              {2'580, 1'665}),
     indexRow<uint8_t>("maxIndx 8u C1", qoriMaxIndx_8u_C1R, {10'793, 7'467}),
     indexRow<float>("maxIndx 32f C1", qoriMaxIndx_32f_C1R, {2'623, 1'573}),
     reductionRow<uint8_t, 1, 1>("blockMinMax 16x16 8u C1", blocks8u, plainMinMax<uint8_t>),
-    reductionRow<uint8_t, 1, 1>("countInRange 8u C1", inRange8u, plainSum<uint8_t, 1>([](auto a, auto) { return a >= 50 && a <= 180; })),
+    reductionRow<uint8_t, 1, 1>("countInRange 8u C1", inRange8u,
+                                plainSum<uint8_t, 1>([](auto a, auto) { return a >= 50 && a <= 180; })),
 }};
 
 /// Noise over the whole type; `flat` makes all pixels equal. plain is one table and one loop.
@@ -214,19 +241,26 @@ Row histogramRow(std::string name, bool flat, Ours ours, Best best = {}) {
         Image<T> image(size, n);
         uint32_t state = 7;
         for (int y = 0; y < size.height; ++y)
-            for (int i = 0; i < image.elements(); ++i) image.row(y)[i] = flat ? T{9} : static_cast<T>((state = state * 1664525u + 1013904223u) >> 12);
+            for (int i = 0; i < image.elements(); ++i)
+                image.row(y)[i] = flat ? T{9} : static_cast<T>((state = state * 1664525u + 1013904223u) >> 12);
         const auto table = std::make_shared<std::vector<int32_t>>(n << 8 * sizeof(T));
         return Contenders{[=] { ours(image, size.roi()); },
                           [=] {
                               for (int y = 0; y < size.height; ++y)
                                   for (int x = 0; x < size.width; ++x)
-                                      for (int c = 0; c < n; ++c) ++(*table)[static_cast<size_t>(image.row(y)[x * n + c] * n + c)];
+                                      for (int c = 0; c < n; ++c)
+                                          ++(*table)[static_cast<size_t>(image.row(y)[x * n + c] * n + c)];
                               keep(table->data());
                           },
                           {}};
     };
-    return {.operation = std::move(name), .bytesPerPixel = n * sizeof(T), .sizes = {kL1, kL2, kFrame, kNarrow}, .make = make,
-            .roofline = Roofline::read, .bestAtL2 = best.atL2, .bestAtFrame = best.atFrame};
+    return {.operation = std::move(name),
+            .bytesPerPixel = n * sizeof(T),
+            .sizes = {kL1, kL2, kFrame, kNarrow},
+            .make = make,
+            .roofline = Roofline::read,
+            .bestAtL2 = best.atL2,
+            .bestAtFrame = best.atFrame};
 }
 
 std::vector<int32_t> levelsUpTo(int32_t last) {
@@ -260,7 +294,8 @@ auto words(int32_t count) {
     const auto bins = std::make_shared<std::vector<int32_t>>(count);
     qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, reinterpret_cast<QorHistogramSpec*>(spec->data()));
     return [=](const Image<uint16_t>& image, QorImageSize roi) {
-        qoriHistogram_16u_C1R(image.data(), image.step(), roi, bins->data(), reinterpret_cast<const QorHistogramSpec*>(spec->data()), buffer->data());
+        qoriHistogram_16u_C1R(image.data(), image.step(), roi, bins->data(),
+                              reinterpret_cast<const QorHistogramSpec*>(spec->data()), buffer->data());
         keep(bins->data());
     };
 }

@@ -18,8 +18,10 @@ bool allValues(const T* value, Predicate predicate) {
 
 template <class T>
 bool isZeroValue(T value) {
-    if constexpr (kernels::isComplex<T>) return value.re == 0 && value.im == 0;
-    else return value == 0;
+    if constexpr (kernels::isComplex<T>)
+        return value.re == 0 && value.im == 0;
+    else
+        return value == 0;
 }
 
 template <Layout layout, class T>
@@ -52,8 +54,9 @@ void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
         constexpr int pixel = channels(layout) * elementBytes<T>;
         const bool streaming = streams(streamRules::copy, traffic(roi, 2 * pixel));
         const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
-        forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); },
-                   walk(src, channels(layout)), walk(dst, channels(layout)));
+        forEachRow(
+            roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); },
+            walk(src, channels(layout)), walk(dst, channels(layout)));
         if (streaming) streamFence();
     }
 }
@@ -68,8 +71,8 @@ QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize
 template <class T, Layout layout, Kind kind>
 QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t> ||
-                             (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
+    constexpr bool anyStep =
+        std::is_same_v<T, uint8_t> || (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
     if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
@@ -79,7 +82,7 @@ QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImage
     }
     if constexpr (std::is_unsigned_v<T>) {
         constexpr int bits = 8 * elementBytes<T>;
-        if (scale <= -bits && allValues<layout>(value, [](T v) { return v != 0; })) {   // no sum is 0
+        if (scale <= -bits && allValues<layout>(value, [](T v) { return v != 0; })) {  // no sum is 0
             fillConstant<layout>(dst, roi, std::numeric_limits<T>::max());
             return QOR_OK;
         }

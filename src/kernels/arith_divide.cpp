@@ -18,7 +18,7 @@ constexpr uint64_t kBeyondRange = uint64_t{1} << 32;
 uint64_t roundedQuotient(uint64_t n, uint64_t d, int32_t scale) {
     Mixed m{n / d, n % d, d};
     if (scale > 0) {
-        if (scale >= 64) return 0;   // at most 2^63 / 2^64
+        if (scale >= 64) return 0;  // at most 2^63 / 2^64
         const uint64_t whole = m.q >> scale, rest = m.q - (whole << scale), half = uint64_t{1} << (scale - 1);
         return whole + (rest > half || (rest == half && (m.r != 0 || whole % 2 == 1)));
     }

@@ -39,8 +39,8 @@ struct ZeroDivisors {
     /// Only the first `count` elements of a tail are there.
     template <class T>
     QORI_INLINE void noteFirst(__m256i isZero, ptrdiff_t count) {
-        const __m256i index = _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19,
-                                               20, 21, 22, 23, 24, 25, 26, 27, 28, 29, 30, 31);
+        const __m256i index = _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20,
+                                               21, 22, 23, 24, 25, 26, 27, 28, 29, 30, 31);
         const auto bytes = static_cast<int8_t>(count * static_cast<ptrdiff_t>(sizeof(T)));
         note(_mm256_and_si256(isZero, _mm256_cmpgt_epi8(_mm256_set1_epi8(bytes), index)));
     }
@@ -79,9 +79,12 @@ QORI_INLINE Vec<double> roundHalfFromZero(Vec<double> x) {
 
 template <QorRoundingMode mode, class F>
 QORI_INLINE Vec<F> rounded(Vec<F> x) {
-    if constexpr (mode == roundTowardZero) return truncate(x);
-    else if constexpr (mode == roundHalfAway) return roundHalfFromZero(x);
-    else return roundToEven(x);
+    if constexpr (mode == roundTowardZero)
+        return truncate(x);
+    else if constexpr (mode == roundHalfAway)
+        return roundHalfFromZero(x);
+    else
+        return roundToEven(x);
 }
 
 // --- 8u, 16u, 16s ---------------------------------------------------------------------------------------------------
@@ -90,9 +93,13 @@ QORI_INLINE Vec<F> rounded(Vec<F> x) {
 template <class F>
 struct Divisors;
 template <>
-struct Divisors<float> { __m256 all; };
+struct Divisors<float> {
+    __m256 all;
+};
 template <>
-struct Divisors<double> { __m256d low, high; };
+struct Divisors<double> {
+    __m256d low, high;
+};
 
 /// Quotients of eight 32-bit integers, rounded and clamped to the range of T. The scale goes to the divisors: there it
 /// is no work where they are constants.
@@ -131,8 +138,10 @@ private:
 
     static QORI_INLINE __m256 nonZero(__m256 d) {
         const __m256 tiny = _mm256_set1_ps(static_cast<float>(kTiny));
-        if constexpr (!std::is_signed_v<T>) return _mm256_max_ps(d, tiny);
-        else return _mm256_blendv_ps(d, tiny, _mm256_cmp_ps(d, _mm256_setzero_ps(), _CMP_EQ_OQ));
+        if constexpr (!std::is_signed_v<T>)
+            return _mm256_max_ps(d, tiny);
+        else
+            return _mm256_blendv_ps(d, tiny, _mm256_cmp_ps(d, _mm256_setzero_ps(), _CMP_EQ_OQ));
     }
     static QORI_INLINE __m256d nonZero(__m256d d) {
         return _mm256_blendv_pd(d, _mm256_set1_pd(kTiny), _mm256_cmp_pd(d, _mm256_setzero_pd(), _CMP_EQ_OQ));
@@ -145,7 +154,9 @@ template <class T, QorRoundingMode mode, class F>
 struct DivideIntegers {
     static constexpr int eights = Vec<T>::lanes / 8;
     /// The divisors of one vector of elements, in the order of widen().
-    struct Prepared { Divisors<F> eight[eights]; };
+    struct Prepared {
+        Divisors<F> eight[eights];
+    };
 
     explicit DivideIntegers(int32_t scale) : quotients(scale) {}
 
@@ -188,8 +199,10 @@ private:
 /// Calls use(divide) with the division of integers T.
 template <class T, QorRoundingMode mode, class Use>
 void withRoundedDivision(int32_t scale, Use use) {
-    if (sizeof(T) == 1 || scale >= -6) use(DivideIntegers<T, mode, float>{scale});
-    else if constexpr (sizeof(T) != 1) use(DivideIntegers<T, mode, double>{scale});
+    if (sizeof(T) == 1 || scale >= -6)
+        use(DivideIntegers<T, mode, float>{scale});
+    else if constexpr (sizeof(T) != 1)
+        use(DivideIntegers<T, mode, double>{scale});
 }
 
 // --- complex integers -----------------------------------------------------------------------------------------------
@@ -262,8 +275,8 @@ private:
         const __m256d y = _mm256_cvtepi32_pd(first), x = _mm256_cvtepi32_pd(second), sign = _mm256_set1_pd(-0.);
         const __m256d squares = _mm256_mul_pd(y, y), norm = _mm256_add_pd(squares, _mm256_permute_pd(squares, 0x5));
         const __m256d inverse = _mm256_div_pd(_mm256_set1_pd(factor), _mm256_max_pd(norm, _mm256_set1_pd(1)));
-        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                                     // ca, da
-        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));   // db, cb
+        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                                    // ca, da
+        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));  // db, cb
         const __m256d sum = _mm256_addsub_pd(byReal, _mm256_xor_pd(byImaginary, sign));
         const __m256d size = _mm256_add_pd(_mm256_andnot_pd(sign, byReal), _mm256_andnot_pd(sign, byImaginary));
         const __m256d q = _mm256_mul_pd(sum, inverse);
@@ -337,8 +350,8 @@ private:
     static QORI_INLINE __m128 quotients(__m128 numerators, __m128 divisors) {
         const __m256d x = _mm256_cvtps_pd(numerators), y = _mm256_cvtps_pd(divisors);
         const __m256d squares = _mm256_mul_pd(y, y), norm = _mm256_add_pd(squares, _mm256_permute_pd(squares, 0x5));
-        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                          // ca, da
-        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));   // db, cb
+        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                                    // ca, da
+        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));  // db, cb
         const __m256d sums = _mm256_addsub_pd(byReal, _mm256_xor_pd(byImaginary, _mm256_set1_pd(-0.)));
         return _mm256_cvtpd_ps(_mm256_div_pd(sums, norm));
     }
@@ -383,11 +396,16 @@ struct DivisionByConstants {
 /// Calls use(divide) with the division of elements T.
 template <class T, class Use>
 void withDivision(int32_t scale, Use use) {
-    if constexpr (std::is_same_v<T, QorComplex16s>) use(DivideComplex16{scale});
-    else if constexpr (std::is_same_v<T, QorComplex32s>) use(DivideComplex32{scale});
-    else if constexpr (std::is_same_v<T, QorComplex32f>) use(DivideComplexFloats{scale});
-    else if constexpr (std::is_same_v<T, float>) use(DivideFloats{scale});
-    else withRoundedDivision<T, roundNearestEven>(scale, use);
+    if constexpr (std::is_same_v<T, QorComplex16s>)
+        use(DivideComplex16{scale});
+    else if constexpr (std::is_same_v<T, QorComplex32s>)
+        use(DivideComplex32{scale});
+    else if constexpr (std::is_same_v<T, QorComplex32f>)
+        use(DivideComplexFloats{scale});
+    else if constexpr (std::is_same_v<T, float>)
+        use(DivideFloats{scale});
+    else
+        withRoundedDivision<T, roundNearestEven>(scale, use);
 }
 
 }  // namespace qori::kernels

@@ -13,7 +13,7 @@ namespace qori::kernels {
 template <int channels>
 struct ByteCounters {
     static constexpr int tables = channels == 3 ? 6 : 8;
-    static constexpr int group = channels == 3 ? 12 : 8;   ///< Elements read at a time, whole pixels.
+    static constexpr int group = channels == 3 ? 12 : 8;  ///< Elements read at a time, whole pixels.
 
     uint32_t table[tables][256] = {};
 
@@ -94,7 +94,8 @@ inline bool consecutive(const int32_t* levels) {
 
 /// bins[k] = sum of the counters of the values from levels[k] up to levels[k + 1]. Counter 0 is that of `lowest`, and
 /// levels beyond the counters are clamped. Levels need no order.
-inline void sumBins(const uint32_t* counters, int32_t values, int32_t lowest, const int32_t* levels, int32_t count, int32_t* bins) {
+inline void sumBins(const uint32_t* counters, int32_t values, int32_t lowest, const int32_t* levels, int32_t count,
+                    int32_t* bins) {
     const auto clamped = [=](int32_t level) {
         return static_cast<int32_t>(std::clamp<int64_t>(int64_t{level} - lowest, 0, values));
     };
@@ -154,12 +155,12 @@ struct WordBins {
     static constexpr int kCellBits = 5;
     static constexpr int32_t kCells = 65'536 >> kCellBits;
     struct Cell {
-        int32_t below;    ///< Levels that are not above the cell's first value.
-        int32_t inside;   ///< Levels among its other values.
+        int32_t below;   ///< Levels that are not above the cell's first value.
+        int32_t inside;  ///< Levels among its other values.
     };
 
     const int32_t* levels;
-    int32_t lowest;   ///< Least value of the element type.
+    int32_t lowest;  ///< Least value of the element type.
     Cell cells[kCells];
 
     WordBins(const int32_t* l, int32_t n, int32_t least) : levels(l), lowest(least) {
@@ -180,12 +181,13 @@ struct WordBins {
 
 /// Counts one channel of a row through a finder of bins; step is the distance of its elements.
 template <class Bins, class T>
-QORI_NOINLINE void countByBinRow(const Bins& binOf, const T* src, ptrdiff_t pixels, int step, int32_t last, int32_t* bins) {
+QORI_NOINLINE void countByBinRow(const Bins& binOf, const T* src, ptrdiff_t pixels, int step, int32_t last,
+                                 int32_t* bins) {
     const auto count = [=](int32_t bin) {
         if (static_cast<uint32_t>(bin) < static_cast<uint32_t>(last)) ++bins[bin];
     };
     ptrdiff_t x = 0;
-    for (; x <= pixels - 4; x += 4, src += 4 * step) {   // four searches at a time hide each other's latency
+    for (; x <= pixels - 4; x += 4, src += 4 * step) {  // four searches at a time hide each other's latency
         const int32_t a = binOf(src[0]), b = binOf(src[step]), d = binOf(src[2 * step]), e = binOf(src[3 * step]);
         count(a);
         count(b);

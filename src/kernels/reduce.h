@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Reductions of a region to one number per channel: one row loop for every measure, type and layout.
 //
-// Elements are taken in rounds of three vectors (or a multiple). Three vectors hold a whole number of pixels of 1, 3 and
-// 4 channels, so an accumulator lane sees one channel only, in every row, and layouts share their code: channels are
-// told apart once, at the end. AC4 is four channels of which the last is not asked for.
+// Elements are taken in rounds of three vectors (or a multiple). Three vectors hold a whole number of pixels of 1, 3
+// and 4 channels, so an accumulator lane sees one channel only, in every row, and layouts share their code: channels
+// are told apart once, at the end. AC4 is four channels of which the last is not asked for.
 //
 // A measure says what is accumulated:
 //     Lanes                            accumulators of one vector position, see reduce_lanes.h
@@ -27,8 +27,10 @@ namespace detail {
 
 template <class Lanes>
 constexpr auto join(typename Lanes::Total a, typename Lanes::Total b) {
-    if constexpr (requires { Lanes::join(a, b); }) return Lanes::join(a, b);
-    else return static_cast<typename Lanes::Total>(a + b);
+    if constexpr (requires { Lanes::join(a, b); })
+        return Lanes::join(a, b);
+    else
+        return static_cast<typename Lanes::Total>(a + b);
 }
 
 /// Brings the values of one channel together pairwise, which keeps float rounding to the depth of the tree.
@@ -47,14 +49,18 @@ typename Lanes::Total joinChannel(const typename Lanes::Total* values, int chann
 
 template <class Measure, class T>
 QORI_INLINE auto loadFor(const T* p) {
-    if constexpr (requires { Measure::loadVector(p); }) return Measure::loadVector(p);
-    else return load(p);
+    if constexpr (requires { Measure::loadVector(p); })
+        return Measure::loadVector(p);
+    else
+        return load(p);
 }
 
 template <class Measure, class T>
 QORI_INLINE auto loadRestFor(const T* p, ptrdiff_t n) {
-    if constexpr (requires { Measure::loadRest(p, n); }) return Measure::loadRest(p, n);
-    else return loadPartial(p, n);
+    if constexpr (requires { Measure::loadRest(p, n); })
+        return Measure::loadRest(p, n);
+    else
+        return loadPartial(p, n);
 }
 
 }  // namespace detail
@@ -66,7 +72,7 @@ struct Accumulators {
     static constexpr int vectors = vectorCount;
 
     L lanes[vectors] = {};
-    ptrdiff_t left = L::limit;   ///< Rounds until the lanes must be emptied.
+    ptrdiff_t left = L::limit;  ///< Rounds until the lanes must be emptied.
     Total totals[4] = {};
 
     /// Empties the lanes into the totals.
@@ -85,7 +91,7 @@ struct Accumulators {
 
 /// Accumulators that spill into wider ones.
 template <class L, int vectorCount>
-    requires requires { typename L::Next; }
+requires requires { typename L::Next; }
 struct Accumulators<L, vectorCount> {
     static constexpr int vectors = vectorCount;
 
@@ -113,7 +119,8 @@ using AccumulatorsOf = Accumulators<typename Measure::Lanes>;
 
 /// Adds one row of `elements` elements. Stands outside its callers, so that layouts share it.
 template <class Measure, class T, class... More>
-QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdiff_t elements, const T* first, const More*... more) {
+QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdiff_t elements, const T* first,
+                             const More*... more) {
     constexpr int n = Vec<T>::lanes, vectors = AccumulatorsOf<Measure>::vectors;
     constexpr ptrdiff_t round = ptrdiff_t{n} * vectors;
     ptrdiff_t i = 0;
@@ -123,17 +130,20 @@ QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdif
         const ptrdiff_t rounds = std::min((elements - i) / round, sums.left);
         for (const ptrdiff_t end = i + rounds * round; i < end; i += round) {
 #pragma GCC unroll 6
-            for (int v = 0; v < vectors; ++v) Measure::feed(lanes[v], detail::loadFor<Measure>(first + i + v * n), detail::loadFor<Measure>(more + i + v * n)...);
+            for (int v = 0; v < vectors; ++v)
+                Measure::feed(lanes[v], detail::loadFor<Measure>(first + i + v * n),
+                              detail::loadFor<Measure>(more + i + v * n)...);
         }
         for (int v = 0; v < vectors; ++v) sums.lanes[v] = lanes[v];
         if ((sums.left -= rounds) == 0) sums.spill(channels);
     }
     if (i == elements) return;
     int v = 0;
-    for (; elements - i >= n; i += n, ++v) 
+    for (; elements - i >= n; i += n, ++v)
         Measure::feed(sums.lanes[v], detail::loadFor<Measure>(first + i), detail::loadFor<Measure>(more + i)...);
     if (const ptrdiff_t rest = elements - i; rest > 0)
-        Measure::feed(sums.lanes[v], detail::loadRestFor<Measure>(first + i, rest), detail::loadRestFor<Measure>(more + i, rest)...);
+        Measure::feed(sums.lanes[v], detail::loadRestFor<Measure>(first + i, rest),
+                      detail::loadRestFor<Measure>(more + i, rest)...);
     if (--sums.left == 0) sums.spill(channels);
 }
 

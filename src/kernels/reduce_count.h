@@ -58,7 +58,8 @@ template <class T>
 using Counts = Accumulators<CountLanes<T>>;
 
 template <class T>
-QORI_NOINLINE void countRow(Counts<T>& counts, const Bounds<T>& bounds, int channels, ptrdiff_t elements, const T* src) {
+QORI_NOINLINE void countRow(Counts<T>& counts, const Bounds<T>& bounds, int channels, ptrdiff_t elements,
+                            const T* src) {
     constexpr int n = Vec<T>::lanes;
     ptrdiff_t i = 0;
     while (elements - i >= 3 * n) {

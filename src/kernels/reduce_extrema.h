@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Smallest and largest elements, and where they are. Lanes are arranged as in reduce.h: a round of three vectors holds
-// whole pixels of 1, 3 and 4 channels. So does the way back from a row's end, which makes its last vector the third of a
-// round; extrema do not mind that it overlaps the one before.
+// whole pixels of 1, 3 and 4 channels. So does the way back from a row's end, which makes its last vector the third of
+// a round; extrema do not mind that it overlaps the one before.
 //
 // Float extrema ignore NaN: an element that is not a number never replaces the best so far.
 #pragma once
@@ -14,25 +14,34 @@ namespace qori::kernels {
 
 template <class T>
 QORI_INLINE Vec<T> filled(T value) {
-    if constexpr (std::is_same_v<T, float>) return {_mm256_set1_ps(value)};
-    else if constexpr (sizeof(T) == 1) return {_mm256_set1_epi8(static_cast<char>(value))};
-    else return {_mm256_set1_epi16(static_cast<int16_t>(value))};
+    if constexpr (std::is_same_v<T, float>)
+        return {_mm256_set1_ps(value)};
+    else if constexpr (sizeof(T) == 1)
+        return {_mm256_set1_epi8(static_cast<char>(value))};
+    else
+        return {_mm256_set1_epi16(static_cast<int16_t>(value))};
 }
 
 template <class T>
 struct Smallest {
     using Element = T;
     /// What every element may replace.
-    static constexpr T start = std::is_floating_point_v<T> ? std::numeric_limits<T>::infinity() : std::numeric_limits<T>::max();
+    static constexpr T start =
+        std::is_floating_point_v<T> ? std::numeric_limits<T>::infinity() : std::numeric_limits<T>::max();
     /// What no element can replace.
-    static constexpr T limit = std::is_floating_point_v<T> ? -std::numeric_limits<T>::infinity() : std::numeric_limits<T>::lowest();
+    static constexpr T limit =
+        std::is_floating_point_v<T> ? -std::numeric_limits<T>::infinity() : std::numeric_limits<T>::lowest();
 
     static bool better(T a, T b) { return a < b; }
     QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> best) {
-        if constexpr (std::is_same_v<T, float>) return {_mm256_min_ps(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint8_t>) return {_mm256_min_epu8(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint16_t>) return {_mm256_min_epu16(a.v, best.v)};
-        else return {_mm256_min_epi16(a.v, best.v)};
+        if constexpr (std::is_same_v<T, float>)
+            return {_mm256_min_ps(a.v, best.v)};
+        else if constexpr (std::is_same_v<T, uint8_t>)
+            return {_mm256_min_epu8(a.v, best.v)};
+        else if constexpr (std::is_same_v<T, uint16_t>)
+            return {_mm256_min_epu16(a.v, best.v)};
+        else
+            return {_mm256_min_epi16(a.v, best.v)};
     }
 };
 
@@ -43,23 +52,28 @@ struct Biggest {
 
     static bool better(T a, T b) { return a > b; }
     QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> best) {
-        if constexpr (std::is_same_v<T, float>) return {_mm256_max_ps(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint8_t>) return {_mm256_max_epu8(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint16_t>) return {_mm256_max_epu16(a.v, best.v)};
-        else return {_mm256_max_epi16(a.v, best.v)};
+        if constexpr (std::is_same_v<T, float>)
+            return {_mm256_max_ps(a.v, best.v)};
+        else if constexpr (std::is_same_v<T, uint8_t>)
+            return {_mm256_max_epu8(a.v, best.v)};
+        else if constexpr (std::is_same_v<T, uint16_t>)
+            return {_mm256_max_epu16(a.v, best.v)};
+        else
+            return {_mm256_max_epi16(a.v, best.v)};
     }
 };
 
 namespace detail {
 
-alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {
-    255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
-    255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
+alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
+                                                           255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
+                                                           255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
 
 /// All bits of the first `count` lanes (0 to all).
 template <class T>
 QORI_INLINE __m256i firstLanes(ptrdiff_t count) {
-    return _mm256_loadu_si256(reinterpret_cast<const __m256i*>(kOnesThenZeros + 32 - count * static_cast<ptrdiff_t>(sizeof(T))));
+    return _mm256_loadu_si256(
+        reinterpret_cast<const __m256i*>(kOnesThenZeros + 32 - count * static_cast<ptrdiff_t>(sizeof(T))));
 }
 
 /// The lanes of a that mask selects, `other` elsewhere.
@@ -70,9 +84,12 @@ QORI_INLINE Vec<T> select(Vec<T> a, T other, __m256i mask) {
 
 template <class T>
 QORI_INLINE uint32_t equalBytes(Vec<T> a, Vec<T> b) {
-    if constexpr (std::is_same_v<T, float>) return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_castps_si256(_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ))));
-    else if constexpr (sizeof(T) == 1) return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(a.v, b.v)));
-    else return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi16(a.v, b.v)));
+    if constexpr (std::is_same_v<T, float>)
+        return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_castps_si256(_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ))));
+    else if constexpr (sizeof(T) == 1)
+        return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(a.v, b.v)));
+    else
+        return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi16(a.v, b.v)));
 }
 
 }  // namespace detail
@@ -107,7 +124,7 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
         return;
     }
     ptrdiff_t i = 0;
-    const auto rounds = [&](ExtremumLanes<Orders>... own) {   // copies: lanes in registers
+    const auto rounds = [&](ExtremumLanes<Orders>... own) {  // copies: lanes in registers
         for (; i <= elements - 3 * n; i += 3 * n)
             for (int v = 0; v < 3; ++v) {
                 const Vec<T> a = load(src + i + v * n);
@@ -154,7 +171,7 @@ QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const Channe
         const uint32_t found = detail::equalBytes(loadUpTo(src + i, elements - i), wanted) & channel.bits[phase];
         if (found != 0) {
             const ptrdiff_t at = i + __builtin_ctz(found) / static_cast<int>(sizeof(T));
-            return at < elements ? at : -1;   // zeros behind the row may equal the value
+            return at < elements ? at : -1;  // zeros behind the row may equal the value
         }
         phase = phase == 2 ? 0 : phase + 1;
     }
@@ -163,9 +180,12 @@ QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const Channe
 
 /// Extrema of each column over `rows` rows, into buffers.
 template <class T>
-QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptrdiff_t columns, T* smallest, T* biggest) {
+QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptrdiff_t columns, T* smallest,
+                                 T* biggest) {
     constexpr int n = Vec<T>::lanes;
-    const auto advanced = [step](const T* p) { return reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(p) + step); };
+    const auto advanced = [step](const T* p) {
+        return reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(p) + step);
+    };
     ptrdiff_t i = 0;
     for (; i <= columns - 2 * n; i += 2 * n) {
         const T* p = src + i;
@@ -190,7 +210,7 @@ QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptr
             low = Smallest<T>::join(a, low);
             high = Biggest<T>::join(a, high);
         }
-        store(smallest + i, low);   // the buffers end on whole vectors
+        store(smallest + i, low);  // the buffers end on whole vectors
         store(biggest + i, high);
     }
 }

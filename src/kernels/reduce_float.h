@@ -16,9 +16,13 @@ QORI_INLINE Doubles toDoubles(Vec<float> a) {
 }
 
 /// Converts from memory, half by half.
-QORI_INLINE Doubles loadDoubles(const float* p) { return {_mm256_cvtps_pd(_mm_loadu_ps(p)), _mm256_cvtps_pd(_mm_loadu_ps(p + 4))}; }
+QORI_INLINE Doubles loadDoubles(const float* p) {
+    return {_mm256_cvtps_pd(_mm_loadu_ps(p)), _mm256_cvtps_pd(_mm_loadu_ps(p + 4))};
+}
 
-QORI_INLINE Doubles operator-(Doubles a, Doubles b) { return {_mm256_sub_pd(a.low, b.low), _mm256_sub_pd(a.high, b.high)}; }
+QORI_INLINE Doubles operator-(Doubles a, Doubles b) {
+    return {_mm256_sub_pd(a.low, b.low), _mm256_sub_pd(a.high, b.high)};
+}
 
 QORI_INLINE Doubles magnitude(Doubles a) {
     const __m256d sign = _mm256_set1_pd(-0.0);

@@ -20,14 +20,18 @@ QORI_INLINE void storeInterleaved(Word* out, __m256i even, __m256i odd) {
 /// The even and the odd elements of a vector of bytes as 16-bit numbers.
 template <class T>
 QORI_INLINE __m256i evenBytes(Vec<T> a) {
-    if constexpr (std::is_signed_v<T>) return _mm256_srai_epi16(_mm256_slli_epi16(a.v, 8), 8);
-    else return _mm256_and_si256(a.v, _mm256_set1_epi16(0xFF));
+    if constexpr (std::is_signed_v<T>)
+        return _mm256_srai_epi16(_mm256_slli_epi16(a.v, 8), 8);
+    else
+        return _mm256_and_si256(a.v, _mm256_set1_epi16(0xFF));
 }
 
 template <class T>
 QORI_INLINE __m256i oddBytes(Vec<T> a) {
-    if constexpr (std::is_signed_v<T>) return _mm256_srai_epi16(a.v, 8);
-    else return _mm256_srli_epi16(a.v, 8);
+    if constexpr (std::is_signed_v<T>)
+        return _mm256_srai_epi16(a.v, 8);
+    else
+        return _mm256_srli_epi16(a.v, 8);
 }
 
 }  // namespace detail
@@ -136,8 +140,8 @@ struct ProductLanes;
 
 /// Byte products fit 16 bits: 255 * 255 < 2^16, -128 * -128 < 2^15.
 template <class T>
-    requires(sizeof(T) == 1)
-struct ProductLanes<T> : EvenOddSums<std::conditional_t<std::is_signed_v<T>, int16_t, uint16_t>> {
+requires(sizeof(T) == 1) struct ProductLanes<T>
+    : EvenOddSums<std::conditional_t<std::is_signed_v<T>, int16_t, uint16_t>> {
     QORI_INLINE void add(Vec<T> a, Vec<T> b) {
         this->even.add({_mm256_mullo_epi16(detail::evenBytes(a), detail::evenBytes(b))});
         this->odd.add({_mm256_mullo_epi16(detail::oddBytes(a), detail::oddBytes(b))});
@@ -146,8 +150,7 @@ struct ProductLanes<T> : EvenOddSums<std::conditional_t<std::is_signed_v<T>, int
 
 /// Products of 16 bits in two halves, low (always unsigned) and high, summed apart.
 template <class T>
-    requires(sizeof(T) == 2)
-struct ProductLanes<T> {
+requires(sizeof(T) == 2) struct ProductLanes<T> {
     using Total = typename SumLanes<T>::Total;
     static constexpr int banks = 1, count = 16;
     static constexpr ptrdiff_t limit = 65'535;
@@ -157,8 +160,10 @@ struct ProductLanes<T> {
 
     QORI_INLINE void add(Vec<T> a, Vec<T> b) {
         low.add({_mm256_mullo_epi16(a.v, b.v)});
-        if constexpr (std::is_signed_v<T>) high.add({_mm256_mulhi_epi16(a.v, b.v)});
-        else high.add({_mm256_mulhi_epu16(a.v, b.v)});
+        if constexpr (std::is_signed_v<T>)
+            high.add({_mm256_mulhi_epi16(a.v, b.v)});
+        else
+            high.add({_mm256_mulhi_epu16(a.v, b.v)});
     }
     void values(Total* out) const {
         uint64_t lows[count];
@@ -208,10 +213,14 @@ struct MaxLanes {
 
     static constexpr T join(T a, T b) { return a > b ? a : b; }
     QORI_INLINE void add(Vec<T> a) {
-        if constexpr (std::is_same_v<T, float>) largest.v = _mm256_max_ps(a.v, largest.v);
-        else if constexpr (sizeof(T) == 1) largest.v = _mm256_max_epu8(a.v, largest.v);
-        else if constexpr (sizeof(T) == 2) largest.v = _mm256_max_epu16(a.v, largest.v);
-        else largest.v = _mm256_max_epu32(a.v, largest.v);
+        if constexpr (std::is_same_v<T, float>)
+            largest.v = _mm256_max_ps(a.v, largest.v);
+        else if constexpr (sizeof(T) == 1)
+            largest.v = _mm256_max_epu8(a.v, largest.v);
+        else if constexpr (sizeof(T) == 2)
+            largest.v = _mm256_max_epu16(a.v, largest.v);
+        else
+            largest.v = _mm256_max_epu32(a.v, largest.v);
     }
     void values(Total* out) const { store(out, largest); }
 };

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// What the norms, sums and dot products accumulate: a magnitude (of a value or of a difference) under one of three norms.
+// What the norms, sums and dot products accumulate: a magnitude (of a value or of a difference) under one of three
+// norms.
 #pragma once
 #include "reduce.h"
 #include "reduce_float.h"
@@ -41,7 +42,9 @@ template <class T>
 struct Largest {
     using Lanes = MaxLanes<Magnitude<T>>;
     template <class... V>
-    QORI_INLINE static void feed(Lanes& lanes, V... v) { lanes.add(magnitude(v...)); }
+    QORI_INLINE static void feed(Lanes& lanes, V... v) {
+        lanes.add(magnitude(v...));
+    }
 };
 
 /// Sum of magnitudes.
@@ -49,13 +52,17 @@ template <class T>
 struct Magnitudes {
     using Lanes = SumLanes<Magnitude<T>>;
     template <class... V>
-    QORI_INLINE static void feed(Lanes& lanes, V... v) { lanes.add(magnitude(v...)); }
+    QORI_INLINE static void feed(Lanes& lanes, V... v) {
+        lanes.add(magnitude(v...));
+    }
 };
 template <>
 struct Magnitudes<float> {
     using Lanes = FloatLanes;
     template <class... V>
-    QORI_INLINE static void feed(Lanes& lanes, V... v) { lanes.add(magnitude(v...)); }
+    QORI_INLINE static void feed(Lanes& lanes, V... v) {
+        lanes.add(magnitude(v...));
+    }
 };
 
 /// Sum of squared magnitudes.

@@ -5,8 +5,8 @@
 
 namespace qori::kernels {
 
-/// Dot products of 32-bit integers, which no integer register holds: products and sums in double precision, one channel's
-/// from left to right.
+/// Dot products of 32-bit integers, which no integer register holds: products and sums in double precision, one
+/// channel's from left to right.
 template <int channels, class T>
 QORI_NOINLINE void sequentialDotRow(double* sums, ptrdiff_t pixels, const T* a, const T* b) {
     double own[channels];

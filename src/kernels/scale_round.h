@@ -23,39 +23,56 @@ struct Lane {
     static_assert(bits < 64 || isSigned);
 
     static QORI_INLINE V all(W value) {
-        if constexpr (bits == 16) return {_mm256_set1_epi16(static_cast<int16_t>(value))};
-        else if constexpr (bits == 32) return {_mm256_set1_epi32(static_cast<int32_t>(value))};
-        else return {_mm256_set1_epi64x(value)};
+        if constexpr (bits == 16)
+            return {_mm256_set1_epi16(static_cast<int16_t>(value))};
+        else if constexpr (bits == 32)
+            return {_mm256_set1_epi32(static_cast<int32_t>(value))};
+        else
+            return {_mm256_set1_epi64x(value)};
     }
     static QORI_INLINE V add(V a, V b) {
-        if constexpr (bits == 16) return {_mm256_add_epi16(a.v, b.v)};
-        else if constexpr (bits == 32) return {_mm256_add_epi32(a.v, b.v)};
-        else return {_mm256_add_epi64(a.v, b.v)};
+        if constexpr (bits == 16)
+            return {_mm256_add_epi16(a.v, b.v)};
+        else if constexpr (bits == 32)
+            return {_mm256_add_epi32(a.v, b.v)};
+        else
+            return {_mm256_add_epi64(a.v, b.v)};
     }
     static QORI_INLINE V shiftLeft(V a, __m128i count) {
-        if constexpr (bits == 16) return {_mm256_sll_epi16(a.v, count)};
-        else if constexpr (bits == 32) return {_mm256_sll_epi32(a.v, count)};
-        else return {_mm256_sll_epi64(a.v, count)};
+        if constexpr (bits == 16)
+            return {_mm256_sll_epi16(a.v, count)};
+        else if constexpr (bits == 32)
+            return {_mm256_sll_epi32(a.v, count)};
+        else
+            return {_mm256_sll_epi64(a.v, count)};
     }
     /// Floor of a / 2^count: arithmetic where the lane is signed.
     static QORI_INLINE V shiftRight(V a, __m128i count) {
-        if constexpr (bits == 16) return {isSigned ? _mm256_sra_epi16(a.v, count) : _mm256_srl_epi16(a.v, count)};
-        else if constexpr (bits == 32) return {isSigned ? _mm256_sra_epi32(a.v, count) : _mm256_srl_epi32(a.v, count)};
-        else {   // AVX2 shifts 64 bits only logically: as unsigned from the minimum up
+        if constexpr (bits == 16)
+            return {isSigned ? _mm256_sra_epi16(a.v, count) : _mm256_srl_epi16(a.v, count)};
+        else if constexpr (bits == 32)
+            return {isSigned ? _mm256_sra_epi32(a.v, count) : _mm256_srl_epi32(a.v, count)};
+        else {  // AVX2 shifts 64 bits only logically: as unsigned from the minimum up
             const __m256i minimum = _mm256_set1_epi64x(INT64_MIN);
             const __m256i raised = _mm256_srl_epi64(_mm256_xor_si256(a.v, minimum), count);
             return {_mm256_sub_epi64(raised, _mm256_srl_epi64(minimum, count))};
         }
     }
     static QORI_INLINE V min(V a, V b) {
-        if constexpr (bits == 16) return {isSigned ? _mm256_min_epi16(a.v, b.v) : _mm256_min_epu16(a.v, b.v)};
-        else if constexpr (bits == 32) return {isSigned ? _mm256_min_epi32(a.v, b.v) : _mm256_min_epu32(a.v, b.v)};
-        else return {_mm256_blendv_epi8(a.v, b.v, _mm256_cmpgt_epi64(a.v, b.v))};
+        if constexpr (bits == 16)
+            return {isSigned ? _mm256_min_epi16(a.v, b.v) : _mm256_min_epu16(a.v, b.v)};
+        else if constexpr (bits == 32)
+            return {isSigned ? _mm256_min_epi32(a.v, b.v) : _mm256_min_epu32(a.v, b.v)};
+        else
+            return {_mm256_blendv_epi8(a.v, b.v, _mm256_cmpgt_epi64(a.v, b.v))};
     }
     static QORI_INLINE V max(V a, V b) {
-        if constexpr (bits == 16) return {isSigned ? _mm256_max_epi16(a.v, b.v) : _mm256_max_epu16(a.v, b.v)};
-        else if constexpr (bits == 32) return {isSigned ? _mm256_max_epi32(a.v, b.v) : _mm256_max_epu32(a.v, b.v)};
-        else return {_mm256_blendv_epi8(b.v, a.v, _mm256_cmpgt_epi64(a.v, b.v))};
+        if constexpr (bits == 16)
+            return {isSigned ? _mm256_max_epi16(a.v, b.v) : _mm256_max_epu16(a.v, b.v)};
+        else if constexpr (bits == 32)
+            return {isSigned ? _mm256_max_epi32(a.v, b.v) : _mm256_max_epu32(a.v, b.v)};
+        else
+            return {_mm256_blendv_epi8(b.v, a.v, _mm256_cmpgt_epi64(a.v, b.v))};
     }
 };
 
@@ -111,8 +128,10 @@ QORI_INLINE Vec<T> narrow(Vec<W> low, Vec<W> high) {
 template <class T, class W>
 struct Saturate {
     QORI_INLINE Vec<W> operator()(Vec<W> v) const {
-        if constexpr (std::is_signed_v<W>) return v;
-        else return Lane<W>::min(v, Lane<W>::all(std::numeric_limits<T>::max()));
+        if constexpr (std::is_signed_v<W>)
+            return v;
+        else
+            return Lane<W>::min(v, Lane<W>::all(std::numeric_limits<T>::max()));
     }
 };
 
@@ -175,13 +194,17 @@ bool withScaleRule(int32_t scale, Use use) {
     // Past it limit <= 2^(scale-1): no value is above the half, which goes to 0.
     constexpr int lastScale = static_cast<int>(std::bit_width(limit - 1));
     constexpr auto room = static_cast<uint64_t>(std::numeric_limits<W>::max()) - limit;
-    constexpr int lastDirect = std::min(lastScale, static_cast<int>(std::bit_width(room)));   // 2^(scale-1) <= room
+    constexpr int lastDirect = std::min(lastScale, static_cast<int>(std::bit_width(room)));  // 2^(scale-1) <= room
     static_assert(lastDirect >= 2);
     if (scale > lastScale) return false;
-    if (scale == 0) use(Saturate<T, W>{});
-    else if (scale < 0) use(LeftShift<T, W>{scale});
-    else if (scale <= lastDirect) use(RoundShift<W>{scale});
-    else if constexpr (lastDirect < lastScale) use(RoundShiftSticky<W>{scale});
+    if (scale == 0)
+        use(Saturate<T, W>{});
+    else if (scale < 0)
+        use(LeftShift<T, W>{scale});
+    else if (scale <= lastDirect)
+        use(RoundShift<W>{scale});
+    else if constexpr (lastDirect < lastScale)
+        use(RoundShiftSticky<W>{scale});
     return true;
 }
 

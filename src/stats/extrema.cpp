@@ -17,9 +17,10 @@ constexpr T kNan = std::is_floating_point_v<T> ? std::numeric_limits<T>::quiet_N
 
 template <class T, class... Orders>
 void joinRegion(QorImageSize roi, int channels, Image<const T> src, ExtremumLanes<Orders>&... lanes) {
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* row) {
-        kernels::extremaRow<T, Orders...>(pixels * channels, row, lanes...);
-    }, walk(src, channels));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* row) { kernels::extremaRow<T, Orders...>(pixels * channels, row, lanes...); },
+        walk(src, channels));
 }
 
 /// One order's extremum per channel. Where a float channel still stands at its start, it holds that very value or
@@ -59,7 +60,9 @@ QorResult maximum(Image<const T> src, QorImageSize roi, T* pMax) {
 
 /// Without a number in a channel, its lanes stand at their starts: the smallest above the biggest.
 template <class T>
-bool noNumber(T smallest, T biggest) { return std::is_floating_point_v<T> && smallest > biggest; }
+bool noNumber(T smallest, T biggest) {
+    return std::is_floating_point_v<T> && smallest > biggest;
+}
 
 template <class T>
 QORI_NOINLINE void bothExtrema(QorImageSize roi, int stored, int results, Image<const T> src, T* pMin, T* pMax) {
@@ -163,7 +166,8 @@ bool locate(QorImageSize roi, int stored, int channel, Image<const T> src, T val
 }
 
 template <class Order, class T>
-QORI_NOINLINE void extremumAndPosition(QorImageSize roi, int stored, int results, Image<const T> src, T* out, int32_t* xs, int32_t* ys) {
+QORI_NOINLINE void extremumAndPosition(QorImageSize roi, int stored, int results, Image<const T> src, T* out,
+                                       int32_t* xs, int32_t* ys) {
     Best<Order> best[4];
     scanPieces<Order>(roi, stored, results, src, best);
     for (int c = 0; c < results; ++c) {
@@ -224,13 +228,14 @@ MinMax<T> blockRow(Image<const T> src, int32_t y, int32_t rows, int32_t width, i
     const int32_t strip = blockWidth < kStrip ? kStrip / blockWidth * blockWidth : kStrip;
     MinMax<T> all, block;
     ptrdiff_t done = 0;
-    int32_t left = blockWidth;   // columns that the current block still wants
+    int32_t left = blockWidth;  // columns that the current block still wants
     for (int32_t x = 0; x < width;) {
         const int32_t columns = std::min(blockWidth < kStrip ? strip : std::min(strip, left), width - x);
         kernels::columnExtrema(src.row(y) + x, src.step, rows, columns, smallest, biggest);
         for (int32_t at = 0; at < columns;) {
             const int32_t own = std::min(left, columns - at);
-            block.join({kernels::bestOf<Smallest<T>>(smallest + at, own), kernels::bestOf<Biggest<T>>(biggest + at, own)});
+            block.join(
+                {kernels::bestOf<Smallest<T>>(smallest + at, own), kernels::bestOf<Biggest<T>>(biggest + at, own)});
             at += own;
             left -= own;
             if (left > 0 && x + at < width) continue;
@@ -245,7 +250,8 @@ MinMax<T> blockRow(Image<const T> src, int32_t y, int32_t rows, int32_t width, i
 }
 
 template <class T>
-QorResult blockMinMax(Image<const T> src, QorImageSize roi, Image<T> dstMin, Image<T> dstMax, QorImageSize block, T* pGlobalMin, T* pGlobalMax) {
+QorResult blockMinMax(Image<const T> src, QorImageSize roi, Image<T> dstMin, Image<T> dstMax, QorImageSize block,
+                      T* pGlobalMin, T* pGlobalMax) {
     if (isNull(src) || (isNull(dstMin) && isNull(dstMax))) return QOR_ERR_NULL_PTR;
     if (QorResult r = firstOf(sizeCheck(roi), sizeCheck(block))) return r;
     const int32_t blocks = (roi.width - 1) / block.width + 1;
@@ -267,14 +273,15 @@ QorResult blockMinMax(Image<const T> src, QorImageSize roi, Image<T> dstMin, Ima
 // --- counting -------------------------------------------------------------------------------------------------------
 
 template <class T>
-QORI_NOINLINE void countRegion(QorImageSize roi, int stored, int results, Image<const T> src, int32_t* out, const T* lower, const T* upper) {
+QORI_NOINLINE void countRegion(QorImageSize roi, int stored, int results, Image<const T> src, int32_t* out,
+                               const T* lower, const T* upper) {
     const T low[4] = {lower[0], lower[results > 1], lower[results > 1 ? 2 : 0], T{}};
     const T high[4] = {upper[0], upper[results > 1], upper[results > 1 ? 2 : 0], T{}};
     const kernels::Bounds<T> bounds{kernels::channelVectors(low, stored), kernels::channelVectors(high, stored)};
     kernels::Counts<T> counts;
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* row) {
-        kernels::countRow(counts, bounds, stored, pixels * stored, row);
-    }, walk(src, stored));
+    forEachRow(
+        roi, [&](ptrdiff_t pixels, const T* row) { kernels::countRow(counts, bounds, stored, pixels * stored, row); },
+        walk(src, stored));
     counts.finish(stored);
     for (int c = 0; c < results; ++c) out[c] = static_cast<int32_t>(counts.total(c));
 }

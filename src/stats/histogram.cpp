@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Histograms with levels given in the call or prepared in a record.
+#include "kernels/histogram.h"
 #include "checks.h"
 #include "driver.h"
-#include "kernels/histogram.h"
 #include "rounding.h"
 
 namespace qori::stats {
@@ -47,9 +47,9 @@ template <Layout layout>
 void countBytes(QorImageSize roi, Image<const uint8_t> src, const Channel<int32_t>* out) {
     constexpr int n = channels(layout), counted = processedChannels(layout);
     kernels::ByteCounters<n> counters;
-    forEachRow(roi, [&](ptrdiff_t pixels, const uint8_t* row) {
-        kernels::countBytesRow<n, counted>(counters, row, pixels);
-    }, walk(src, n));
+    forEachRow(
+        roi, [&](ptrdiff_t pixels, const uint8_t* row) { kernels::countBytesRow<n, counted>(counters, row, pixels); },
+        walk(src, n));
     for (int c = 0; c < counted; ++c) {
         uint32_t table[256];
         counters.ofChannel(c, table);
@@ -61,9 +61,13 @@ void countBytes(QorImageSize roi, Image<const uint8_t> src, const Channel<int32_
 template <class T, int n>
 void countWords(QorImageSize roi, Image<const T> src, const Channel<int32_t>* out, uint32_t* table) {
     for (int32_t i = 0; i < n * kValues<T>; ++i) table[i] = 0;
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* row) {
-        kernels::countWordsRow<n>(table, reinterpret_cast<const uint16_t*>(row), pixels, std::is_signed_v<T> ? 0x8000 : 0);
-    }, walk(src, n));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* row) {
+            kernels::countWordsRow<n>(table, reinterpret_cast<const uint16_t*>(row), pixels,
+                                      std::is_signed_v<T> ? 0x8000 : 0);
+        },
+        walk(src, n));
     for (int c = 0; c < n; ++c)
         kernels::sumBins(table + c * kValues<T>, kValues<T>, kLowest<T>, out[c].levels, out[c].count, out[c].bins);
 }
@@ -74,14 +78,19 @@ QORI_NOINLINE void countBySearch(QorImageSize roi, int stored, Image<const T> sr
     for (int32_t k = 0; k < out.count - 1; ++k) out.bins[k] = 0;
     const bool ordered = kernels::strictlyIncreasing(out.levels, out.count);
     const auto finder = [&] {
-        if constexpr (std::is_floating_point_v<T>) return kernels::FloatBins(out.levels, out.count);
-        else return kernels::WordBins(out.levels, ordered ? out.count : 0, kLowest<T>);
+        if constexpr (std::is_floating_point_v<T>)
+            return kernels::FloatBins(out.levels, out.count);
+        else
+            return kernels::WordBins(out.levels, ordered ? out.count : 0, kLowest<T>);
     }();
-    forEachRow(roi, [&](ptrdiff_t pixels, const T* row) {
-        if (ordered) return kernels::countByBinRow(finder, row, pixels, stored, out.count - 1, out.bins);
-        for (ptrdiff_t x = 0; x < pixels; ++x)
-            kernels::countInAllBins<Level<T>>(row[x * stored], out.levels, out.count, out.bins);
-    }, walk(src, stored));
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* row) {
+            if (ordered) return kernels::countByBinRow(finder, row, pixels, stored, out.count - 1, out.bins);
+            for (ptrdiff_t x = 0; x < pixels; ++x)
+                kernels::countInAllBins<Level<T>>(row[x * stored], out.levels, out.count, out.bins);
+        },
+        walk(src, stored));
 }
 
 template <class T, Layout layout>
@@ -98,13 +107,15 @@ void countDirectly(QorImageSize roi, Image<const T> src, const Channel<Level<T>>
 // --- levels with the call -------------------------------------------------------------------------------------------
 
 template <class T, class L>
-QorResult directChecks(Image<const T> src, QorImageSize roi, int n, int32_t* const* pHist, L* const* pLevels, const int32_t* nLevels) {
+QorResult directChecks(Image<const T> src, QorImageSize roi, int n, int32_t* const* pHist, L* const* pLevels,
+                       const int32_t* nLevels) {
     if (isNull(src) || anyNull(pHist, n) || anyNull(pLevels, n) || nLevels == nullptr) return QOR_ERR_NULL_PTR;
     return firstOf(sizeCheck(roi), stepCheck(src), levelCountCheck(nLevels, n));
 }
 
 template <class T, Layout layout>
-QorResult histogramRange(Image<const T> src, QorImageSize roi, int32_t* const* pHist, const Level<T>* const* pLevels, const int32_t* nLevels) {
+QorResult histogramRange(Image<const T> src, QorImageSize roi, int32_t* const* pHist, const Level<T>* const* pLevels,
+                         const int32_t* nLevels) {
     constexpr int n = processedChannels(layout);
     if (QorResult r = directChecks(src, roi, n, pHist, pLevels, nLevels)) return r;
     Channel<Level<T>> out[n];
@@ -125,8 +136,8 @@ void spaceEvenly(int32_t lower, int32_t upper, int32_t count, int32_t* levels) {
 }
 
 template <class T, Layout layout>
-QorResult histogramEven(Image<const T> src, QorImageSize roi, int32_t* const* pHist, int32_t* const* pLevels, const int32_t* nLevels,
-                        const int32_t* lowerLevel, const int32_t* upperLevel) {
+QorResult histogramEven(Image<const T> src, QorImageSize roi, int32_t* const* pHist, int32_t* const* pLevels,
+                        const int32_t* nLevels, const int32_t* lowerLevel, const int32_t* upperLevel) {
     constexpr int n = processedChannels(layout);
     if (lowerLevel == nullptr || upperLevel == nullptr) return QOR_ERR_NULL_PTR;
     if (QorResult r = directChecks(src, roi, n, pHist, pLevels, nLevels)) return r;
@@ -143,7 +154,7 @@ QorResult histogramEven(Image<const T> src, QorImageSize roi, int32_t* const* pH
 
 /// The record: 12 words, then the level arrays of the channels one after another.
 struct Record {
-    static constexpr uint32_t kIdentifier = 0x74736968;   // "hist" in memory
+    static constexpr uint32_t kIdentifier = 0x74736968;  // "hist" in memory
 
     int32_t dataType;
     int32_t channels;
@@ -161,8 +172,10 @@ struct Record {
     }
     uint32_t place(int channel) {
         const uint8_t* const at = levels<uint8_t>(channel);
-        if constexpr (sizeof(void*) == 4) return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(at));
-        else return static_cast<uint32_t>(at - reinterpret_cast<const uint8_t*>(this));
+        if constexpr (sizeof(void*) == 4)
+            return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(at));
+        else
+            return static_cast<uint32_t>(at - reinterpret_cast<const uint8_t*>(this));
     }
     void begin(int32_t type, int32_t n, int32_t isUniform, const int32_t* nLevels) {
         *this = {type, n, isUniform, kIdentifier, {}, {}};
@@ -185,20 +198,25 @@ QorResult typeCheck(int32_t type) {
 int32_t truncated(float value) { return _mm_cvttss_si32(_mm_set_ss(value)); }
 int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(value)); }
 
-QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t, int32_t* pSpecSize,
-                         int32_t* pBufferSize) {
-    if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels))) return r;
+QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t,
+                         int32_t* pSpecSize, int32_t* pBufferSize) {
+    if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels)))
+        return r;
     if (QorResult r = levelCountCheck(nLevels, numChannels)) return r;
     uint32_t words = sizeof(Record) / 4;
     for (int c = 0; c < numChannels; ++c) words += static_cast<uint32_t>(nLevels[c]);
     *pSpecSize = static_cast<int32_t>(4 * words);
-    const int32_t values = dataType == qor8u ? kValues<uint8_t> : dataType == qor16u || dataType == qor16s ? kValues<uint16_t> : 0;
+    const int32_t values = dataType == qor8u                          ? kValues<uint8_t>
+                           : dataType == qor16u || dataType == qor16s ? kValues<uint16_t>
+                                                                      : 0;
     *pBufferSize = 4 * values * numChannels;
     return typeCheck(dataType);
 }
 
-QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int32_t* nLevels, int32_t numChannels, QorHistogramSpec* pSpec) {
-    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelCheck(numChannels))) return r;
+QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int32_t* nLevels, int32_t numChannels,
+                        QorHistogramSpec* pSpec) {
+    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelCheck(numChannels)))
+        return r;
     for (int c = 0; c < numChannels; ++c) {
         if (QorResult r = firstOf(nullCheck(pLevels[c]), levelCountCheck(nLevels + c, 1))) return r;
         if (!kernels::strictlyIncreasing(pLevels[c], nLevels[c])) return QOR_ERR_BAD_RANGE;
@@ -207,15 +225,18 @@ QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int
     record->begin(dataType, numChannels, 0, nLevels);
     for (int c = 0; c < numChannels; ++c)
         for (int32_t k = 0; k < nLevels[c]; ++k) {
-            if (dataType == qor32f) record->levels<float>(c)[k] = pLevels[c][k];
-            else record->levels<int32_t>(c)[k] = truncated(pLevels[c][k]);
+            if (dataType == qor32f)
+                record->levels<float>(c)[k] = pLevels[c][k];
+            else
+                record->levels<int32_t>(c)[k] = truncated(pLevels[c][k]);
         }
     return QOR_OK;
 }
 
 void spaceUniformly(float lower, float upper, int32_t count, float* levels) {
     const float width = (upper - lower) / static_cast<float>(count - 1);
-    for (int32_t k = 1; k < count - 1; ++k) levels[k] = static_cast<float>(__builtin_fma(double(k), double(width), double(lower)));
+    for (int32_t k = 1; k < count - 1; ++k)
+        levels[k] = static_cast<float>(__builtin_fma(double(k), double(width), double(lower)));
     levels[0] = lower;
     levels[count - 1] = upper;
 }
@@ -229,9 +250,11 @@ double spaceUniformly(float lower, float upper, int32_t count, int32_t* levels) 
     return width;
 }
 
-QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const float* pUpperLevel, const int32_t* nLevels, int32_t numChannels,
-                               QorHistogramSpec* pSpec) {
-    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLowerLevel, pUpperLevel, nLevels, pSpec), channelCheck(numChannels))) return r;
+QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const float* pUpperLevel,
+                               const int32_t* nLevels, int32_t numChannels, QorHistogramSpec* pSpec) {
+    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLowerLevel, pUpperLevel, nLevels, pSpec),
+                              channelCheck(numChannels)))
+        return r;
     for (int c = 0; c < numChannels; ++c) {
         if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
         if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
@@ -241,8 +264,10 @@ QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const
         record->begin(dataType, numChannels, 1, nLevels);
         QorResult result = QOR_OK;
         for (int c = 0; c < numChannels; ++c) {
-            if (dataType == qor32f) spaceUniformly(pLowerLevel[c], pUpperLevel[c], nLevels[c], record->levels<float>(c));
-            else if (spaceUniformly(pLowerLevel[c], pUpperLevel[c], nLevels[c], record->levels<int32_t>(c)) < 1.0) result = QOR_WARN_ADJUSTED;
+            if (dataType == qor32f)
+                spaceUniformly(pLowerLevel[c], pUpperLevel[c], nLevels[c], record->levels<float>(c));
+            else if (spaceUniformly(pLowerLevel[c], pUpperLevel[c], nLevels[c], record->levels<int32_t>(c)) < 1.0)
+                result = QOR_WARN_ADJUSTED;
         }
         return result;
     });
@@ -256,13 +281,15 @@ QorResult histogramLevels(const QorHistogramSpec* pSpec, float* const* ppLevels)
     return underDefaultRounding([&] {
         for (int c = 0; c < record->channels; ++c)
             for (int32_t k = 0; k < record->counts[c]; ++k)
-                ppLevels[c][k] = record->dataType == qor32f ? record->levels<float>(c)[k] : static_cast<float>(record->levels<int32_t>(c)[k]);
+                ppLevels[c][k] = record->dataType == qor32f ? record->levels<float>(c)[k]
+                                                            : static_cast<float>(record->levels<int32_t>(c)[k]);
         return QOR_OK;
     });
 }
 
 template <class T, Layout layout>
-QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer) {
+QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist, const QorHistogramSpec* pSpec,
+                    uint8_t* pBuffer) {
     constexpr int n = channels(layout);
     if (isNull(src) || anyNull(pHist, n) || pSpec == nullptr || pBuffer == nullptr) return QOR_ERR_NULL_PTR;
     if (QorResult r = firstOf(sizeCheck(roi), stepCheck(src))) return r;
@@ -271,8 +298,10 @@ QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist,
     if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
     Channel<Level<T>> out[n];
     for (int c = 0; c < n; ++c) out[c] = {record->levels<Level<T>>(c), record->counts[c], pHist[c]};
-    if constexpr (sizeof(T) == 2) countWords<T, n>(roi, src, out, reinterpret_cast<uint32_t*>(pBuffer));
-    else countDirectly<T, layout>(roi, src, out);
+    if constexpr (sizeof(T) == 2)
+        countWords<T, n>(roi, src, out, reinterpret_cast<uint32_t*>(pBuffer));
+    else
+        countDirectly<T, layout>(roi, src, out);
     return QOR_OK;
 }
 

@@ -29,22 +29,34 @@ struct Type {
 template <Quantity quantity, class T, bool single>
 constexpr auto chooseMeasure() {
     constexpr bool bytes = single && std::is_same_v<T, uint8_t>;
-    if constexpr (quantity == Quantity::largest) return Type<kernels::Largest<T>>{};
-    else if constexpr (bytes && quantity == Quantity::squares) return Type<kernels::ByteSquares>{};
-    else if constexpr (bytes && quantity == Quantity::products) return Type<kernels::ByteProducts>{};
-    else if constexpr (bytes) return Type<kernels::ByteMagnitudes>{};
-    else if constexpr (quantity == Quantity::magnitudes) return Type<kernels::Magnitudes<T>>{};
-    else if constexpr (quantity == Quantity::squares) return Type<kernels::Squares<T>>{};
-    else if constexpr (quantity == Quantity::values) return Type<kernels::Values<T>>{};
-    else return Type<kernels::Products<T>>{};
+    if constexpr (quantity == Quantity::largest)
+        return Type<kernels::Largest<T>>{};
+    else if constexpr (bytes && quantity == Quantity::squares)
+        return Type<kernels::ByteSquares>{};
+    else if constexpr (bytes && quantity == Quantity::products)
+        return Type<kernels::ByteProducts>{};
+    else if constexpr (bytes)
+        return Type<kernels::ByteMagnitudes>{};
+    else if constexpr (quantity == Quantity::magnitudes)
+        return Type<kernels::Magnitudes<T>>{};
+    else if constexpr (quantity == Quantity::squares)
+        return Type<kernels::Squares<T>>{};
+    else if constexpr (quantity == Quantity::values)
+        return Type<kernels::Values<T>>{};
+    else
+        return Type<kernels::Products<T>>{};
 }
 
 template <Quantity quantity>
 constexpr auto chooseAccurateMeasure() {
-    if constexpr (quantity == Quantity::magnitudes) return Type<kernels::AccurateMagnitudes>{};
-    else if constexpr (quantity == Quantity::squares) return Type<kernels::AccurateSquares>{};
-    else if constexpr (quantity == Quantity::values) return Type<kernels::AccurateValues>{};
-    else return Type<kernels::AccurateProducts>{};
+    if constexpr (quantity == Quantity::magnitudes)
+        return Type<kernels::AccurateMagnitudes>{};
+    else if constexpr (quantity == Quantity::squares)
+        return Type<kernels::AccurateSquares>{};
+    else if constexpr (quantity == Quantity::values)
+        return Type<kernels::AccurateValues>{};
+    else
+        return Type<kernels::AccurateProducts>{};
 }
 
 /// Calls use(measure) with the measure that the type and the hint ask for.
@@ -66,7 +78,9 @@ double toDouble(int64_t value) {
            static_cast<double>(static_cast<uint32_t>(value));
 }
 template <class T>
-double toDouble(T value) { return static_cast<double>(value); }
+double toDouble(T value) {
+    return static_cast<double>(value);
+}
 
 struct Totals {
     double of[4];
@@ -85,9 +99,12 @@ QORI_NOINLINE Totals accumulate(QorImageSize roi, Channels n, int32_t hint, Sour
     Totals totals;
     withMeasure<quantity, T, single>(hint, [&]<class Measure>(Type<Measure>) {
         kernels::AccumulatorsOf<Measure> sums;
-        forEachRow(roi, [&](ptrdiff_t pixels, auto... rows) {
-            kernels::reduceRow<Measure>(sums, n.stored, pixels * n.stored, rows...);
-        }, walk(sources, n.stored)...);
+        forEachRow(
+            roi,
+            [&](ptrdiff_t pixels, auto... rows) {
+                kernels::reduceRow<Measure>(sums, n.stored, pixels * n.stored, rows...);
+            },
+            walk(sources, n.stored)...);
         totals = finish(sums, n);
     });
     return totals;
@@ -99,7 +116,9 @@ Totals totalsOf(QorImageSize roi, int32_t hint, Sources... sources) {
 }
 
 template <Quantity quantity>
-double rooted(double total) { return quantity == Quantity::squares ? __builtin_sqrt(total) : total; }
+double rooted(double total) {
+    return quantity == Quantity::squares ? __builtin_sqrt(total) : total;
+}
 
 // --- sums and means -------------------------------------------------------------------------------------------------
 
@@ -149,20 +168,24 @@ struct Ratio {
 
 /// Both norms of a relative one, piece by piece, so that the second source is still in the cache when it is read again.
 template <Quantity quantity, class T, bool single>
-QORI_NOINLINE Ratio accumulateRatio(QorImageSize roi, Channels n, int32_t hint, Image<const T> src1, Image<const T> src2) {
+QORI_NOINLINE Ratio accumulateRatio(QorImageSize roi, Channels n, int32_t hint, Image<const T> src1,
+                                    Image<const T> src2) {
     // A multiple of every round of vectors and of 3 and 4 channels.
     constexpr ptrdiff_t kPiece = 8'192 / static_cast<ptrdiff_t>(sizeof(T)) / 192 * 192;
     Ratio ratio;
     withMeasure<quantity, T, single>(hint, [&]<class Measure>(Type<Measure>) {
         kernels::AccumulatorsOf<Measure> differences, references;
-        forEachRow(roi, [&](ptrdiff_t pixels, const T* a, const T* b) {
-            const ptrdiff_t elements = pixels * n.stored;
-            for (ptrdiff_t i = 0; i < elements; i += kPiece) {
-                const ptrdiff_t piece = std::min(kPiece, elements - i);
-                kernels::reduceRow<Measure>(differences, n.stored, piece, a + i, b + i);
-                kernels::reduceRow<Measure>(references, n.stored, piece, b + i);
-            }
-        }, walk(src1, n.stored), walk(src2, n.stored));
+        forEachRow(
+            roi,
+            [&](ptrdiff_t pixels, const T* a, const T* b) {
+                const ptrdiff_t elements = pixels * n.stored;
+                for (ptrdiff_t i = 0; i < elements; i += kPiece) {
+                    const ptrdiff_t piece = std::min(kPiece, elements - i);
+                    kernels::reduceRow<Measure>(differences, n.stored, piece, a + i, b + i);
+                    kernels::reduceRow<Measure>(references, n.stored, piece, b + i);
+                }
+            },
+            walk(src1, n.stored), walk(src2, n.stored));
         ratio = {finish(differences, n), finish(references, n)};
     });
     return ratio;
@@ -173,12 +196,15 @@ QorResult relativeNorm(QorImageSize roi, double* pValue, int32_t hint, Image<con
     if (QorResult r = firstOf(nullCheck(src1, src2, pValue), sizeCheck(roi), stepCheck(src1, src2))) return r;
     return underDefaultRounding([&] {
         constexpr double kSmallestNormal = 2.2250738585072014e-308;
-        const Ratio ratio = accumulateRatio<quantity, T, channels(layout) == 1>(roi, channelsOf<layout>, hint, src1, src2);
+        const Ratio ratio =
+            accumulateRatio<quantity, T, channels(layout) == 1>(roi, channelsOf<layout>, hint, src1, src2);
         QorResult result = QOR_OK;
         for (int c = 0; c < processedChannels(layout); ++c) {
             double value = ratio.numerators.of[c];
-            if (ratio.denominators.of[c] < kSmallestNormal) result = QOR_WARN_DIV_BY_ZERO;
-            else value /= ratio.denominators.of[c];
+            if (ratio.denominators.of[c] < kSmallestNormal)
+                result = QOR_WARN_DIV_BY_ZERO;
+            else
+                value /= ratio.denominators.of[c];
             pValue[c] = rooted<quantity>(value);
         }
         return result;
@@ -203,11 +229,13 @@ QorResult normDiffInf(Image<const T> src1, Image<const T> src2, QorImageSize roi
     return norm<Quantity::largest, T, layout>(roi, pValue, hintFast, src1, src2);
 }
 template <class T, Layout layout>
-QorResult normDiffL1(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue, int32_t hint = hintFast) {
+QorResult normDiffL1(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                     int32_t hint = hintFast) {
     return norm<Quantity::magnitudes, T, layout>(roi, pValue, hint, src1, src2);
 }
 template <class T, Layout layout>
-QorResult normDiffL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue, int32_t hint = hintFast) {
+QorResult normDiffL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                     int32_t hint = hintFast) {
     return norm<Quantity::squares, T, layout>(roi, pValue, hint, src1, src2);
 }
 template <class T, Layout layout>
@@ -215,11 +243,13 @@ QorResult normRelInf(Image<const T> src1, Image<const T> src2, QorImageSize roi,
     return relativeNorm<Quantity::largest, T, layout>(roi, pValue, hintFast, src1, src2);
 }
 template <class T, Layout layout>
-QorResult normRelL1(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue, int32_t hint = hintFast) {
+QorResult normRelL1(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                    int32_t hint = hintFast) {
     return relativeNorm<Quantity::magnitudes, T, layout>(roi, pValue, hint, src1, src2);
 }
 template <class T, Layout layout>
-QorResult normRelL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue, int32_t hint = hintFast) {
+QorResult normRelL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                    int32_t hint = hintFast) {
     return relativeNorm<Quantity::squares, T, layout>(roi, pValue, hint, src1, src2);
 }
 
@@ -234,9 +264,12 @@ QorResult dotProduct(Image<const T> src1, Image<const T> src2, QorImageSize roi,
     return underDefaultRounding([&] {
         Totals totals{};
         if constexpr (std::is_integral_v<T> && sizeof(T) == 4) {
-            forEachRow(roi, [&](ptrdiff_t pixels, const T* a, const T* b) {
-                kernels::sequentialDotRow<n>(totals.of, pixels, a, b);
-            }, walk(src1, n), walk(src2, n));
+            forEachRow(
+                roi,
+                [&](ptrdiff_t pixels, const T* a, const T* b) {
+                    kernels::sequentialDotRow<n>(totals.of, pixels, a, b);
+                },
+                walk(src1, n), walk(src2, n));
         } else {
             totals = totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
         }

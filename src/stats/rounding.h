@@ -11,7 +11,9 @@ namespace detail {
 
 /// Stands outside its caller, so that the compiler cannot move arithmetic across the changes of the control register.
 template <class Body>
-QORI_NOINLINE QorResult outOfLine(Body& body) { return body(); }
+QORI_NOINLINE QorResult outOfLine(Body& body) {
+    return body();
+}
 
 }  // namespace detail
 

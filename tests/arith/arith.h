@@ -11,9 +11,9 @@ namespace qori::test {
 
 /// Scale factors at every change of kernel, for all types, and the ends of the range.
 inline const std::vector<int32_t>& scaleFactors() {
-    static const std::vector<int32_t> all = {0, 1, 2, 3, 5, 8, 9, 10, 15, 16, 17, 18, 29, 30, 31, 32, 33, 34, 62, 63,
-                                             64, INT32_MAX, -1, -3, -6, -7, -8, -9, -15, -16, -17, -31, -32, -33, -63,
-                                             -100, INT32_MIN};
+    static const std::vector<int32_t> all = {0,  1,  2,   3,   5,   8,   9,   10,  15,        16,   17,       18, 29,
+                                             30, 31, 32,  33,  34,  62,  63,  64,  INT32_MAX, -1,   -3,       -6, -7,
+                                             -8, -9, -15, -16, -17, -31, -32, -33, -63,       -100, INT32_MIN};
     return all;
 }
 
@@ -64,8 +64,10 @@ void forShapesAndScales(Check check) {
 /// Calls f with the scale factor where the element type has one.
 template <class T, class F>
 auto withScale(int32_t scale, F f) {
-    if constexpr (reference::isFloat<T>) return f();
-    else return f(scale);
+    if constexpr (reference::isFloat<T>)
+        return f();
+    else
+        return f(scale);
 }
 
 /// Which faults a two-image export reports, and which of two it reports first.

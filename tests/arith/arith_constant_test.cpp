@@ -9,11 +9,15 @@ template <class T, Layout layout, Kind kind, class Function, class... Parameters
 QorResult callConstant(Function function, const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi,
                        Parameters... parameters) {
     const auto constants = [&] {
-        if constexpr (layout == Layout::C1) return *value;
-        else return value;
+        if constexpr (layout == Layout::C1)
+            return *value;
+        else
+            return value;
     }();
-    if constexpr (kind == Kind::IR) return call(function, constants, dst.data<T>(), dst.step(), roi, parameters...);
-    else return call(function, src.data<T>(), src.step(), constants, dst.data<T>(), dst.step(), roi, parameters...);
+    if constexpr (kind == Kind::IR)
+        return call(function, constants, dst.data<T>(), dst.step(), roi, parameters...);
+    else
+        return call(function, src.data<T>(), src.step(), constants, dst.data<T>(), dst.step(), roi, parameters...);
 }
 
 template <class T>
@@ -37,40 +41,45 @@ void sweep(const char* name, Invoke invoke, Reference reference) {
         const bool small = random().oneIn(6);
         const int part = random().below(2);
         const T common = reference::byPart(T{}, T{}, [=](auto x, auto) { return static_cast<decltype(x)>(part); });
-        for (T& v : value)
-            do v = small ? common : NearPowers<T>{}();
+        for (T& v : value) do
+                v = small ? common : NearPowers<T>{}();
             while (nonZero && reference::isZero(v) && !small);
         if (nonZero && reference::isZero(value[0])) return;
-        checkUnary<T, T, layout, kind>(shape, [&](const TestImage& src, const TestImage& dst, QorImageSize roi) {
-            EXPECT_EQ(QOR_OK, invoke(value, src, dst, roi, scale));
-        }, [&](T a, int c) { return reference(value[c], a, scale); }, NearPowers<T>{});
+        checkUnary<T, T, layout, kind>(
+            shape,
+            [&](const TestImage& src, const TestImage& dst, QorImageSize roi) {
+                EXPECT_EQ(QOR_OK, invoke(value, src, dst, roi, scale));
+            },
+            [&](T a, int c) { return reference(value[c], a, scale); }, NearPowers<T>{});
     });
     markSwept(name);
 }
 
 /// Sweep and statuses of the operation `operation`; `reference_` gets (value, src, scale).
-#define QORI_SCALED_SWEEP(operation, divides, reference_)                                   \
-    template <class T, Layout layout, Kind kind, class Function>                            \
-    void operation(const char* name, Function function) {                                   \
-        constexpr bool anyStep = anyStep_##operation<T, layout, kind>;                      \
-        sweep<T, layout, kind, anyStep, divides>(name, [=](const T* value, auto&... rest) { \
-            return callScaled<T, layout, kind>(function, value, rest...);                   \
-        }, reference_);                                                                     \
+#define QORI_SCALED_SWEEP(operation, divides, reference_)                                                         \
+    template <class T, Layout layout, Kind kind, class Function>                                                  \
+    void operation(const char* name, Function function) {                                                         \
+        constexpr bool anyStep = anyStep_##operation<T, layout, kind>;                                            \
+        sweep<T, layout, kind, anyStep, divides>(                                                                 \
+            name,                                                                                                 \
+            [=](const T* value, auto&... rest) { return callScaled<T, layout, kind>(function, value, rest...); }, \
+            reference_);                                                                                          \
     }
 
 template <class T, Layout layout, Kind kind, class Function>
 QorResult callScaled(Function function, const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi,
                      int32_t scale) {
-    return withScale<T>(scale, [&](auto... s) {
-        return callConstant<T, layout, kind>(function, value, src, dst, roi, s...);
-    });
+    return withScale<T>(scale,
+                        [&](auto... s) { return callConstant<T, layout, kind>(function, value, src, dst, roi, s...); });
 }
 
 /// Images are divided by the reciprocal, constants correctly.
 template <class T>
 T divideByConstant(T value, T a, int32_t scale) {
-    if constexpr (std::is_same_v<T, float>) return a / value;
-    else return reference::divide(value, a, scale);
+    if constexpr (std::is_same_v<T, float>)
+        return a / value;
+    else
+        return reference::divide(value, a, scale);
 }
 
 QORI_SCALED_SWEEP(addConstant, false, reference::add<T>)
@@ -80,9 +89,12 @@ QORI_SCALED_SWEEP(divideConstant, true, divideByConstant<T>)
 
 template <class T, Layout layout, Kind kind, class Function>
 void multiplyConstantFraction(const char* name, Function function) {
-    sweep<T, layout, kind, false, false>(name, [=](const T* value, auto& src, auto& dst, QorImageSize roi, int32_t) {
-        return callConstant<T, layout, kind>(function, value, src, dst, roi);
-    }, [](T value, T a, int32_t) { return reference::multiplyFractions(value, a); });
+    sweep<T, layout, kind, false, false>(
+        name,
+        [=](const T* value, auto& src, auto& dst, QorImageSize roi, int32_t) {
+            return callConstant<T, layout, kind>(function, value, src, dst, roi);
+        },
+        [](T value, T a, int32_t) { return reference::multiplyFractions(value, a); });
 }
 
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
@@ -117,12 +129,16 @@ void checkStatuses(Function function, Parameters... parameters) {
     const T good[4] = {one, one, one, one};
     const auto statusOf = [&](bool noSrc, bool noDst, const T* value, int srcStep, int dstStep, QorImageSize roi) {
         const auto constants = [&] {
-            if constexpr (layout == Layout::C1) return *value;
-            else return value;
+            if constexpr (layout == Layout::C1)
+                return *value;
+            else
+                return value;
         }();
         T* const d = noDst ? nullptr : dst.data<T>();
-        if constexpr (kind == Kind::IR) return call(function, constants, d, dstStep, roi, parameters...);
-        else return call(function, noSrc ? nullptr : src.data<T>(), srcStep, constants, d, dstStep, roi, parameters...);
+        if constexpr (kind == Kind::IR)
+            return call(function, constants, d, dstStep, roi, parameters...);
+        else
+            return call(function, noSrc ? nullptr : src.data<T>(), srcStep, constants, d, dstStep, roi, parameters...);
     };
     const T zero[4] = {one, one, T{}, one}, *anyZero = layout == Layout::C1 ? zero + 2 : zero;
     const QorImageSize none{0, 1}, ok{1, 1};
@@ -141,19 +157,21 @@ void checkStatuses(Function function, Parameters... parameters) {
     if (divides) QORI_EXPECT_STATUS(QOR_ERR_DIV_BY_ZERO, dst, statusOf(false, false, anyZero, 32, 32, ok));
 }
 
-#define QORI_SCALED_STATUS(operation, divides)                                                                      \
-    template <class T, Layout layout, Kind kind, class Function>                                                    \
-    void status_##operation(Function f) {                                                                           \
-        withScale<T>(0, [&](auto... s) {                                                                            \
-            checkStatuses<T, layout, kind, anyStep_##operation<T, layout, kind>, divides>(f, s...);                 \
-        });                                                                                                         \
+#define QORI_SCALED_STATUS(operation, divides)                                                      \
+    template <class T, Layout layout, Kind kind, class Function>                                    \
+    void status_##operation(Function f) {                                                           \
+        withScale<T>(0, [&](auto... s) {                                                            \
+            checkStatuses<T, layout, kind, anyStep_##operation<T, layout, kind>, divides>(f, s...); \
+        });                                                                                         \
     }
 QORI_SCALED_STATUS(addConstant, false)
 QORI_SCALED_STATUS(subtractConstant, false)
 QORI_SCALED_STATUS(multiplyConstant, false)
 QORI_SCALED_STATUS(divideConstant, true)
 template <class T, Layout layout, Kind kind, class Function>
-void status_multiplyConstantFraction(Function f) { checkStatuses<T, layout, kind, false, false>(f); }
+void status_multiplyConstantFraction(Function f) {
+    checkStatuses<T, layout, kind, false, false>(f);
+}
 
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
     TEST(ConstantArithmeticStatus, name) { status_##operation<S, Layout::SL, Kind::kind>(&name); }
@@ -163,9 +181,13 @@ void status_multiplyConstantFraction(Function f) { checkStatuses<T, layout, kind
 TEST(ConstantArithmetic, Streaming) {
     forStreamingChoices(6, 1 << 20, [](const Shape& shape) {
         const uint8_t value[4] = {3, 0, 250};
-        checkUnary<uint8_t, uint8_t, Layout::C3, Kind::R>(shape, [&](const auto&... images) {
-            EXPECT_EQ(QOR_OK, (callConstant<uint8_t, Layout::C3, Kind::R>(qoriAddC_8u_C3RSfs, value, images..., 1)));
-        }, [&](uint8_t a, int c) { return reference::add(value[c], a, 1); });
+        checkUnary<uint8_t, uint8_t, Layout::C3, Kind::R>(
+            shape,
+            [&](const auto&... images) {
+                EXPECT_EQ(QOR_OK,
+                          (callConstant<uint8_t, Layout::C3, Kind::R>(qoriAddC_8u_C3RSfs, value, images..., 1)));
+            },
+            [&](uint8_t a, int c) { return reference::add(value[c], a, 1); });
     });
 }
 

@@ -22,8 +22,10 @@ void sweep(const char* name, Sweep check) {
     int turn = 0;
     forShapesAndScales<T, false>([&](const Shape& shape, int32_t scale) {
         const int mode = turn / 2 % 3;
-        if (turn++ % 2 == 0) check(shape, scale, mode, NearPowers<T>{});
-        else check(shape, scale, mode, ZeroInAlphaOnly<T, layout>{});
+        if (turn++ % 2 == 0)
+            check(shape, scale, mode, NearPowers<T>{});
+        else
+            check(shape, scale, mode, ZeroInAlphaOnly<T, layout>{});
     });
     markSwept(name);
 }
@@ -31,12 +33,13 @@ void sweep(const char* name, Sweep check) {
 template <class T, Layout layout, Kind kind, class Invoke, class Draw>
 void checkDivision(const Shape& shape, int32_t scale, int mode, Draw draw, Invoke invoke) {
     bool zeroMet = false;
-    checkBinary<T, T, layout, kind>(shape, [&](const auto&... images) {
-        EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(images...));
-    }, [&](T a, T b, int) {
-        zeroMet = zeroMet || reference::isZero(a);
-        return reference::divide(a, b, scale, mode);
-    }, draw);
+    checkBinary<T, T, layout, kind>(
+        shape, [&](const auto&... images) { EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(images...)); },
+        [&](T a, T b, int) {
+            zeroMet = zeroMet || reference::isZero(a);
+            return reference::divide(a, b, scale, mode);
+        },
+        draw);
 }
 
 template <class T, Layout layout, Kind kind, class Function>
@@ -68,7 +71,7 @@ void status_divide(Function function) {
 }
 template <class T, Kind kind, class Function>
 void status_divideRounded(Function function) {
-    checkStatuses<T, kind, true, false>(function, 7, 0);   // the faulty mode is found last
+    checkStatuses<T, kind, true, false>(function, 7, 0);  // the faulty mode is found last
     const Shape shape{.width = 4, .height = 2};
     TestImage a(1, shape, 8), b(2, shape, 8), d(0, shape, 8);
     for (int mode : {-1, 3, INT32_MAX})
@@ -90,9 +93,9 @@ void checkAllNumerators(const std::vector<T>& divisors, Function function, Round
         for (int s = sizeof(T) == 1 ? -40 : -18; s <= (sizeof(T) == 1 ? 40 : 18); ++s)
             for (int mode = 0; mode < 4; ++mode) {
                 const QorImageSize roi{count, 1};
-                const auto result = mode == 3
-                    ? call(function, a.data(), bytes, b.data(), bytes, d.data(), bytes, roi, s)
-                    : call(roundedFunction, a.data(), bytes, b.data(), bytes, d.data(), bytes, roi, mode, s);
+                const auto result =
+                    mode == 3 ? call(function, a.data(), bytes, b.data(), bytes, d.data(), bytes, roi, s)
+                              : call(roundedFunction, a.data(), bytes, b.data(), bytes, d.data(), bytes, roi, mode, s);
                 ASSERT_EQ(divisor == 0 ? QOR_WARN_DIV_BY_ZERO : QOR_OK, result);
                 for (size_t i = 0; i < count; ++i)
                     ASSERT_EQ(reference::divide(divisor, b[i], s, mode == 3 ? roundNearestEven : mode), d[i])

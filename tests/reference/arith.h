@@ -31,7 +31,7 @@ inline Exact operator+(Exact a, Exact b) {
 
 /// 192 bits: numerators up to 2^63 * 2^100 and denominators up to 2^63 * 2^66, with room to double them.
 struct Big {
-    std::array<uint32_t, 6> limb{};   // the most significant first, so that they compare as arrays do
+    std::array<uint32_t, 6> limb{};  // the most significant first, so that they compare as arrays do
 
     explicit Big(uint64_t v = 0) : limb{0, 0, 0, 0, static_cast<uint32_t>(v >> 32), static_cast<uint32_t>(v)} {}
     Big doubled(uint32_t carry = 0) const {
@@ -55,7 +55,7 @@ struct Big {
 /// numerator * 2^-scale / denominator, rounded; some value above 2^32 where it is beyond.
 inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int scale, int mode) {
     const int up = scale < 0 ? std::min(-(scale + 1), 99) + 1 : 0, down = std::clamp(scale, 0, 66);
-    uint64_t q, r2IsAbove, r2IsEqual;   // quotient; how twice the remainder compares with the denominator
+    uint64_t q, r2IsAbove, r2IsEqual;  // quotient; how twice the remainder compares with the denominator
     if (std::bit_width(numerator) + up <= 63 && std::bit_width(denominator) + down <= 63) {
         const uint64_t n = numerator << up, d = denominator << down;
         q = n / d;
@@ -93,22 +93,28 @@ T scaled(Exact v, int scale) {
 }
 
 template <class T>
-constexpr bool isComplex = requires(T t) { t.re; };
+constexpr bool isComplex = requires(T t) {
+    t.re;
+};
 template <class T>
 constexpr bool isFloat = std::is_same_v<T, float> || std::is_same_v<T, QorComplex32f>;
 
 /// f(parts of a, parts of b) for each part of an element.
 template <class T, class F>
 T byPart(T a, T b, F f) {
-    if constexpr (isComplex<T>) return {f(a.re, b.re), f(a.im, b.im)};
-    else return f(a, b);
+    if constexpr (isComplex<T>)
+        return {f(a.re, b.re), f(a.im, b.im)};
+    else
+        return f(a, b);
 }
 
 template <class T>
 T add(T a, T b, int scale) {
     return byPart(a, b, [&](auto x, auto y) {
-        if constexpr (isFloat<T>) return x + y;
-        else return scaled<decltype(x)>(exact(x) + exact(y), scale);
+        if constexpr (isFloat<T>)
+            return x + y;
+        else
+            return scaled<decltype(x)>(exact(x) + exact(y), scale);
     });
 }
 
@@ -116,8 +122,10 @@ T add(T a, T b, int scale) {
 template <class T>
 T subtract(T a, T b, int scale) {
     return byPart(a, b, [&](auto x, auto y) {
-        if constexpr (isFloat<T>) return y - x;
-        else return scaled<decltype(x)>(exact(y) + -exact(x), scale);
+        if constexpr (isFloat<T>)
+            return y - x;
+        else
+            return scaled<decltype(x)>(exact(y) + -exact(x), scale);
     });
 }
 
@@ -144,8 +152,10 @@ T multiplyFractions(T a, T b) {
 
 template <class T>
 bool isZero(T a) {
-    if constexpr (isComplex<T>) return a.re == 0 && a.im == 0;
-    else return a == 0;
+    if constexpr (isComplex<T>)
+        return a.re == 0 && a.im == 0;
+    else
+        return a == 0;
 }
 
 inline float floatFromBits(uint32_t bits) {

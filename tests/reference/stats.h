@@ -10,7 +10,8 @@
 
 namespace qori::test::reference {
 
-/// A sum together with the sum of its terms' magnitudes, to which rounding errors are relative. Integer terms are exact.
+/// A sum together with the sum of its terms' magnitudes, to which rounding errors are relative. Integer terms are
+/// exact.
 template <class T>
 struct Sum {
     using Number = std::conditional_t<std::is_floating_point_v<T>, long double, int64_t>;
@@ -39,8 +40,12 @@ Sum<T> sumOf(const std::vector<T>& elements, Term term) {
 }
 
 template <class T>
-T smallest(const std::vector<T>& elements) { return *std::min_element(elements.begin(), elements.end()); }
+T smallest(const std::vector<T>& elements) {
+    return *std::min_element(elements.begin(), elements.end());
+}
 template <class T>
-T largest(const std::vector<T>& elements) { return *std::max_element(elements.begin(), elements.end()); }
+T largest(const std::vector<T>& elements) {
+    return *std::max_element(elements.begin(), elements.end());
+}
 
 }  // namespace qori::test::reference

@@ -46,8 +46,10 @@ Extremum<T> firstBest(View<T> image, QorImageSize roi, int c, bool largest) {
 
 template <class T>
 void expectSame(T expected, T actual) {
-    if (expected != expected) EXPECT_TRUE(actual != actual) << "not NaN: " << +actual;
-    else EXPECT_EQ(expected, actual);
+    if (expected != expected)
+        EXPECT_TRUE(actual != actual) << "not NaN: " << +actual;
+    else
+        EXPECT_EQ(expected, actual);
 }
 
 /// Hands filled images of every shape to check(image, shape) and sees that they are only read.
@@ -70,11 +72,14 @@ void sweepExtremum(const char* name, Function function, bool largest) {
         T results[5] = {7, 7, 7, 7, 7};
         int32_t xs[5] = {-7, -7, -7, -7, -7}, ys[5] = {-7, -7, -7, -7, -7};
         constexpr bool indexed = std::is_invocable_v<Function, const T*, int32_t, QorImageSize, T*, int32_t*, int32_t*>;
-        if constexpr (indexed) ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), results, xs, ys));
-        else ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), results));
+        if constexpr (indexed)
+            ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), results, xs, ys));
+        else
+            ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), results));
         for (int c = 0; c < 5; ++c) {
             SCOPED_TRACE(c);
-            const auto best = c < resultsOf(layout) ? firstBest(src.view<T>(channels(layout)), shape.roi(), c, largest) : Extremum<T>{7, -7, -7};
+            const auto best = c < resultsOf(layout) ? firstBest(src.view<T>(channels(layout)), shape.roi(), c, largest)
+                                                    : Extremum<T>{7, -7, -7};
             expectSame(best.value, results[c]);
             EXPECT_EQ(indexed ? best.x : -7, xs[c]);
             EXPECT_EQ(indexed ? best.y : -7, ys[c]);
@@ -82,9 +87,11 @@ void sweepExtremum(const char* name, Function function, bool largest) {
     });
 }
 
-#define QORI_SWEEP(operation, ...)                                      \
-    template <class T, Layout layout, class Function>                   \
-    void operation(const char* name, Function function) { __VA_ARGS__; }
+#define QORI_SWEEP(operation, ...)                        \
+    template <class T, Layout layout, class Function>     \
+    void operation(const char* name, Function function) { \
+        __VA_ARGS__;                                      \
+    }
 QORI_SWEEP(minimum, sweepExtremum<T, layout>(name, function, false))
 QORI_SWEEP(maximum, sweepExtremum<T, layout>(name, function, true))
 QORI_SWEEP(minimumIndex, sweepExtremum<T, layout>(name, function, false))
@@ -115,13 +122,15 @@ void checkBlocks(Function function, const TestImage& src, const Shape& shape, Qo
         for (int x = 0; x < columns; ++x) {
             View<T> part = src.view<T>(1);
             part.origin += y * block.height * part.step + x * block.width * static_cast<ptrdiff_t>(sizeof(T));
-            const QorImageSize size{std::min(block.width, shape.width - x * block.width), std::min(block.height, shape.height - y * block.height)};
+            const QorImageSize size{std::min(block.width, shape.width - x * block.width),
+                                    std::min(block.height, shape.height - y * block.height)};
             if (outputs & 1) expectedMins.view<T>(1).set(x, y, 0, firstBest(part, size, 0, false).value);
             if (outputs & 2) expectedMaxs.view<T>(1).set(x, y, 0, firstBest(part, size, 0, true).value);
         }
     T low = 7, high = 7;
-    ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), outputs & 1 ? mins.data<T>() : nullptr, mins.step(),
-                           outputs & 2 ? maxs.data<T>() : nullptr, maxs.step(), block, outputs & 4 ? &low : nullptr, outputs & 4 ? &high : nullptr));
+    ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), outputs & 1 ? mins.data<T>() : nullptr,
+                           mins.step(), outputs & 2 ? maxs.data<T>() : nullptr, maxs.step(), block,
+                           outputs & 4 ? &low : nullptr, outputs & 4 ? &high : nullptr));
     QORI_EXPECT_UNCHANGED(mins, expectedMins);
     QORI_EXPECT_UNCHANGED(maxs, expectedMaxs);
     if (!(outputs & 4)) return;
@@ -133,7 +142,8 @@ template <class T, Layout layout, class Function>
 void blockMinMax(const char* name, Function function) {
     sweepImages<T, layout>(name, [&](const TestImage& src, const Shape& shape) {
         if (shape.flipped) return;
-        for (QorImageSize block : {QorImageSize{1, 1}, QorImageSize{4, 4}, QorImageSize{16, 16}, QorImageSize{37, 2}, QorImageSize{INT32_MAX, INT32_MAX}})
+        for (QorImageSize block : {QorImageSize{1, 1}, QorImageSize{4, 4}, QorImageSize{16, 16}, QorImageSize{37, 2},
+                                   QorImageSize{INT32_MAX, INT32_MAX}})
             checkBlocks<T>(function, src, shape, block, 5 + shape.width % 3);
     });
     // Wider than a strip of columns, with blocks that end inside it, on it, and beyond.
@@ -155,11 +165,16 @@ void countInRange(const char* name, Function function) {
             } while (upper[c] < lower[c]);
         }
         int32_t counts[4] = {-7, -7, -7, -7};
-        if constexpr (layout == Layout::C1) ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), counts, lower[0], upper[0]));
-        else ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), counts, static_cast<const T*>(lower), static_cast<const T*>(upper)));
+        if constexpr (layout == Layout::C1)
+            ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), counts, lower[0], upper[0]));
+        else
+            ASSERT_EQ(QOR_OK, call(function, src.data<T>(), src.step(), shape.roi(), counts,
+                                   static_cast<const T*>(lower), static_cast<const T*>(upper)));
         for (int c = 0; c < resultsOf(layout); ++c) {
             const auto elements = reference::channel(src.view<T>(channels(layout)), shape.roi(), c);
-            EXPECT_EQ(std::count_if(elements.begin(), elements.end(), [&](T v) { return lower[c] <= v && v <= upper[c]; }), counts[c]);
+            EXPECT_EQ(
+                std::count_if(elements.begin(), elements.end(), [&](T v) { return lower[c] <= v && v <= upper[c]; }),
+                counts[c]);
         }
         EXPECT_EQ(-7, counts[resultsOf(layout)]);
     });
@@ -171,7 +186,7 @@ void countInRange(const char* name, Function function) {
 #undef QORI_MEMBER
 
 TEST(Extrema, FirstOfEqualPixelsAcrossRowsAndPiecesOfRows) {
-    constexpr int kWidth = 30'000;   // three pieces a row
+    constexpr int kWidth = 30'000;  // three pieces a row
     std::vector<uint16_t> image(kWidth * 3, 9);
     const auto put = [&](int x, int y) { image[static_cast<size_t>(y * kWidth + x)] = 500; };
     const auto at = [&](int expectedX, int expectedY) {
@@ -213,7 +228,7 @@ TEST(Extrema, LowestValuesEverywhereAreFoundAtTheirFirstPixel) {
 }
 
 TEST(CountInRange, CountsPastEveryLane) {
-    const std::vector<uint8_t> row(8'000 * 3 + 40'000, 10);   // rows overlap: 3 * 320,000,000 elements
+    const std::vector<uint8_t> row(8'000 * 3 + 40'000, 10);  // rows overlap: 3 * 320,000,000 elements
     int32_t counts[3] = {};
     const uint8_t lower[3] = {10, 11, 0}, upper[3] = {10, 255, 255};
     EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C3R(row.data(), 1, {8'000, 40'000}, counts, lower, upper));
@@ -246,7 +261,8 @@ TEST(BlockMinMax, ChecksPointersSizesThenSteps) {
     uint8_t pixels[16] = {}, low[4] = {7}, high[4] = {7}, all[2] = {7, 7};
     uint8_t* none = nullptr;
     const QorImageSize empty{0, 0}, roi{4, 2}, block{2, 2};
-    const auto run = [&](const uint8_t* src, int32_t step, QorImageSize size, uint8_t* mins, int32_t minStep, uint8_t* maxs, int32_t maxStep, QorImageSize blocks) {
+    const auto run = [&](const uint8_t* src, int32_t step, QorImageSize size, uint8_t* mins, int32_t minStep,
+                         uint8_t* maxs, int32_t maxStep, QorImageSize blocks) {
         return qoriBlockMinMax_8u_C1R(src, step, size, mins, minStep, maxs, maxStep, blocks, all, all + 1);
     };
     EXPECT_EQ(QOR_ERR_NULL_PTR, run(none, 0, empty, low, 0, high, 0, empty));

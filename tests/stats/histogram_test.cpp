@@ -36,7 +36,8 @@ std::vector<Level<T>> drawLevels(Order order, int count) {
             return levels;
         }
         for (int k = 0; k < count; ++k)
-            levels.push_back(random().oneIn(8) ? random().value<L>() : lowest - span / 8 + random().below(span + span / 4));
+            levels.push_back(random().oneIn(8) ? random().value<L>()
+                                               : lowest - span / 8 + random().below(span + span / 4));
     } else {
         for (int k = 0; k < count; ++k) levels.push_back(static_cast<L>(random().below(1 << 24) - (1 << 23)) / 4'096);
         if (order == Order::any && count > 3) levels[static_cast<size_t>(random().below(count))] = std::nanf("");
@@ -55,7 +56,8 @@ void fill(const TestImage& image, int n, const std::vector<Level<T>>& levels) {
     const T one = random().value<T>();
     image.fill<T>(n, [&]() -> T {
         if (flat && !random().oneIn(30)) return one;
-        if (random().oneIn(4)) return static_cast<T>(levels[static_cast<size_t>(random().below(static_cast<int>(levels.size())))]);
+        if (random().oneIn(4))
+            return static_cast<T>(levels[static_cast<size_t>(random().below(static_cast<int>(levels.size())))]);
         return random().value<T>();
     });
 }
@@ -71,7 +73,7 @@ struct Job {
 
     void prepare() {
         for (int c = 0; c < n; ++c) {
-            bins[c].assign(levels[c].size(), -7);   // one more than there are bins
+            bins[c].assign(levels[c].size(), -7);  // one more than there are bins
             levelPointers[c] = levels[c].data();
             binPointers[c] = bins[c].data();
             counts[c] = static_cast<int32_t>(levels[c].size());
@@ -110,14 +112,17 @@ void sweepLevels(const char* name, std::initializer_list<Order> orders, Run run)
 
 template <class T, Layout layout, class Function>
 void histogramRange(const char* name, Function function) {
-    sweepLevels<T, layout>(name, {Order::consecutive, Order::increasing, Order::any}, [&](const TestImage& src, const Shape& shape, auto& job) {
-        QorResult status;
-        if constexpr (layout == Layout::C1)
-            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers[0], job.levelPointers[0], job.counts[0]);
-        else
-            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers, job.levelPointers, job.counts);
-        ASSERT_EQ(QOR_OK, status);
-    });
+    sweepLevels<T, layout>(name, {Order::consecutive, Order::increasing, Order::any},
+                           [&](const TestImage& src, const Shape& shape, auto& job) {
+                               QorResult status;
+                               if constexpr (layout == Layout::C1)
+                                   status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers[0],
+                                                 job.levelPointers[0], job.counts[0]);
+                               else
+                                   status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers,
+                                                 job.levelPointers, job.counts);
+                               ASSERT_EQ(QOR_OK, status);
+                           });
 }
 
 template <class T, Layout layout, class Function>
@@ -132,22 +137,28 @@ void histogramEven(const char* name, Function function) {
             lower[c] = job.levels[c].front();
             upper[c] = job.levels[c].back();
             const int64_t span = int64_t{upper[c]} - lower[c], sign = span < 0 ? -1 : 1;
-            for (int k = 0; k <= bins; ++k)   // widths differ by one, the wider bins come first
-                expected[c].push_back(static_cast<int32_t>(lower[c] + k * (span / bins) + sign * std::min<int64_t>(k, sign * (span % bins))));
+            for (int k = 0; k <= bins; ++k)  // widths differ by one, the wider bins come first
+                expected[c].push_back(static_cast<int32_t>(lower[c] + k * (span / bins) +
+                                                           sign * std::min<int64_t>(k, sign * (span % bins))));
             levelPointers[c] = job.levels[c].data();
         }
         QorResult status;
         if constexpr (layout == Layout::C1)
-            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers[0], levelPointers[0], job.counts[0], lower[0], upper[0]);
+            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers[0], levelPointers[0],
+                          job.counts[0], lower[0], upper[0]);
         else
-            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers, levelPointers, job.counts, lower, upper);
+            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers, levelPointers, job.counts,
+                          lower, upper);
         ASSERT_EQ(QOR_OK, status);
         for (int c = 0; c < n; ++c) EXPECT_EQ(expected[c], job.levels[c]);
     });
 }
 
 template <class T>
-constexpr int32_t kTypeCode = std::is_floating_point_v<T> ? qor32f : sizeof(T) == 1 ? qor8u : std::is_signed_v<T> ? qor16s : qor16u;
+constexpr int32_t kTypeCode = std::is_floating_point_v<T> ? qor32f
+                              : sizeof(T) == 1            ? qor8u
+                              : std::is_signed_v<T>       ? qor16s
+                                                          : qor16u;
 
 /// A prepared record and its buffer in guarded memory of the reported sizes.
 struct Prepared {
@@ -166,38 +177,43 @@ struct Prepared {
 template <class T, Layout layout, class Function>
 void histogram(const char* name, Function function) {
     constexpr int n = channels(layout);
-    sweepLevels<T, layout>(name, {Order::consecutive, Order::increasing}, [&](const TestImage& src, const Shape& shape, auto& job) {
-        std::vector<float> floats[n];
-        const float* pointers[n];
-        for (int c = 0; c < n; ++c) {
-            auto& levels = job.levels[c];
-            if constexpr (std::is_integral_v<T>)   // those that floats hold
-                std::erase_if(levels, [](int32_t level) { return level < -1'000'000 || level > 1'000'000; });
-            while (levels.size() < 2) levels.push_back(levels.empty() ? Level<T>{} : levels.back() + 1);
-            floats[c].assign(levels.begin(), levels.end());
-            pointers[c] = floats[c].data();
-        }
-        job.prepare();
-        Prepared prepared(kTypeCode<T>, job.counts, n, [&](QorHistogramSpec* spec) {
-            ASSERT_EQ(QOR_OK, call(qoriHistogramInit, kTypeCode<T>, static_cast<const float* const*>(pointers), static_cast<const int32_t*>(job.counts), n, spec));
+    sweepLevels<T, layout>(
+        name, {Order::consecutive, Order::increasing}, [&](const TestImage& src, const Shape& shape, auto& job) {
+            std::vector<float> floats[n];
+            const float* pointers[n];
+            for (int c = 0; c < n; ++c) {
+                auto& levels = job.levels[c];
+                if constexpr (std::is_integral_v<T>)  // those that floats hold
+                    std::erase_if(levels, [](int32_t level) { return level < -1'000'000 || level > 1'000'000; });
+                while (levels.size() < 2) levels.push_back(levels.empty() ? Level<T>{} : levels.back() + 1);
+                floats[c].assign(levels.begin(), levels.end());
+                pointers[c] = floats[c].data();
+            }
+            job.prepare();
+            Prepared prepared(kTypeCode<T>, job.counts, n, [&](QorHistogramSpec* spec) {
+                ASSERT_EQ(QOR_OK, call(qoriHistogramInit, kTypeCode<T>, static_cast<const float* const*>(pointers),
+                                       static_cast<const int32_t*>(job.counts), n, spec));
+            });
+            const Snapshot before = prepared.spec.snapshot();
+            const auto* spec = prepared.spec.template data<const QorHistogramSpec>();
+            QorResult status;
+            if constexpr (layout == Layout::C1)
+                status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers[0], spec,
+                              prepared.buffer.template data<uint8_t>());
+            else
+                status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers, spec,
+                              prepared.buffer.template data<uint8_t>());
+            ASSERT_EQ(QOR_OK, status);
+            QORI_EXPECT_UNCHANGED(prepared.spec, before);
         });
-        const Snapshot before = prepared.spec.snapshot();
-        const auto* spec = prepared.spec.template data<const QorHistogramSpec>();
-        QorResult status;
-        if constexpr (layout == Layout::C1)
-            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers[0], spec, prepared.buffer.template data<uint8_t>());
-        else
-            status = call(function, src.data<T>(), src.step(), shape.roi(), job.binPointers, spec, prepared.buffer.template data<uint8_t>());
-        ASSERT_EQ(QOR_OK, status);
-        QORI_EXPECT_UNCHANGED(prepared.spec, before);
-    });
 }
 
 /// The sizes, and that each set-up function fills a record of them and nothing around it.
 template <class, Layout, class Function>
 void histogramSizes(const char* name, Function function) {
     const int32_t counts[4] = {2, 257, 3, 5};
-    const std::pair<int32_t, int32_t> bytesPerChannel[] = {{qor8u, 1'024}, {qor16u, 262'144}, {qor16s, 262'144}, {qor32f, 0}};
+    const std::pair<int32_t, int32_t> bytesPerChannel[] = {
+        {qor8u, 1'024}, {qor16u, 262'144}, {qor16s, 262'144}, {qor32f, 0}};
     for (const auto& [type, bytes] : bytesPerChannel)
         for (int n : {1, 3, 4}) {
             int32_t spec = -7, buffer = -7;
@@ -221,15 +237,21 @@ void histogramInit(const char* name, Function function) {
     const float* levels[3] = {a, b, c};
     const int32_t counts[3] = {3, 2, 4};
     for (int32_t type : {int32_t{qor8u}, int32_t{qor32f}}) {
-        Prepared prepared(type, counts, 3, [&](QorHistogramSpec* spec) { ASSERT_EQ(QOR_OK, call(function, type, levels, counts, 3, spec)); });
+        Prepared prepared(type, counts, 3, [&](QorHistogramSpec* spec) {
+            ASSERT_EQ(QOR_OK, call(function, type, levels, counts, 3, spec));
+        });
         const auto record = words<int32_t>(prepared.spec, prepared.specSize);
-        EXPECT_EQ((std::vector<int32_t>{type, 3, 0, 0x74736968, 3, 2, 4, 0}), std::vector(record.begin(), record.begin() + 8));
+        EXPECT_EQ((std::vector<int32_t>{type, 3, 0, 0x74736968, 3, 2, 4, 0}),
+                  std::vector(record.begin(), record.begin() + 8));
         EXPECT_EQ(12, record[9] - record[8]);
         EXPECT_EQ(8, record[10] - record[9]);
         EXPECT_EQ(0, record[11]);
         const auto floats = words<float>(prepared.spec, prepared.specSize);
-        if (type == qor32f) EXPECT_EQ((std::vector{-1.9f, 0.5f, 300.7f, 4.0f, 5.0f}), std::vector(floats.begin() + 12, floats.begin() + 17));
-        else EXPECT_EQ((std::vector{-1, 0, 300, 4, 5, 1, 2, 3, 4}), std::vector(record.begin() + 12, record.end()));
+        if (type == qor32f)
+            EXPECT_EQ((std::vector{-1.9f, 0.5f, 300.7f, 4.0f, 5.0f}),
+                      std::vector(floats.begin() + 12, floats.begin() + 17));
+        else
+            EXPECT_EQ((std::vector{-1, 0, 300, 4, 5, 1, 2, 3, 4}), std::vector(record.begin() + 12, record.end()));
     }
     markSwept(name);
 }
@@ -238,20 +260,29 @@ template <class, Layout, class Function>
 void histogramUniformInit(const char* name, Function function) {
     const float lower[3] = {0, -10.5f, 0.1f}, upper[3] = {100, 10.5f, 1.3f};
     const int32_t counts[3] = {8, 5, 7};
-    Prepared floats(qor32f, counts, 3, [&](QorHistogramSpec* spec) { ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec)); });
+    Prepared floats(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
+        ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec));
+    });
     Prepared wide(qor16s, counts, 2 + 1, [&](QorHistogramSpec* spec) {
-        ASSERT_EQ(QOR_WARN_ADJUSTED, call(function, int32_t{qor16s}, lower, upper, counts, 3, spec));   // channel 2: width 0.2
+        ASSERT_EQ(QOR_WARN_ADJUSTED,
+                  call(function, int32_t{qor16s}, lower, upper, counts, 3, spec));  // channel 2: width 0.2
     });
     const auto record = words<int32_t>(wide.spec, wide.specSize);
     EXPECT_EQ(1, record[2]);
-    EXPECT_EQ((std::vector{0, 14, 28, 42, 57, 71, 85, 100, -10, -5, 0, 5, 10, 0, 0, 0, 0, 0, 1, 1}), std::vector(record.begin() + 12, record.end()));
-    floats = Prepared(qor32f, counts, 3, [&](QorHistogramSpec* spec) { ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec)); });
+    EXPECT_EQ((std::vector{0, 14, 28, 42, 57, 71, 85, 100, -10, -5, 0, 5, 10, 0, 0, 0, 0, 0, 1, 1}),
+              std::vector(record.begin() + 12, record.end()));
+    floats = Prepared(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
+        ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec));
+    });
     const auto levels = words<float>(floats.spec, floats.specSize);
     size_t at = 12;
     for (int c = 0; c < 3; ++c) {
         const float width = (upper[c] - lower[c]) / static_cast<float>(counts[c] - 1);
         for (int k = 0; k < counts[c]; ++k, ++at)
-            EXPECT_EQ(k == 0 ? lower[c] : k == counts[c] - 1 ? upper[c] : static_cast<float>(std::fma(k, double{width}, double{lower[c]})), levels[at]);
+            EXPECT_EQ(k == 0               ? lower[c]
+                      : k == counts[c] - 1 ? upper[c]
+                                           : static_cast<float>(std::fma(k, double{width}, double{lower[c]})),
+                      levels[at]);
     }
     markSwept(name);
 }
@@ -262,10 +293,13 @@ void histogramLevels(const char* name, Function function) {
     const float* pointers[1] = {given};
     const int32_t counts[1] = {4};
     for (int32_t type : {int32_t{qor16s}, int32_t{qor32f}}) {
-        Prepared prepared(type, counts, 1, [&](QorHistogramSpec* spec) { ASSERT_EQ(QOR_OK, qoriHistogramInit(type, pointers, counts, 1, spec)); });
+        Prepared prepared(type, counts, 1, [&](QorHistogramSpec* spec) {
+            ASSERT_EQ(QOR_OK, qoriHistogramInit(type, pointers, counts, 1, spec));
+        });
         float read[5] = {-7, -7, -7, -7, -7};
         float* out[1] = {read};
-        ASSERT_EQ(QOR_OK, call(function, prepared.spec.data<const QorHistogramSpec>(), static_cast<float* const*>(out)));
+        ASSERT_EQ(QOR_OK,
+                  call(function, prepared.spec.data<const QorHistogramSpec>(), static_cast<float* const*>(out)));
         for (int k = 0; k < 4; ++k) EXPECT_EQ(type == qor32f ? given[k] : std::trunc(given[k]), read[k]);
         EXPECT_EQ(-7, read[4]);
     }
@@ -299,13 +333,17 @@ TEST(Histogram, AllWordsOneByOne) {
     expected[65'535] = 3;
     std::vector<int32_t> levels(65'537);
     for (size_t i = 0; i < levels.size(); ++i) levels[i] = static_cast<int32_t>(i);
-    EXPECT_EQ(QOR_OK, qoriHistogramRange_16u_C1R(image.data(), 131'072, {65'536, 2}, bins.data(), levels.data(), 65'537));
+    EXPECT_EQ(QOR_OK,
+              qoriHistogramRange_16u_C1R(image.data(), 131'072, {65'536, 2}, bins.data(), levels.data(), 65'537));
     EXPECT_EQ(expected, bins);
     const float lower = 0, upper = 65'536;
     const int32_t count = 65'537;
-    Prepared prepared(qor16u, &count, 1, [&](QorHistogramSpec* spec) { EXPECT_EQ(QOR_OK, qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, spec)); });
+    Prepared prepared(qor16u, &count, 1, [&](QorHistogramSpec* spec) {
+        EXPECT_EQ(QOR_OK, qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, spec));
+    });
     bins.assign(65'536, -7);
-    EXPECT_EQ(QOR_OK, qoriHistogram_16u_C1R(image.data(), 131'072, {65'536, 2}, bins.data(), prepared.spec.data<QorHistogramSpec>(), prepared.buffer.data<uint8_t>()));
+    EXPECT_EQ(QOR_OK, qoriHistogram_16u_C1R(image.data(), 131'072, {65'536, 2}, bins.data(),
+                                            prepared.spec.data<QorHistogramSpec>(), prepared.buffer.data<uint8_t>()));
     EXPECT_EQ(expected, bins);
 }
 
@@ -327,8 +365,10 @@ TEST(Histogram, DirectFormsCheckPointersSizesStepsThenLevels) {
     EXPECT_EQ(QOR_ERR_NULL_PTR, qoriHistogramRange_8u_C3R(pixels, 3, empty, binArrays, levelArrays, counts));
     binArrays[2] = bins;
     EXPECT_EQ(QOR_ERR_NULL_PTR, qoriHistogramRange_8u_AC4R(pixels, 4, empty, binArrays, givenArrays, counts));
-    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriHistogramEven_8u_C3R(pixels, 3, empty, binArrays, levelArrays, counts, nullptr, bounds));
-    EXPECT_EQ(QOR_ERR_HIST_LEVELS, qoriHistogramEven_8u_C3R(pixels, 3, one, binArrays, levelArrays, counts, bounds, bounds));
+    EXPECT_EQ(QOR_ERR_NULL_PTR,
+              qoriHistogramEven_8u_C3R(pixels, 3, empty, binArrays, levelArrays, counts, nullptr, bounds));
+    EXPECT_EQ(QOR_ERR_HIST_LEVELS,
+              qoriHistogramEven_8u_C3R(pixels, 3, one, binArrays, levelArrays, counts, bounds, bounds));
     EXPECT_EQ(-28, bins[0] + bins[1] + levels[0] + levels[1]);
 }
 
@@ -348,7 +388,8 @@ TEST(Histogram, SetUpChecksInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_BAD_RANGE, memory, qoriHistogramInit(qor8u, flat, two, 1, spec));
     QORI_EXPECT_STATUS(QOR_ERR_DATA_TYPE, memory, qoriHistogramUniformInit(19, &lower, &upper, few, 2, nullptr));
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, memory, qoriHistogramUniformInit(qor8u, &lower, nullptr, few, 2, spec));
-    QORI_EXPECT_STATUS(QOR_ERR_CHANNELS_UNSUPPORTED, memory, qoriHistogramUniformInit(qor8u, &lower, &upper, few, 5, spec));
+    QORI_EXPECT_STATUS(QOR_ERR_CHANNELS_UNSUPPORTED, memory,
+                       qoriHistogramUniformInit(qor8u, &lower, &upper, few, 5, spec));
     QORI_EXPECT_STATUS(QOR_ERR_HIST_LEVELS, memory, qoriHistogramUniformInit(qor8u, &lower, &upper, few, 1, spec));
     QORI_EXPECT_STATUS(QOR_ERR_BAD_RANGE, memory, qoriHistogramUniformInit(qor8u, &lower, &upper, two, 1, spec));
     QORI_EXPECT_STATUS(QOR_ERR_BAD_RANGE, memory, qoriHistogramUniformInit(qor32f, &lower, &nan, two, 1, spec));

@@ -12,8 +12,10 @@ constexpr int resultsOf(Layout layout) { return layout == Layout::AC4 ? 3 : chan
 /// Floats of moderate size, which a sum of any length does not carry to infinity; integers of any size.
 template <class T>
 T draw() {
-    if constexpr (std::is_floating_point_v<T>) return static_cast<T>(static_cast<int32_t>(random().bits())) / static_cast<T>(1 << 20);
-    else return random().value<T>();
+    if constexpr (std::is_floating_point_v<T>)
+        return static_cast<T>(static_cast<int32_t>(random().bits())) / static_cast<T>(1 << 20);
+    else
+        return random().value<T>();
 }
 
 /// Roundings between an element and the result: the difference or product, the additions of the busiest of `lanes`
@@ -33,14 +35,19 @@ reference::Sum<T> expectedTotal(const std::vector<T>& a, const std::vector<T>& b
     const auto number = [&](size_t i) { return static_cast<Number>(a[i]); };
     const auto difference = [&](size_t i) { return b.empty() ? number(i) : number(i) - static_cast<Number>(b[i]); };
     const auto magnitude = [&](size_t i) { return difference(i) < 0 ? -difference(i) : difference(i); };
-    if constexpr (measure == Measure::values) return reference::sumOf(a, number);
-    else if constexpr (measure == Measure::magnitudes) return reference::sumOf(a, magnitude);
-    else if constexpr (measure == Measure::squares) return reference::sumOf(a, [&](size_t i) { return difference(i) * difference(i); });
-    else if constexpr (measure == Measure::products) return reference::sumOf(a, [&](size_t i) { return number(i) * static_cast<Number>(b[i]); });
+    if constexpr (measure == Measure::values)
+        return reference::sumOf(a, number);
+    else if constexpr (measure == Measure::magnitudes)
+        return reference::sumOf(a, magnitude);
+    else if constexpr (measure == Measure::squares)
+        return reference::sumOf(a, [&](size_t i) { return difference(i) * difference(i); });
+    else if constexpr (measure == Measure::products)
+        return reference::sumOf(a, [&](size_t i) { return number(i) * static_cast<Number>(b[i]); });
     else {
         Number best = 0;
-        for (size_t i = 0; i < a.size(); ++i)   // differences of floats are single precision here
-            best = std::max(best, std::is_integral_v<T> ? magnitude(i) : static_cast<Number>(static_cast<T>(magnitude(i))));
+        for (size_t i = 0; i < a.size(); ++i)  // differences of floats are single precision here
+            best = std::max(best,
+                            std::is_integral_v<T> ? magnitude(i) : static_cast<Number>(static_cast<T>(magnitude(i))));
         return {best, best};
     }
 }
@@ -48,13 +55,16 @@ reference::Sum<T> expectedTotal(const std::vector<T>& a, const std::vector<T>& b
 /// Calls with or without the hint, as the export has it.
 template <class Function, class... Arguments>
 QorResult callWith(int32_t hint, Function function, Arguments... arguments) {
-    if constexpr (std::is_invocable_v<Function, Arguments..., int32_t>) return call(function, arguments..., hint);
-    else return call(function, arguments...);
+    if constexpr (std::is_invocable_v<Function, Arguments..., int32_t>)
+        return call(function, arguments..., hint);
+    else
+        return call(function, arguments...);
 }
 
 template <class Function, class T>
-constexpr bool isBinary = std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*> ||
-                          std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*, int32_t>;
+constexpr bool isBinary =
+    std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*> ||
+    std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*, int32_t>;
 
 /// One channel of a call: its elements, what came out, and the status that the call should have.
 template <class T>
@@ -76,14 +86,16 @@ void runMember(Function function, const Shape& shape, int32_t hint, Check check)
     double results[5] = {-7, -7, -7, -7, -7};
     QorResult status, expectedStatus = QOR_OK;
     if constexpr (binary)
-        status = callWith(hint, function, src1.data<T>(), src1.step(), src2.data<T>(), src2.step(), shape.roi(), results);
+        status =
+            callWith(hint, function, src1.data<T>(), src1.step(), src2.data<T>(), src2.step(), shape.roi(), results);
     else
         status = callWith(hint, function, src1.data<T>(), src1.step(), shape.roi(), results);
     const double relative = relativeError<T>(shape, n, hint == hintAccurate);
     for (int c = 0; c < resultsOf(layout); ++c) {
         SCOPED_TRACE("channel " + std::to_string(c));
         const auto b = binary ? reference::channel(src2.view<T>(n), shape.roi(), c) : std::vector<T>{};
-        check(Channel<T>{reference::channel(src1.view<T>(n), shape.roi(), c), b, results[c], relative, &expectedStatus});
+        check(
+            Channel<T>{reference::channel(src1.view<T>(n), shape.roi(), c), b, results[c], relative, &expectedStatus});
     }
     EXPECT_EQ(expectedStatus, status);
     for (int c = resultsOf(layout); c < 5; ++c) EXPECT_EQ(-7, results[c]) << "a result that nobody asked for";
@@ -119,18 +131,23 @@ void sweepRelative(const char* name, Function function) {
     sweepMember<T, layout>(name, function, false, [](const Channel<T>& channel) {
         double expected = static_cast<double>(expectedTotal<measure>(channel.a, channel.b).total);
         const auto denominator = static_cast<double>(expectedTotal<measure, T>(channel.b, {}).total);
-        if (denominator == 0) *channel.expectedStatus = QOR_WARN_DIV_BY_ZERO;
-        else expected /= denominator;
+        if (denominator == 0)
+            *channel.expectedStatus = QOR_WARN_DIV_BY_ZERO;
+        else
+            expected /= denominator;
         const double value = measure == Measure::squares ? channel.result * channel.result : channel.result;
         // The errors of numerator and denominator, of the quotient, of the root and of its square here.
         const double roundings = 4 * std::ldexp(1.0, -53);
-        EXPECT_NEAR(expected, value, (measure == Measure::largest ? roundings : 2.01 * channel.relativeError + roundings) * expected);
+        EXPECT_NEAR(expected, value,
+                    (measure == Measure::largest ? roundings : 2.01 * channel.relativeError + roundings) * expected);
     });
 }
 
-#define QORI_SWEEP(operation, ...)                                             \
-    template <class T, Layout layout, class Function>                          \
-    void operation(const char* name, Function function) { __VA_ARGS__; }
+#define QORI_SWEEP(operation, ...)                        \
+    template <class T, Layout layout, class Function>     \
+    void operation(const char* name, Function function) { \
+        __VA_ARGS__;                                      \
+    }
 QORI_SWEEP(sum, sweepNorm<Measure::values, T, layout>(name, function, true))
 QORI_SWEEP(normInf, sweepNorm<Measure::largest, T, layout>(name, function, false))
 QORI_SWEEP(normL1, sweepNorm<Measure::magnitudes, T, layout>(name, function, false))
@@ -148,8 +165,11 @@ void mean(const char* name, Function function) {
         const auto sum = expectedTotal<Measure::values, T>(channel.a, {});
         const auto pixels = static_cast<double>(channel.a.size());
         const auto total = static_cast<double>(sum.total);
-        if (std::is_integral_v<T>) EXPECT_EQ(layout == Layout::C1 ? total / pixels : total * (1 / pixels), channel.result);
-        else EXPECT_NEAR(total / pixels, channel.result, channel.relativeError * static_cast<double>(sum.magnitude) / pixels);
+        if (std::is_integral_v<T>)
+            EXPECT_EQ(layout == Layout::C1 ? total / pixels : total * (1 / pixels), channel.result);
+        else
+            EXPECT_NEAR(total / pixels, channel.result,
+                        channel.relativeError * static_cast<double>(sum.magnitude) / pixels);
     });
 }
 
@@ -191,7 +211,8 @@ void checkWeightedRows(QorResult(QORI_CALL* function)(const T* const*, const T*,
                 }
                 expected.template view<T>(1).set(x, 0, 0, sum);
             }
-            ASSERT_EQ(QOR_OK, call(function, rows.data(), static_cast<const T*>(weights), count, dst.data<T>(), row.width));
+            ASSERT_EQ(QOR_OK,
+                      call(function, rows.data(), static_cast<const T*>(weights), count, dst.data<T>(), row.width));
             QORI_EXPECT_UNCHANGED(dst, expected);
         });
 }
@@ -209,11 +230,13 @@ void sumWeightedRows(const char* name, Function function) {
 
 /// `pixels` equal elements; rows may overlap, so that regions far larger than the memory are seen.
 template <class T>
-std::vector<T> constant(T value, int pixels, int n) { return std::vector<T>(static_cast<size_t>(pixels) * static_cast<size_t>(n), value); }
+std::vector<T> constant(T value, int pixels, int n) {
+    return std::vector<T>(static_cast<size_t>(pixels) * static_cast<size_t>(n), value);
+}
 
 TEST(Norms, IntegerTotalsOutgrowEveryLane) {
     double r[4] = {};
-    {   // 2^32 pixels; the C3 and C4 sums fill their 16- and 32-bit lanes
+    {  // 2^32 pixels; the C3 and C4 sums fill their 16- and 32-bit lanes
         const auto row = constant<uint8_t>(255, 65'536 + 8'192, 4);
         ASSERT_EQ(QOR_OK, qoriSum_8u_C1R(row.data(), 0, {65'536, 65'536}, r));
         EXPECT_EQ(255 * 4'294'967'296.0, r[0]);
@@ -227,17 +250,18 @@ TEST(Norms, IntegerTotalsOutgrowEveryLane) {
         ASSERT_EQ(QOR_OK, qoriDotProd_8u64f_C1R(row.data(), 1, row.data(), -0x7FFFFFFF - 1, {65'536, 1}, r));
         EXPECT_EQ(65'025 * 65'536.0, r[0]);
     }
-    constexpr QorImageSize kRoi{40'001, 120};   // 4,800,120 pixels
+    constexpr QorImageSize kRoi{40'001, 120};  // 4,800,120 pixels
     constexpr uint64_t kPixels = 4'800'120;
     const auto bright = constant<uint16_t>(65'535, 40'001 + 120, 4);
     ASSERT_EQ(QOR_OK, qoriSum_16u_C3R(bright.data(), 2, kRoi, r));
     for (int c = 0; c < 3; ++c) EXPECT_EQ(65'535.0 * kPixels, r[c]);
-    constexpr double kSquares = static_cast<double>(65'535ull * 65'535 * kPixels);   // above 2^53: rounded once
+    constexpr double kSquares = static_cast<double>(65'535ull * 65'535 * kPixels);  // above 2^53: rounded once
     ASSERT_EQ(QOR_OK, qoriDotProd_16u64f_C4R(bright.data(), 2, bright.data(), 0, kRoi, r));
     for (double product : r) EXPECT_EQ(kSquares, product);
     ASSERT_EQ(QOR_OK, qoriNorm_L2_16u_C1R(bright.data(), 2, kRoi, r));
     EXPECT_EQ(std::sqrt(kSquares), r[0]);
-    const auto lowest = constant<int16_t>(-32'768, 40'001 + 120, 3), highest = constant<int16_t>(32'767, 40'001 + 120, 3);
+    const auto lowest = constant<int16_t>(-32'768, 40'001 + 120, 3),
+               highest = constant<int16_t>(32'767, 40'001 + 120, 3);
     ASSERT_EQ(QOR_OK, qoriSum_16s_C1R(lowest.data(), 2, kRoi, r));
     EXPECT_EQ(-32'768.0 * kPixels, r[0]);
     ASSERT_EQ(QOR_OK, qoriDotProd_16s64f_C3R(lowest.data(), 2, highest.data(), 2, kRoi, r));
@@ -288,11 +312,11 @@ TEST(Norms, RelativeToZeroWarnsAndGivesTheDifference) {
     EXPECT_EQ(5.0, r[0]);
     EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, qoriNormRel_L1_16s_C3R(a, 12, second, 12, {2, 1}, r));
     EXPECT_EQ(3.0, r[0]);
-    EXPECT_EQ(1.5, r[1]);   // one channel's zero does not keep the others from being divided
+    EXPECT_EQ(1.5, r[1]);  // one channel's zero does not keep the others from being divided
     EXPECT_EQ(4.0, r[2]);
     EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, qoriNormRel_L2_32f_C1R(f, 8, none, 8, {2, 1}, r, hintAccurate));
     EXPECT_EQ(5.0, r[0]);
-    EXPECT_EQ(QOR_OK, qoriNormRel_Inf_32f_C1R(f, 8, tiny, 8, {2, 1}, r));   // subnormal, but not in double precision
+    EXPECT_EQ(QOR_OK, qoriNormRel_Inf_32f_C1R(f, 8, tiny, 8, {2, 1}, r));  // subnormal, but not in double precision
     EXPECT_EQ(4.0 / static_cast<double>(1e-45f), r[0]);
 }
 
