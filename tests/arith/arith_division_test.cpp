@@ -35,7 +35,7 @@ void checkDivision(const Shape& shape, int32_t scale, int mode, Draw draw, Invok
     bool zeroMet = false;
     checkBinary<T, T, layout, kind>(
         shape, [&](const auto&... images) { EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(images...)); },
-        [&](T a, T b, int) {
+        [&](T a, T b, int) __attribute__((always_inline)) {
             zeroMet = zeroMet || reference::isZero(a);
             return reference::divide(a, b, scale, mode);
         },

@@ -158,14 +158,17 @@ bool isZero(T a) {
         return a == 0;
 }
 
-inline float floatFromBits(uint32_t bits) {
+/// Inlined, as everything on the way of a signalling NaN: returning it in an x87 register would make it a quiet one.
+#define QORI_KEEPS_NAN inline __attribute__((always_inline))
+
+QORI_KEEPS_NAN float floatFromBits(uint32_t bits) {
     float f;
     __builtin_memcpy(&f, &bits, sizeof f);
     return f;
 }
 
 /// numerator over a zero of the sign of `zero`.
-inline float overZero(float numerator, float zero) {
+QORI_KEEPS_NAN float overZero(float numerator, float zero) {
     if (numerator == 0 || std::isnan(numerator)) return floatFromBits(0x7FBFFFFF);
     const float infinity = std::numeric_limits<float>::infinity();
     return std::signbit(numerator) != std::signbit(zero) ? -infinity : infinity;
@@ -180,7 +183,7 @@ inline float divideByReciprocal(float d, float n) {
 
 /// b / a.
 template <class T>
-T divide(T a, T b, int scale, int mode = roundNearestEven) {
+QORI_KEEPS_NAN T divide(T a, T b, int scale, int mode = roundNearestEven) {
     const auto rounded = [&]<class C>(C, Exact n, Exact d) {
         return saturated<C>(n.negative != d.negative, scaledQuotient(n.magnitude, d.magnitude, scale, mode));
     };
