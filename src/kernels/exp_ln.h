@@ -52,32 +52,47 @@ QORI_INLINE __m256 exponential(__m256 x) {
     return _mm256_mul_ps(scaled, detail::powerOfTwo(_mm256_sub_epi32(whole, half)));
 }
 
-/// x = 2^e m with sqrt(1/2) <= m < sqrt(2); ln m = f - f^2/2 + f^3 P(f), f = m - 1, with the minimax polynomial P of
-/// the Cephes library (Moshier, logf: relative error 2^-27).
-QORI_INLINE __m256 logarithm(__m256 x) {
-    const __m256 tiny = _mm256_cmp_ps(x, _mm256_set1_ps(1.17549435e-38f), _CMP_LT_OQ);  // subnormal, or not positive
-    const __m256 normal = _mm256_blendv_ps(x, _mm256_mul_ps(x, _mm256_set1_ps(33554432.0f)), tiny);
-    // Adding the distance from sqrt(1/2) to 1 to the bits makes the exponent field change at sqrt(1/2).
-    constexpr int kOne = 0x3F800000, kRootHalf = 0x3F3504F3;
-    const __m256i bits = _mm256_add_epi32(_mm256_castps_si256(normal), _mm256_set1_epi32(kOne - kRootHalf));
-    const __m256i exponent = _mm256_sub_epi32(_mm256_srai_epi32(bits, 23), _mm256_set1_epi32(127));
-    const __m256i mantissa =
-        _mm256_add_epi32(_mm256_and_si256(bits, _mm256_set1_epi32(0x007FFFFF)), _mm256_set1_epi32(kRootHalf));
-    const __m256 f = _mm256_sub_ps(_mm256_castsi256_ps(mantissa), _mm256_set1_ps(1.0f));
-    const __m256 e = _mm256_sub_ps(_mm256_cvtepi32_ps(exponent), _mm256_and_ps(tiny, _mm256_set1_ps(25.0f)));
+namespace detail {
+
+/// ln(x 2^-scaling) of positive normal floats. x = 2^e m with sqrt(1/2) <= m < sqrt(2); ln m = f - f^2/2 + f^3 P(f),
+/// f = m - 1, with the minimax polynomial P of the Cephes library (Moshier, logf: relative error 2^-27).
+QORI_INLINE __m256 logarithmOfNormal(__m256 x, __m256 scaling) {
+    // Without the bits of sqrt(1/2) the exponent field changes at it.
+    const __m256i rootHalf = _mm256_set1_epi32(0x3F3504F3), bits = _mm256_castps_si256(x);
+    const __m256i above = _mm256_sub_epi32(bits, rootHalf);
+    const __m256i power = _mm256_and_si256(above, _mm256_set1_epi32(static_cast<int32_t>(0xFF800000u)));
+    const __m256 f = _mm256_sub_ps(_mm256_castsi256_ps(_mm256_sub_epi32(bits, power)), _mm256_set1_ps(1.0f));
+    const __m256 e = _mm256_sub_ps(_mm256_cvtepi32_ps(_mm256_srai_epi32(above, 23)), scaling);
     static constexpr float c[] = {3.3333331174E-1f,  -2.4999993993E-1f, 2.0000714765E-1f,
                                   -1.6668057665E-1f, 1.4249322787E-1f,  -1.2420140846E-1f,
                                   1.1676998740E-1f,  -1.1514610310E-1f, 7.0376836292E-2f};
     const __m256 square = _mm256_mul_ps(f, f);
-    __m256 rest = _mm256_mul_ps(_mm256_mul_ps(f, square), detail::polynomial(f, c));
-    rest = _mm256_fmadd_ps(e, _mm256_set1_ps(detail::kLn2Low), rest);
+    __m256 rest = _mm256_mul_ps(_mm256_mul_ps(f, square), polynomial(f, c));
+    rest = _mm256_fmadd_ps(e, _mm256_set1_ps(kLn2Low), rest);
     rest = _mm256_fnmadd_ps(square, _mm256_set1_ps(0.5f), rest);
-    __m256 result = _mm256_fmadd_ps(e, _mm256_set1_ps(detail::kLn2High), _mm256_add_ps(f, rest));
-    // 0: minus infinity; negative or NaN: a NaN; infinity stays.
+    return _mm256_fmadd_ps(e, _mm256_set1_ps(kLn2High), _mm256_add_ps(f, rest));
+}
+
+/// Subnormals are scaled by 2^25. 0: minus infinity; negative or NaN: a NaN; infinity stays.
+inline __m256 logarithmOfAny(__m256 x) {
+    const __m256 tiny = _mm256_cmp_ps(x, _mm256_set1_ps(1.17549435e-38f), _CMP_LT_OQ);
+    const __m256 normal = _mm256_blendv_ps(x, _mm256_mul_ps(x, _mm256_set1_ps(33554432.0f)), tiny);
+    __m256 result = logarithmOfNormal(normal, _mm256_and_ps(tiny, _mm256_set1_ps(25.0f)));
     const __m256 infinity = _mm256_set1_ps(INFINITY);
     result = _mm256_blendv_ps(result, _mm256_set1_ps(-INFINITY), _mm256_cmp_ps(x, _mm256_setzero_ps(), _CMP_EQ_OQ));
     result = _mm256_blendv_ps(result, infinity, _mm256_cmp_ps(x, infinity, _CMP_EQ_OQ));
     return _mm256_or_ps(result, _mm256_cmp_ps(x, _mm256_setzero_ps(), _CMP_NGE_UQ));
+}
+
+}  // namespace detail
+
+QORI_INLINE __m256 logarithm(__m256 x) {
+    // Positive and normal: the bits above those of the least, as unsigned numbers, reach not up to infinity.
+    const __m256i above = _mm256_sub_epi32(_mm256_castps_si256(x), _mm256_set1_epi32(0x00800000));
+    const __m256i special = _mm256_cmpeq_epi32(_mm256_max_epu32(above, _mm256_set1_epi32(0x7F000000)), above);
+    if (!_mm256_testz_si256(special, special)) [[unlikely]]
+        return detail::logarithmOfAny(x);
+    return detail::logarithmOfNormal(x, _mm256_setzero_ps());
 }
 
 /// ln of integers from 1 to 65,535: x = 2^e m as above, ln m = 2 (t + t^3/3 + ...), t = (m - 1) / (m + 1), |t| < 0.172;
