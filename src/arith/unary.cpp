@@ -21,6 +21,26 @@ struct OfFloats {
     }
 };
 
+/// A value in every lane of a vector of 8- or 16-bit integers.
+template <class T>
+QORI_INLINE __m256i splat(T value) {
+    return sizeof(T) == 1 ? _mm256_set1_epi8(static_cast<char>(value)) : _mm256_set1_epi16(static_cast<short>(value));
+}
+
+template <class T>
+QORI_INLINE __m256i greater(__m256i a, __m256i b) {
+    if constexpr (sizeof(T) == 1)
+        return _mm256_max_epu8(a, b);
+    else
+        return std::is_signed_v<T> ? _mm256_max_epi16(a, b) : _mm256_max_epu16(a, b);
+}
+
+template <class T>
+QORI_INLINE __m256i isAtLeast(__m256i a, __m256i b) {
+    const __m256i most = greater<T>(a, b);
+    return sizeof(T) == 1 ? _mm256_cmpeq_epi8(most, a) : _mm256_cmpeq_epi16(most, a);
+}
+
 struct AbsoluteShorts {
     /// The largest of x and its saturated negative.
     template <int n>
@@ -98,38 +118,88 @@ struct Exponential {
     }
 };
 
-/// Remembers the first element at or below 0: its kind is the warning.
-template <class T>
+/// Logarithms of positive integers are the rule's; others give T's least value, and the kind of the first is the
+/// warning.
+template <class T, class Rule>
 struct Logarithm {
-    __m256d factor;
+    Rule rule;
     QorResult warning = QOR_OK;
 
     template <int n>
     QORI_INLINE Pack<T, n> operator()(int, Pack<T, n> a) {
-        Pack<int32_t, n> wide = extend<int32_t>(a);
-        for (Vec<int32_t>& v : wide.v) {
-            const __m256i one = _mm256_set1_epi32(1), none = _mm256_cmpgt_epi32(one, v.v);
-            const int holes = _mm256_movemask_ps(_mm256_castsi256_ps(none));
-            if (holes != 0 && warning == QOR_OK) {
-                const int negative = _mm256_movemask_ps(_mm256_castsi256_ps(v.v));
-                warning = negative >> __builtin_ctz(static_cast<unsigned>(holes)) & 1 ? QOR_WARN_LOG_NEGATIVE
-                                                                                      : QOR_WARN_LOG_ZERO;
-            }
-            const __m256i positive = _mm256_max_epi32(v.v, one);
-            const auto scaled = [&](__m128i x) { return _mm256_mul_pd(logarithm(x), factor); };
-            v = nearest<T>(scaled(_mm256_castsi256_si128(positive)), scaled(_mm256_extracti128_si256(positive, 1)));
-            v.v = _mm256_blendv_epi8(v.v, _mm256_set1_epi32(std::numeric_limits<T>::min()), none);
-        }
-        return fit<T>(wide);
+        const __m256i x = a.v[0].v, one = splat<T>(1);
+        const __m256i none = _mm256_xor_si256(isAtLeast<T>(x, one), _mm256_set1_epi32(-1));
+        if (!_mm256_testz_si256(none, none)) note(none, x);
+        const __m256i result = rule(greater<T>(x, one));
+        return {{{_mm256_blendv_epi8(result, splat<T>(std::numeric_limits<T>::min()), none)}}};
     }
 
     /// The zeros behind the last elements are no zeros of the image.
     template <int n>
     QORI_INLINE Pack<T, n> tail(int phase, ptrdiff_t count, Pack<T, n> a) {
         alignas(32) T padded[n];
-        for (int i = 0; i < Pack<T, n>::vectors; ++i) store(padded + i * Vec<T>::lanes, a.v[i]);
+        store(padded, a.v[0]);
         for (ptrdiff_t i = count; i < n; ++i) padded[i] = 1;
         return (*this)(phase, kernels::detail::loadPack<T, n>(padded));
+    }
+
+private:
+    void note(__m256i none, __m256i x) {
+        if (warning != QOR_OK) return;
+        // The top byte of the first hole holds its sign.
+        const int byte = __builtin_ctz(static_cast<unsigned>(_mm256_movemask_epi8(none))) + int{sizeof(T)} - 1;
+        const bool negative = std::is_signed_v<T> && (_mm256_movemask_epi8(x) >> byte & 1) != 0;
+        warning = negative ? QOR_WARN_LOG_NEGATIVE : QOR_WARN_LOG_ZERO;
+    }
+};
+
+/// The least x of each result from 1 up: e^((r - 1/2) 2^scale) rounded up, where a result is at most 11.
+struct LogarithmSteps {
+    int count;
+    uint16_t least[11];
+};
+constexpr LogarithmSteps kLogarithmSteps[] = {{11, {2, 5, 13, 34, 91, 245, 666, 1809, 4915, 13360, 36316}},
+                                              {6, {3, 21, 149, 1097, 8104, 59875}},
+                                              {3, {8, 404, 22027}},
+                                              {1, {55}},
+                                              {1, {2981}},
+                                              {0, {}}};
+
+/// For scales from 0 up: counts the steps that x has reached.
+template <class T>
+struct CountSteps {
+    int count = 0;
+    T least[11];
+
+    explicit CountSteps(int scale) {
+        const LogarithmSteps& steps = kLogarithmSteps[std::min(scale, 5)];
+        while (count < steps.count && steps.least[count] <= std::numeric_limits<T>::max()) {
+            least[count] = static_cast<T>(steps.least[count]);
+            ++count;
+        }
+    }
+    QORI_INLINE __m256i operator()(__m256i x) const {
+        Vec<T> reached = zero<T>();
+        for (int i = 0; i < count; ++i) {
+            const __m256i mask = isAtLeast<T>(x, splat<T>(least[i]));
+            reached.v = sizeof(T) == 1 ? _mm256_sub_epi8(reached.v, mask) : _mm256_sub_epi16(reached.v, mask);
+        }
+        return reached.v;
+    }
+};
+
+/// In double, for the scales below.
+template <class T>
+struct ScaledLogarithm {
+    __m256d factor;
+
+    QORI_INLINE __m256i operator()(__m256i x) const {
+        Pack<int32_t, Vec<T>::lanes> wide = extend<int32_t>(Pack<T, Vec<T>::lanes>{{{x}}});
+        for (Vec<int32_t>& v : wide.v) {
+            const auto scaled = [&](__m128i half) { return _mm256_mul_pd(logarithm(half), factor); };
+            v = nearest<T>(scaled(_mm256_castsi256_si128(v.v)), scaled(_mm256_extracti128_si256(v.v, 1)));
+        }
+        return fit<T>(wide).v[0].v;
     }
 };
 
@@ -201,9 +271,13 @@ QorResult logarithm(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t 
     if constexpr (std::is_same_v<T, float>) {
         return runFloats<layout>([](__m256 v) { return kernels::logarithm(v); }, src, dst, roi);
     } else {
-        Logarithm<T> op{powerOfTwo(boundedExponent(scale))};
-        runUnary<layout>(op, src, dst, roi);
-        return op.warning;
+        const auto run = [&]<class Rule>(Rule rule) {
+            Logarithm<T, Rule> op{rule};
+            runUnary<layout>(op, src, dst, roi);
+            return op.warning;
+        };
+        if (scale >= 0) return run(CountSteps<T>{scale});
+        return run(ScaledLogarithm<T>{powerOfTwo(boundedExponent(scale))});
     }
 }
 
