@@ -1873,6 +1873,8 @@ QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1RSfs(const float* pSrc, int32_
 QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1IRSfs(uint32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
     int32_t roundMode, int32_t scaleFactor);
 
+/* ---- Convert bits --------------------------------------------------------------------------------------------- */
+
 /** Unpacks bits into bytes: a set bit gives 255, a clear one 0.
  *  Units     Steps in bytes, at least 1; roiSize in pixels. Pixel 0 of a row is the bit at srcBitOffset,
  *            counted from the most significant bit of the row's first byte; 8 and more step into later bytes.
