@@ -14,5 +14,6 @@ struct Panel {
 };
 
 std::span<const Panel> copyPanels();
+std::span<const Panel> arithPanels();
 
 }  // namespace demo
