@@ -651,9 +651,9 @@ QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4IR(const uint16_t* pSrc, int32_
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value);
- *            then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value),
+ *            QOR_ERR_NULL_PTR (value is null); then nothing is written.
  *  Example   const uint8_t warmer[3] = {0, 4, 16};
  *            qoriAddC_8u_C3IRSfs(warmer, picture, step, (QorImageSize){640, 480}, 0);
  */
@@ -766,9 +766,9 @@ QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
- *            written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value), QOR_ERR_NULL_PTR (value
+ *            is null); then nothing is written.
  *  Example   qoriSubC_16u_C1IRSfs(blackLevel, raw, rawStep, roi, 0);
  */
 QORI_API QorResult QORI_CALL qoriSubC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -880,9 +880,9 @@ QORI_API QorResult QORI_CALL qoriSubC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
- *            written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value), QOR_ERR_NULL_PTR (value
+ *            is null); then nothing is written.
  *  Example   qoriMulC_8u_C1RSfs(src, srcStep, 181, dst, dstStep, roi, 7);   // brighter by half a stop: 181/128 = 2^0.5
  */
 QORI_API QorResult QORI_CALL qoriMulC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -995,9 +995,9 @@ QORI_API QorResult QORI_CALL qoriMulC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_DIV_BY_ZERO (the value of a channel is 0); then nothing
- *            is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (value is null), QOR_ERR_DIV_BY_ZERO (the value of
+ *            a channel is 0); then nothing is written.
  *  Example   qoriDivC_16s_C1RSfs(src, srcStep, 3, dst, dstStep, roi, -4);   // src / 3 in sixteenths
  */
 QORI_API QorResult QORI_CALL qoriDivC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -1107,8 +1107,8 @@ QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4IR(const QorComplex32f value[3], Q
  *  Units     Steps in bytes; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (value is null); then nothing is written.
  *  Example   qoriMulCScale_8u_C1IR(128, picture, step, roi);   // half as bright
  */
 QORI_API QorResult QORI_CALL qoriMulCScale_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
