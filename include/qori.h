@@ -183,6 +183,17 @@ typedef enum QorCopyFlags {
     copyStreamLoad = 2   /**< Streaming loads, for write-combining memory such as mapped frame buffers. */
 } QorCopyFlags;
 
+/** What a neighbourhood operation sees beyond the image: a kind, combined with flags for sides that are read instead. */
+typedef enum QorBorderMode {
+    borderConstant = 0,       /**< A missing pixel takes the border value of its channel. */
+    borderReplicate = 1,      /**< A missing pixel copies the nearest pixel of the image. */
+    borderReadAll = 6,        /**< Nothing is missing: pixels on all sides are read from memory. */
+    borderReadTop = 0x10,     /**< Flag: rows above are read from memory. */
+    borderReadBottom = 0x20,  /**< Flag: rows below are read from memory. */
+    borderReadLeft = 0x40,    /**< Flag: columns to the left are read from memory. */
+    borderReadRight = 0x80    /**< Flag: columns to the right are read from memory. */
+} QorBorderMode;
+
 /** Version record of the library. */
 typedef struct QorLibraryVersion {
     int32_t versionMajor;
@@ -194,6 +205,11 @@ typedef struct QorLibraryVersion {
     const char* versionText;   /**< Version and revision as text. */
     const char* buildDateText; /**< Build date as "Mmm dd yyyy". */
 } QorLibraryVersion;
+
+/** A kernel prepared for filtering, in the caller's memory: as many bytes as qoriFilterBorderGetSize reports, at any
+ *  address. It may be copied to a block whose address is equal modulo 64. Once filled it is only read: any number of
+ *  threads may use it at once. */
+typedef struct QorLinearFilterPlan QorLinearFilterPlan;
 
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
