@@ -88,7 +88,8 @@ void run(benchmark::State& state, const Row& row, Size size) {
     const Contenders contenders = row.make(size);
     const auto bytes = static_cast<int64_t>(row.bytesPerPixel * static_cast<double>(size.pixels()));
     Timed ours = prepare(contenders.ours), roof = prepare(rooflineOf(row.roofline, bytes));
-    Timed copy = prepare(rooflineOf(Roofline::copy, 2 * size.pixels()));
+    const int64_t copied = row.best > 0 ? kFrame.pixels() : size.pixels();
+    Timed copy = prepare(rooflineOf(Roofline::copy, 2 * copied));
     std::vector<Timed*> all = {&ours, &roof, &copy};
     Timed plain, peer;
     if (contenders.plain) {
@@ -114,8 +115,11 @@ void run(benchmark::State& state, const Row& row, Size size) {
     if (contenders.peer) out["vs_peer"] = peer.median() / seconds;
     constexpr double kCopyAtL2 = 51'853, kCopyAtFrame = 15'345;
     const bool isFrame = size.width == kFrame.width, isL2 = size.width == kL2.width;
-    const double best = isFrame ? row.bestAtFrame / kCopyAtFrame : isL2 ? row.bestAtL2 / kCopyAtL2 : 0;
-    if (best > 0) out["vs_best"] = copy.median() / seconds / best;
+    const double best = row.best > 0 ? row.best / kCopyAtFrame
+                        : isFrame    ? row.bestAtFrame / kCopyAtFrame
+                        : isL2       ? row.bestAtL2 / kCopyAtL2
+                                     : 0;
+    if (best > 0) out["vs_best"] = pixels / seconds / (static_cast<double>(copied) / copy.median()) / best;
 }
 
 void registerAll() {

@@ -80,6 +80,8 @@ struct Row {
     /// 15,345; 0 where none is known.
     double bestAtL2 = 0, bestAtFrame = 0;
     std::string peerName = {};
+    /// Best known rate at the row's own size, held against memcpy at 3840x2160 like bestAtFrame.
+    double best = 0;
 };
 
 /// Registers rows before main.

@@ -2,35 +2,10 @@
 #include <algorithm>
 #include <cmath>
 
-#include "bench.h"
+#include "unary_row.h"
 
 namespace qori::bench {
 namespace {
-
-/// ours(src, srcStep, dst, dstStep, roi); plain(x) gives one element.
-template <class S, class D, class Ours, class Plain>
-Row row(std::string name, int channels, Ours ours, Plain plain, double bestAtL2 = 0, double bestAtFrame = 0) {
-    const auto make = [=](Size size) {
-        Image<S> src(size, channels);
-        Image<D> dst(size, channels);
-        return Contenders{[=] { ours(src.data(), src.step(), dst.data(), dst.step(), size.roi()); },
-                          [=] {
-                              for (int y = 0; y < size.height; ++y) {
-                                  const S* s = src.row(y);
-                                  D* d = dst.row(y);
-                                  for (int i = 0; i < src.elements(); ++i) d[i] = plain(s[i]);
-                                  keep(d);
-                              }
-                          },
-                          {}};
-    };
-    return {.operation = std::move(name),
-            .bytesPerPixel = double(channels * (sizeof(S) + sizeof(D))),
-            .sizes = kSizes,
-            .make = make,
-            .bestAtL2 = bestAtL2,
-            .bestAtFrame = bestAtFrame};
-}
 
 /// Functors, so that the plain loops see through them.
 template <class D, class S>
@@ -50,50 +25,51 @@ struct Widened {
 };
 
 const Rows rows{{
-    row<uint8_t, float>("convert 8u32f C1", 1, qoriConvert_8u32f_C1R, Widened<uint8_t, float>{}, 13'523, 5'319),
-    row<uint8_t, float>("convert 8u32f C3", 3, qoriConvert_8u32f_C3R, Widened<uint8_t, float>{}),
-    row<uint8_t, int16_t>("convert 8u16s C1", 1, qoriConvert_8u16s_C1R, Widened<uint8_t, int16_t>{}),
-    row<uint16_t, int32_t>("convert 16u32s C1", 1, qoriConvert_16u32s_C1R, Widened<uint16_t, int32_t>{}),
-    row<int16_t, float>("convert 16s32f C1", 1, qoriConvert_16s32f_C1R, Widened<int16_t, float>{}),
-    row<uint32_t, float>("convert 32u32f C1", 1, qoriConvert_32u32f_C1R, Widened<uint32_t, float>{}),
-    row<float, uint8_t>(
+    unaryRow<uint8_t, float>("convert 8u32f C1", 1, qoriConvert_8u32f_C1R, Widened<uint8_t, float>{}, 13'523, 5'319),
+    unaryRow<uint8_t, float>("convert 8u32f C3", 3, qoriConvert_8u32f_C3R, Widened<uint8_t, float>{}),
+    unaryRow<uint8_t, int16_t>("convert 8u16s C1", 1, qoriConvert_8u16s_C1R, Widened<uint8_t, int16_t>{}),
+    unaryRow<uint16_t, int32_t>("convert 16u32s C1", 1, qoriConvert_16u32s_C1R, Widened<uint16_t, int32_t>{}),
+    unaryRow<int16_t, float>("convert 16s32f C1", 1, qoriConvert_16s32f_C1R, Widened<int16_t, float>{}),
+    unaryRow<uint32_t, float>("convert 32u32f C1", 1, qoriConvert_32u32f_C1R, Widened<uint32_t, float>{}),
+    unaryRow<float, uint8_t>(
         "convert 32f8u C1", 1, [](auto... a) { return qoriConvert_32f8u_C1R(a..., roundNearestEven); },
         [](float x) { return clamp<uint8_t>(std::nearbyint(x)); }, 13'969, 5'693),
-    row<float, uint8_t>(
+    unaryRow<float, uint8_t>(
         "convert 32f8u C1 half away", 1, [](auto... a) { return qoriConvert_32f8u_C1R(a..., roundHalfAway); },
         [](float x) { return clamp<uint8_t>(std::trunc(x + std::copysign(0.5f, x))); }),
-    row<float, int16_t>(
+    unaryRow<float, int16_t>(
         "convert 32f16s C3", 3, [](auto... a) { return qoriConvert_32f16s_C3R(a..., roundTowardZero); },
         [](float x) { return clamp<int16_t>(std::trunc(x)); }),
-    row<float, uint32_t>(
+    unaryRow<float, uint32_t>(
         "convert 32f32u Sfs C1", 1, [](auto... a) { return qoriConvert_32f32u_C1RSfs(a..., roundNearestEven, 3); },
         [](float x) { return static_cast<uint32_t>(std::clamp(std::nearbyint(x * 0.125f), 0.0f, 4.29e9f)); }),
-    row<int16_t, uint8_t>("convert 16s8u C1", 1, qoriConvert_16s8u_C1R, Clamped<uint8_t, int16_t>{}, 39'937, 9'877),
-    row<int32_t, uint8_t>("convert 32s8u C1", 1, qoriConvert_32s8u_C1R, Clamped<uint8_t, int32_t>{}),
-    row<int16_t, int8_t>(
+    unaryRow<int16_t, uint8_t>("convert 16s8u C1", 1, qoriConvert_16s8u_C1R, Clamped<uint8_t, int16_t>{}, 39'937,
+                               9'877),
+    unaryRow<int32_t, uint8_t>("convert 32s8u C1", 1, qoriConvert_32s8u_C1R, Clamped<uint8_t, int32_t>{}),
+    unaryRow<int16_t, int8_t>(
         "convert 16s8s Sfs C1", 1, [](auto... a) { return qoriConvert_16s8s_C1RSfs(a..., roundNearestEven, 4); },
         [](int16_t x) { return clamp<int8_t>(static_cast<int16_t>((x + 7 + (x >> 4 & 1)) >> 4)); }),
-    row<uint8_t, uint16_t>("scale 8u16u C1", 1, qoriScale_8u16u_C1R,
-                           [](uint8_t x) { return static_cast<uint16_t>(x * 257); }),
-    row<uint8_t, int32_t>("scale 8u32s C1", 1, qoriScale_8u32s_C1R,
-                          [](uint8_t x) { return static_cast<int32_t>(x * 0x01010101u ^ 0x80000000u); }),
-    row<uint8_t, float>(
+    unaryRow<uint8_t, uint16_t>("scale 8u16u C1", 1, qoriScale_8u16u_C1R,
+                                [](uint8_t x) { return static_cast<uint16_t>(x * 257); }),
+    unaryRow<uint8_t, int32_t>("scale 8u32s C1", 1, qoriScale_8u32s_C1R,
+                               [](uint8_t x) { return static_cast<int32_t>(x * 0x01010101u ^ 0x80000000u); }),
+    unaryRow<uint8_t, float>(
         "scale 8u32f C1", 1, [](auto... a) { return qoriScale_8u32f_C1R(a..., 0.0f, 1.0f); },
         [](uint8_t x) { return static_cast<float>(x) * (1.0f / 255); }, 12'856, 5'238),
-    row<float, uint8_t>(
+    unaryRow<float, uint8_t>(
         "scale 32f8u C1", 1, [](auto... a) { return qoriScale_32f8u_C1R(a..., 0.0f, 300.0f); },
         [](float x) { return clamp<uint8_t>(std::nearbyint(x * (255.0f / 300))); }, 16'318, 5'513),
-    row<uint16_t, uint8_t>(
+    unaryRow<uint16_t, uint8_t>(
         "scale 16u8u C1 accurate", 1, [](auto... a) { return qoriScale_16u8u_C1R(a..., hintAccurate); },
         [](uint16_t x) { return static_cast<uint8_t>(std::nearbyint(static_cast<float>(x) * 0.00389105058f)); }, 8'330,
         7'147),
-    row<uint16_t, uint8_t>(
+    unaryRow<uint16_t, uint8_t>(
         "scale 16u8u C1 fast", 1, [](auto... a) { return qoriScale_16u8u_C1R(a..., hintFast); },
         [](uint16_t x) {
             const int s = x - 32768;
             return static_cast<uint8_t>(((s - (s >> 8)) >> 8) + 128);
         }),
-    row<int32_t, uint8_t>(
+    unaryRow<int32_t, uint8_t>(
         "scale 32s8u C1 accurate", 1, [](auto... a) { return qoriScale_32s8u_C1R(a..., hintAccurate); },
         [](int32_t x) { return static_cast<uint8_t>(std::nearbyint(x * 5.937181414556033e-08 + 127.5000000296859)); }),
 }};

@@ -28,9 +28,11 @@ target_compile_options(qori_target INTERFACE
     $<$<COMPILE_LANGUAGE:C,CXX>:-mavx2 -mfma -ffp-contract=off -fno-math-errno>
     $<$<AND:$<PLATFORM_ID:Windows>,$<COMPILE_LANGUAGE:C,CXX>>:-mfpmath=sse -mstackrealign>)
 if(QORI_SANITIZE)
-    # Unaligned elements are part of the contract (steps of any value), so alignment is not checked.
-    add_compile_options($<$<COMPILE_LANGUAGE:C,CXX>:-fsanitize=address,undefined> $<$<COMPILE_LANGUAGE:C,CXX>:-fno-sanitize=alignment>
-        $<$<COMPILE_LANGUAGE:C,CXX>:-fno-sanitize-recover=all> $<$<COMPILE_LANGUAGE:C,CXX>:-fno-omit-frame-pointer>)
+    # Unaligned elements are part of the contract (steps of any value). The address sanitizer sees null and stray pointers
+    # itself; its checks are calls in large functions, or these would take minutes to compile.
+    set(sanitizers -fsanitize=address,undefined -fno-sanitize=alignment,null,object-size,vptr,pointer-overflow
+        -fno-sanitize-recover=all -fno-omit-frame-pointer --param asan-instrumentation-with-call-threshold=50)
+    add_compile_options("$<$<COMPILE_LANGUAGE:C,CXX>:${sanitizers}>")
     add_link_options(-fsanitize=address,undefined)
 endif()
 

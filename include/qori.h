@@ -194,6 +194,31 @@ typedef enum QorBorderMode {
     borderReadRight = 0x80    /**< Flag: columns to the right are read from memory. */
 } QorBorderMode;
 
+/** How a resized pixel is made. */
+typedef enum QorInterpolationKind {
+    interpNearest = 1, /**< The nearest pixel. */
+    interpLinear = 2,  /**< 2 x 2 pixels, weighted by distance. */
+    interpCubic = 6,   /**< 4 x 4 pixels, two-parameter cubic filters. */
+    interpSuper = 8,   /**< The mean of the area covered; reductions only. */
+    interpLanczos = 16 /**< 4 x 4 or 6 x 6 pixels, windowed sinc. */
+} QorInterpolationKind;
+
+/** Widths around an image, in pixels. */
+typedef struct QorBorderExtent {
+    int32_t left;
+    int32_t top;
+    int32_t right;
+    int32_t bottom;
+} QorBorderExtent;
+
+/** Tables of a resize, in the caller's memory: as many bytes as qoriResizeGetSize reports, at any address. The plan
+ *  begins at the next multiple of 64 and may be copied to a block whose address is equal modulo 64. Once filled it is
+ *  only read: any number of threads may use it at once. */
+typedef struct QorResizePlan QorResizePlan;
+
+/** Levels of a prepared histogram: a block of the size that qoriHistogramGetBufferSize reports, aligned to 4 bytes. */
+typedef struct QorHistogramSpec QorHistogramSpec;
+
 /** Version record of the library. */
 typedef struct QorLibraryVersion {
     int32_t versionMajor;
@@ -337,8 +362,8 @@ QORI_API QorResult QORI_CALL qoriAdd_32fc_AC4IR(const QorComplex32f* pSrc, int32
 /** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even.
  *  Shapes    All images have roiSize pixels of one layout. AC4 computes channels 0 to 2 and keeps channel 3 of
  *            the destination. In place (I), pSrcDst is the second operand and the destination.
- *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
- *            precision, no scale.
+ *  Elements  Integer differences are exact before scaling, complex by part. 32f, 32fc: IEEE single precision,
+ *            unscaled.
  *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
  *            2^-scaleFactor.
  *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
@@ -740,8 +765,8 @@ QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4IR(const QorComplex32f value[3], Q
 /** Subtracts constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even.
  *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
  *            which keeps channel 3 of the destination.
- *  Elements  Integer differences are exact before scaling, complex ones by part. 32f and 32fc: IEEE single
- *            precision, no scale.
+ *  Elements  Integer differences are exact before scaling, complex by part. 32f, 32fc: IEEE single precision,
+ *            unscaled.
  *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: results are multiplied by
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
@@ -1080,8 +1105,7 @@ QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4R(const QorComplex32f* pSrc, int32
 QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4IR(const QorComplex32f value[3], QorComplex32f* pSrcDst,
     int32_t srcDstStep, QorImageSize roiSize);
 
-/** Multiplies an image by constants as fractions of the largest value: round(src * value / max), max 255 or
- *  65535.
+/** Multiplies an image by constants as fractions of the maximum: round(src * value / max), max 255 or 65535.
  *  Shapes    value is the element (C1) or an array of one value per processed channel: 3, 4, or 3 for AC4,
  *            which keeps channel 3 of the destination.
  *  Elements  To nearest; there are no ties. Multiplying by max changes nothing.
@@ -1317,6 +1341,254 @@ QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4RSfs(const int16_t* pSrc1, int
     int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
 QORI_API QorResult QORI_CALL qoriDiv_Round_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
     int32_t srcDstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
+
+/* ---- Unary math ----------------------------------------------------------------------------------------------- */
+
+/** Takes the absolute value.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  16s: |-32768| saturates to 32767. 32f: the sign bit is cleared, of NaNs too.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels. 16s: bit 0 of each step is cleared before use, so
+ *            that an odd step is taken as the even number below it.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriAbs_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriAbs_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Squares: dst = saturate(round(src * src * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriSqr_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_C4IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_8u_AC4IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C4RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_C4IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16u_AC4IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C4RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_C4IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_16s_AC4IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqr_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Square root: dst = saturate(round(sqrt(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  Integers: the real root, scaled, is rounded once. Negative 16s values give 0. 32f as IEEE:
+ *            negative values give a NaN.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_8u_AC4IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_AC4RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16u_AC4IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_AC4RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_16s_AC4IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriSqrt_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Exponential: dst = saturate(round(e^src * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  Integers: the real exponential, scaled, is rounded once. 32f: within 1 ulp of the rounded
+ *            exponential, subnormal results too; beyond the range infinity and 0, a NaN gives a NaN.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriExp_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriExp_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriExp_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriExp_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriExp_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Natural logarithm: dst = saturate(round(ln(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor.
+ *  Shapes    AC4 processes channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  Integers: the real logarithm, scaled, is rounded once; 0 and negative values give the type's
+ *            minimum (0 or -32768). 32f: within 1 ulp of the rounded logarithm; 0 gives minus infinity,
+ *            negative values and NaNs give a NaN, without a warning.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels; scaleFactor any integer.
+ *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
+ *            overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written. Integers: QOR_WARN_LOG_ZERO or
+ *            QOR_WARN_LOG_NEGATIVE, by the first element at or below 0 in the order of rows; the destination is
+ *            complete.
+ */
+QORI_API QorResult QORI_CALL qoriLn_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_8u_C1IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_8u_C3IRSfs(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C1RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C1IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C3RSfs(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16u_C3IRSfs(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C1IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_16s_C3IRSfs(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriLn_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriLn_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriLn_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriLn_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
 
 /* ---- Convert -------------------------------------------------------------------------------------------------- */
 
@@ -1939,6 +2211,459 @@ QORI_API QorResult QORI_CALL qoriDup_8u_C1C3R(const uint8_t* pSrc, int32_t srcSt
 QORI_API QorResult QORI_CALL qoriDup_8u_C1C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
+/* ---- Extrema and counting ------------------------------------------------------------------------------------- */
+
+/** Smallest element of each channel.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMin_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, uint8_t* pMin);
+QORI_API QorResult QORI_CALL qoriMin_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMin);
+QORI_API QorResult QORI_CALL qoriMin_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, int16_t* pMin);
+QORI_API QorResult QORI_CALL qoriMin_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMin);
+QORI_API QorResult QORI_CALL qoriMin_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[3]);
+QORI_API QorResult QORI_CALL qoriMin_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[4]);
+QORI_API QorResult QORI_CALL qoriMin_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[3]);
+
+/** Largest element of each channel.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, uint8_t* pMax);
+QORI_API QorResult QORI_CALL qoriMax_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMax_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, int16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMax_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMax);
+QORI_API QorResult QORI_CALL qoriMax_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMax[3]);
+QORI_API QorResult QORI_CALL qoriMax_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMax[4]);
+QORI_API QorResult QORI_CALL qoriMax_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMax[3]);
+
+/** Smallest and largest element of each channel, in one pass.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   uint8_t darkest, brightest;
+ *            qoriMinMax_8u_C1R(src, srcStep, (QorImageSize){640, 480}, &darkest, &brightest);
+ */
+QORI_API QorResult QORI_CALL qoriMinMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pMin, uint8_t* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[4], uint8_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], uint8_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMin, uint16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[4], uint16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], uint16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pMin, int16_t* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[4], int16_t pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int16_t pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMin,
+    float* pMax);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[3],
+    float pMax[3]);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float pMin[4],
+    float pMax[4]);
+QORI_API QorResult QORI_CALL qoriMinMax_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[3], float pMax[3]);
+
+/** Smallest element of each channel and the first pixel, from the top and then from the left, that holds it.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; where there is nothing else, the result is NaN at (0, 0).
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pMin, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMin, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pMin, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMin,
+    int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMinIndx_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMin[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+
+/** Largest element of each channel and the first pixel, from the top and then from the left, that holds it.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize and positions
+ *            in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     32f: NaN elements are ignored; where there is nothing else, the result is NaN at (0, 0). The scan
+ *            ends early when every channel has met its type's largest value.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   float peak;
+ *            int32_t x, y;
+ *            qoriMaxIndx_32f_C1R(score, scoreStep, roi, &peak, &x, &y);
+ */
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pMax, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pMax, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pMax, int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, float* pMax,
+    int32_t* pIndexX, int32_t* pIndexY);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMax[4], int32_t pIndexX[4], int32_t pIndexY[4]);
+QORI_API QorResult QORI_CALL qoriMaxIndx_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float pMax[3], int32_t pIndexX[3], int32_t pIndexY[3]);
+
+/** Smallest and largest element of every block of a grid, and of the whole region.
+ *  Shapes    Blocks of blockSize start at the top left corner; the last column and row of blocks may be
+ *            partial. pDstMin and pDstMax hold one element per block.
+ *  Units     Steps in bytes; roiSize and blockSize in pixels.
+ *  Aliasing  Source and outputs must not overlap.
+ *  Notes     pDstMin or pDstMax may be null, and so may pDstGlobalMin and pDstGlobalMax; what is null is not
+ *            written. The step checks compare numbers of elements with bytes. 32f: NaN elements are ignored;
+ *            NaN where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc is null, or pDstMin and pDstMax both are),
+ *            QOR_ERR_SIZE (a width or height of the region or the block below 1), QOR_ERR_STEP (width greater
+ *            than srcStep, or more blocks in a row than a given output's step); then nothing is written.
+ *  Example   // Extremes of 16 x 16 blocks of a 640 x 480 image.
+ *            qoriBlockMinMax_8u_C1R(src, srcStep, (QorImageSize){640, 480}, mins, 40, maxs, 40, (QorImageSize){16, 16}, &low, &high);
+ */
+QORI_API QorResult QORI_CALL qoriBlockMinMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint8_t* pDstMin, int32_t dstMinStep, uint8_t* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    uint8_t* pDstGlobalMin, uint8_t* pDstGlobalMax);
+QORI_API QorResult QORI_CALL qoriBlockMinMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    uint16_t* pDstMin, int32_t dstMinStep, uint16_t* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    uint16_t* pDstGlobalMin, uint16_t* pDstGlobalMax);
+QORI_API QorResult QORI_CALL qoriBlockMinMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int16_t* pDstMin, int32_t dstMinStep, int16_t* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    int16_t* pDstGlobalMin, int16_t* pDstGlobalMax);
+QORI_API QorResult QORI_CALL qoriBlockMinMax_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    float* pDstMin, int32_t dstMinStep, float* pDstMax, int32_t dstMaxStep, QorImageSize blockSize,
+    float* pDstGlobalMin, float* pDstGlobalMax);
+
+/** Counts the pixels of each channel with lowerBound <= value <= upperBound.
+ *  Shapes    Results: one value, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The image is only read. Results must not lie in it.
+ *  Notes     NaN is in no range.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_BAD_RANGE (an upperBound below its lowerBound);
+ *            then nothing is written.
+ *  Example   int32_t dark;
+ *            qoriCountInRange_8u_C1R(src, srcStep, roi, &dark, 0, 31);
+ */
+QORI_API QorResult QORI_CALL qoriCountInRange_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pCounts, uint8_t lowerBound, uint8_t upperBound);
+QORI_API QorResult QORI_CALL qoriCountInRange_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const uint8_t lowerBound[3], const uint8_t upperBound[3]);
+QORI_API QorResult QORI_CALL qoriCountInRange_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const uint8_t lowerBound[3], const uint8_t upperBound[3]);
+QORI_API QorResult QORI_CALL qoriCountInRange_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pCounts, float lowerBound, float upperBound);
+QORI_API QorResult QORI_CALL qoriCountInRange_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
+QORI_API QorResult QORI_CALL qoriCountInRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
+
+/* ---- Histograms ----------------------------------------------------------------------------------------------- */
+
+/** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1].
+ *  Shapes    nLevels levels make nLevels - 1 bins. Multi-channel forms take one array of bins, one of levels
+ *            and one count per channel (three for AC4).
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     A value equal to the last level is not counted. Levels need not ascend: a pixel counts in every
+ *            bin that holds it, and a bin whose lower level is not below its upper one stays 0. NaN counts
+ *            nowhere.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_HIST_LEVELS (an nLevels below 2); then nothing is
+ *            written.
+ *  Example   int32_t levels[3] = {0, 128, 256}, dark_bright[2];
+ *            qoriHistogramRange_8u_C1R(src, srcStep, roi, dark_bright, levels, 3);
+ */
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriHistogramRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const float* const pLevels[3], const int32_t nLevels[3]);
+
+/** Counts the pixels between levels spaced evenly from lowerLevel to upperLevel, and returns the levels.
+ *  Shapes    nLevels levels make nLevels - 1 bins. Multi-channel forms take one array of bins, one of levels,
+ *            one count and one pair of bounds per channel (three for AC4).
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     What upperLevel - lowerLevel leaves over, divided by the number of bins, widens the first bins by
+ *            one each, in the direction of the levels. Counting is that of qoriHistogramRange: descending
+ *            levels give empty bins.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_HIST_LEVELS (an nLevels below 2); then nothing is
+ *            written.
+ *  Example   int32_t levels[257], histogram[256];
+ *            qoriHistogramEven_8u_C1R(src, srcStep, roi, histogram, levels, 257, 0, 256);
+ */
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, int32_t* pLevels, int32_t nLevels, int32_t lowerLevel, int32_t upperLevel);
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], int32_t* const pLevels[4], const int32_t nLevels[4], const int32_t lowerLevel[4],
+    const int32_t upperLevel[4]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, int32_t* pLevels, int32_t nLevels, int32_t lowerLevel, int32_t upperLevel);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], int32_t* const pLevels[4], const int32_t nLevels[4], const int32_t lowerLevel[4],
+    const int32_t upperLevel[4]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, int32_t* pLevels, int32_t nLevels, int32_t lowerLevel, int32_t upperLevel);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], int32_t* const pLevels[4], const int32_t nLevels[4], const int32_t lowerLevel[4],
+    const int32_t upperLevel[4]);
+QORI_API QorResult QORI_CALL qoriHistogramEven_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], int32_t* const pLevels[3], const int32_t nLevels[3], const int32_t lowerLevel[3],
+    const int32_t upperLevel[3]);
+
+/** Sizes of the record and of the scratch buffer of the prepared histograms.
+ *  Units     Sizes in bytes. nLevels holds one count per channel. The record takes 48 + 4 times the sum of
+ *            nLevels; the buffer takes 1024 (8u), 262144 (16u, 16s) or 0 (32f) per channel. roiSize and uniform
+ *            do not change the sizes.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     dataType is a QorDataType. One that is not supported is reported only after the record's size and
+ *            a buffer size of 0 have been written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_HIST_LEVELS (an nLevels
+ *            below 2), QOR_ERR_DATA_TYPE; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogramGetBufferSize(int32_t dataType, QorImageSize roiSize, const int32_t* nLevels,
+    int32_t numChannels, int32_t uniform, int32_t* pSpecSize, int32_t* pBufferSize);
+
+/** Prepares a histogram with given levels.
+ *  Shapes    pLevels holds one array of float levels per channel, nLevels one count per channel.
+ *  Elements  For integer types the levels are truncated towards zero.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     The record points into itself on 32-bit systems: do not move it.
+ *  Returns   QOR_OK; in this order QOR_ERR_DATA_TYPE (before anything else), QOR_ERR_NULL_PTR (a pointer is
+ *            null), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), for each channel
+ *            QOR_ERR_NULL_PTR, QOR_ERR_HIST_LEVELS (nLevels below 2), QOR_ERR_BAD_RANGE (levels do not
+ *            increase); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogramInit(int32_t dataType, const float* const* pLevels, const int32_t* nLevels,
+    int32_t numChannels, QorHistogramSpec* pSpec);
+
+/** Prepares a histogram with levels spaced uniformly from pLowerLevel to pUpperLevel.
+ *  Shapes    One lower and one upper level and one count per channel.
+ *  Elements  32f: level k is the fused k * width + lower, in double precision; integer types: k * width +
+ *            lower, truncated towards zero.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     Returns QOR_WARN_ADJUSTED, with the record filled, where the bins of an integer type come out
+ *            narrower than 1: some are empty. The record points into itself on 32-bit systems: do not move it.
+ *  Returns   QOR_OK; in this order QOR_ERR_DATA_TYPE (before anything else), QOR_ERR_NULL_PTR (a pointer is
+ *            null), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), for each channel
+ *            QOR_ERR_HIST_LEVELS (nLevels below 2), QOR_ERR_BAD_RANGE (lower level not below the upper one);
+ *            then nothing is written.
+ *  Example   float lower = 0, upper = 65536;
+ *            int32_t count = 257, specSize, bufferSize;
+ *            qoriHistogramGetBufferSize(qor16u, roi, &count, 1, 1, &specSize, &bufferSize);
+ *            QorHistogramSpec* spec = malloc(specSize);
+ *            uint8_t* buffer = malloc(bufferSize);
+ *            qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, spec);
+ *            qoriHistogram_16u_C1R(src, srcStep, roi, histogram, spec, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriHistogramUniformInit(int32_t dataType, const float* pLowerLevel,
+    const float* pUpperLevel, const int32_t* nLevels, int32_t numChannels, QorHistogramSpec* pSpec);
+
+/** Reads the levels of a prepared histogram back, as floats.
+ *  Shapes    ppLevels holds one array per channel, with room for that channel's nLevels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_BAD_ARG (the record is not a
+ *            prepared histogram), QOR_ERR_NULL_PTR (a channel's array is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogramGetLevels(const QorHistogramSpec* pSpec, float* const* ppLevels);
+
+/** Counts the pixels between the levels of a prepared histogram.
+ *  Shapes    pHist: an array of nLevels - 1 bins, or an array of one such per channel.
+ *  Units     srcStep in bytes, at least one row of pixels; roiSize in pixels.
+ *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
+ *  Notes     The record must be of the function's type and channels; only its identifier is checked. It is only
+ *            read: calls may share it, each with a buffer of its own. pBuffer must not be null even where its
+ *            size is 0. Levels outside the type's range are taken as its ends. NaN counts nowhere.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (srcStep below 1 or below the bytes of a row), QOR_ERR_BAD_ARG (the record is not
+ *            a prepared histogram); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHistogram_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* pHist, const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+
 /* ---- Image memory --------------------------------------------------------------------------------------------- */
 
 /** Allocates an image whose rows start on 64-byte boundaries.
@@ -1993,6 +2718,1091 @@ QORI_API QorComplex32f* QORI_CALL qoriMalloc_32fc_AC4(int32_t width, int32_t hei
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API void QORI_CALL qoriFree(void* ptr);
+
+/* ---- Norms, sums, means and dot products ---------------------------------------------------------------------- */
+
+/** Adds the elements of each channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   double sum[3];
+ *            qoriSum_8u_C3R(rgb, rgbStep, (QorImageSize){640, 480}, sum);
+ */
+QORI_API QorResult QORI_CALL qoriSum_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum);
+QORI_API QorResult QORI_CALL qoriSum_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[4]);
+QORI_API QorResult QORI_CALL qoriSum_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pSum[3]);
+QORI_API QorResult QORI_CALL qoriSum_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double* pSum,
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[4],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pSum[3],
+    int32_t hint);
+
+/** Averages the elements of each channel: their sum over width * height.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     width * height is taken modulo 2^32 as a signed number. C1 divides the sum; the other layouts
+ *            multiply it by the reciprocal, which may differ in the last bit.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMean_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize, double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pMean);
+QORI_API QorResult QORI_CALL qoriMean_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[4]);
+QORI_API QorResult QORI_CALL qoriMean_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3]);
+QORI_API QorResult QORI_CALL qoriMean_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double* pMean,
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pMean[3],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize, double pMean[4],
+    int32_t hint);
+QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pMean[3], int32_t hint);
+
+/** Largest magnitude of each channel: max |src|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     |-32768| is 32768. NaN elements are ignored; 0 where there is nothing else.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+
+/** Sum of magnitudes of each channel: sum |src|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+
+/** Euclidean norm of each channel: the square root of sum src^2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     srcStep in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     32f, fast: squares are summed in single precision, so magnitudes above 1.8e19 overflow to
+ *            infinity.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Example   double norm;
+ *            qoriNorm_L2_32f_C1R(src, srcStep, roi, &norm, hintAccurate);
+ */
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    double pValue[3], int32_t hint);
+
+/** Largest magnitude of the difference in each channel: max |src1 - src2|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     32f: differences in single precision; those that are NaN are ignored.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+
+/** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Largest magnitude of the difference over that of src2, per channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the norm of src2 is 0, the result is the norm of the difference and the status
+ *            QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+
+/** Sum of magnitudes of the difference over that of src2, per channel.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the norm of src2 is below 2.2250738585072014e-308, the result is the norm of the difference
+ *            and the status QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
+ *            single precision, added pairwise.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Notes     Where the sum of squares of src2 is below 2.2250738585072014e-308, the result is the norm of the
+ *            difference and the status QOR_WARN_DIV_BY_ZERO; the other channels are divided.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_8u_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16u_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_16s_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3]);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pValue, int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pValue[3], int32_t hint);
+
+/** Dot product of two images, per channel: sum src1 * src2.
+ *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
+ *            at).
+ *  Elements  8- and 16-bit totals are exact and rounded once. 32u and 32s: products and sums in double
+ *            precision, in the order of the pixels. 32f with hintAccurate: exact products, sums in double
+ *            precision; with any other hint: 48 partial sums in single precision by fused multiply-add, added
+ *            pairwise.
+ *  Units     Steps in bytes, not checked otherwise; roiSize in pixels.
+ *  Aliasing  Images are only read and may overlap. Results must not lie in them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (8u C1 only: a step of 0); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C1R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C3R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_C4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_8u64f_AC4R(const uint8_t* pSrc1, int32_t src1Step, const uint8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C1R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C3R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_C4R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_8s64f_AC4R(const int8_t* pSrc1, int32_t src1Step, const int8_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C1R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C3R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_C4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_16u64f_AC4R(const uint16_t* pSrc1, int32_t src1Step, const uint16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C1R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C3R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_C4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_16s64f_AC4R(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C1R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C3R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_C4R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_32u64f_AC4R(const uint32_t* pSrc1, int32_t src1Step, const uint32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C1R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C3R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_C4R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4]);
+QORI_API QorResult QORI_CALL qoriDotProd_32s64f_AC4R(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3]);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double* pDp, int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3], int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[4], int32_t hint);
+QORI_API QorResult QORI_CALL qoriDotProd_32f64f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, QorImageSize roiSize, double pDp[3], int32_t hint);
+
+/** Weighted sum of vectors: pDst[j] = sum over i of pWeights[i] * ppSrcRows[i][j].
+ *  Shapes    nRows vectors and weights; len elements in each vector and in pDst.
+ *  Elements  Products and sums are rounded to the element type one by one, in the order of the rows.
+ *  Units     len in elements.
+ *  Aliasing  pDst may be one of the rows.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (len or nRows below 1),
+ *            QOR_ERR_NULL_PTR (a row is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDotProdCol_32f_L2(const float* const* ppSrcRows, const float* pWeights, int32_t nRows,
+    float* pDst, int32_t len);
+QORI_API QorResult QORI_CALL qoriDotProdCol_64f_L2(const double* const* ppSrcRows, const double* pWeights,
+    int32_t nRows, double* pDst, int32_t len);
+
+/* ---- Resize --------------------------------------------------------------------------------------------------- */
+
+/** Reports how many bytes a plan and the buffer for its initialisation take.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     antialiasing: 0 for the plain forms, any other value for the antialiasing ones (linear, cubic,
+ *            Lanczos).
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (width or height below 1), QOR_ERR_INTERPOLATION (not 0 or a
+ *            QorInterpolationKind), QOR_ERR_UNSUPPORTED_MODE (0; antialiasing of nearest or super),
+ *            QOR_ERR_SIZE (source below 2 pixels for linear, 4 for cubic and Lanczos, below the destination for
+ *            super; a result of 2^31 or more); then nothing is written.
+ *  Example   int32_t planBytes, initBytes, bufferBytes;
+ *            qoriResizeGetSize_8u(srcSize, dstSize, interpCubic, 0, &planBytes, &initBytes);
+ *            QorResizePlan* plan = malloc(planBytes);
+ *            uint8_t* init = malloc(initBytes);
+ *            qoriResizeCubicInit_8u(srcSize, dstSize, 0.0f, 0.5f, plan, init);
+ *            qoriResizeGetBufferSize_8u(plan, dstSize, 3, &bufferBytes);
+ *            uint8_t* buffer = malloc(bufferBytes);
+ *            qoriResizeCubic_8u_C3R(src, srcStep, dst, dstStep, (QorPoint2D){0, 0}, dstSize, borderReplicate, NULL, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetSize_8u(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_16u(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_16s(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_32f(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetSize_64f(QorImageSize srcSize, QorImageSize dstSize, int32_t interpolation,
+    int32_t antialiasing, int32_t* pPlanSize, int32_t* pInitBufSize);
+
+/** Reports how many bytes of work buffer a tile takes; each thread needs a buffer of its own.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     Also returns QOR_WARN_ADJUSTED where the tile is wider or higher than the plan's destination; the
+ *            size is stored.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4),
+ *            QOR_ERR_SIZE (a negative length; a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_8u(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_16u(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_16s(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_32f(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBufferSize_64f(const QorResizePlan* pPlan, QorImageSize dstSize,
+    int32_t numChannels, int32_t* pBufSize);
+
+/** Reports how many pixels around the source the filter of a plan may reach; zeros for nearest and super.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_8u(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_16u(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_16s(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_32f(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+QORI_API QorResult QORI_CALL qoriResizeGetBorderSize_64f(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize);
+
+/** Reports the source pixel at which pSrc must point for a tile: floor(dstOffset * source length / destination
+ *  length).
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan),
+ *            QOR_ERR_OUT_OF_RANGE (an offset is negative or outside the plan's destination); then nothing is
+ *            written.
+ *  Example   QorPoint2D at;   // the lower half of an image, as a tile of its own
+ *            qoriResizeGetSrcOffset_8u(plan, (QorPoint2D){0, 360}, &at);
+ *            qoriResizeLinear_8u_C1R(src + at.y * srcStep + at.x, srcStep, dst + 360 * dstStep, dstStep, (QorPoint2D){0, 360},
+ *                                    (QorImageSize){1280, 360}, borderReplicate, NULL, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_8u(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_16u(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_16s(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_32f(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcOffset_64f(const QorResizePlan* pPlan, QorPoint2D dstOffset,
+    QorPoint2D* pSrcOffset);
+
+/** Reports the smallest source rectangle that holds every pixel that a destination rectangle is made of.
+ *  Shapes    The destination rectangle is trimmed to the plan's destination first and reported so; the source
+ *            rectangle is clipped to the source.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_CONTEXT (no plan), QOR_ERR_OUT_OF_RANGE (the origin is negative or outside the plan's
+ *            destination); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_8u(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_16u(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_16s(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_32f(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+QORI_API QorResult QORI_CALL qoriResizeGetSrcRoi_64f(const QorResizePlan* pPlan, QorImageRect dstRect,
+    QorImageRect* pSrcRect, QorImageRect* pTrimmedDstRect);
+
+/** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination -
+ *  1e-10).
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_8u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_16u(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_16s(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeNearestInit_32f(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan);
+
+/** Fills the plan of a linear resize. The 8u plan holds 14-bit weights and serves 8u only; the others are one.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 2); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_8u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_16u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_16s(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_32f(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeLinearInit_64f(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+
+/** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the
+ *  B-spline.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     valueB and valueC are not checked.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 4); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_8u(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_16u(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_16s(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeCubicInit_32f(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a Lanczos resize with 2 or 3 lobes; the weights of each position sum to 1.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length), QOR_ERR_UNSUPPORTED_MODE (numLobes not 2 or 3), QOR_ERR_SIZE
+ *            (a source side below 4 with 2 lobes, 6 with 3); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_8u(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_16u(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_16s(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriResizeLanczosInit_32f(QorImageSize srcSize, QorImageSize dstSize, uint32_t numLobes,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a super-sampling reduction: each pixel is the mean of the source area that it covers.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below the destination's); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_8u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_16u(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_16s(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+QORI_API QorResult QORI_CALL qoriResizeSuperInit_32f(QorImageSize srcSize, QorImageSize dstSize, QorResizePlan* pPlan);
+
+/** Fills the plan of a linear resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The weights of each position sum to 1. Along an axis that is not reduced the filter is the plain
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 2); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasingLinearInit(QorImageSize srcSize, QorImageSize dstSize,
+    QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a cubic resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The weights of each position sum to 1. Along an axis that is not reduced the filter is the plain
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length; a source side below 4); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasingCubicInit(QorImageSize srcSize, QorImageSize dstSize, float valueB,
+    float valueC, QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Fills the plan of a Lanczos resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The weights of each position sum to 1. Along an axis that is not reduced the filter is the plain
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (a length is
+ *            0), QOR_ERR_SIZE (a negative length), QOR_ERR_UNSUPPORTED_MODE (numLobes not 2 or 3), QOR_ERR_SIZE
+ *            (a source side below 4 with 2 lobes, 6 with 3); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasingLanczosInit(QorImageSize srcSize, QorImageSize dstSize,
+    uint32_t numLobes, QorResizePlan* pPlan, uint8_t* pInitBuf);
+
+/** Resizes a tile by the nearest source pixel, moved bit for bit.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
+ *            the tile's first.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED where dstSize
+ *            alone exceeds it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
+ *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
+ *            another interpolation); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeNearest_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Reduces a tile to means of areas, in single precision; integers round to nearest, ties to even.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
+ *            the tile's first.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED where dstSize
+ *            alone exceeds it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
+ *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
+ *            another interpolation); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeSuper_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single
+ *  precision.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
+ *            the tile's first.
+ *  Elements  8u: h = (p0 * (16384 - w) + p1 * w + 128) >> 8 along rows, then (h0 * (16384 - w) + h1 * w +
+ *            0x80000) >> 20. 16u and 16s round to nearest, ties to even, and saturate.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     borderReplicate repeats the source's edge, except on sides whose borderRead flag is set: there,
+ *            and with borderReadAll, pixels beyond the source are read from memory. pBorderValue is not used
+ *            and may be null. The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED
+ *            where dstSize alone exceeds it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
+ *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
+ *            another interpolation), QOR_ERR_BORDER (bits outside 0xF7), QOR_ERR_UNSUPPORTED_MODE (neither
+ *            borderReplicate nor borderReadAll); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const double* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C3R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const double* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const double* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and
+ *  saturate.
+ *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; 4 x 4 source pixels make one.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     A source element that is not finite reaches every result whose 4 x 4 pixels hold it.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile by Lanczos filtering in single precision; integers round to nearest, ties to even, and
+ *  saturate.
+ *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; 4 x 4 (2 lobes) or 6 x 6 source pixels make
+ *            one.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+
+/** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and
+ *  saturate.
+ *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; the filter spans twice
+ *            qoriResizeGetBorderSize source pixels.
+ *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
+ *            in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const int16_t* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriResizeAntialiasing_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
+    const QorResizePlan* pPlan, uint8_t* pBuffer);
 
 /* ---- Scale ---------------------------------------------------------------------------------------------------- */
 

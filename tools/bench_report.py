@@ -15,7 +15,8 @@ COLUMNS = [("Mpix/s", "Mpix/s", "{:,.0f}"), ("GB/s", "GB/s", "{:.1f}"), ("ns", "
 
 def load(path):
     rows = []
-    for run in json.loads(Path(path).read_text())["benchmarks"]:
+    text = Path(path).read_text()           # empty when no name matched
+    for run in json.loads(text)["benchmarks"] if text else []:
         operation, size = run["name"].split("/")[:2]
         rows.append((operation, size, run))
     return rows
@@ -31,19 +32,30 @@ def print_table(rows):
 
 
 def draw(rows, path):
-    """One bar a row: our share of the roofline, cut at 2."""
-    height, left, scale, cut = 18, 330, 260, 2.0
-    lines = [f'<svg xmlns="http://www.w3.org/2000/svg" width="{left + scale * cut + 80:.0f}" height="{height * len(rows) + 50}" '
-             'font-family="DejaVu Sans, sans-serif" font-size="11">', '<rect width="100%" height="100%" fill="white"/>',
-             f'<text x="{left}" y="16">share of the roofline (line: moving the same bytes and doing nothing else)</text>']
+    """One bar a row: our share of the roofline. Bars beyond the cut end in a point; the numbers are whole."""
+    height, top, left, scale, cut = 18, 58, 290, 260, 2.0
+    column, bottom = left + scale * cut + 70, top + height * len(rows)
+    lines = [f'<svg xmlns="http://www.w3.org/2000/svg" width="{column + 80:.0f}" height="{bottom + 16}" '
+             'font-family="DejaVu Sans, sans-serif" font-size="11" fill="#222">',
+             '<rect width="100%" height="100%" fill="white"/>',
+             '<text x="16" y="22" font-size="14">Share of the roofline: the time of moving the same bytes and doing nothing '
+             'else, over ours</text>',
+             f'<g text-anchor="end"><text x="{column}" y="{top - 10}">share</text>'
+             f'<text x="{column + 64}" y="{top - 10}">Mpix/s</text></g>']
+    for tick in (0.5, 1.0, 1.5, 2.0):
+        x, strong = left + scale * tick, tick == 1.0
+        lines.append(f'<text x="{x}" y="{top - 10}" text-anchor="middle">{tick}</text>')
+        lines.append(f'<line x1="{x}" x2="{x}" y1="{top - 4}" y2="{bottom}" stroke="{"#c0392b" if strong else "#ddd"}"/>')
     for i, (operation, size, run) in enumerate(rows):
-        y, share = 30 + i * height, run["roof"]
-        lines.append(f'<text x="{left - 6}" y="{y + 12}" text-anchor="end">{escape(operation)}  {escape(size)}</text>')
-        lines.append(f'<rect x="{left}" y="{y + 2}" width="{scale * min(share, cut):.1f}" height="{height - 5}" fill="#3a7ca5"/>')
-        lines.append(f'<text x="{left + scale * min(share, cut) + 4:.1f}" y="{y + 12}">{share:.2f}</text>')
-    x = left + scale
-    lines.append(f'<line x1="{x}" x2="{x}" y1="24" y2="{30 + height * len(rows)}" stroke="#c0392b" stroke-dasharray="3 3"/></svg>')
-    Path(path).write_text("\n".join(lines))
+        y, share = top + i * height, run["roof"]
+        end, low, high = left + scale * min(share, cut), y + 3, y + height - 3
+        point = f"{end + 7:.1f},{(low + high) / 2} " if share > cut else ""
+        lines.append(f'<polygon points="{left},{low} {end:.1f},{low} {point}{end:.1f},{high} {left},{high}" '
+                     f'fill="{"#3a7ca5" if share >= 1 else "#8db8d3"}"/>')
+        lines.append(f'<g text-anchor="end"><text x="{left - 8}" y="{y + 13}">{escape(operation)}  {escape(size)}</text>'
+                     f'<text x="{column}" y="{y + 13}">{share:.2f}</text>'
+                     f'<text x="{column + 64}" y="{y + 13}">{run["Mpix/s"]:,.0f}</text></g>')
+    Path(path).write_text("\n".join(lines + ["</svg>", ""]))
 
 
 def main(arguments):

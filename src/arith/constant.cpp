@@ -18,32 +18,45 @@ bool allValues(const T* value, Predicate predicate) {
 
 template <class T>
 bool isZeroValue(T value) {
-    if constexpr (kernels::isComplex<T>) return value.re == 0 && value.im == 0;
-    else return value == 0;
+    if constexpr (kernels::isComplex<T>)
+        return value.re == 0 && value.im == 0;
+    else
+        return value == 0;
+}
+
+template <Layout layout, class T>
+kernels::ChannelVectors<T> constantsOf(const T* value) {
+    T perChannel[channels(layout)];
+    for (int c = 0; c < channels(layout); ++c) perChannel[c] = value[c < processedChannels(layout) ? c : 0];
+    return kernels::channelVectors(perChannel, channels(layout));
+}
+
+/// dst = operation(src), per element, where the operation has the constants.
+template <Layout layout, class T, class Operation>
+void runUnary(Operation operation, Image<const T> src, Image<T> dst, QorImageSize roi) {
+    [[maybe_unused]] const FloatControl<T> control;
+    const bool streaming = streamsTo<layout>(dst, roi, src);
+    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, src);
 }
 
 /// dst = operation(value, src), per element.
 template <Layout layout, class T, class Operation>
 void runConstant(Operation operation, const T* value, Image<const T> src, Image<T> dst, QorImageSize roi) {
-    [[maybe_unused]] const FloatControl<T> control;
-    T perChannel[channels(layout)];
-    for (int c = 0; c < channels(layout); ++c) perChannel[c] = value[c < processedChannels(layout) ? c : 0];
-    kernels::WithConstant<T, Operation> withConstant{operation, kernels::channelVectors(perChannel, channels(layout))};
-    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), withConstant, false, dst, src);
+    runUnary<layout>(kernels::WithConstant<T, Operation>{operation, constantsOf<layout>(value)}, src, dst, roi);
 }
 
 template <Layout layout, class T>
 void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (src.data == dst.data && src.step == dst.step) return;
     if constexpr (keepsAlpha<layout>) {
-        const auto same = [](int, auto block) { return block; };
-        kernels::mapImage<true>(roi, 4, same, false, dst, src);
+        runUnary<layout>([](int, auto block) { return block; }, src, dst, roi);
     } else {
         constexpr int pixel = channels(layout) * elementBytes<T>;
         const bool streaming = streams(streamRules::copy, traffic(roi, 2 * pixel));
         const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
-        forEachRow(roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); },
-                   walk(src, channels(layout)), walk(dst, channels(layout)));
+        forEachRow(
+            roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); },
+            walk(src, channels(layout)), walk(dst, channels(layout)));
         if (streaming) streamFence();
     }
 }
@@ -58,8 +71,8 @@ QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize
 template <class T, Layout layout, Kind kind>
 QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t> ||
-                             (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
+    constexpr bool anyStep =
+        std::is_same_v<T, uint8_t> || (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
     if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
@@ -69,7 +82,7 @@ QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImage
     }
     if constexpr (std::is_unsigned_v<T>) {
         constexpr int bits = 8 * elementBytes<T>;
-        if (scale <= -bits && allValues<layout>(value, [](T v) { return v != 0; })) {   // no sum is 0
+        if (scale <= -bits && allValues<layout>(value, [](T v) { return v != 0; })) {  // no sum is 0
             fillConstant<layout>(dst, roi, std::numeric_limits<T>::max());
             return QOR_OK;
         }
@@ -122,8 +135,12 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
             return QOR_OK;
         }
     }
-    const auto run = [&](auto division) {
-        runConstant<layout>(kernels::Binary<T, decltype(division)>{division}, value, src, dst, roi);
+    const auto run = [&]<class Divide>(Divide division) {
+        if constexpr (requires { typename Divide::Prepared; })
+            runUnary<layout>(kernels::DivisionByConstants<T, Divide>{division, constantsOf<layout>(value)}, src, dst,
+                             roi);
+        else
+            runConstant<layout>(kernels::Binary<T, Divide>{division}, value, src, dst, roi);
     };
     if constexpr (std::is_same_v<T, float>) {
         run([](auto d, auto n) __attribute__((always_inline)) { return Vec<float>{_mm256_div_ps(n.v, d.v)}; });
@@ -136,7 +153,7 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
 template <class T, Layout layout>
 QorResult multiplyConstantFraction(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
-    const auto product = [](Vec<T> a, Vec<T> b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
+    const auto product = [](auto a, auto b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
     runConstant<layout>(kernels::Binary<T, decltype(product)>{product}, value, src, dst, roi);
     return QOR_OK;
 }

@@ -17,7 +17,8 @@ template <class T, Layout layout>
 QorResult divide(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi), stepCheck(src1, src2, dst))) return r;
     QorResult result = QOR_OK;
-    kernels::withDivision<T>(scale, [&](auto division) { result = runDivision<layout>(division, src1, src2, dst, roi); });
+    const auto run = [&](auto division) { result = runDivision<layout>(division, src1, src2, dst, roi); };
+    kernels::withDivision<T>(scale, run);
     return result;
 }
 

@@ -1,34 +1,29 @@
 // SPDX-License-Identifier: Apache-2.0
 // How the arithmetic families run a row operation: over two images, or over one image and constants.
 #pragma once
-#include <immintrin.h>
-
 #include "frame/checks.h"
+#include "frame/control_scope.h"
 #include "frame/streaming.h"
 #include "kernels/arith.h"
 
 namespace qori::arith {
 
-/// Float arithmetic rounds to nearest and traps nothing, whatever the caller has set; his setting returns at the end.
-class DefaultFloatControl {
-public:
-    DefaultFloatControl() : callers_(_mm_getcsr()) { _mm_setcsr(kRoundNearestMaskAll); }
-    ~DefaultFloatControl() { _mm_setcsr(callers_); }
-    DefaultFloatControl(const DefaultFloatControl&) = delete;
-    DefaultFloatControl& operator=(const DefaultFloatControl&) = delete;
-
-private:
-    static constexpr unsigned kRoundNearestMaskAll = 0x1F80;
-    unsigned callers_;
-};
-
 /// Nothing, for integer elements.
 struct NoFloatControl {
-    NoFloatControl() {}   // user-provided, so that an unused variable is no warning
+    NoFloatControl() {}  // user-provided, so that an unused variable is no warning
 };
 
 template <class T>
-using FloatControl = std::conditional_t<kernels::isFloat<T>, DefaultFloatControl, NoFloatControl>;
+using FloatControl = std::conditional_t<kernels::isFloat<T>, ControlScope, NoFloatControl>;
+
+/// Stores past the cache once the images fill half of it: the destination is then not read before it is written. In
+/// place it has been read anyway.
+template <Layout layout, class T, class... Sources>
+bool streamsTo([[maybe_unused]] Image<T> dst, QorImageSize roi, Sources... sources) {
+    constexpr int bytes = static_cast<int>(1 + sizeof...(sources)) * channels(layout) * elementBytes<T>;
+    const bool inPlace = ((asBytes(sources.data) == asBytes(dst.data)) || ...);
+    return !inPlace && streams(streamRules::copy, traffic(roi, bytes));
+}
 
 template <Layout layout>
 constexpr bool keepsAlpha = layout == Layout::AC4;
@@ -37,7 +32,7 @@ constexpr bool keepsAlpha = layout == Layout::AC4;
 template <Layout layout, class Operation, class T>
 void runBinary(Operation&& operation, Image<const T> first, Image<const T> second, Image<T> dst, QorImageSize roi) {
     [[maybe_unused]] const FloatControl<T> control;
-    const bool streaming = false;
+    const bool streaming = streamsTo<layout>(dst, roi, first, second);
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, first, second);
 }
 
@@ -45,7 +40,7 @@ template <Layout layout, class T>
 void fillConstant(Image<T> dst, QorImageSize roi, T value) {
     const T values[1] = {value};
     kernels::Fill<T> fill{kernels::channelVectors(values, 1).v[0]};
-    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, false, dst);
+    kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), fill, streamsTo<layout>(dst, roi), dst);
 }
 
 }  // namespace qori::arith

@@ -25,7 +25,7 @@ inline constexpr StreamRule channelSplit{524'288, StreamRule::Limit::aboveCache}
 inline constexpr StreamRule workFill{2'097'152, StreamRule::Limit::aboveCache};
 /// Fills of 8- and 16-bit images.
 inline constexpr StreamRule constantFill{3'145'728, StreamRule::Limit::halfCache};
-/// Every other copy: measured, streaming gains from half the cache on, as source and destination compete for it.
+/// Every other copy and the arithmetic: measured, streaming gains from half the cache on, as the images compete for it.
 inline constexpr StreamRule copy{1'048'576, StreamRule::Limit::halfCache};
 }  // namespace streamRules
 

@@ -14,13 +14,21 @@ namespace qori::kernels {
 
 /// The type of an element's parts: complex elements are pairs.
 template <class T>
-struct ComponentOf { using type = T; };
+struct ComponentOf {
+    using type = T;
+};
 template <>
-struct ComponentOf<QorComplex16s> { using type = int16_t; };
+struct ComponentOf<QorComplex16s> {
+    using type = int16_t;
+};
 template <>
-struct ComponentOf<QorComplex32s> { using type = int32_t; };
+struct ComponentOf<QorComplex32s> {
+    using type = int32_t;
+};
 template <>
-struct ComponentOf<QorComplex32f> { using type = float; };
+struct ComponentOf<QorComplex32f> {
+    using type = float;
+};
 template <class T>
 using Component = typename ComponentOf<T>::type;
 
@@ -31,17 +39,21 @@ constexpr bool isFloat = std::is_same_v<Component<T>, float>;
 
 /// A vector of elements as one of their components, and back.
 template <class T>
-QORI_INLINE Vec<Component<T>> components(Vec<T> a) { return fromInteger<Component<T>>(toInteger(a.v)); }
+QORI_INLINE Vec<Component<T>> components(Vec<T> a) {
+    return fromInteger<Component<T>>(toInteger(a.v));
+}
 template <class T>
-QORI_INLINE Vec<T> elements(Vec<Component<T>> a) { return fromInteger<T>(toInteger(a.v)); }
+QORI_INLINE Vec<T> elements(Vec<Component<T>> a) {
+    return fromInteger<T>(toInteger(a.v));
+}
 
 namespace detail {
 
 /// Saturated 32-bit sum: where both operands differ in sign from it, the limit on their side.
 QORI_INLINE __m256i saturateSum32(__m256i a, __m256i sum, __m256i overflowSign) {
     const __m256i limit = _mm256_xor_si256(_mm256_srai_epi32(a, 31), _mm256_set1_epi32(INT32_MAX));
-    return _mm256_castps_si256(_mm256_blendv_ps(_mm256_castsi256_ps(sum), _mm256_castsi256_ps(limit),
-                                                _mm256_castsi256_ps(overflowSign)));
+    return _mm256_castps_si256(
+        _mm256_blendv_ps(_mm256_castsi256_ps(sum), _mm256_castsi256_ps(limit), _mm256_castsi256_ps(overflowSign)));
 }
 
 /// Lanes that hold their minimum for an exact value of minus that, M = 2^31 or 2^63: they become M - 256. No rule tells
@@ -78,14 +90,18 @@ template <class T>
 struct Sum {
     using C = Component<T>;
     using W = SignedLane<C>;
-    static constexpr uint64_t limit = 2 * magnitude<C>;   // at most 2^32, in lanes of 64 bits
+    static constexpr uint64_t limit = 2 * magnitude<C>;  // at most 2^32, in lanes of 64 bits
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const Vec<C> a = components(first), b = components(second);
-        if constexpr (isFloat<T>) return elements<T>({_mm256_add_ps(a.v, b.v)});
-        else if constexpr (std::is_same_v<C, uint8_t>) return elements<T>({_mm256_adds_epu8(a.v, b.v)});
-        else if constexpr (std::is_same_v<C, uint16_t>) return elements<T>({_mm256_adds_epu16(a.v, b.v)});
-        else if constexpr (std::is_same_v<C, int16_t>) return elements<T>({_mm256_adds_epi16(a.v, b.v)});
+        if constexpr (isFloat<T>)
+            return elements<T>({_mm256_add_ps(a.v, b.v)});
+        else if constexpr (std::is_same_v<C, uint8_t>)
+            return elements<T>({_mm256_adds_epu8(a.v, b.v)});
+        else if constexpr (std::is_same_v<C, uint16_t>)
+            return elements<T>({_mm256_adds_epu16(a.v, b.v)});
+        else if constexpr (std::is_same_v<C, int16_t>)
+            return elements<T>({_mm256_adds_epi16(a.v, b.v)});
         else {
             const __m256i sum = _mm256_add_epi32(a.v, b.v);
             return elements<T>({detail::saturateSum32(
@@ -113,10 +129,14 @@ struct Difference {
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const Vec<C> a = components(first), b = components(second);
-        if constexpr (isFloat<T>) return elements<T>({_mm256_sub_ps(b.v, a.v)});
-        else if constexpr (std::is_same_v<C, uint8_t>) return elements<T>({_mm256_subs_epu8(b.v, a.v)});
-        else if constexpr (std::is_same_v<C, uint16_t>) return elements<T>({_mm256_subs_epu16(b.v, a.v)});
-        else if constexpr (std::is_same_v<C, int16_t>) return elements<T>({_mm256_subs_epi16(b.v, a.v)});
+        if constexpr (isFloat<T>)
+            return elements<T>({_mm256_sub_ps(b.v, a.v)});
+        else if constexpr (std::is_same_v<C, uint8_t>)
+            return elements<T>({_mm256_subs_epu8(b.v, a.v)});
+        else if constexpr (std::is_same_v<C, uint16_t>)
+            return elements<T>({_mm256_subs_epu16(b.v, a.v)});
+        else if constexpr (std::is_same_v<C, int16_t>)
+            return elements<T>({_mm256_subs_epi16(b.v, a.v)});
         else {
             const __m256i difference = _mm256_sub_epi32(b.v, a.v);
             return elements<T>({detail::saturateSum32(
@@ -129,8 +149,10 @@ struct Difference {
         } else {
             const Wide<W> a = widen<W>(components(first)), b = widen<W>(components(second));
             const auto minus = [](Vec<W> x, Vec<W> y) -> Vec<W> {
-                if constexpr (sizeof(W) == 4) return {_mm256_sub_epi32(x.v, y.v)};
-                else return {_mm256_sub_epi64(x.v, y.v)};
+                if constexpr (sizeof(W) == 4)
+                    return {_mm256_sub_epi32(x.v, y.v)};
+                else
+                    return {_mm256_sub_epi64(x.v, y.v)};
             };
             return {minus(b.low, a.low), minus(b.high, a.high)};
         }
@@ -146,7 +168,7 @@ struct Product {
     using W = std::conditional_t<std::is_signed_v<C>, SignedLane<C>, std::make_unsigned_t<SignedLane<C>>>;
     // 8u: 65,025. 16u: 65,535^2. 16s: 2^30. Complex parts reach 2^31 and 2^63, which the lane does not
     // hold and mendMinimum() lowers by 256.
-    static constexpr uint64_t limit = isComplex<T> ? 2 * magnitude<C> * magnitude<C> - 256 : magnitude<C> * magnitude<C>;
+    static constexpr uint64_t square = magnitude<C> * magnitude<C>, limit = isComplex<T> ? 2 * square - 256 : square;
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) requires isFloat<T> {
         const __m256 a = components(first).v, b = components(second).v;
@@ -234,7 +256,8 @@ bool withScaledOperation(int32_t scale, Run run) {
             }
         }
         return withScaleRule<C, typename Op::W, Op::limit>(scale, [&](auto rule) {
-            if constexpr (std::is_same_v<decltype(rule), Saturate<C, typename Op::W>> && requires(Vec<T> a) { Op::exact(a, a); }) {
+            constexpr bool unscaled = std::is_same_v<decltype(rule), Saturate<C, typename Op::W>>;
+            if constexpr (unscaled && requires(Vec<T> a) { Op::exact(a, a); }) {
                 binary(exact);
             } else {
                 binary([rule](Vec<T> a, Vec<T> b) __attribute__((always_inline)) {
@@ -257,8 +280,10 @@ QORI_INLINE Vec<T> fractionProduct(Vec<T> a, Vec<T> b) {
     const Wide<W> product = Product<T>::wide(a, b);
     const auto divide = [](Vec<W> v) {
         const Vec<W> t = Lane<W>::add(v, Lane<W>::all(static_cast<W>(W{1} << (n - 1))));
-        if constexpr (n == 8) return Vec<W>{_mm256_srli_epi16(_mm256_add_epi16(t.v, _mm256_srli_epi16(t.v, 8)), 8)};
-        else return Vec<W>{_mm256_srli_epi32(_mm256_add_epi32(t.v, _mm256_srli_epi32(t.v, 16)), 16)};
+        if constexpr (n == 8)
+            return Vec<W>{_mm256_srli_epi16(_mm256_add_epi16(t.v, _mm256_srli_epi16(t.v, 8)), 8)};
+        else
+            return Vec<W>{_mm256_srli_epi32(_mm256_add_epi32(t.v, _mm256_srli_epi32(t.v, 16)), 16)};
     };
     return narrow<T>(divide(product.low), divide(product.high));
 }

@@ -18,7 +18,7 @@ constexpr uint64_t kBeyondRange = uint64_t{1} << 32;
 uint64_t roundedQuotient(uint64_t n, uint64_t d, int32_t scale) {
     Mixed m{n / d, n % d, d};
     if (scale > 0) {
-        if (scale >= 64) return 0;   // at most 2^63 / 2^64
+        if (scale >= 64) return 0;  // at most 2^63 / 2^64
         const uint64_t whole = m.q >> scale, rest = m.q - (whole << scale), half = uint64_t{1} << (scale - 1);
         return whole + (rest > half || (rest == half && (m.r != 0 || whole % 2 == 1)));
     }
@@ -55,7 +55,8 @@ QorComplex32s divideExactly(QorComplex32s divisor, QorComplex32s numerator, int3
     const auto [c, d] = numerator;
     const uint64_t norm = product(a, a) + product(b, b);
     if (norm == 0) return {limitBySign(c), limitBySign(d)};
-    return {roundedPart(product(c, a) + product(d, b), norm, scale), roundedPart(product(d, a) - product(c, b), norm, scale)};
+    return {roundedPart(product(c, a) + product(d, b), norm, scale),
+            roundedPart(product(d, a) - product(c, b), norm, scale)};
 }
 
 }  // namespace qori::kernels

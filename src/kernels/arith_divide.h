@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Quotients of elements: second / first * 2^-scale, rounded from the exact rational number.
 //
-// Integers go through one floating-point division. A quotient x = N / D (after scaling by a power of two, which is exact)
-// that is not halfway between integers is away from the nearest half by at least 1 / (2 D), that is x / (2 N). The
+// Integers go through one floating-point division. A quotient x = N / D (scaling by a power of two is exact) that is
+// not halfway between integers is away from the nearest half by at least 1 / (2 D), that is x / (2 N). The
 // division is off by less than x * 2^-23 in float and x * 2^-52 in double, whatever the rounding mode, and cannot jump
 // over a half, which it represents. So the rounded quotient is exact where N < 2^22 or N < 2^51. Where N is larger
 // because the scale is negative, only quotients that do not saturate matter: N <= 2 D * max.
@@ -11,7 +11,7 @@
 //     16sc   N <= 2^31, or 2^31 * 2 * 2^15    double
 // Whole numbers are farther away, x / N, so that truncation is exact too.
 //
-// A divisor of 0 acts as 2^-60: any numerator but 0 saturates by its sign, 0 gives 0, and nothing traps.
+// A divisor of 0 acts as 2^-60, scale and all: any numerator but 0 saturates by its sign, 0 gives 0, and nothing traps.
 #pragma once
 #include "arith.h"
 
@@ -19,23 +19,28 @@ namespace qori::kernels {
 
 constexpr double kTiny = 0x1p-60;
 
-/// Scales past these ends make no difference: numerators are 1 to 2^31, divisors up to 2^31, and with the tiny divisor
-/// the least quotient, 2^-33 / 2^-60, still saturates.
+/// Scales past these ends make no difference to numerators and divisors up to 2^31; and every scaled divisor is above
+/// the tiny one.
 constexpr int kLeastScale = -48, kMostScale = 33;
 
-QORI_INLINE double powerOfTwo(int exponent) { return std::bit_cast<double>(static_cast<int64_t>(1023 + exponent) << 52); }
+QORI_INLINE double powerOfTwo(int exponent) {
+    return std::bit_cast<double>(static_cast<int64_t>(1023 + exponent) << 52);
+}
 
 /// What a division has met: which elements had a zero divisor, by their place among the lanes.
 struct ZeroDivisors {
     __m256i seen = _mm256_setzero_si256();
 
-    QORI_INLINE void note(__m256i isZero) { seen = _mm256_or_si256(seen, isZero); }
+    /// Behind a branch, because the state lives in memory and would bind each block to the one before.
+    QORI_INLINE void note(__m256i isZero) {
+        if (!_mm256_testz_si256(isZero, isZero)) seen = _mm256_or_si256(seen, isZero);
+    }
 
     /// Only the first `count` elements of a tail are there.
     template <class T>
     QORI_INLINE void noteFirst(__m256i isZero, ptrdiff_t count) {
-        const __m256i index = _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20, 21,
-                                               22, 23, 24, 25, 26, 27, 28, 29, 30, 31);
+        const __m256i index = _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20,
+                                               21, 22, 23, 24, 25, 26, 27, 28, 29, 30, 31);
         const auto bytes = static_cast<int8_t>(count * static_cast<ptrdiff_t>(sizeof(T)));
         note(_mm256_and_si256(isZero, _mm256_cmpgt_epi8(_mm256_set1_epi8(bytes), index)));
     }
@@ -51,94 +56,142 @@ struct ZeroDivisors {
 
 // --- rounding of float vectors, independent of the control register -------------------------------------------------
 
-QORI_INLINE Vec<float> truncate(Vec<float> x) { return {_mm256_round_ps(x.v, _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC)}; }
-QORI_INLINE Vec<double> truncate(Vec<double> x) { return {_mm256_round_pd(x.v, _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC)}; }
-QORI_INLINE Vec<float> roundToEven(Vec<float> x) { return {_mm256_round_ps(x.v, _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC)}; }
-QORI_INLINE Vec<double> roundToEven(Vec<double> x) { return {_mm256_round_pd(x.v, _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC)}; }
+constexpr int kToZero = _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC, kToEven = _MM_FROUND_TO_NEAREST_INT | _MM_FROUND_NO_EXC;
+
+QORI_INLINE Vec<float> truncate(Vec<float> x) { return {_mm256_round_ps(x.v, kToZero)}; }
+QORI_INLINE Vec<double> truncate(Vec<double> x) { return {_mm256_round_pd(x.v, kToZero)}; }
+QORI_INLINE Vec<float> roundToEven(Vec<float> x) { return {_mm256_round_ps(x.v, kToEven)}; }
+QORI_INLINE Vec<double> roundToEven(Vec<double> x) { return {_mm256_round_pd(x.v, kToEven)}; }
 
 /// The fraction x - trunc(x) is exact; from 1/2 on, one more with the sign of x.
 QORI_INLINE Vec<float> roundHalfFromZero(Vec<float> x) {
-    const __m256 sign = _mm256_set1_ps(-0.f), whole = truncate(x).v, fraction = _mm256_andnot_ps(sign, _mm256_sub_ps(x.v, whole));
+    const __m256 sign = _mm256_set1_ps(-0.f), whole = truncate(x).v;
+    const __m256 fraction = _mm256_andnot_ps(sign, _mm256_sub_ps(x.v, whole));
     const __m256 away = _mm256_and_ps(_mm256_cmp_ps(fraction, _mm256_set1_ps(.5f), _CMP_GE_OQ), _mm256_set1_ps(1));
     return {_mm256_add_ps(whole, _mm256_or_ps(away, _mm256_and_ps(x.v, sign)))};
 }
 QORI_INLINE Vec<double> roundHalfFromZero(Vec<double> x) {
-    const __m256d sign = _mm256_set1_pd(-0.), whole = truncate(x).v, fraction = _mm256_andnot_pd(sign, _mm256_sub_pd(x.v, whole));
+    const __m256d sign = _mm256_set1_pd(-0.), whole = truncate(x).v;
+    const __m256d fraction = _mm256_andnot_pd(sign, _mm256_sub_pd(x.v, whole));
     const __m256d away = _mm256_and_pd(_mm256_cmp_pd(fraction, _mm256_set1_pd(.5), _CMP_GE_OQ), _mm256_set1_pd(1));
     return {_mm256_add_pd(whole, _mm256_or_pd(away, _mm256_and_pd(x.v, sign)))};
 }
 
 template <QorRoundingMode mode, class F>
 QORI_INLINE Vec<F> rounded(Vec<F> x) {
-    if constexpr (mode == roundTowardZero) return truncate(x);
-    else if constexpr (mode == roundHalfAway) return roundHalfFromZero(x);
-    else return roundToEven(x);
+    if constexpr (mode == roundTowardZero)
+        return truncate(x);
+    else if constexpr (mode == roundHalfAway)
+        return roundHalfFromZero(x);
+    else
+        return roundToEven(x);
 }
 
 // --- 8u, 16u, 16s ---------------------------------------------------------------------------------------------------
 
-/// Quotients of eight 32-bit integers, clamped to the range of T.
+/// Eight divisors in floats, scaled.
+template <class F>
+struct Divisors;
+template <>
+struct Divisors<float> {
+    __m256 all;
+};
+template <>
+struct Divisors<double> {
+    __m256d low, high;
+};
+
+/// Quotients of eight 32-bit integers, rounded and clamped to the range of T. The scale goes to the divisors: there it
+/// is no work where they are constants.
 template <class T, QorRoundingMode mode, class F>
 struct Quotients {
-    explicit Quotients(int32_t scale) : factor(powerOfTwo(-std::clamp(scale, kLeastScale, kMostScale))) {}
+    explicit Quotients(int32_t scale)
+        : factor(static_cast<F>(powerOfTwo(std::clamp(scale, kLeastScale, kMostScale)))) {}
 
-    QORI_INLINE __m256i operator()(__m256i numerator, __m256i divisor) const {
+    QORI_INLINE Divisors<F> prepare(__m256i d) const {
         if constexpr (std::is_same_v<F, float>) {
-            return _mm256_cvttps_epi32(quotient(_mm256_cvtepi32_ps(numerator), _mm256_cvtepi32_ps(divisor)));
+            return {nonZero(_mm256_mul_ps(_mm256_cvtepi32_ps(d), _mm256_set1_ps(factor)))};
         } else {
-            const auto half = [&](__m128i n, __m128i d) {
-                return _mm256_cvttpd_epi32(quotient(_mm256_cvtepi32_pd(n), _mm256_cvtepi32_pd(d)));
+            const auto half = [&](__m128i h) {
+                return nonZero(_mm256_mul_pd(_mm256_cvtepi32_pd(h), _mm256_set1_pd(factor)));
             };
-            const __m128i low = half(_mm256_castsi256_si128(numerator), _mm256_castsi256_si128(divisor));
-            return _mm256_set_m128i(half(_mm256_extracti128_si256(numerator, 1), _mm256_extracti128_si256(divisor, 1)), low);
+            return {half(_mm256_castsi256_si128(d)), half(_mm256_extracti128_si256(d, 1))};
+        }
+    }
+    QORI_INLINE __m256i operator()(__m256i n, const Divisors<F>& d) const {
+        if constexpr (std::is_same_v<F, float>) {
+            __m256 x = _mm256_div_ps(_mm256_cvtepi32_ps(n), d.all);
+            if constexpr (std::is_signed_v<T>) x = _mm256_max_ps(x, _mm256_set1_ps(least));
+            return _mm256_cvttps_epi32(rounded<mode>(Vec<float>{_mm256_min_ps(x, _mm256_set1_ps(most))}).v);
+        } else {
+            const auto half = [](__m128i h, __m256d divisor) {
+                const __m256d x = _mm256_max_pd(_mm256_div_pd(_mm256_cvtepi32_pd(h), divisor), _mm256_set1_pd(least));
+                return _mm256_cvttpd_epi32(rounded<mode>(Vec<double>{_mm256_min_pd(x, _mm256_set1_pd(most))}).v);
+            };
+            const __m128i low = half(_mm256_castsi256_si128(n), d.low);
+            return _mm256_set_m128i(half(_mm256_extracti128_si256(n, 1), d.high), low);
         }
     }
 
 private:
     static constexpr T least = std::numeric_limits<T>::min(), most = std::numeric_limits<T>::max();
 
-    QORI_INLINE __m256 quotient(__m256 n, __m256 d) const {
+    static QORI_INLINE __m256 nonZero(__m256 d) {
         const __m256 tiny = _mm256_set1_ps(static_cast<float>(kTiny));
-        if constexpr (std::is_signed_v<T>)
-            d = _mm256_blendv_ps(d, tiny, _mm256_cmp_ps(d, _mm256_setzero_ps(), _CMP_EQ_OQ));
+        if constexpr (!std::is_signed_v<T>)
+            return _mm256_max_ps(d, tiny);
         else
-            d = _mm256_max_ps(d, tiny);
-        __m256 x = _mm256_div_ps(_mm256_mul_ps(n, _mm256_set1_ps(static_cast<float>(factor))), d);
-        if constexpr (std::is_signed_v<T>) x = _mm256_max_ps(x, _mm256_set1_ps(least));
-        return rounded<mode>(Vec<float>{_mm256_min_ps(x, _mm256_set1_ps(most))}).v;
+            return _mm256_blendv_ps(d, tiny, _mm256_cmp_ps(d, _mm256_setzero_ps(), _CMP_EQ_OQ));
     }
-    QORI_INLINE __m256d quotient(__m256d n, __m256d d) const {
-        d = _mm256_blendv_pd(d, _mm256_set1_pd(kTiny), _mm256_cmp_pd(d, _mm256_setzero_pd(), _CMP_EQ_OQ));
-        __m256d x = _mm256_div_pd(_mm256_mul_pd(n, _mm256_set1_pd(factor)), d);
-        x = _mm256_min_pd(_mm256_max_pd(x, _mm256_set1_pd(least)), _mm256_set1_pd(most));
-        return rounded<mode>(Vec<double>{x}).v;
+    static QORI_INLINE __m256d nonZero(__m256d d) {
+        return _mm256_blendv_pd(d, _mm256_set1_pd(kTiny), _mm256_cmp_pd(d, _mm256_setzero_pd(), _CMP_EQ_OQ));
     }
-    double factor;
+    F factor;
 };
 
 /// second / first of real integers.
 template <class T, QorRoundingMode mode, class F>
 struct DivideIntegers {
+    static constexpr int eights = Vec<T>::lanes / 8;
+    /// The divisors of one vector of elements, in the order of widen().
+    struct Prepared {
+        Divisors<F> eight[eights];
+    };
+
     explicit DivideIntegers(int32_t scale) : quotients(scale) {}
 
     static QORI_INLINE __m256i zeroDivisors(Vec<T> first) {
         const __m256i none = _mm256_setzero_si256();
         return sizeof(T) == 1 ? _mm256_cmpeq_epi8(first.v, none) : _mm256_cmpeq_epi16(first.v, none);
     }
-    QORI_INLINE Vec<T> operator()(Vec<T> first, Vec<T> second) const {
+    QORI_INLINE Vec<T> operator()(Vec<T> first, Vec<T> second) const { return apply(prepare(first), second); }
+
+    QORI_INLINE Prepared prepare(Vec<T> first) const {
         if constexpr (sizeof(T) == 1) {
-            const Wide<uint16_t> d = widen<uint16_t>(first), n = widen<uint16_t>(second);
-            return narrow<uint8_t>(divide(d.low, n.low), divide(d.high, n.high));
+            const Wide<uint16_t> d = widen<uint16_t>(first);
+            const Wide<int32_t> low = widen<int32_t>(d.low), high = widen<int32_t>(d.high);
+            return {{prepare(low.low), prepare(low.high), prepare(high.low), prepare(high.high)}};
         } else {
-            return divide(first, second);
+            const Wide<int32_t> d = widen<int32_t>(first);
+            return {{prepare(d.low), prepare(d.high)}};
+        }
+    }
+    QORI_INLINE Vec<T> apply(const Prepared& first, Vec<T> second) const {
+        if constexpr (sizeof(T) == 1) {
+            const Wide<uint16_t> n = widen<uint16_t>(second);
+            return narrow<uint8_t>(divide(first.eight, n.low), divide(first.eight + 2, n.high));
+        } else {
+            return divide(first.eight, second);
         }
     }
 
 private:
+    QORI_INLINE Divisors<F> prepare(Vec<int32_t> d) const { return quotients.prepare(d.v); }
+
     template <class H>
-    QORI_INLINE Vec<H> divide(Vec<H> first, Vec<H> second) const {
-        const Wide<int32_t> d = widen<int32_t>(first), n = widen<int32_t>(second);
-        return narrow<H>(Vec<int32_t>{quotients(n.low.v, d.low.v)}, Vec<int32_t>{quotients(n.high.v, d.high.v)});
+    QORI_INLINE Vec<H> divide(const Divisors<F>* d, Vec<H> second) const {
+        const Wide<int32_t> n = widen<int32_t>(second);
+        return narrow<H>(Vec<int32_t>{quotients(n.low.v, d[0])}, Vec<int32_t>{quotients(n.high.v, d[1])});
     }
     Quotients<T, mode, F> quotients;
 };
@@ -146,8 +199,10 @@ private:
 /// Calls use(divide) with the division of integers T.
 template <class T, QorRoundingMode mode, class Use>
 void withRoundedDivision(int32_t scale, Use use) {
-    if (sizeof(T) == 1 || scale >= -6) use(DivideIntegers<T, mode, float>{scale});
-    else if constexpr (sizeof(T) != 1) use(DivideIntegers<T, mode, double>{scale});
+    if (sizeof(T) == 1 || scale >= -6)
+        use(DivideIntegers<T, mode, float>{scale});
+    else if constexpr (sizeof(T) != 1)
+        use(DivideIntegers<T, mode, double>{scale});
 }
 
 // --- complex integers -----------------------------------------------------------------------------------------------
@@ -164,13 +219,15 @@ struct DivideComplex16 {
     /// least values are 2^16 - 2^31 and 0. da - cb comes as da + c(-b - 1) + c, because -b need not fit 16 bits.
     QORI_INLINE Vec<QorComplex16s> operator()(Vec<QorComplex16s> first, Vec<QorComplex16s> second) const {
         const __m256i y = first.v, x = second.v, one = _mm256_set1_epi32(1);
-        const __m256i crossed = detail::swapParts(Vec<int16_t>{_mm256_xor_si256(y, _mm256_set1_epi32(static_cast<int32_t>(0xFFFF0000u)))}).v;
+        const __m256i conjugate = _mm256_xor_si256(y, _mm256_set1_epi32(static_cast<int32_t>(0xFFFF0000u)));
+        const __m256i crossed = detail::swapParts({conjugate}).v;
+        const __m256i realPart = _mm256_srai_epi32(_mm256_slli_epi32(x, 16), 16);
         const __m256i real = _mm256_sub_epi32(_mm256_madd_epi16(x, y), one);
-        const __m256i imaginary = _mm256_add_epi32(_mm256_madd_epi16(x, crossed), _mm256_srai_epi32(_mm256_slli_epi32(x, 16), 16));
+        const __m256i imaginary = _mm256_add_epi32(_mm256_madd_epi16(x, crossed), realPart);
         const __m256i norm = _mm256_sub_epi32(_mm256_madd_epi16(y, y), one);
         // Where the divisor is zero the sums are too, and the parts of the numerator take their place.
         const __m256i none = zeroDivisors(first);
-        const __m256i c = _mm256_and_si256(none, _mm256_srai_epi32(_mm256_slli_epi32(x, 16), 16));
+        const __m256i c = _mm256_and_si256(none, realPart);
         const __m256i d = _mm256_and_si256(none, _mm256_srai_epi32(x, 16));
         const auto half = [&](auto part) {
             const __m256d divisor = _mm256_max_pd(plusOne(part(norm)), _mm256_set1_pd(kTiny));
@@ -186,7 +243,8 @@ private:
     static QORI_INLINE __m256d plusOne(__m128i v) { return _mm256_add_pd(_mm256_cvtepi32_pd(v), _mm256_set1_pd(1)); }
     QORI_INLINE __m128i quotient(__m256d n, __m256d d) const {
         const __m256d x = _mm256_div_pd(_mm256_mul_pd(n, _mm256_set1_pd(factor)), d);
-        return _mm256_cvttpd_epi32(roundToEven({_mm256_min_pd(_mm256_max_pd(x, _mm256_set1_pd(INT16_MIN)), _mm256_set1_pd(INT16_MAX))}).v);
+        const __m256d clamped = _mm256_min_pd(_mm256_max_pd(x, _mm256_set1_pd(INT16_MIN)), _mm256_set1_pd(INT16_MAX));
+        return _mm256_cvttpd_epi32(roundToEven({clamped}).v);
     }
     double factor;
 };
@@ -194,13 +252,42 @@ private:
 /// One quotient in integers, for which no float is wide enough.
 QorComplex32s divideExactly(QorComplex32s divisor, QorComplex32s numerator, int32_t scale);
 
+/// In double precision, with a bound of its error; elements that come too near to a half are divided exactly. With
+/// A = |ca| + |db| the sum ca + db is off by at most 2 u A, u = 2^-52 for any rounding mode; factor / norm by 3 u of
+/// itself; their product q by u more: together by less than 8 u A factor / norm.
 struct DivideComplex32 {
-    explicit DivideComplex32(int32_t scaleFactor) : scale(scaleFactor) {}
+    explicit DivideComplex32(int32_t scaleFactor)
+        : scale(scaleFactor), factor(powerOfTwo(-std::clamp(scale, -100, 100))) {}
 
     static QORI_INLINE __m256i zeroDivisors(Vec<QorComplex32s> first) {
         return _mm256_cmpeq_epi64(first.v, _mm256_setzero_si256());
     }
     QORI_INLINE Vec<QorComplex32s> operator()(Vec<QorComplex32s> first, Vec<QorComplex32s> second) const {
+        __m256i unsure = zeroDivisors(first);
+        const __m128i low = two(_mm256_castsi256_si128(first.v), _mm256_castsi256_si128(second.v), unsure);
+        const __m128i high = two(_mm256_extracti128_si256(first.v, 1), _mm256_extracti128_si256(second.v, 1), unsure);
+        const Vec<QorComplex32s> quotients{_mm256_set_m128i(high, low)};
+        return _mm256_testz_si256(unsure, unsure) ? quotients : exactly(first, second);
+    }
+
+private:
+    QORI_INLINE __m128i two(__m128i first, __m128i second, __m256i& unsure) const {
+        const __m256d y = _mm256_cvtepi32_pd(first), x = _mm256_cvtepi32_pd(second), sign = _mm256_set1_pd(-0.);
+        const __m256d squares = _mm256_mul_pd(y, y), norm = _mm256_add_pd(squares, _mm256_permute_pd(squares, 0x5));
+        const __m256d inverse = _mm256_div_pd(_mm256_set1_pd(factor), _mm256_max_pd(norm, _mm256_set1_pd(1)));
+        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                                    // ca, da
+        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));  // db, cb
+        const __m256d sum = _mm256_addsub_pd(byReal, _mm256_xor_pd(byImaginary, sign));
+        const __m256d size = _mm256_add_pd(_mm256_andnot_pd(sign, byReal), _mm256_andnot_pd(sign, byImaginary));
+        const __m256d q = _mm256_mul_pd(sum, inverse);
+        const __m256d error = _mm256_mul_pd(_mm256_mul_pd(size, inverse), _mm256_set1_pd(0x1p-49));
+        const __m256d whole = roundToEven({q}).v, off = _mm256_andnot_pd(sign, _mm256_sub_pd(q, whole));
+        const __m256d isNear = _mm256_cmp_pd(_mm256_add_pd(off, error), _mm256_set1_pd(.5), _CMP_NLT_UQ);
+        unsure = _mm256_or_si256(unsure, _mm256_castpd_si256(isNear));
+        const __m256d least = _mm256_set1_pd(INT32_MIN), most = _mm256_set1_pd(INT32_MAX);
+        return _mm256_cvttpd_epi32(_mm256_min_pd(_mm256_max_pd(whole, least), most));
+    }
+    QORI_NOINLINE Vec<QorComplex32s> exactly(Vec<QorComplex32s> first, Vec<QorComplex32s> second) const {
         QorComplex32s y[4], x[4];
         store(y, first);
         store(x, second);
@@ -208,6 +295,7 @@ struct DivideComplex32 {
         return load(x);
     }
     int32_t scale;
+    double factor;
 };
 
 // --- floats ---------------------------------------------------------------------------------------------------------
@@ -262,8 +350,8 @@ private:
     static QORI_INLINE __m128 quotients(__m128 numerators, __m128 divisors) {
         const __m256d x = _mm256_cvtps_pd(numerators), y = _mm256_cvtps_pd(divisors);
         const __m256d squares = _mm256_mul_pd(y, y), norm = _mm256_add_pd(squares, _mm256_permute_pd(squares, 0x5));
-        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                          // ca, da
-        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));   // db, cb
+        const __m256d byReal = _mm256_mul_pd(x, _mm256_movedup_pd(y));                                    // ca, da
+        const __m256d byImaginary = _mm256_mul_pd(_mm256_permute_pd(x, 0x5), _mm256_permute_pd(y, 0xF));  // db, cb
         const __m256d sums = _mm256_addsub_pd(byReal, _mm256_xor_pd(byImaginary, _mm256_set1_pd(-0.)));
         return _mm256_cvtpd_ps(_mm256_div_pd(sums, norm));
     }
@@ -274,6 +362,7 @@ private:
 /// second / first, remembering zero divisors.
 template <class T, class Divide>
 struct Division {
+    static constexpr bool mayStream = true;
     Divide divide;
     ZeroDivisors zeros;
 
@@ -288,14 +377,35 @@ struct Division {
     }
 };
 
+/// second / first with a constant divisor per channel, none of them zero.
+template <class T, class Divide>
+struct DivisionByConstants {
+    static constexpr bool mayStream = true;
+    Divide divide;
+    typename Divide::Prepared divisors[3];
+
+    DivisionByConstants(Divide division, const ChannelVectors<T>& values)
+        : divide(division),
+          divisors{divide.prepare(values.v[0]), divide.prepare(values.v[1]), divide.prepare(values.v[2])} {}
+
+    QORI_INLINE Pack<T, Vec<T>::lanes> operator()(int phase, Pack<T, Vec<T>::lanes> numerators) {
+        return {{divide.apply(divisors[phase], numerators.v[0])}};
+    }
+};
+
 /// Calls use(divide) with the division of elements T.
 template <class T, class Use>
 void withDivision(int32_t scale, Use use) {
-    if constexpr (std::is_same_v<T, QorComplex16s>) use(DivideComplex16{scale});
-    else if constexpr (std::is_same_v<T, QorComplex32s>) use(DivideComplex32{scale});
-    else if constexpr (std::is_same_v<T, QorComplex32f>) use(DivideComplexFloats{scale});
-    else if constexpr (std::is_same_v<T, float>) use(DivideFloats{scale});
-    else withRoundedDivision<T, roundNearestEven>(scale, use);
+    if constexpr (std::is_same_v<T, QorComplex16s>)
+        use(DivideComplex16{scale});
+    else if constexpr (std::is_same_v<T, QorComplex32s>)
+        use(DivideComplex32{scale});
+    else if constexpr (std::is_same_v<T, QorComplex32f>)
+        use(DivideComplexFloats{scale});
+    else if constexpr (std::is_same_v<T, float>)
+        use(DivideFloats{scale});
+    else
+        withRoundedDivision<T, roundNearestEven>(scale, use);
 }
 
 }  // namespace qori::kernels

@@ -4,7 +4,7 @@
 // by one of four rules that a call chooses once: Saturate (scale 0), LeftShift (below 0), RoundShift and, where its
 // addition could leave the lane, RoundShiftSticky (above 0). Scales that turn every value into 0 have no rule.
 //
-//     withScaleRule<uint8_t, int16_t, 510>(scale, [&](auto rule) { ... narrow<uint8_t>(rule(w.low), rule(w.high)) ... })
+//     withScaleRule<uint8_t, int16_t, 510>(scale, [&](auto rule) { ... narrow<uint8_t>(rule(v.low), rule(v.high)); })
 #pragma once
 #include <algorithm>
 #include <bit>
@@ -23,46 +23,63 @@ struct Lane {
     static_assert(bits < 64 || isSigned);
 
     static QORI_INLINE V all(W value) {
-        if constexpr (bits == 16) return {_mm256_set1_epi16(static_cast<int16_t>(value))};
-        else if constexpr (bits == 32) return {_mm256_set1_epi32(static_cast<int32_t>(value))};
-        else return {_mm256_set1_epi64x(value)};
+        if constexpr (bits == 16)
+            return {_mm256_set1_epi16(static_cast<int16_t>(value))};
+        else if constexpr (bits == 32)
+            return {_mm256_set1_epi32(static_cast<int32_t>(value))};
+        else
+            return {_mm256_set1_epi64x(value)};
     }
     static QORI_INLINE V add(V a, V b) {
-        if constexpr (bits == 16) return {_mm256_add_epi16(a.v, b.v)};
-        else if constexpr (bits == 32) return {_mm256_add_epi32(a.v, b.v)};
-        else return {_mm256_add_epi64(a.v, b.v)};
+        if constexpr (bits == 16)
+            return {_mm256_add_epi16(a.v, b.v)};
+        else if constexpr (bits == 32)
+            return {_mm256_add_epi32(a.v, b.v)};
+        else
+            return {_mm256_add_epi64(a.v, b.v)};
     }
     static QORI_INLINE V shiftLeft(V a, __m128i count) {
-        if constexpr (bits == 16) return {_mm256_sll_epi16(a.v, count)};
-        else if constexpr (bits == 32) return {_mm256_sll_epi32(a.v, count)};
-        else return {_mm256_sll_epi64(a.v, count)};
+        if constexpr (bits == 16)
+            return {_mm256_sll_epi16(a.v, count)};
+        else if constexpr (bits == 32)
+            return {_mm256_sll_epi32(a.v, count)};
+        else
+            return {_mm256_sll_epi64(a.v, count)};
     }
     /// Floor of a / 2^count: arithmetic where the lane is signed.
     static QORI_INLINE V shiftRight(V a, __m128i count) {
-        if constexpr (bits == 16) return {isSigned ? _mm256_sra_epi16(a.v, count) : _mm256_srl_epi16(a.v, count)};
-        else if constexpr (bits == 32) return {isSigned ? _mm256_sra_epi32(a.v, count) : _mm256_srl_epi32(a.v, count)};
-        else {   // AVX2 shifts 64 bits only logically: as unsigned from the minimum up
+        if constexpr (bits == 16)
+            return {isSigned ? _mm256_sra_epi16(a.v, count) : _mm256_srl_epi16(a.v, count)};
+        else if constexpr (bits == 32)
+            return {isSigned ? _mm256_sra_epi32(a.v, count) : _mm256_srl_epi32(a.v, count)};
+        else {  // AVX2 shifts 64 bits only logically: as unsigned from the minimum up
             const __m256i minimum = _mm256_set1_epi64x(INT64_MIN);
             const __m256i raised = _mm256_srl_epi64(_mm256_xor_si256(a.v, minimum), count);
             return {_mm256_sub_epi64(raised, _mm256_srl_epi64(minimum, count))};
         }
     }
     static QORI_INLINE V min(V a, V b) {
-        if constexpr (bits == 16) return {isSigned ? _mm256_min_epi16(a.v, b.v) : _mm256_min_epu16(a.v, b.v)};
-        else if constexpr (bits == 32) return {isSigned ? _mm256_min_epi32(a.v, b.v) : _mm256_min_epu32(a.v, b.v)};
-        else return {_mm256_blendv_epi8(a.v, b.v, _mm256_cmpgt_epi64(a.v, b.v))};
+        if constexpr (bits == 16)
+            return {isSigned ? _mm256_min_epi16(a.v, b.v) : _mm256_min_epu16(a.v, b.v)};
+        else if constexpr (bits == 32)
+            return {isSigned ? _mm256_min_epi32(a.v, b.v) : _mm256_min_epu32(a.v, b.v)};
+        else
+            return {_mm256_blendv_epi8(a.v, b.v, _mm256_cmpgt_epi64(a.v, b.v))};
     }
     static QORI_INLINE V max(V a, V b) {
-        if constexpr (bits == 16) return {isSigned ? _mm256_max_epi16(a.v, b.v) : _mm256_max_epu16(a.v, b.v)};
-        else if constexpr (bits == 32) return {isSigned ? _mm256_max_epi32(a.v, b.v) : _mm256_max_epu32(a.v, b.v)};
-        else return {_mm256_blendv_epi8(b.v, a.v, _mm256_cmpgt_epi64(a.v, b.v))};
+        if constexpr (bits == 16)
+            return {isSigned ? _mm256_max_epi16(a.v, b.v) : _mm256_max_epu16(a.v, b.v)};
+        else if constexpr (bits == 32)
+            return {isSigned ? _mm256_max_epi32(a.v, b.v) : _mm256_max_epu32(a.v, b.v)};
+        else
+            return {_mm256_blendv_epi8(b.v, a.v, _mm256_cmpgt_epi64(a.v, b.v))};
     }
 };
 
 // --- elements to lanes of twice their width and back ----------------------------------------------------------------
 
-/// One vector of elements in two vectors of lanes, in the order that narrow() undoes: the interleaving of the halves for
-/// 8 and 16 bits, even and odd elements for 32 bits.
+/// One vector of elements in two vectors of lanes, in the order that narrow() undoes: the interleaving of the halves
+/// for 8 and 16 bits, even and odd elements for 32 bits.
 template <class W>
 struct Wide {
     Vec<W> low, high;
@@ -111,14 +128,16 @@ QORI_INLINE Vec<T> narrow(Vec<W> low, Vec<W> high) {
 template <class T, class W>
 struct Saturate {
     QORI_INLINE Vec<W> operator()(Vec<W> v) const {
-        if constexpr (std::is_signed_v<W>) return v;
-        else return Lane<W>::min(v, Lane<W>::all(std::numeric_limits<T>::max()));
+        if constexpr (std::is_signed_v<W>)
+            return v;
+        else
+            return Lane<W>::min(v, Lane<W>::all(std::numeric_limits<T>::max()));
     }
 };
 
-/// Scale below 0: values that would leave the element are first brought to the nearest that just does, so that the shift
-/// stays inside the lane: with n = -scale, (max >> n) + 1 shifted is at most max + 2^n <= 2 * (max + 1). Beyond the
-/// element's width (n is cut there) every value but 0 saturates.
+/// Scale below 0: values that would leave the element are first brought to the nearest that just does, so that the
+/// shift stays inside the lane: with n = -scale, (max >> n) + 1 shifted is at most max + 2^n <= 2 * (max + 1). Beyond
+/// the element's width (n is cut there) every value but 0 saturates.
 template <class T, class W>
 struct LeftShift {
     explicit LeftShift(int32_t scale) {
@@ -139,8 +158,8 @@ struct LeftShift {
     __m128i count;
 };
 
-/// Scale above 0: (v + odd + 2^(scale-1) - 1) >> scale, odd being the lowest bit of v >> scale. An exact half reaches the
-/// next integer only where odd is 1. |v| + 2^(scale-1) must fit the lane.
+/// Scale above 0: (v + odd + 2^(scale-1) - 1) >> scale, odd being the lowest bit of v >> scale. An exact half reaches
+/// the next integer only where odd is 1. |v| + 2^(scale-1) must fit the lane.
 template <class W>
 struct RoundShift {
     explicit RoundShift(int32_t scale)
@@ -155,9 +174,9 @@ struct RoundShift {
     __m128i count;
 };
 
-/// Scale above 2, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling exact halves
-/// from values beside them. |v| / 2 + 2^(scale-2) is at most 3/4 of 2^bits (unsigned lanes, scale up to their width) and
-/// 3/4 of 2^(bits-1) (signed ones, scale below it).
+/// Scale above 2, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling exact
+/// halves from values beside them. |v| / 2 + 2^(scale-2) is at most 3/4 of 2^bits (unsigned lanes, scale up to their
+/// width) and 3/4 of 2^(bits-1) (signed ones, scale below it).
 template <class W>
 struct RoundShiftSticky {
     explicit RoundShiftSticky(int32_t scale) : rest(scale - 1) {}
@@ -175,13 +194,17 @@ bool withScaleRule(int32_t scale, Use use) {
     // Past it limit <= 2^(scale-1): no value is above the half, which goes to 0.
     constexpr int lastScale = static_cast<int>(std::bit_width(limit - 1));
     constexpr auto room = static_cast<uint64_t>(std::numeric_limits<W>::max()) - limit;
-    constexpr int lastDirect = std::min(lastScale, static_cast<int>(std::bit_width(room)));   // 2^(scale-1) <= room
+    constexpr int lastDirect = std::min(lastScale, static_cast<int>(std::bit_width(room)));  // 2^(scale-1) <= room
     static_assert(lastDirect >= 2);
     if (scale > lastScale) return false;
-    if (scale == 0) use(Saturate<T, W>{});
-    else if (scale < 0) use(LeftShift<T, W>{scale});
-    else if (scale <= lastDirect) use(RoundShift<W>{scale});
-    else if constexpr (lastDirect < lastScale) use(RoundShiftSticky<W>{scale});
+    if (scale == 0)
+        use(Saturate<T, W>{});
+    else if (scale < 0)
+        use(LeftShift<T, W>{scale});
+    else if (scale <= lastDirect)
+        use(RoundShift<W>{scale});
+    else if constexpr (lastDirect < lastScale)
+        use(RoundShiftSticky<W>{scale});
     return true;
 }
 

@@ -6,13 +6,18 @@ namespace {
 
 /// Calls a constant form of either kind.
 template <class T, Layout layout, Kind kind, class Function, class... Parameters>
-QorResult callConstant(Function function, const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi, Parameters... parameters) {
+QorResult callConstant(Function function, const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi,
+                       Parameters... parameters) {
     const auto constants = [&] {
-        if constexpr (layout == Layout::C1) return *value;
-        else return value;
+        if constexpr (layout == Layout::C1)
+            return *value;
+        else
+            return value;
     }();
-    if constexpr (kind == Kind::IR) return call(function, constants, dst.data<T>(), dst.step(), roi, parameters...);
-    else return call(function, src.data<T>(), src.step(), constants, dst.data<T>(), dst.step(), roi, parameters...);
+    if constexpr (kind == Kind::IR)
+        return call(function, constants, dst.data<T>(), dst.step(), roi, parameters...);
+    else
+        return call(function, src.data<T>(), src.step(), constants, dst.data<T>(), dst.step(), roi, parameters...);
 }
 
 template <class T>
@@ -34,37 +39,47 @@ void sweep(const char* name, Invoke invoke, Reference reference) {
     forShapesAndScales<T, anyStep>([&](const Shape& shape, int32_t scale) {
         T value[4];
         const bool small = random().oneIn(6);
-        const T common = reference::byPart(T{}, T{}, [part = random().below(2)](auto x, auto) { return static_cast<decltype(x)>(part); });
-        for (T& v : value)
-            do v = small ? common : NearPowers<T>{}();
+        const int part = random().below(2);
+        const T common = reference::byPart(T{}, T{}, [=](auto x, auto) { return static_cast<decltype(x)>(part); });
+        for (T& v : value) do
+                v = small ? common : NearPowers<T>{}();
             while (nonZero && reference::isZero(v) && !small);
         if (nonZero && reference::isZero(value[0])) return;
-        checkUnary<T, T, layout, kind>(shape, [&](const TestImage& src, const TestImage& dst, QorImageSize roi) {
-            EXPECT_EQ(QOR_OK, invoke(value, src, dst, roi, scale));
-        }, [&](T a, int c) { return reference(value[c], a, scale); }, NearPowers<T>{});
+        checkUnary<T, T, layout, kind>(
+            shape,
+            [&](const TestImage& src, const TestImage& dst, QorImageSize roi) {
+                EXPECT_EQ(QOR_OK, invoke(value, src, dst, roi, scale));
+            },
+            [&](T a, int c) { return reference(value[c], a, scale); }, NearPowers<T>{});
     });
     markSwept(name);
 }
 
 /// Sweep and statuses of the operation `operation`; `reference_` gets (value, src, scale).
-#define QORI_SCALED_SWEEP(operation, divides, reference_)                                                              \
-    template <class T, Layout layout, Kind kind, class Function>                                                       \
-    void operation(const char* name, Function function) {                                                              \
-        sweep<T, layout, kind, anyStep_##operation<T, layout, kind>, divides>(name, [=](const T* value, auto&... rest) { \
-            return callScaled<T, layout, kind>(function, value, rest...);                                              \
-        }, reference_);                                                                                                \
+#define QORI_SCALED_SWEEP(operation, divides, reference_)                                                         \
+    template <class T, Layout layout, Kind kind, class Function>                                                  \
+    void operation(const char* name, Function function) {                                                         \
+        constexpr bool anyStep = anyStep_##operation<T, layout, kind>;                                            \
+        sweep<T, layout, kind, anyStep, divides>(                                                                 \
+            name,                                                                                                 \
+            [=](const T* value, auto&... rest) { return callScaled<T, layout, kind>(function, value, rest...); }, \
+            reference_);                                                                                          \
     }
 
 template <class T, Layout layout, Kind kind, class Function>
-QorResult callScaled(Function function, const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi, int32_t scale) {
-    return withScale<T>(scale, [&](auto... s) { return callConstant<T, layout, kind>(function, value, src, dst, roi, s...); });
+QorResult callScaled(Function function, const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi,
+                     int32_t scale) {
+    return withScale<T>(scale,
+                        [&](auto... s) { return callConstant<T, layout, kind>(function, value, src, dst, roi, s...); });
 }
 
 /// Images are divided by the reciprocal, constants correctly.
 template <class T>
 T divideByConstant(T value, T a, int32_t scale) {
-    if constexpr (std::is_same_v<T, float>) return a / value;
-    else return reference::divide(value, a, scale);
+    if constexpr (std::is_same_v<T, float>)
+        return a / value;
+    else
+        return reference::divide(value, a, scale);
 }
 
 QORI_SCALED_SWEEP(addConstant, false, reference::add<T>)
@@ -74,9 +89,12 @@ QORI_SCALED_SWEEP(divideConstant, true, divideByConstant<T>)
 
 template <class T, Layout layout, Kind kind, class Function>
 void multiplyConstantFraction(const char* name, Function function) {
-    sweep<T, layout, kind, false, false>(name, [=](const T* value, const TestImage& src, const TestImage& dst, QorImageSize roi, int32_t) {
-        return callConstant<T, layout, kind>(function, value, src, dst, roi);
-    }, [](T value, T a, int32_t) { return reference::multiplyFractions(value, a); });
+    sweep<T, layout, kind, false, false>(
+        name,
+        [=](const T* value, auto& src, auto& dst, QorImageSize roi, int32_t) {
+            return callConstant<T, layout, kind>(function, value, src, dst, roi);
+        },
+        [](T value, T a, int32_t) { return reference::multiplyFractions(value, a); });
 }
 
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
@@ -92,7 +110,8 @@ TEST(ConstantArithmetic, AllBytesAndConstantsAtEveryScaleFactor) {
             for (int v = first; v < 256; ++v) {
                 const auto value = static_cast<uint8_t>(v);
                 ASSERT_EQ(QOR_OK, call(function, src.data(), 256, value, dst.data(), 256, QorImageSize{256, 1}, s));
-                for (size_t i = 0; i < 256; ++i) ASSERT_EQ(reference(value, src[i], s), dst[i]) << i << " and " << v << ", scale " << s;
+                for (size_t i = 0; i < 256; ++i)
+                    ASSERT_EQ(reference(value, src[i], s), dst[i]) << i << " and " << v << ", scale " << s;
             }
     };
     check(qoriAddC_8u_C1RSfs, reference::add<uint8_t>, 0);
@@ -110,12 +129,16 @@ void checkStatuses(Function function, Parameters... parameters) {
     const T good[4] = {one, one, one, one};
     const auto statusOf = [&](bool noSrc, bool noDst, const T* value, int srcStep, int dstStep, QorImageSize roi) {
         const auto constants = [&] {
-            if constexpr (layout == Layout::C1) return *value;
-            else return value;
+            if constexpr (layout == Layout::C1)
+                return *value;
+            else
+                return value;
         }();
         T* const d = noDst ? nullptr : dst.data<T>();
-        if constexpr (kind == Kind::IR) return call(function, constants, d, dstStep, roi, parameters...);
-        else return call(function, noSrc ? nullptr : src.data<T>(), srcStep, constants, d, dstStep, roi, parameters...);
+        if constexpr (kind == Kind::IR)
+            return call(function, constants, d, dstStep, roi, parameters...);
+        else
+            return call(function, noSrc ? nullptr : src.data<T>(), srcStep, constants, d, dstStep, roi, parameters...);
     };
     const T zero[4] = {one, one, T{}, one}, *anyZero = layout == Layout::C1 ? zero + 2 : zero;
     const QorImageSize none{0, 1}, ok{1, 1};
@@ -134,24 +157,39 @@ void checkStatuses(Function function, Parameters... parameters) {
     if (divides) QORI_EXPECT_STATUS(QOR_ERR_DIV_BY_ZERO, dst, statusOf(false, false, anyZero, 32, 32, ok));
 }
 
-#define QORI_SCALED_STATUS(operation, divides)                                                                      \
-    template <class T, Layout layout, Kind kind, class Function>                                                    \
-    void status_##operation(Function f) {                                                                           \
-        withScale<T>(0, [&](auto... s) {                                                                            \
-            checkStatuses<T, layout, kind, anyStep_##operation<T, layout, kind>, divides>(f, s...);                 \
-        });                                                                                                         \
+#define QORI_SCALED_STATUS(operation, divides)                                                      \
+    template <class T, Layout layout, Kind kind, class Function>                                    \
+    void status_##operation(Function f) {                                                           \
+        withScale<T>(0, [&](auto... s) {                                                            \
+            checkStatuses<T, layout, kind, anyStep_##operation<T, layout, kind>, divides>(f, s...); \
+        });                                                                                         \
     }
 QORI_SCALED_STATUS(addConstant, false)
 QORI_SCALED_STATUS(subtractConstant, false)
 QORI_SCALED_STATUS(multiplyConstant, false)
 QORI_SCALED_STATUS(divideConstant, true)
 template <class T, Layout layout, Kind kind, class Function>
-void status_multiplyConstantFraction(Function f) { checkStatuses<T, layout, kind, false, false>(f); }
+void status_multiplyConstantFraction(Function f) {
+    checkStatuses<T, layout, kind, false, false>(f);
+}
 
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
     TEST(ConstantArithmeticStatus, name) { status_##operation<S, Layout::SL, Kind::kind>(&name); }
 #include "members/arith_constant.inc"
 #undef QORI_MEMBER
+
+TEST(ConstantArithmetic, Streaming) {
+    forStreamingChoices(6, 1 << 20, [](const Shape& shape) {
+        const uint8_t value[4] = {3, 0, 250};
+        checkUnary<uint8_t, uint8_t, Layout::C3, Kind::R>(
+            shape,
+            [&](const auto&... images) {
+                EXPECT_EQ(QOR_OK,
+                          (callConstant<uint8_t, Layout::C3, Kind::R>(qoriAddC_8u_C3RSfs, value, images..., 1)));
+            },
+            [&](uint8_t a, int c) { return reference::add(value[c], a, 1); });
+    });
+}
 
 /// Results known beforehand come without a look at the source, which may then be smaller than the region.
 TEST(ConstantArithmetic, DoesNotReadTheSourceWithoutNeed) {

@@ -22,8 +22,10 @@ void sweep(const char* name, Sweep check) {
     int turn = 0;
     forShapesAndScales<T, false>([&](const Shape& shape, int32_t scale) {
         const int mode = turn / 2 % 3;
-        if (turn++ % 2 == 0) check(shape, scale, mode, NearPowers<T>{});
-        else check(shape, scale, mode, ZeroInAlphaOnly<T, layout>{});
+        if (turn++ % 2 == 0)
+            check(shape, scale, mode, NearPowers<T>{});
+        else
+            check(shape, scale, mode, ZeroInAlphaOnly<T, layout>{});
     });
     markSwept(name);
 }
@@ -31,18 +33,19 @@ void sweep(const char* name, Sweep check) {
 template <class T, Layout layout, Kind kind, class Invoke, class Draw>
 void checkDivision(const Shape& shape, int32_t scale, int mode, Draw draw, Invoke invoke) {
     bool zeroMet = false;
-    checkBinary<T, T, layout, kind>(shape, [&](const TestImage& a, const TestImage& b, const TestImage& d, QorImageSize roi) {
-        EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(a, b, d, roi));
-    }, [&](T a, T b, int) {
-        zeroMet = zeroMet || reference::isZero(a);
-        return reference::divide(a, b, scale, mode);
-    }, draw);
+    checkBinary<T, T, layout, kind>(
+        shape, [&](const auto&... images) { EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(images...)); },
+        [&](T a, T b, int) __attribute__((always_inline)) {
+            zeroMet = zeroMet || reference::isZero(a);
+            return reference::divide(a, b, scale, mode);
+        },
+        draw);
 }
 
 template <class T, Layout layout, Kind kind, class Function>
 void divide(const char* name, Function function) {
     sweep<T, layout>(name, [&](const Shape& shape, int32_t scale, int, auto draw) {
-        checkDivision<T, layout, kind>(shape, scale, roundNearestEven, draw, [&](auto&... arguments) {
+        checkDivision<T, layout, kind>(shape, scale, roundNearestEven, draw, [&](const auto&... arguments) {
             return withScale<T>(scale, [&](auto... s) { return callBinary<T, kind>(function, arguments..., s...); });
         });
     });
@@ -51,7 +54,7 @@ void divide(const char* name, Function function) {
 template <class T, Layout layout, Kind kind, class Function>
 void divideRounded(const char* name, Function function) {
     sweep<T, layout>(name, [&](const Shape& shape, int32_t scale, int mode, auto draw) {
-        checkDivision<T, layout, kind>(shape, scale, mode, draw, [&](auto&... arguments) {
+        checkDivision<T, layout, kind>(shape, scale, mode, draw, [&](const auto&... arguments) {
             return callBinary<T, kind>(function, arguments..., mode, scale);
         });
     });
@@ -68,7 +71,7 @@ void status_divide(Function function) {
 }
 template <class T, Kind kind, class Function>
 void status_divideRounded(Function function) {
-    checkStatuses<T, kind, true, false>(function, 7, 0);   // the faulty mode is found last
+    checkStatuses<T, kind, true, false>(function, 7, 0);  // the faulty mode is found last
     const Shape shape{.width = 4, .height = 2};
     TestImage a(1, shape, 8), b(2, shape, 8), d(0, shape, 8);
     for (int mode : {-1, 3, INT32_MAX})
@@ -89,9 +92,10 @@ void checkAllNumerators(const std::vector<T>& divisors, Function function, Round
         std::fill(a.begin(), a.end(), divisor);
         for (int s = sizeof(T) == 1 ? -40 : -18; s <= (sizeof(T) == 1 ? 40 : 18); ++s)
             for (int mode = 0; mode < 4; ++mode) {
-                const auto result = mode == 3
-                    ? call(function, a.data(), bytes, b.data(), bytes, d.data(), bytes, QorImageSize{count, 1}, s)
-                    : call(roundedFunction, a.data(), bytes, b.data(), bytes, d.data(), bytes, QorImageSize{count, 1}, mode, s);
+                const QorImageSize roi{count, 1};
+                const auto result =
+                    mode == 3 ? call(function, a.data(), bytes, b.data(), bytes, d.data(), bytes, roi, s)
+                              : call(roundedFunction, a.data(), bytes, b.data(), bytes, d.data(), bytes, roi, mode, s);
                 ASSERT_EQ(divisor == 0 ? QOR_WARN_DIV_BY_ZERO : QOR_OK, result);
                 for (size_t i = 0; i < count; ++i)
                     ASSERT_EQ(reference::divide(divisor, b[i], s, mode == 3 ? roundNearestEven : mode), d[i])
@@ -111,11 +115,21 @@ TEST(Division, AllNumeratorsOf16Bits) {
     checkAllNumerators<int16_t>({1, -1, 7, -181, 32767, INT16_MIN}, qoriDiv_16s_C1RSfs, qoriDiv_Round_16s_C1RSfs);
 }
 
+TEST(Division, Streaming) {
+    forStreamingChoices(12, 1 << 20, [](const Shape& shape) {
+        checkDivision<float, Layout::C1, Kind::R>(shape, 0, 0, NearPowers<float>{}, [](const auto&... arguments) {
+            return callBinary<float, Kind::R>(qoriDiv_32f_C1R, arguments...);
+        });
+    });
+}
+
 TEST(Division, WidestComplexNumbers) {
     const int32_t extremes[] = {INT32_MIN, INT32_MIN + 1, -1, 0, 1, INT32_MAX};
     for (int code = 0; code < 6 * 6 * 6 * 6; ++code) {
-        const QorComplex32s a{extremes[code % 6], extremes[code / 6 % 6]}, b{extremes[code / 36 % 6], extremes[code / 216]};
-        const auto narrow = [](QorComplex32s v) { return QorComplex16s{static_cast<int16_t>(v.re >> 16), static_cast<int16_t>(v.im >> 16)}; };
+        const QorComplex32s a{extremes[code % 6], extremes[code / 6 % 6]};
+        const QorComplex32s b{extremes[code / 36 % 6], extremes[code / 216]};
+        const auto upper = [](int32_t v) { return static_cast<int16_t>(v >> 16); };
+        const auto narrow = [&](QorComplex32s v) { return QorComplex16s{upper(v.re), upper(v.im)}; };
         const QorComplex16s p = narrow(a), q = narrow(b);
         const int scale = scaleFactors()[static_cast<size_t>(code) % scaleFactors().size()];
         QorComplex32s d;
@@ -131,10 +145,13 @@ TEST(Division, WidestComplexNumbers) {
 
 TEST(Division, FloatsOverZero) {
     const float inf = std::numeric_limits<float>::infinity(), nan = std::numeric_limits<float>::quiet_NaN();
-    const float divisors[] = {0.f, 0.f, 0.f, 0.f, -0.f, -0.f, 0.f, 2.f, 0.f}, numerators[] = {2, -2, 0, nan, 2, -2, -inf, 3, -nan};
-    const uint32_t expected[] = {0x7F800000, 0xFF800000, 0x7FBFFFFF, 0x7FBFFFFF, 0xFF800000, 0x7F800000, 0xFF800000, 0x3FC00000, 0x7FBFFFFF};
+    const float divisors[] = {0.f, 0.f, 0.f, 0.f, -0.f, -0.f, 0.f, 2.f, 0.f};
+    const float numerators[] = {2, -2, 0, nan, 2, -2, -inf, 3, -nan};
+    const uint32_t expected[] = {0x7F800000, 0xFF800000, 0x7FBFFFFF, 0x7FBFFFFF, 0xFF800000,
+                                 0x7F800000, 0xFF800000, 0x3FC00000, 0x7FBFFFFF};
     float results[9];
-    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_32f_C1R, divisors, 36, numerators, 36, results, 36, QorImageSize{9, 1}));
+    const QorImageSize roi{9, 1};
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_32f_C1R, divisors, 36, numerators, 36, results, 36, roi));
     EXPECT_EQ(0, std::memcmp(expected, results, sizeof results));
 }
 

@@ -39,10 +39,11 @@ long largestCacheOfTheSystem() {
 int main() {
     void* blocks[8];
     for (int i = 0; i < 8; ++i) {
-        blocks[i] = qorMalloc(1 + 37 * i);
+        const int32_t length = 1 + 37 * i;
+        blocks[i] = qorMalloc(length);
         expect(blocks[i] != nullptr && reinterpret_cast<uintptr_t>(blocks[i]) % 64 == 0,
                "blocks start on 64-byte boundaries");
-        if (blocks[i] != nullptr) std::memset(blocks[i], 0xA5, static_cast<size_t>(1 + 37 * i));
+        if (blocks[i] != nullptr) std::memset(blocks[i], 0xA5, static_cast<size_t>(length));
     }
     for (void* block : blocks) qorFree(block);
     qorFree(nullptr);

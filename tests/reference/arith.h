@@ -21,15 +21,17 @@ struct Exact {
 };
 inline Exact exact(int64_t v) { return {v < 0, v < 0 ? 0 - static_cast<uint64_t>(v) : static_cast<uint64_t>(v)}; }
 inline Exact operator-(Exact a) { return {!a.negative, a.magnitude}; }
-inline Exact operator*(Exact a, Exact b) { return {a.negative != b.negative, a.magnitude * b.magnitude}; }   // up to 2^32 each
+/// Of magnitudes up to 2^32.
+inline Exact operator*(Exact a, Exact b) { return {a.negative != b.negative, a.magnitude * b.magnitude}; }
 inline Exact operator+(Exact a, Exact b) {
     if (a.negative == b.negative) return {a.negative, a.magnitude + b.magnitude};
-    return a.magnitude >= b.magnitude ? Exact{a.negative, a.magnitude - b.magnitude} : Exact{b.negative, b.magnitude - a.magnitude};
+    if (a.magnitude < b.magnitude) return {b.negative, b.magnitude - a.magnitude};
+    return {a.negative, a.magnitude - b.magnitude};
 }
 
 /// 192 bits: numerators up to 2^63 * 2^100 and denominators up to 2^63 * 2^66, with room to double them.
 struct Big {
-    std::array<uint32_t, 6> limb{};   // the most significant first, so that they compare as arrays do
+    std::array<uint32_t, 6> limb{};  // the most significant first, so that they compare as arrays do
 
     explicit Big(uint64_t v = 0) : limb{0, 0, 0, 0, static_cast<uint32_t>(v >> 32), static_cast<uint32_t>(v)} {}
     Big doubled(uint32_t carry = 0) const {
@@ -53,7 +55,7 @@ struct Big {
 /// numerator * 2^-scale / denominator, rounded; some value above 2^32 where it is beyond.
 inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int scale, int mode) {
     const int up = scale < 0 ? std::min(-(scale + 1), 99) + 1 : 0, down = std::clamp(scale, 0, 66);
-    uint64_t q, r2IsAbove, r2IsEqual;   // quotient; how twice the remainder compares with the denominator
+    uint64_t q, r2IsAbove, r2IsEqual;  // quotient; how twice the remainder compares with the denominator
     if (std::bit_width(numerator) + up <= 63 && std::bit_width(denominator) + down <= 63) {
         const uint64_t n = numerator << up, d = denominator << down;
         q = n / d;
@@ -80,30 +82,39 @@ inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int sca
 template <class T>
 T saturated(bool negative, uint64_t magnitude) {
     using Limits = std::numeric_limits<T>;
-    if (negative) return magnitude >= exact(Limits::min()).magnitude ? Limits::min() : static_cast<T>(-static_cast<int64_t>(magnitude));
+    if (negative && magnitude >= exact(Limits::min()).magnitude) return Limits::min();
+    if (negative) return static_cast<T>(-static_cast<int64_t>(magnitude));
     return magnitude >= static_cast<uint64_t>(Limits::max()) ? Limits::max() : static_cast<T>(magnitude);
 }
 
 template <class T>
-T scaled(Exact v, int scale) { return saturated<T>(v.negative, scaledQuotient(v.magnitude, 1, scale, roundNearestEven)); }
+T scaled(Exact v, int scale) {
+    return saturated<T>(v.negative, scaledQuotient(v.magnitude, 1, scale, roundNearestEven));
+}
 
 template <class T>
-constexpr bool isComplex = requires(T t) { t.re; };
+constexpr bool isComplex = requires(T t) {
+    t.re;
+};
 template <class T>
 constexpr bool isFloat = std::is_same_v<T, float> || std::is_same_v<T, QorComplex32f>;
 
 /// f(parts of a, parts of b) for each part of an element.
 template <class T, class F>
 T byPart(T a, T b, F f) {
-    if constexpr (isComplex<T>) return {f(a.re, b.re), f(a.im, b.im)};
-    else return f(a, b);
+    if constexpr (isComplex<T>)
+        return {f(a.re, b.re), f(a.im, b.im)};
+    else
+        return f(a, b);
 }
 
 template <class T>
 T add(T a, T b, int scale) {
     return byPart(a, b, [&](auto x, auto y) {
-        if constexpr (isFloat<T>) return x + y;
-        else return scaled<decltype(x)>(exact(x) + exact(y), scale);
+        if constexpr (isFloat<T>)
+            return x + y;
+        else
+            return scaled<decltype(x)>(exact(x) + exact(y), scale);
     });
 }
 
@@ -111,8 +122,10 @@ T add(T a, T b, int scale) {
 template <class T>
 T subtract(T a, T b, int scale) {
     return byPart(a, b, [&](auto x, auto y) {
-        if constexpr (isFloat<T>) return y - x;
-        else return scaled<decltype(x)>(exact(y) + -exact(x), scale);
+        if constexpr (isFloat<T>)
+            return y - x;
+        else
+            return scaled<decltype(x)>(exact(y) + -exact(x), scale);
     });
 }
 
@@ -139,18 +152,23 @@ T multiplyFractions(T a, T b) {
 
 template <class T>
 bool isZero(T a) {
-    if constexpr (isComplex<T>) return a.re == 0 && a.im == 0;
-    else return a == 0;
+    if constexpr (isComplex<T>)
+        return a.re == 0 && a.im == 0;
+    else
+        return a == 0;
 }
 
-inline float floatFromBits(uint32_t bits) {
+/// Inlined, as everything on the way of a signalling NaN: returning it in an x87 register would make it a quiet one.
+#define QORI_KEEPS_NAN inline __attribute__((always_inline))
+
+QORI_KEEPS_NAN float floatFromBits(uint32_t bits) {
     float f;
     __builtin_memcpy(&f, &bits, sizeof f);
     return f;
 }
 
 /// numerator over a zero of the sign of `zero`.
-inline float overZero(float numerator, float zero) {
+QORI_KEEPS_NAN float overZero(float numerator, float zero) {
     if (numerator == 0 || std::isnan(numerator)) return floatFromBits(0x7FBFFFFF);
     const float infinity = std::numeric_limits<float>::infinity();
     return std::signbit(numerator) != std::signbit(zero) ? -infinity : infinity;
@@ -165,7 +183,7 @@ inline float divideByReciprocal(float d, float n) {
 
 /// b / a.
 template <class T>
-T divide(T a, T b, int scale, int mode = roundNearestEven) {
+QORI_KEEPS_NAN T divide(T a, T b, int scale, int mode = roundNearestEven) {
     const auto rounded = [&]<class C>(C, Exact n, Exact d) {
         return saturated<C>(n.negative != d.negative, scaledQuotient(n.magnitude, d.magnitude, scale, mode));
     };

@@ -1,0 +1,30 @@
+# Shared by the scripts beside it, which source it from the repository's root.
+# shellcheck shell=bash
+
+# configure_and_build PRESET [TARGET]: quietly, with a log under build/. Warnings are errors in each of the scripts, so that
+# none of them builds again what another has built.
+configure_and_build() {
+    local -r preset=$1 log=build/$1.log
+    mkdir -p build
+    echo "${0##*/}: building $preset"
+    if { cmake --preset "$preset" -DQORI_WERROR=ON && cmake --build --preset "$preset" -j"$(nproc)" ${2:+--target "$2"}; } >"$log" 2>&1; then
+        return
+    fi
+    { grep -m 20 -E 'error|Error|FAILED' "$log" || tail -n 20 "$log"; } >&2
+    echo "${0##*/}: building $preset failed; the whole report is in $log" >&2
+    exit 1
+}
+
+# Makes Wine's prefix once, so that programs, and tests that run side by side, find it ready. A prefix that was not finished
+# has no registry file.
+start_wine() {
+    export WINEPREFIX="${WINEPREFIX:-$PWD/build/wine}" WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml="
+    if [[ ! -f $WINEPREFIX/system.reg ]]; then
+        mkdir -p "$(dirname "$WINEPREFIX")"
+        echo "${0##*/}: first start of Wine"
+        if ! { wineboot -i && wineserver -w; } >/dev/null 2>&1; then
+            echo "${0##*/}: Wine does not start (Debian packages wine, wine32:i386)" >&2
+            exit 1
+        fi
+    fi
+}

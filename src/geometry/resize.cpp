@@ -1,0 +1,305 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "checks.h"
+#include "frame/control_scope.h"
+#include "resize_half_run.h"
+#include "resize_run.h"
+#include "resize_taps_run.h"
+
+namespace qori::geometry {
+namespace {
+
+constexpr int64_t kSizeLimit = int64_t{1} << 31;
+
+const ResizePlan* planOf(const QorResizePlan* block) { return reinterpret_cast<const ResizePlan*>(blockStart(block)); }
+
+QorResult tagCheck(const ResizePlan* plan) { return plan->tag == ResizePlan::kTag ? QOR_OK : QOR_ERR_CONTEXT; }
+
+QorResult emptyCheck(QorImageSize size) {
+    return size.width == 0 || size.height == 0 ? QOR_WARN_NOTHING_TO_DO : QOR_OK;
+}
+
+/// Null pointers, then lengths of 0, then negative ones.
+template <class... Pointers>
+QorResult initCheck(QorImageSize src, QorImageSize dst, Pointers... pointers) {
+    return firstOf(nullCheck(pointers...), emptyCheck(src), emptyCheck(dst), sizeCheck(src), sizeCheck(dst));
+}
+
+QorResult sourceCheck(QorImageSize src, int32_t least) {
+    return src.width < least || src.height < least ? QOR_ERR_SIZE : QOR_OK;
+}
+
+QorResult reductionCheck(QorImageSize src, QorImageSize dst) {
+    return src.width < dst.width || src.height < dst.height ? QOR_ERR_SIZE : QOR_OK;
+}
+
+QorResult kindCheck(int32_t interpolation, bool antialiasing) {
+    switch (interpolation) {
+        case interpNearest:
+        case interpSuper: return antialiasing ? QOR_ERR_UNSUPPORTED_MODE : QOR_OK;
+        case interpLinear:
+        case interpCubic:
+        case interpLanczos: return QOR_OK;
+        case 0: return QOR_ERR_UNSUPPORTED_MODE;
+        default: return QOR_ERR_INTERPOLATION;
+    }
+}
+
+QorResult kindSizeCheck(QorImageSize src, QorImageSize dst, int32_t interpolation) {
+    switch (interpolation) {
+        case interpLinear: return sourceCheck(src, 2);
+        case interpCubic:
+        case interpLanczos: return sourceCheck(src, 4);
+        case interpSuper: return reductionCheck(src, dst);
+        default: return QOR_OK;
+    }
+}
+
+QorResult offsetCheck(const ResizePlan& plan, int32_t x, int32_t y) {
+    const bool inside = x >= 0 && y >= 0 && x < plan.horizontal.targetLength && y < plan.vertical.targetLength;
+    return inside ? QOR_OK : QOR_ERR_OUT_OF_RANGE;
+}
+
+QorResult trimWarning(const ResizePlan& plan, QorImageSize tile) {
+    const bool exceeds = tile.width > plan.horizontal.targetLength || tile.height > plan.vertical.targetLength;
+    return exceeds ? QOR_WARN_ADJUSTED : QOR_OK;
+}
+
+int32_t smaller(int32_t a, int32_t b) { return a < b ? a : b; }
+
+Tile trimmed(const ResizePlan& plan, int32_t x, int32_t y, int32_t width, int32_t height) {
+    return {x, y, smaller(width, plan.horizontal.targetLength - x), smaller(height, plan.vertical.targetLength - y)};
+}
+
+// --- queries --------------------------------------------------------------------------------------------------------
+
+QorResult resizeGetSize(QorImageSize src, QorImageSize dst, int32_t interpolation, int32_t antialiasing,
+                        int32_t* pPlanSize, int32_t* pInitBufSize) {
+    if (QorResult r = initCheck(src, dst, pPlanSize, pInitBufSize)) return r;
+    if (QorResult r = kindCheck(interpolation, antialiasing != 0)) return r;
+    if (QorResult r = kindSizeCheck(src, dst, interpolation)) return r;
+    const PlanLayout layout = planLayout(src, dst, interpolation, antialiasing != 0);
+    if (layout.planBytes >= kSizeLimit || layout.initBytes >= kSizeLimit) return QOR_ERR_SIZE;
+    *pPlanSize = static_cast<int32_t>(layout.planBytes);
+    *pInitBufSize = static_cast<int32_t>(layout.initBytes);
+    return QOR_OK;
+}
+
+/// Calls visit with the way to resize T by a plan.
+template <class T, int channels, class Visit>
+auto withWay(const ResizePlan& plan, Visit visit) {
+    if constexpr (std::is_same_v<T, double>) {
+        return visit.template operator()<DoubleLinearTile<channels>>();
+    } else {
+        if (plan.interpolation == interpNearest) return visit.template operator()<NearestTile<T, channels>>();
+        if constexpr (HalfTile<T, channels>::exists)
+            if (HalfTile<T, channels>::suits(plan)) return visit.template operator()<HalfTile<T, channels>>();
+        if constexpr (std::is_same_v<T, uint8_t>)
+            if (plan.interpolation == interpLinear && plan.antialiasing == 0)
+                return visit.template operator()<FixedLinearTile<channels>>();
+        return visit.template operator()<TapsTile<T, channels>>();
+    }
+}
+
+template <class T>
+int64_t bufferBytes(const ResizePlan& plan, Tile tile, int32_t channels) {
+    const auto count = [&]<class Way>() {
+        WorkBuffer buffer(nullptr);
+        const Way counted(plan, tile, buffer);
+        return buffer.bytes();
+    };
+    switch (channels) {
+        case 1: return withWay<T, 1>(plan, count);
+        case 3: return withWay<T, 3>(plan, count);
+        default: return withWay<T, 4>(plan, count);
+    }
+}
+
+template <class T>
+QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int32_t numChannels, int32_t* pBufSize) {
+    if (QorResult r = firstOf(nullCheck(pPlan, pBufSize), emptyCheck(dst))) return r;
+    const ResizePlan& plan = *planOf(pPlan);
+    if (QorResult r = tagCheck(&plan)) return r;
+    if (numChannels != 1 && numChannels != 3 && numChannels != 4) return QOR_ERR_CHANNELS_UNSUPPORTED;
+    if (QorResult r = sizeCheck(dst)) return r;
+    const ControlScope scope;  // as in the operation
+    const int64_t bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
+    if (bytes >= kSizeLimit) return QOR_ERR_SIZE;
+    *pBufSize = static_cast<int32_t>(bytes);
+    return trimWarning(plan, dst);
+}
+
+QorResult resizeGetBorderSize(const QorResizePlan* pPlan, QorBorderExtent* pBorderSize) {
+    if (QorResult r = nullCheck(pPlan, pBorderSize)) return r;
+    if (QorResult r = tagCheck(planOf(pPlan))) return r;
+    *pBorderSize = planOf(pPlan)->border;
+    return QOR_OK;
+}
+
+QorResult resizeGetSrcOffset(const QorResizePlan* pPlan, QorPoint2D dstOffset, QorPoint2D* pSrcOffset) {
+    if (QorResult r = nullCheck(pPlan, pSrcOffset)) return r;
+    const ResizePlan& plan = *planOf(pPlan);
+    if (QorResult r = tagCheck(&plan)) return r;
+    if (QorResult r = offsetCheck(plan, dstOffset.x, dstOffset.y)) return r;
+    *pSrcOffset = {sourceOffset(plan.horizontal, dstOffset.x), sourceOffset(plan.vertical, dstOffset.y)};
+    return QOR_OK;
+}
+
+QorResult resizeGetSrcRoi(const QorResizePlan* pPlan, QorImageRect dst, QorImageRect* pSrcRect,
+                          QorImageRect* pTrimmedDstRect) {
+    if (QorResult r = firstOf(nullCheck(pPlan, pSrcRect, pTrimmedDstRect), sizeCheck({dst.width, dst.height})))
+        return r;
+    const ResizePlan& plan = *planOf(pPlan);
+    if (QorResult r = tagCheck(&plan)) return r;
+    if (QorResult r = offsetCheck(plan, dst.x, dst.y)) return r;
+    const Tile tile = trimmed(plan, dst.x, dst.y, dst.width, dst.height);
+    const Range columns = tapRange(plan, plan.horizontal, tile.x, tile.width, false, false);
+    const Range rows = tapRange(plan, plan.vertical, tile.y, tile.height, false, false);
+    *pSrcRect = {columns.first, rows.first, columns.last - columns.first + 1, rows.last - rows.first + 1};
+    *pTrimmedDstRect = {tile.x, tile.y, tile.width, tile.height};
+    return QOR_OK;
+}
+
+// --- plans ----------------------------------------------------------------------------------------------------------
+
+QorResult resizeNearestInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan) {
+    if (QorResult r = initCheck(src, dst, pPlan)) return r;
+    fillNearest(reinterpret_cast<ResizePlan*>(pPlan), src, dst);
+    return QOR_OK;
+}
+
+template <class T>
+QorResult resizeLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan) {
+    if (QorResult r = firstOf(initCheck(src, dst, pPlan), sourceCheck(src, 2))) return r;
+    fillLinear(reinterpret_cast<ResizePlan*>(pPlan), src, dst, std::is_same_v<T, uint8_t>);
+    return QOR_OK;
+}
+
+QorResult initCubic(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan, uint8_t* pInitBuf,
+                    bool antialiasing) {
+    if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 4))) return r;
+    fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::cubic, 2, b, c}, antialiasing);
+    return QOR_OK;
+}
+
+QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan, uint8_t* pInitBuf,
+                      bool antialiasing) {
+    if (QorResult r = initCheck(src, dst, pPlan, pInitBuf)) return r;
+    if (lobes != 2 && lobes != 3) return QOR_ERR_UNSUPPORTED_MODE;
+    const auto support = static_cast<int32_t>(lobes);
+    if (QorResult r = sourceCheck(src, 2 * support)) return r;
+    fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::lanczos, support}, antialiasing);
+    return QOR_OK;
+}
+
+QorResult resizeCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
+                          uint8_t* pInitBuf) {
+    return initCubic(src, dst, b, c, pPlan, pInitBuf, false);
+}
+
+QorResult resizeLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan,
+                            uint8_t* pInitBuf) {
+    return initLanczos(src, dst, lobes, pPlan, pInitBuf, false);
+}
+
+QorResult resizeSuperInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan) {
+    if (QorResult r = firstOf(initCheck(src, dst, pPlan), reductionCheck(src, dst))) return r;
+    fillSuper(reinterpret_cast<ResizePlan*>(pPlan), src, dst);
+    return QOR_OK;
+}
+
+QorResult resizeAntialiasingLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan, uint8_t* pInitBuf) {
+    if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 2))) return r;
+    fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::linear, 1}, true);
+    return QOR_OK;
+}
+
+QorResult resizeAntialiasingCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
+                                      uint8_t* pInitBuf) {
+    return initCubic(src, dst, b, c, pPlan, pInitBuf, true);
+}
+
+QorResult resizeAntialiasingLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan,
+                                        uint8_t* pInitBuf) {
+    return initLanczos(src, dst, lobes, pPlan, pInitBuf, true);
+}
+
+// --- operations -----------------------------------------------------------------------------------------------------
+
+template <class T>
+QorResult tileCheck(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan,
+                    uint8_t* pBuffer) {
+    if (QorResult r = firstOf(nullCheck(src, dst, pPlan, pBuffer), emptyCheck(size))) return r;
+    return firstOf(tagCheck(planOf(pPlan)), sizeCheck(size), offsetCheck(*planOf(pPlan), offset.x, offset.y));
+}
+
+/// Antialiasing serves any interpolation.
+QorResult planCheck(const ResizePlan& plan, int32_t interpolation, bool antialiasing) {
+    const bool fits = (plan.antialiasing != 0) == antialiasing && (antialiasing || plan.interpolation == interpolation);
+    return fits ? QOR_OK : QOR_ERR_UNSUPPORTED_MODE;
+}
+
+/// Border values are accepted and not used: no kind that this family takes needs them.
+struct Border {
+    int32_t type;
+    const void* values;
+};
+
+QorResult borderCheck(Border border) {
+    if (border.type & ~0xF7) return QOR_ERR_BORDER;
+    const int32_t kind = border.type & 7;
+    return kind == borderReplicate || kind == borderReadAll ? QOR_OK : QOR_ERR_UNSUPPORTED_MODE;
+}
+
+OpenSides openSides(Border border) {
+    const bool all = (border.type & 7) == borderReadAll;
+    const auto open = [=](int32_t flag) { return all || (border.type & flag) != 0; };
+    return {open(borderReadTop), open(borderReadBottom), open(borderReadLeft), open(borderReadRight)};
+}
+
+template <class T, int channels>
+QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open,
+                  const QorResizePlan* pPlan, uint8_t* pBuffer) {
+    const ControlScope scope;
+    const ResizePlan& plan = *planOf(pPlan);
+    WorkBuffer buffer(pBuffer);
+    const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);
+    withWay<T, channels>(plan, [&]<class Way>() { Way(plan, tile, buffer).run(src, dst, open); });
+    return trimWarning(plan, size);
+}
+
+template <class T, int channels, int32_t interpolation>
+QorResult resizeInside(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size,
+                       const QorResizePlan* pPlan, uint8_t* pBuffer) {
+    if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
+    if (QorResult r = planCheck(*planOf(pPlan), interpolation, false)) return r;
+    return runTile<T, channels>(src, dst, offset, size, {}, pPlan, pBuffer);
+}
+
+constexpr int32_t kAnyAntialiasing = 0;
+
+template <class T, int channels, int32_t interpolation>
+QorResult resizeBordered(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, Border border,
+                         const QorResizePlan* pPlan, uint8_t* pBuffer) {
+    if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
+    constexpr bool antialiasing = interpolation == kAnyAntialiasing;
+    if (QorResult r = firstOf(planCheck(*planOf(pPlan), interpolation, antialiasing), borderCheck(border))) return r;
+    return runTile<T, channels>(src, dst, offset, size, openSides(border), pPlan, pBuffer);
+}
+
+template <class T, int channels>
+constexpr auto resizeNearest = resizeInside<T, channels, interpNearest>;
+template <class T, int channels>
+constexpr auto resizeSuper = resizeInside<T, channels, interpSuper>;
+template <class T, int channels>
+constexpr auto resizeLinear = resizeBordered<T, channels, interpLinear>;
+template <class T, int channels>
+constexpr auto resizeCubic = resizeBordered<T, channels, interpCubic>;
+template <class T, int channels>
+constexpr auto resizeLanczos = resizeBordered<T, channels, interpLanczos>;
+template <class T, int channels>
+constexpr auto resizeAntialiasing = resizeBordered<T, channels, kAnyAntialiasing>;
+
+}  // namespace
+}  // namespace qori::geometry
+
+#include "entries/resize.inc"

@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: Apache-2.0
+// The plan of a resize: a record and its tables in the caller's block, and what can be asked of it.
+#pragma once
+#include "frame/image.h"
+
+namespace qori::geometry {
+
+/// Where a caller's record or buffer begins inside its block.
+template <class T>
+auto* blockStart(T* block) {
+    using Byte = std::conditional_t<std::is_const_v<T>, const uint8_t, uint8_t>;
+    return reinterpret_cast<Byte*>((reinterpret_cast<uintptr_t>(block) + 63) & ~uintptr_t{63});
+}
+
+constexpr int64_t roundUp(int64_t n, int64_t multiple) { return (n + multiple - 1) / multiple * multiple; }
+
+/// One direction. A position is a pixel of the destination, an index one of the source.
+struct Axis {
+    int32_t sourceLength, targetLength;
+    int32_t sourceReduced, targetReduced;  ///< The lengths divided by their greatest common divisor.
+    int32_t indexTable, weightTable;       ///< Bytes from the start of the record.
+    int32_t leading, trailing;             ///< Positions whose filter begins before, or ends behind, the source.
+
+    double ratio() const { return static_cast<double>(sourceReduced) / targetReduced; }
+};
+
+struct ResizePlan {
+    static constexpr uint32_t kTag = 0x4B617389;
+    uint32_t tag;
+    int32_t interpolation;
+    int32_t halfWidth, halfHeight;  ///< Half of the filter's taps; 0 for nearest and super.
+    int32_t antialiasing;
+    QorBorderExtent border;
+    Axis vertical, horizontal;
+    int32_t columnTaps, rowTaps;  ///< Weights per position of the two directions.
+    int32_t columnPeriod;         ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
+
+    template <class T>
+    const T* table(int32_t offset) const {
+        return reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(this) + offset);
+    }
+    /// Source index of a position: its first pixel for super, the pixel at or before its centre else.
+    int32_t index(const Axis& axis, int32_t position) const {
+        const auto* indices = table<int32_t>(axis.indexTable);
+        if (interpolation != interpSuper) return indices[position];
+        return position / axis.targetReduced * axis.sourceReduced + indices[position % axis.targetReduced];
+    }
+    /// Which of the stored sets of weights a position has: super keeps those of one period.
+    int32_t weightSet(const Axis& axis, int32_t position) const {
+        return interpolation == interpSuper ? position % axis.targetReduced : position;
+    }
+    int32_t half(const Axis& axis) const { return &axis == &vertical ? halfHeight : halfWidth; }
+    int32_t firstTap(const Axis& axis, int32_t position) const {
+        const int32_t reach = half(axis);
+        return index(axis, position) - (reach > 0 ? reach - 1 : 0);
+    }
+    /// The last index that the position's filter has a weight for.
+    int32_t lastTap(const Axis& axis, int32_t position) const;
+};
+
+/// Where a tile's pSrc lies in the source.
+inline int32_t sourceOffset(const Axis& axis, int32_t position) {
+    return static_cast<int32_t>(int64_t{position} * axis.sourceReduced / axis.targetReduced);
+}
+
+/// Bytes of plan and initialisation buffer, with the slack for their alignment, and where the tables lie.
+struct PlanLayout {
+    int32_t verticalIndices, verticalWeights, horizontalIndices, horizontalWeights;
+    int64_t planBytes, initBytes;
+};
+
+PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation, bool antialiasing);
+
+/// Which filter a plan weighs its taps with.
+struct Filter {
+    enum class Shape { linear, cubic, lanczos } shape;
+    int32_t support;  ///< Source pixels that the filter reaches to either side.
+    double b = 0, c = 0;
+
+    double operator()(double distance) const;
+};
+
+void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst);
+/// `fixedPoint` stores the 14-bit weights of the 8u form, else the fraction as a float.
+void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint);
+void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing);
+void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst);
+
+}  // namespace qori::geometry

@@ -1,0 +1,316 @@
+// SPDX-License-Identifier: Apache-2.0
+// Resizing one tile. Each way of doing it is a class that takes its memory from a work buffer in its constructor, so
+// that the query for the buffer's size and the operation cannot disagree, and then runs.
+#pragma once
+#include "kernels/resize_gather.h"
+#include "kernels/resize_taps.h"
+#include "resize_plan.h"
+
+namespace qori::geometry {
+
+/// Hands out pieces of a work buffer, each on a 64-byte boundary; without a buffer it only counts.
+class WorkBuffer {
+public:
+    explicit WorkBuffer(uint8_t* block) : next_(block == nullptr ? nullptr : blockStart(block)) {}
+
+    template <class T>
+    T* take(int64_t count) {
+        const int64_t bytes = roundUp(count * static_cast<int64_t>(sizeof(T)), 64);
+        auto* piece = reinterpret_cast<T*>(next_);
+        if (next_ != nullptr) next_ += bytes;
+        used_ += bytes;
+        return piece;
+    }
+    /// With the slack for the alignment of the caller's block.
+    int64_t bytes() const { return used_ + 64; }
+
+private:
+    uint8_t* next_;
+    int64_t used_ = 0;
+};
+
+/// The part of a tile inside the destination, in destination pixels.
+struct Tile {
+    int32_t x, y, width, height;
+};
+
+/// Source indices first..last.
+struct Range {
+    int32_t first, last;
+
+    int32_t clamp(int32_t index) const { return index < first ? first : index > last ? last : index; }
+};
+
+/// Sides beyond which the source goes on in memory.
+struct OpenSides {
+    bool top = false, bottom = false, left = false, right = false;
+};
+
+/// Indices that `count` positions are made of, within the source except on open sides. Every other index is as good as
+/// the nearest of these.
+inline Range tapRange(const ResizePlan& plan, const Axis& axis, int32_t position, int32_t count, bool openLow,
+                      bool openHigh) {
+    Range range{plan.firstTap(axis, position), plan.lastTap(axis, position + count - 1)};
+    if (!openLow && range.first < 0) range.first = 0;
+    if (!openHigh && range.last >= axis.sourceLength) range.last = axis.sourceLength - 1;
+    return range;
+}
+
+/// What the ways have in common: the tile, the source pixels that may be read, and access to rows by source index.
+template <class T, int channels>
+struct TileSource {
+    const ResizePlan& plan;
+    Tile tile;
+    Range columns{}, rows{};
+    Image<const T> image{};  ///< At pixel (0, 0) of the whole source.
+
+    void open(Image<const T> src, OpenSides open) {
+        columns = tapRange(plan, plan.horizontal, tile.x, tile.width, open.left, open.right);
+        rows = tapRange(plan, plan.vertical, tile.y, tile.height, open.top, open.bottom);
+        const ptrdiff_t x = sourceOffset(plan.horizontal, tile.x), y = sourceOffset(plan.vertical, tile.y);
+        image = {advance(src.data, -(y * src.step + x * ptrdiff_t{channels} * elementBytes<T>)), src.step};
+    }
+    /// The row's pixel at a column.
+    const T* at(int32_t row, int32_t column) const {
+        return advance(image.row(row), ptrdiff_t{column} * channels * elementBytes<T>);
+    }
+};
+
+/// Rows for the gathering kernels, which want 16 bytes at least: shorter ones are copied.
+template <class T, int channels>
+class GatherRows {
+public:
+    explicit GatherRows(WorkBuffer& buffer) : copy_(buffer.take<uint8_t>(kernels::Gather::kLane)) {}
+
+    void open(const TileSource<T, channels>& source) {
+        source_ = &source;
+        bytes_ = (source.columns.last - source.columns.first + 1) * channels * elementBytes<T>;
+    }
+    int32_t bytes() const { return bytes_ < kernels::Gather::kLane ? kernels::Gather::kLane : bytes_; }
+    const uint8_t* row(int32_t index) const {
+        const uint8_t* row = asBytes(source_->at(index, source_->columns.first));
+        if (bytes_ >= kernels::Gather::kLane) return row;
+        storePartial(copy_, loadPartial(row, bytes_), bytes_);
+        return copy_;
+    }
+
+private:
+    uint8_t* copy_;
+    const TileSource<T, channels>* source_ = nullptr;
+    int32_t bytes_ = 0;
+};
+
+template <class T, int channels>
+class NearestTile {
+public:
+    NearestTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
+        : source_{plan, tile},
+          rows_(buffer),
+          rowBytes_(ptrdiff_t{tile.width} * kPixel),
+          tables_(buffer.take<uint8_t>(2 * groups() * kernels::Gather::kLaneBytes)) {}
+
+    void run(Image<const T> src, Image<T> dst, OpenSides) {
+        source_.open(src, {});
+        rows_.open(source_);
+        const kernels::Gather gather = buildTables();
+        const Axis& axis = source_.plan.vertical;
+        const Tile& tile = source_.tile;
+        const bool rowsApart = dst.step >= rowBytes_ || dst.step <= -rowBytes_;
+        for (int32_t y = 0; y < tile.height; ++y) {
+            const int32_t index = source_.plan.index(axis, tile.y + y);
+            uint8_t* to = asBytes(dst.row(y));
+            if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1))
+                repeatRow(to, asBytes(dst.row(y - 1)));
+            else
+                kernels::gatherRow(gather, rows_.row(index), to, rowBytes_, elementBytes<T>);
+        }
+    }
+
+private:
+    static constexpr int kPixel = channels * elementBytes<T>;
+
+    ptrdiff_t groups() const { return (rowBytes_ + 31) / 32; }
+
+    void repeatRow(uint8_t* to, const uint8_t* from) const {
+        for (ptrdiff_t i = 0; i < rowBytes_; i += 32)
+            storeUpTo(to + i, loadUpTo(from + i, rowBytes_ - i), rowBytes_ - i);
+    }
+
+    kernels::Gather buildTables() const {
+        const ResizePlan& plan = source_.plan;
+        auto* offsets = reinterpret_cast<int32_t*>(tables_);
+        for (int32_t x = 0; x < source_.tile.width; ++x) {
+            const int32_t from = (plan.index(plan.horizontal, source_.tile.x + x) - source_.columns.first) * kPixel;
+            for (int b = 0; b < kPixel; ++b) *offsets++ = from + b;
+        }
+        for (ptrdiff_t i = rowBytes_; i < 32 * groups(); ++i, ++offsets) *offsets = offsets[-1];
+        return kernels::buildGather(tables_, groups(), rows_.bytes());
+    }
+
+    TileSource<T, channels> source_;
+    GatherRows<T, channels> rows_;
+    ptrdiff_t rowBytes_;
+    uint8_t* tables_;
+};
+
+/// The two filtered rows that a destination row lies between. Neighbouring destination rows share them, so a row is
+/// filtered once as long as it is in use.
+template <class H>
+class RowPair {
+public:
+    RowPair(WorkBuffer& buffer, int64_t elements) : rows_{buffer.take<H>(elements), buffer.take<H>(elements)} {}
+
+    /// Provides rows `first` and `second`, calling filter(index, row) for those that are not there.
+    template <class FilterRow>
+    void provide(int32_t first, int32_t second, FilterRow filter) {
+        if (indices_[1] == first || indices_[0] == second) swap();
+        provideOne(0, first, filter);
+        if (second == first) return;
+        provideOne(1, second, filter);
+    }
+    const H* first() const { return rows_[0]; }
+    const H* second(bool same) const { return rows_[same ? 0 : 1]; }
+
+private:
+    static constexpr int32_t kNone = INT32_MIN;
+
+    void swap() {
+        H* const row = rows_[0];
+        rows_[0] = rows_[1];
+        rows_[1] = row;
+        const int32_t index = indices_[0];
+        indices_[0] = indices_[1];
+        indices_[1] = index;
+    }
+    template <class FilterRow>
+    void provideOne(int place, int32_t index, FilterRow filter) {
+        if (indices_[place] == index) return;
+        filter(index, rows_[place]);
+        indices_[place] = index;
+    }
+
+    H* rows_[2];
+    int32_t indices_[2] = {kNone, kNone};
+};
+
+/// Linear 8u in fixed point.
+template <int channels>
+class FixedLinearTile {
+public:
+    FixedLinearTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
+        : source_{plan, tile},
+          rows_(buffer),
+          elements_(ptrdiff_t{tile.width} * channels),
+          padded_(static_cast<ptrdiff_t>(roundUp(elements_, 32))),
+          tables_(buffer.take<uint8_t>(padded_ / 8 * kernels::Gather::kLaneBytes)),
+          weights_(buffer.take<int16_t>(padded_)),
+          pair_(buffer, padded_) {}
+
+    void run(Image<const uint8_t> src, Image<uint8_t> dst, OpenSides open) {
+        source_.open(src, open);
+        rows_.open(source_);
+        const kernels::Gather gather = buildTables();
+        const ResizePlan& plan = source_.plan;
+        const Tile& tile = source_.tile;
+        const auto* weights = plan.table<int32_t>(plan.vertical.weightTable);
+        for (int32_t y = 0; y < tile.height; ++y) {
+            const int32_t index = plan.index(plan.vertical, tile.y + y), w = weights[tile.y + y];
+            // A row of weight 0 is not needed.
+            const int32_t first = source_.rows.clamp(index), second = w == 0 ? first : source_.rows.clamp(index + 1);
+            pair_.provide(first, second, [&](int32_t row, int16_t* out) {
+                kernels::linearRow8u(gather, rows_.row(row), weights_, out);
+            });
+            kernels::linearColumn8u(pair_.first(), pair_.second(first == second), w, dst.row(y), elements_);
+        }
+    }
+
+private:
+    kernels::Gather buildTables() const {
+        const ResizePlan& plan = source_.plan;
+        const auto* pairs = plan.table<int32_t>(plan.horizontal.weightTable) + source_.tile.x;
+        auto* offsets = reinterpret_cast<int32_t*>(tables_);
+        const auto place = [&](ptrdiff_t i, int32_t first, int32_t second, int32_t w) {
+            const ptrdiff_t at = kernels::linearOrder(i);
+            offsets[2 * at] = first;
+            offsets[2 * at + 1] = second;
+            weights_[at] = static_cast<int16_t>(-2 * w);
+        };
+        const Range& legal = source_.columns;
+        ptrdiff_t i = 0;
+        int32_t first = 0, second = 0;
+        for (int32_t x = 0; x < source_.tile.width; ++x) {
+            const int32_t index = plan.index(plan.horizontal, source_.tile.x + x), w = pairs[x] >> 16;
+            first = (legal.clamp(index) - legal.first) * channels;
+            second = (legal.clamp(index + 1) - legal.first) * channels;
+            for (int c = 0; c < channels; ++c, ++i) place(i, first + c, second + c, w);
+        }
+        for (; i < padded_; ++i) place(i, first, second, 0);
+        return kernels::buildGather(tables_, padded_ / 16, rows_.bytes());
+    }
+
+    TileSource<uint8_t, channels> source_;
+    GatherRows<uint8_t, channels> rows_;
+    ptrdiff_t elements_, padded_;
+    uint8_t* tables_;
+    int16_t* weights_;
+    RowPair<int16_t> pair_;
+};
+
+/// Linear 64f: the fractions are found again from the stored indices, as the plan holds them in single precision only.
+template <int channels>
+class DoubleLinearTile {
+public:
+    DoubleLinearTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
+        : source_{plan, tile},
+          fractions_(buffer.take<double>(tile.width)),
+          pair_(buffer, roundUp(int64_t{tile.width} * channels, 4)) {}
+
+    void run(Image<const double> src, Image<double> dst, OpenSides open) {
+        source_.open(src, open);
+        const ResizePlan& plan = source_.plan;
+        const Tile& tile = source_.tile;
+        for (int32_t x = 0; x < tile.width; ++x) fractions_[x] = fraction(plan.horizontal, tile.x + x);
+        for (int32_t y = 0; y < tile.height; ++y) {
+            const int32_t index = plan.index(plan.vertical, tile.y + y);
+            const int32_t first = source_.rows.clamp(index), second = source_.rows.clamp(index + 1);
+            pair_.provide(first, second, [&](int32_t row, double* out) { filterRow(row, out); });
+            mix(pair_.first(), pair_.second(first == second), fraction(plan.vertical, tile.y + y), dst.row(y));
+        }
+    }
+
+private:
+    double fraction(const Axis& axis, int32_t position) const {
+        return __builtin_fma(position + 0.5, axis.ratio(), -0.5) - source_.plan.index(axis, position);
+    }
+
+    void filterRow(int32_t row, double* out) const {
+        const Range& legal = source_.columns;
+        const auto* from = asBytes(source_.at(row, 0));
+        for (int32_t x = 0; x < source_.tile.width; ++x) {
+            const int32_t index = source_.plan.index(source_.plan.horizontal, source_.tile.x + x);
+            const ptrdiff_t a = ptrdiff_t{legal.clamp(index)} * channels,
+                            b = ptrdiff_t{legal.clamp(index + 1)} * channels;
+            for (int c = 0; c < channels; ++c, ++out) {
+                double p[2];
+                __builtin_memcpy(&p[0], from + 8 * (a + c), 8);
+                __builtin_memcpy(&p[1], from + 8 * (b + c), 8);
+                *out = __builtin_fma(fractions_[x], p[1], (1 - fractions_[x]) * p[0]);
+            }
+        }
+    }
+
+    void mix(const double* h0, const double* h1, double fraction, double* dst) const {
+        const __m256d second = _mm256_set1_pd(fraction), first = _mm256_set1_pd(1 - fraction);
+        const ptrdiff_t elements = ptrdiff_t{source_.tile.width} * channels;
+        for (ptrdiff_t i = 0; i < elements; i += 4) {
+            const __m256d sum = _mm256_mul_pd(first, _mm256_loadu_pd(h0 + i));
+            storeUpTo(dst + i, Vec<double>{_mm256_fmadd_pd(second, _mm256_loadu_pd(h1 + i), sum)}, elements - i);
+        }
+    }
+
+    TileSource<double, channels> source_;
+    double* fractions_;
+    RowPair<double> pair_;
+};
+
+}  // namespace qori::geometry

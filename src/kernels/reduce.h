@@ -1,0 +1,150 @@
+// SPDX-License-Identifier: Apache-2.0
+// Reductions of a region to one number per channel: one row loop for every measure, type and layout.
+//
+// Elements are taken in rounds of three vectors (or a multiple). Three vectors hold a whole number of pixels of 1, 3
+// and 4 channels, so an accumulator lane sees one channel only, in every row, and layouts share their code: channels
+// are told apart once, at the end. AC4 is four channels of which the last is not asked for.
+//
+// A measure says what is accumulated:
+//     Lanes                            accumulators of one vector position, see reduce_lanes.h
+//     static void feed(Lanes&, Vec<T>...)   adds one vector of each source; zeros add nothing
+//     optionally loadVector(p) and loadRest(p, n)   where vectors are not simply loaded
+// Lanes offer
+//     Total                            type of a channel's result
+//     static constexpr int banks       vectors of a round, in threes: more than 3 where latency would bind
+//     static constexpr ptrdiff_t limit rounds before a lane could overflow
+//     and either  values(Total*)       one value per element position
+//     or          Next, spillTo(Next&) wider accumulators that take over before the limit
+//     optionally  static Total join(Total, Total)   what brings lanes together if not +
+#pragma once
+#include <algorithm>
+
+#include "simd.h"
+
+namespace qori::kernels {
+
+namespace detail {
+
+template <class Lanes>
+constexpr auto join(typename Lanes::Total a, typename Lanes::Total b) {
+    if constexpr (requires { Lanes::join(a, b); })
+        return Lanes::join(a, b);
+    else
+        return static_cast<typename Lanes::Total>(a + b);
+}
+
+/// Brings the values of one channel together pairwise, which keeps float rounding to the depth of the tree.
+template <class Lanes, int count>
+typename Lanes::Total joinChannel(const typename Lanes::Total* values, int channels, int channel) {
+    typename Lanes::Total own[count];
+    own[0] = values[channel];
+    int n = 1;
+    for (int i = channel + channels; i < count; i += channels) own[n++] = values[i];
+    for (; n > 1; n = (n + 1) / 2) {
+        for (int i = 0; i < n / 2; ++i) own[i] = join<Lanes>(own[2 * i], own[2 * i + 1]);
+        if (n % 2 != 0) own[n / 2] = own[n - 1];
+    }
+    return own[0];
+}
+
+template <class Measure, class T>
+QORI_INLINE auto loadFor(const T* p) {
+    if constexpr (requires { Measure::loadVector(p); })
+        return Measure::loadVector(p);
+    else
+        return load(p);
+}
+
+template <class Measure, class T>
+QORI_INLINE auto loadRestFor(const T* p, ptrdiff_t n) {
+    if constexpr (requires { Measure::loadRest(p, n); })
+        return Measure::loadRest(p, n);
+    else
+        return loadPartial(p, n);
+}
+
+}  // namespace detail
+
+/// Accumulators of a whole reduction; lives on the family function's stack.
+template <class L, int vectorCount = 3 * L::banks>
+struct Accumulators {
+    using Total = typename L::Total;
+    static constexpr int vectors = vectorCount;
+
+    L lanes[vectors] = {};
+    ptrdiff_t left = L::limit;  ///< Rounds until the lanes must be emptied.
+    Total totals[4] = {};
+
+    /// Empties the lanes into the totals.
+    QORI_NOINLINE void spill(int channels) {
+        constexpr int perVector = L::count;
+        Total values[vectors * perVector];
+        for (int v = 0; v < vectors; ++v) lanes[v].values(values + v * perVector);
+        for (int c = 0; c < channels; ++c)
+            totals[c] = detail::join<L>(totals[c], detail::joinChannel<L, vectors * perVector>(values, channels, c));
+        for (L& lane : lanes) lane = L{};
+        left = L::limit;
+    }
+    void finish(int channels) { spill(channels); }
+    Total total(int channel) const { return totals[channel]; }
+};
+
+/// Accumulators that spill into wider ones.
+template <class L, int vectorCount>
+requires requires { typename L::Next; }
+struct Accumulators<L, vectorCount> {
+    static constexpr int vectors = vectorCount;
+
+    L lanes[vectors] = {};
+    ptrdiff_t left = L::limit;
+    Accumulators<typename L::Next, vectorCount> next = {};
+
+    QORI_NOINLINE void spill(int channels) {
+        for (int v = 0; v < vectors; ++v) {
+            lanes[v].spillTo(next.lanes[v]);
+            lanes[v] = L{};
+        }
+        left = L::limit;
+        if (--next.left == 0) next.spill(channels);
+    }
+    void finish(int channels) {
+        spill(channels);
+        next.finish(channels);
+    }
+    auto total(int channel) const { return next.total(channel); }
+};
+
+template <class Measure>
+using AccumulatorsOf = Accumulators<typename Measure::Lanes>;
+
+/// Adds one row of `elements` elements. Stands outside its callers, so that layouts share it.
+template <class Measure, class T, class... More>
+QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdiff_t elements, const T* first,
+                             const More*... more) {
+    constexpr int n = Vec<T>::lanes, vectors = AccumulatorsOf<Measure>::vectors;
+    constexpr ptrdiff_t round = ptrdiff_t{n} * vectors;
+    ptrdiff_t i = 0;
+    while (elements - i >= round) {
+        typename Measure::Lanes lanes[vectors];
+        for (int v = 0; v < vectors; ++v) lanes[v] = sums.lanes[v];
+        const ptrdiff_t rounds = std::min((elements - i) / round, sums.left);
+        for (const ptrdiff_t end = i + rounds * round; i < end; i += round) {
+#pragma GCC unroll 6
+            for (int v = 0; v < vectors; ++v)
+                Measure::feed(lanes[v], detail::loadFor<Measure>(first + i + v * n),
+                              detail::loadFor<Measure>(more + i + v * n)...);
+        }
+        for (int v = 0; v < vectors; ++v) sums.lanes[v] = lanes[v];
+        if ((sums.left -= rounds) == 0) sums.spill(channels);
+    }
+    if (i == elements) return;
+    int v = 0;
+    for (; elements - i >= n; i += n, ++v)
+        Measure::feed(sums.lanes[v], detail::loadFor<Measure>(first + i), detail::loadFor<Measure>(more + i)...);
+    if (const ptrdiff_t rest = elements - i; rest > 0)
+        Measure::feed(sums.lanes[v], detail::loadRestFor<Measure>(first + i, rest),
+                      detail::loadRestFor<Measure>(more + i, rest)...);
+    if (--sums.left == 0) sums.spill(channels);
+}
+
+}  // namespace qori::kernels

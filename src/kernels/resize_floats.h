@@ -1,0 +1,36 @@
+// SPDX-License-Identifier: Apache-2.0
+// Up to eight elements as floats, zeros behind the n that there are.
+#pragma once
+#include "simd.h"
+
+namespace qori::kernels {
+
+QORI_INLINE __m256 toFloats(const float* p, ptrdiff_t n) { return loadUpTo(p, n).v; }
+
+QORI_INLINE __m256 toFloats(const uint8_t* p, ptrdiff_t n) {
+    const __m128i bytes =
+        n >= 8 ? _mm_loadl_epi64(reinterpret_cast<const __m128i*>(p)) : detail::loadBelow16(p, static_cast<int>(n));
+    return _mm256_cvtepi32_ps(_mm256_cvtepu8_epi32(bytes));
+}
+
+QORI_INLINE __m128i loadWords(const void* p, ptrdiff_t n) {
+    const auto* bytes = static_cast<const uint8_t*>(p);
+    return n >= 8 ? _mm_loadu_si128(reinterpret_cast<const __m128i*>(bytes))
+                  : detail::loadBelow16(bytes, 2 * static_cast<int>(n));
+}
+
+QORI_INLINE __m256 toFloats(const uint16_t* p, ptrdiff_t n) {
+    return _mm256_cvtepi32_ps(_mm256_cvtepu16_epi32(loadWords(p, n)));
+}
+QORI_INLINE __m256 toFloats(const int16_t* p, ptrdiff_t n) {
+    return _mm256_cvtepi32_ps(_mm256_cvtepi16_epi32(loadWords(p, n)));
+}
+
+/// Asks for the cache line some way behind p; a hint that touches nothing.
+template <class T>
+QORI_INLINE void prefetchAhead(const T* p) {
+    constexpr uintptr_t kBytes = 1024;
+    _mm_prefetch(reinterpret_cast<const char*>(reinterpret_cast<uintptr_t>(p) + kBytes), _MM_HINT_T0);
+}
+
+}  // namespace qori::kernels

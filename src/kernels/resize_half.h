@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+// Means of 2 x 2 pixels: linear and super-sampling resize to exactly half of both lengths, without tables.
+#pragma once
+#include "simd.h"
+
+namespace qori::kernels {
+
+/// dst = a quarter of the sum of each four pixels of the rows a and b. Halves round up, or to even where `toEven`.
+template <int channels>
+void halveRow8u(const uint8_t* a, const uint8_t* b, uint8_t* dst, ptrdiff_t pixels, bool toEven);
+
+/// One channel: both directions weigh both pixels by `weight`, the result is multiplied by `scale`.
+void halveRow32f(const float* a, const float* b, float* dst, ptrdiff_t pixels, float weight, float scale);
+
+}  // namespace qori::kernels

@@ -1,0 +1,311 @@
+// SPDX-License-Identifier: Apache-2.0
+// Histograms with levels given in the call or prepared in a record.
+#include "kernels/histogram.h"
+#include "checks.h"
+#include "driver.h"
+#include "rounding.h"
+
+namespace qori::stats {
+namespace {
+
+template <class T>
+using Level = std::conditional_t<std::is_floating_point_v<T>, float, int32_t>;
+
+template <class T>
+constexpr int32_t kValues = 1 << 8 * sizeof(T);
+
+template <class T>
+constexpr int32_t kLowest = std::is_signed_v<T> ? -kValues<T> / 2 : 0;
+
+/// One channel's levels and bins.
+template <class L>
+struct Channel {
+    const L* levels;
+    int32_t count;
+    int32_t* bins;
+};
+
+/// Whether an array of n pointers or one of its entries is null.
+template <class P>
+bool anyNull(P* pointers, int n) {
+    if (pointers == nullptr) return true;
+    for (int c = 0; c < n; ++c)
+        if (pointers[c] == nullptr) return true;
+    return false;
+}
+
+QorResult levelCountCheck(const int32_t* counts, int n) {
+    for (int c = 0; c < n; ++c)
+        if (counts[c] < 2) return QOR_ERR_HIST_LEVELS;
+    return QOR_OK;
+}
+
+// --- counting -------------------------------------------------------------------------------------------------------
+
+/// Bytes: all 256 values are counted, then the levels are looked at.
+template <Layout layout>
+void countBytes(QorImageSize roi, Image<const uint8_t> src, const Channel<int32_t>* out) {
+    constexpr int n = channels(layout), counted = processedChannels(layout);
+    kernels::ByteCounters<n> counters;
+    forEachRow(
+        roi, [&](ptrdiff_t pixels, const uint8_t* row) { kernels::countBytesRow<n, counted>(counters, row, pixels); },
+        walk(src, n));
+    for (int c = 0; c < counted; ++c) {
+        uint32_t table[256];
+        counters.ofChannel(c, table);
+        kernels::sumBins(table, 256, 0, out[c].levels, out[c].count, out[c].bins);
+    }
+}
+
+/// 16 bits with room for a counter of every value.
+template <class T, int n>
+void countWords(QorImageSize roi, Image<const T> src, const Channel<int32_t>* out, uint32_t* table) {
+    for (int32_t i = 0; i < n * kValues<T>; ++i) table[i] = 0;
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* row) {
+            kernels::countWordsRow<n>(table, reinterpret_cast<const uint16_t*>(row), pixels,
+                                      std::is_signed_v<T> ? 0x8000 : 0);
+        },
+        walk(src, n));
+    for (int c = 0; c < n; ++c)
+        kernels::sumBins(table + c * kValues<T>, kValues<T>, kLowest<T>, out[c].levels, out[c].count, out[c].bins);
+}
+
+/// Element by element, channel by channel.
+template <class T>
+QORI_NOINLINE void countBySearch(QorImageSize roi, int stored, Image<const T> src, Channel<Level<T>> out) {
+    for (int32_t k = 0; k < out.count - 1; ++k) out.bins[k] = 0;
+    const bool ordered = kernels::strictlyIncreasing(out.levels, out.count);
+    const auto finder = [&] {
+        if constexpr (std::is_floating_point_v<T>)
+            return kernels::FloatBins(out.levels, out.count);
+        else
+            return kernels::WordBins(out.levels, ordered ? out.count : 0, kLowest<T>);
+    }();
+    forEachRow(
+        roi,
+        [&](ptrdiff_t pixels, const T* row) {
+            if (ordered) return kernels::countByBinRow(finder, row, pixels, stored, out.count - 1, out.bins);
+            for (ptrdiff_t x = 0; x < pixels; ++x)
+                kernels::countInAllBins<Level<T>>(row[x * stored], out.levels, out.count, out.bins);
+        },
+        walk(src, stored));
+}
+
+template <class T, Layout layout>
+void countDirectly(QorImageSize roi, Image<const T> src, const Channel<Level<T>>* out) {
+    if constexpr (sizeof(T) == 1) {
+        countBytes<layout>(roi, src, out);
+    } else {
+        // The channels of one image; each starts at its own element.
+        for (int c = 0; c < processedChannels(layout); ++c)
+            countBySearch<T>(roi, channels(layout), {src.data + c, src.step}, out[c]);
+    }
+}
+
+// --- levels with the call -------------------------------------------------------------------------------------------
+
+template <class T, class L>
+QorResult directChecks(Image<const T> src, QorImageSize roi, int n, int32_t* const* pHist, L* const* pLevels,
+                       const int32_t* nLevels) {
+    if (isNull(src) || anyNull(pHist, n) || anyNull(pLevels, n) || nLevels == nullptr) return QOR_ERR_NULL_PTR;
+    return firstOf(sizeCheck(roi), stepCheck(src), levelCountCheck(nLevels, n));
+}
+
+template <class T, Layout layout>
+QorResult histogramRange(Image<const T> src, QorImageSize roi, int32_t* const* pHist, const Level<T>* const* pLevels,
+                         const int32_t* nLevels) {
+    constexpr int n = processedChannels(layout);
+    if (QorResult r = directChecks(src, roi, n, pHist, pLevels, nLevels)) return r;
+    Channel<Level<T>> out[n];
+    for (int c = 0; c < n; ++c) out[c] = {pLevels[c], nLevels[c], pHist[c]};
+    countDirectly<T, layout>(roi, src, out);
+    return QOR_OK;
+}
+
+/// The remainder of the division widens the first bins by one each, in the direction of the levels.
+void spaceEvenly(int32_t lower, int32_t upper, int32_t count, int32_t* levels) {
+    const int64_t span = int64_t{upper} - lower, width = span / (count - 1), remainder = span % (count - 1);
+    const int64_t sign = span < 0 ? -1 : 1;
+    int64_t level = lower;
+    for (int32_t k = 0; k < count; ++k) {
+        levels[k] = static_cast<int32_t>(level);
+        level += width + (k < sign * remainder ? sign : 0);
+    }
+}
+
+template <class T, Layout layout>
+QorResult histogramEven(Image<const T> src, QorImageSize roi, int32_t* const* pHist, int32_t* const* pLevels,
+                        const int32_t* nLevels, const int32_t* lowerLevel, const int32_t* upperLevel) {
+    constexpr int n = processedChannels(layout);
+    if (lowerLevel == nullptr || upperLevel == nullptr) return QOR_ERR_NULL_PTR;
+    if (QorResult r = directChecks(src, roi, n, pHist, pLevels, nLevels)) return r;
+    Channel<int32_t> out[n];
+    for (int c = 0; c < n; ++c) {
+        spaceEvenly(lowerLevel[c], upperLevel[c], nLevels[c], pLevels[c]);
+        out[c] = {pLevels[c], nLevels[c], pHist[c]};
+    }
+    countDirectly<T, layout>(roi, src, out);
+    return QOR_OK;
+}
+
+// --- levels in a record ---------------------------------------------------------------------------------------------
+
+/// The record: 12 words, then the level arrays of the channels one after another.
+struct Record {
+    static constexpr uint32_t kIdentifier = 0x74736968;  // "hist" in memory
+
+    int32_t dataType;
+    int32_t channels;
+    int32_t uniform;
+    uint32_t identifier;
+    int32_t counts[4];
+    /// Where the arrays lie: addresses where 32 bits hold them, else offsets from the record.
+    uint32_t places[4];
+
+    template <class L>
+    L* levels(int channel) {
+        uint8_t* at = reinterpret_cast<uint8_t*>(this + 1);
+        for (int c = 0; c < channel; ++c) at += ptrdiff_t{counts[c]} * 4;
+        return reinterpret_cast<L*>(at);
+    }
+    uint32_t place(int channel) {
+        const uint8_t* const at = levels<uint8_t>(channel);
+        if constexpr (sizeof(void*) == 4)
+            return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(at));
+        else
+            return static_cast<uint32_t>(at - reinterpret_cast<const uint8_t*>(this));
+    }
+    void begin(int32_t type, int32_t n, int32_t isUniform, const int32_t* nLevels) {
+        *this = {type, n, isUniform, kIdentifier, {}, {}};
+        for (int c = 0; c < n; ++c) counts[c] = nLevels[c];
+        for (int c = 0; c < n; ++c) places[c] = place(c);
+    }
+};
+static_assert(sizeof(Record) == 48);
+
+Record* recordOf(QorHistogramSpec* pSpec) { return reinterpret_cast<Record*>(pSpec); }
+Record* recordOf(const QorHistogramSpec* pSpec) { return recordOf(const_cast<QorHistogramSpec*>(pSpec)); }
+
+QorResult channelCheck(int32_t n) { return n == 1 || n == 3 || n == 4 ? QOR_OK : QOR_ERR_CHANNELS_UNSUPPORTED; }
+
+QorResult typeCheck(int32_t type) {
+    return type == qor8u || type == qor16u || type == qor16s || type == qor32f ? QOR_OK : QOR_ERR_DATA_TYPE;
+}
+
+/// Truncation towards zero; what does not fit becomes the least integer.
+int32_t truncated(float value) { return _mm_cvttss_si32(_mm_set_ss(value)); }
+int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(value)); }
+
+QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t,
+                         int32_t* pSpecSize, int32_t* pBufferSize) {
+    if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels)))
+        return r;
+    if (QorResult r = levelCountCheck(nLevels, numChannels)) return r;
+    uint32_t words = sizeof(Record) / 4;
+    for (int c = 0; c < numChannels; ++c) words += static_cast<uint32_t>(nLevels[c]);
+    *pSpecSize = static_cast<int32_t>(4 * words);
+    const int32_t values = dataType == qor8u                          ? kValues<uint8_t>
+                           : dataType == qor16u || dataType == qor16s ? kValues<uint16_t>
+                                                                      : 0;
+    *pBufferSize = 4 * values * numChannels;
+    return typeCheck(dataType);
+}
+
+QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int32_t* nLevels, int32_t numChannels,
+                        QorHistogramSpec* pSpec) {
+    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelCheck(numChannels)))
+        return r;
+    for (int c = 0; c < numChannels; ++c) {
+        if (QorResult r = firstOf(nullCheck(pLevels[c]), levelCountCheck(nLevels + c, 1))) return r;
+        if (!kernels::strictlyIncreasing(pLevels[c], nLevels[c])) return QOR_ERR_BAD_RANGE;
+    }
+    Record* const record = recordOf(pSpec);
+    record->begin(dataType, numChannels, 0, nLevels);
+    for (int c = 0; c < numChannels; ++c)
+        for (int32_t k = 0; k < nLevels[c]; ++k) {
+            if (dataType == qor32f)
+                record->levels<float>(c)[k] = pLevels[c][k];
+            else
+                record->levels<int32_t>(c)[k] = truncated(pLevels[c][k]);
+        }
+    return QOR_OK;
+}
+
+void spaceUniformly(float lower, float upper, int32_t count, float* levels) {
+    const float width = (upper - lower) / static_cast<float>(count - 1);
+    for (int32_t k = 1; k < count - 1; ++k)
+        levels[k] = static_cast<float>(__builtin_fma(double(k), double(width), double(lower)));
+    levels[0] = lower;
+    levels[count - 1] = upper;
+}
+
+/// Returns the width of a bin.
+double spaceUniformly(float lower, float upper, int32_t count, int32_t* levels) {
+    const double width = (double(upper) - double(lower)) / (count - 1);
+    for (int32_t k = 1; k < count - 1; ++k) levels[k] = truncated(k * width + double(lower));
+    levels[0] = truncated(lower);
+    levels[count - 1] = truncated(upper);
+    return width;
+}
+
+QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const float* pUpperLevel,
+                               const int32_t* nLevels, int32_t numChannels, QorHistogramSpec* pSpec) {
+    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLowerLevel, pUpperLevel, nLevels, pSpec),
+                              channelCheck(numChannels)))
+        return r;
+    for (int c = 0; c < numChannels; ++c) {
+        if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
+        if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
+    }
+    return underDefaultRounding([&]() -> QorResult {
+        Record* const record = recordOf(pSpec);
+        record->begin(dataType, numChannels, 1, nLevels);
+        QorResult result = QOR_OK;
+        for (int c = 0; c < numChannels; ++c) {
+            if (dataType == qor32f)
+                spaceUniformly(pLowerLevel[c], pUpperLevel[c], nLevels[c], record->levels<float>(c));
+            else if (spaceUniformly(pLowerLevel[c], pUpperLevel[c], nLevels[c], record->levels<int32_t>(c)) < 1.0)
+                result = QOR_WARN_ADJUSTED;
+        }
+        return result;
+    });
+}
+
+QorResult histogramLevels(const QorHistogramSpec* pSpec, float* const* ppLevels) {
+    if (QorResult r = nullCheck(pSpec, ppLevels)) return r;
+    Record* const record = recordOf(pSpec);
+    if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
+    if (anyNull(ppLevels, record->channels)) return QOR_ERR_NULL_PTR;
+    return underDefaultRounding([&] {
+        for (int c = 0; c < record->channels; ++c)
+            for (int32_t k = 0; k < record->counts[c]; ++k)
+                ppLevels[c][k] = record->dataType == qor32f ? record->levels<float>(c)[k]
+                                                            : static_cast<float>(record->levels<int32_t>(c)[k]);
+        return QOR_OK;
+    });
+}
+
+template <class T, Layout layout>
+QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist, const QorHistogramSpec* pSpec,
+                    uint8_t* pBuffer) {
+    constexpr int n = channels(layout);
+    if (isNull(src) || anyNull(pHist, n) || pSpec == nullptr || pBuffer == nullptr) return QOR_ERR_NULL_PTR;
+    if (QorResult r = firstOf(sizeCheck(roi), stepCheck(src))) return r;
+    if (src.step < int64_t{roi.width} * n * elementBytes<T>) return QOR_ERR_STEP;
+    Record* const record = recordOf(pSpec);
+    if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
+    Channel<Level<T>> out[n];
+    for (int c = 0; c < n; ++c) out[c] = {record->levels<Level<T>>(c), record->counts[c], pHist[c]};
+    if constexpr (sizeof(T) == 2)
+        countWords<T, n>(roi, src, out, reinterpret_cast<uint32_t*>(pBuffer));
+    else
+        countDirectly<T, layout>(roi, src, out);
+    return QOR_OK;
+}
+
+}  // namespace
+}  // namespace qori::stats
+
+#include "entries/histogram.inc"

@@ -1,0 +1,296 @@
+// SPDX-License-Identifier: Apache-2.0
+// Norms, sums, means and dot products: a quantity is accumulated per channel over the region, then finished in double
+// precision.
+#include "checks.h"
+#include "driver.h"
+#include "kernels/reduce_measures.h"
+#include "kernels/reduce_sequential.h"
+#include "rounding.h"
+
+namespace qori::stats {
+namespace {
+
+enum class Quantity { largest, magnitudes, squares, values, products };
+
+/// Channels in memory and channels asked for.
+struct Channels {
+    int stored, results;
+};
+
+template <Layout layout>
+constexpr Channels channelsOf{channels(layout), processedChannels(layout)};
+
+template <class T>
+struct Type {
+    using type = T;
+};
+
+/// The measure of a quantity; `single` where there is one channel.
+template <Quantity quantity, class T, bool single>
+constexpr auto chooseMeasure() {
+    constexpr bool bytes = single && std::is_same_v<T, uint8_t>;
+    if constexpr (quantity == Quantity::largest)
+        return Type<kernels::Largest<T>>{};
+    else if constexpr (bytes && quantity == Quantity::squares)
+        return Type<kernels::ByteSquares>{};
+    else if constexpr (bytes && quantity == Quantity::products)
+        return Type<kernels::ByteProducts>{};
+    else if constexpr (bytes)
+        return Type<kernels::ByteMagnitudes>{};
+    else if constexpr (quantity == Quantity::magnitudes)
+        return Type<kernels::Magnitudes<T>>{};
+    else if constexpr (quantity == Quantity::squares)
+        return Type<kernels::Squares<T>>{};
+    else if constexpr (quantity == Quantity::values)
+        return Type<kernels::Values<T>>{};
+    else
+        return Type<kernels::Products<T>>{};
+}
+
+template <Quantity quantity>
+constexpr auto chooseAccurateMeasure() {
+    if constexpr (quantity == Quantity::magnitudes)
+        return Type<kernels::AccurateMagnitudes>{};
+    else if constexpr (quantity == Quantity::squares)
+        return Type<kernels::AccurateSquares>{};
+    else if constexpr (quantity == Quantity::values)
+        return Type<kernels::AccurateValues>{};
+    else
+        return Type<kernels::AccurateProducts>{};
+}
+
+/// Calls use(measure) with the measure that the type and the hint ask for.
+template <Quantity quantity, class T, bool single, class Use>
+void withMeasure(int32_t hint, Use use) {
+    if constexpr (std::is_same_v<T, float> && quantity != Quantity::largest) {
+        if (hint == hintAccurate) return use(chooseAccurateMeasure<quantity>());
+    }
+    use(chooseMeasure<quantity, T, single>());
+}
+
+/// Rounded once. The words are converted apart, as there is no 64-bit conversion on 32-bit targets.
+double toDouble(uint64_t value) {
+    return static_cast<double>(static_cast<uint32_t>(value >> 32)) * 4'294'967'296.0 +
+           static_cast<double>(static_cast<uint32_t>(value));
+}
+double toDouble(int64_t value) {
+    return static_cast<double>(static_cast<int32_t>(value >> 32)) * 4'294'967'296.0 +
+           static_cast<double>(static_cast<uint32_t>(value));
+}
+template <class T>
+double toDouble(T value) {
+    return static_cast<double>(value);
+}
+
+struct Totals {
+    double of[4];
+};
+
+template <class Accumulators>
+Totals finish(Accumulators& sums, Channels n) {
+    sums.finish(n.stored);
+    Totals totals{};
+    for (int c = 0; c < n.results; ++c) totals.of[c] = toDouble(sums.total(c));
+    return totals;
+}
+
+template <Quantity quantity, class T, bool single, class... Sources>
+QORI_NOINLINE Totals accumulate(QorImageSize roi, Channels n, int32_t hint, Sources... sources) {
+    Totals totals;
+    withMeasure<quantity, T, single>(hint, [&]<class Measure>(Type<Measure>) {
+        kernels::AccumulatorsOf<Measure> sums;
+        forEachRow(
+            roi,
+            [&](ptrdiff_t pixels, auto... rows) {
+                kernels::reduceRow<Measure>(sums, n.stored, pixels * n.stored, rows...);
+            },
+            walk(sources, n.stored)...);
+        totals = finish(sums, n);
+    });
+    return totals;
+}
+
+template <Quantity quantity, class T, Layout layout, class... Sources>
+Totals totalsOf(QorImageSize roi, int32_t hint, Sources... sources) {
+    return accumulate<quantity, T, channels(layout) == 1>(roi, channelsOf<layout>, hint, sources...);
+}
+
+template <Quantity quantity>
+double rooted(double total) {
+    return quantity == Quantity::squares ? __builtin_sqrt(total) : total;
+}
+
+// --- sums and means -------------------------------------------------------------------------------------------------
+
+template <class T, Layout layout>
+QorResult sum(Image<const T> src, QorImageSize roi, double* pSum, int32_t hint = hintFast) {
+    if (QorResult r = firstOf(nullCheck(src, pSum), sizeCheck(roi))) return r;
+    return underDefaultRounding([&] {
+        const Totals totals = totalsOf<Quantity::values, T, layout>(roi, hint, src);
+        for (int c = 0; c < processedChannels(layout); ++c) pSum[c] = totals.of[c];
+        return QOR_OK;
+    });
+}
+
+template <class T, Layout layout>
+QorResult mean(Image<const T> src, QorImageSize roi, double* pMean, int32_t hint = hintFast) {
+    if (isNull(pMean)) return QOR_ERR_NULL_PTR;
+    double sums[4];
+    if (QorResult r = sum<T, layout>(src, roi, sums, hint)) return r;
+    return underDefaultRounding([&] {
+        const auto product = static_cast<int32_t>(static_cast<uint32_t>(roi.width) * static_cast<uint32_t>(roi.height));
+        const double pixels = product;
+        if constexpr (layout == Layout::C1) {
+            *pMean = sums[0] / pixels;
+        } else {
+            const double reciprocal = 1.0 / pixels;
+            for (int c = 0; c < processedChannels(layout); ++c) pMean[c] = sums[c] * reciprocal;
+        }
+        return QOR_OK;
+    });
+}
+
+// --- norms ----------------------------------------------------------------------------------------------------------
+
+template <Quantity quantity, class T, Layout layout, class... Sources>
+QorResult norm(QorImageSize roi, double* pValue, int32_t hint, Sources... sources) {
+    if (QorResult r = firstOf(nullCheck(sources..., pValue), sizeCheck(roi), stepCheck(sources...))) return r;
+    return underDefaultRounding([&] {
+        const Totals totals = totalsOf<quantity, T, layout>(roi, hint, sources...);
+        for (int c = 0; c < processedChannels(layout); ++c) pValue[c] = rooted<quantity>(totals.of[c]);
+        return QOR_OK;
+    });
+}
+
+struct Ratio {
+    Totals numerators, denominators;
+};
+
+/// Both norms of a relative one, piece by piece, so that the second source is still in the cache when it is read again.
+template <Quantity quantity, class T, bool single>
+QORI_NOINLINE Ratio accumulateRatio(QorImageSize roi, Channels n, int32_t hint, Image<const T> src1,
+                                    Image<const T> src2) {
+    // A multiple of every round of vectors and of 3 and 4 channels.
+    constexpr ptrdiff_t kPiece = 8'192 / static_cast<ptrdiff_t>(sizeof(T)) / 192 * 192;
+    Ratio ratio;
+    withMeasure<quantity, T, single>(hint, [&]<class Measure>(Type<Measure>) {
+        kernels::AccumulatorsOf<Measure> differences, references;
+        forEachRow(
+            roi,
+            [&](ptrdiff_t pixels, const T* a, const T* b) {
+                const ptrdiff_t elements = pixels * n.stored;
+                for (ptrdiff_t i = 0; i < elements; i += kPiece) {
+                    const ptrdiff_t piece = std::min(kPiece, elements - i);
+                    kernels::reduceRow<Measure>(differences, n.stored, piece, a + i, b + i);
+                    kernels::reduceRow<Measure>(references, n.stored, piece, b + i);
+                }
+            },
+            walk(src1, n.stored), walk(src2, n.stored));
+        ratio = {finish(differences, n), finish(references, n)};
+    });
+    return ratio;
+}
+
+template <Quantity quantity, class T, Layout layout>
+QorResult relativeNorm(QorImageSize roi, double* pValue, int32_t hint, Image<const T> src1, Image<const T> src2) {
+    if (QorResult r = firstOf(nullCheck(src1, src2, pValue), sizeCheck(roi), stepCheck(src1, src2))) return r;
+    return underDefaultRounding([&] {
+        constexpr double kSmallestNormal = 2.2250738585072014e-308;
+        const Ratio ratio =
+            accumulateRatio<quantity, T, channels(layout) == 1>(roi, channelsOf<layout>, hint, src1, src2);
+        QorResult result = QOR_OK;
+        for (int c = 0; c < processedChannels(layout); ++c) {
+            double value = ratio.numerators.of[c];
+            if (ratio.denominators.of[c] < kSmallestNormal)
+                result = QOR_WARN_DIV_BY_ZERO;
+            else
+                value /= ratio.denominators.of[c];
+            pValue[c] = rooted<quantity>(value);
+        }
+        return result;
+    });
+}
+
+// Named operations, as the registry calls them.
+template <class T, Layout layout>
+QorResult normInf(Image<const T> src, QorImageSize roi, double* pValue) {
+    return norm<Quantity::largest, T, layout>(roi, pValue, hintFast, src);
+}
+template <class T, Layout layout>
+QorResult normL1(Image<const T> src, QorImageSize roi, double* pValue, int32_t hint = hintFast) {
+    return norm<Quantity::magnitudes, T, layout>(roi, pValue, hint, src);
+}
+template <class T, Layout layout>
+QorResult normL2(Image<const T> src, QorImageSize roi, double* pValue, int32_t hint = hintFast) {
+    return norm<Quantity::squares, T, layout>(roi, pValue, hint, src);
+}
+template <class T, Layout layout>
+QorResult normDiffInf(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue) {
+    return norm<Quantity::largest, T, layout>(roi, pValue, hintFast, src1, src2);
+}
+template <class T, Layout layout>
+QorResult normDiffL1(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                     int32_t hint = hintFast) {
+    return norm<Quantity::magnitudes, T, layout>(roi, pValue, hint, src1, src2);
+}
+template <class T, Layout layout>
+QorResult normDiffL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                     int32_t hint = hintFast) {
+    return norm<Quantity::squares, T, layout>(roi, pValue, hint, src1, src2);
+}
+template <class T, Layout layout>
+QorResult normRelInf(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue) {
+    return relativeNorm<Quantity::largest, T, layout>(roi, pValue, hintFast, src1, src2);
+}
+template <class T, Layout layout>
+QorResult normRelL1(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                    int32_t hint = hintFast) {
+    return relativeNorm<Quantity::magnitudes, T, layout>(roi, pValue, hint, src1, src2);
+}
+template <class T, Layout layout>
+QorResult normRelL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pValue,
+                    int32_t hint = hintFast) {
+    return relativeNorm<Quantity::squares, T, layout>(roi, pValue, hint, src1, src2);
+}
+
+// --- dot products ---------------------------------------------------------------------------------------------------
+
+template <class T, Layout layout>
+QorResult dotProduct(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pDp, int32_t hint = hintFast) {
+    constexpr int n = channels(layout);
+    constexpr bool refusesZeroSteps = std::is_same_v<T, uint8_t> && layout == Layout::C1;
+    if (QorResult r = firstOf(nullCheck(src1, src2, pDp), sizeCheck(roi))) return r;
+    if (refusesZeroSteps && (src1.step == 0 || src2.step == 0)) return QOR_ERR_SIZE;
+    return underDefaultRounding([&] {
+        Totals totals{};
+        if constexpr (std::is_integral_v<T> && sizeof(T) == 4) {
+            forEachRow(
+                roi,
+                [&](ptrdiff_t pixels, const T* a, const T* b) {
+                    kernels::sequentialDotRow<n>(totals.of, pixels, a, b);
+                },
+                walk(src1, n), walk(src2, n));
+        } else {
+            totals = totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
+        }
+        for (int c = 0; c < processedChannels(layout); ++c) pDp[c] = totals.of[c];
+        return QOR_OK;
+    });
+}
+
+template <class T>
+QorResult sumWeightedRows(const T* const* rows, const T* weights, int32_t count, T* dst, int32_t length) {
+    if (QorResult r = nullCheck(rows, weights, dst)) return r;
+    if (length < 1 || count < 1) return QOR_ERR_SIZE;
+    for (int32_t i = 0; i < count; ++i)
+        if (isNull(rows[i])) return QOR_ERR_NULL_PTR;
+    return underDefaultRounding([&] {
+        kernels::weightedRows(dst, length, rows, weights, count);
+        return QOR_OK;
+    });
+}
+
+}  // namespace
+}  // namespace qori::stats
+
+#include "entries/norms.inc"

@@ -1,0 +1,590 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "resize_jobs.h"
+
+namespace qori::test {
+namespace {
+
+using reference::Tap;
+
+template <class T>
+T drawPixel() {
+    if constexpr (std::is_floating_point_v<T>)
+        return static_cast<T>(static_cast<int32_t>(random().bits())) / T(1 << 20);
+    else
+        return random().value<T>();
+}
+
+/// A source with memory beyond it on the open sides only, as wide as the filter reaches.
+template <class T, int channels>
+struct Source {
+    Job job;
+    int left, top;
+    TestImage image;
+
+    explicit Source(const Job& j)
+        : job(j),
+          left(j.open(borderReadLeft) ? reachX() : 0),
+          top(j.open(borderReadTop) ? reachY() : 0),
+          image(kSrc, shape(), channels * int{sizeof(T)}) {
+        image.fill<T>(channels, drawPixel<T>);
+    }
+    int reachX() const { return reference::halfWidth(job.method, job.src.width, job.dst.width); }
+    int reachY() const { return reference::halfWidth(job.method, job.src.height, job.dst.height); }
+    Shape shape() const {
+        return {.width = job.src.width + left + (job.open(borderReadRight) ? reachX() : 0),
+                .height = job.src.height + top + (job.open(borderReadBottom) ? reachY() : 0),
+                .padding = random().below(3) * random().below(40),
+                .flipped = random().oneIn(3),
+                .atBegin = random().oneIn(2),
+                .shift = random().below(3)};
+    }
+    const T* pixel(int x, int y) const {
+        return reinterpret_cast<const T*>(image.data<uint8_t>() + ptrdiff_t{image.step()} * (top + y) +
+                                          ptrdiff_t{int{sizeof(T)} * channels} * (left + x));
+    }
+    T get(int x, int y, int c) const {
+        if (!job.open(borderReadLeft)) x = std::max(x, 0);
+        if (!job.open(borderReadRight)) x = std::min(x, job.src.width - 1);
+        if (!job.open(borderReadTop)) y = std::max(y, 0);
+        if (!job.open(borderReadBottom)) y = std::min(y, job.src.height - 1);
+        return image.view<T>(channels).get(left + x, top + y, c);
+    }
+};
+
+/// Exact for nearest and linear 8u, else within rounding and the error of the sums.
+template <class T, class Fetch>
+void expectPixel(const Job& job, const std::vector<Tap>& columns, const std::vector<Tap>& rows, Fetch fetch, T actual) {
+    if (job.method.interpolation == interpNearest) {
+        const T expected = fetch(columns[0].index, rows[0].index);
+        EXPECT_EQ(0, std::memcmp(&expected, &actual, sizeof(T)));
+        return;
+    }
+    if constexpr (std::is_same_v<T, uint8_t>)
+        if (job.method.interpolation == interpLinear && !job.method.antialiasing) {
+            EXPECT_EQ(reference::linear8u(columns, rows, fetch), actual);
+            return;
+        }
+    const reference::Weighted w = reference::weigh(columns, rows, fetch);
+    const double unit = std::is_same_v<T, double> ? 0x1p-53 : 0x1p-24;
+    if constexpr (std::is_floating_point_v<T>) {
+        EXPECT_LE(std::abs(static_cast<double>(actual) - w.value), w.error * unit);
+    } else {
+        const double value = std::clamp<double>(w.value, std::numeric_limits<T>::min(), std::numeric_limits<T>::max());
+        EXPECT_LE(std::abs(actual - value), 0.5 + w.error * unit) << "expected about " << value << ", got " << +actual;
+    }
+}
+
+template <class T, int channels>
+void expectImage(const Source<T, channels>& source, const TestImage& dst) {
+    const Job& job = source.job;
+    std::vector<std::vector<Tap>> columns;
+    for (int x = 0; x < job.dst.width; ++x)
+        columns.push_back(reference::taps(job.method, job.src.width, job.dst.width, x));
+    for (int y = 0; y < job.dst.height; ++y) {
+        const std::vector<Tap> rows = reference::taps(job.method, job.src.height, job.dst.height, y);
+        for (int x = 0; x < job.dst.width; ++x)
+            for (int c = 0; c < channels; ++c) {
+                expectPixel<T>(
+                    job, columns[static_cast<size_t>(x)], rows, [&](int sx, int sy) { return source.get(sx, sy, c); },
+                    dst.view<T>(channels).get(x, y, c));
+                if (testing::Test::HasFailure()) FAIL() << "at pixel (" << x << ", " << y << ") channel " << c;
+            }
+    }
+}
+
+/// A work buffer of exactly the size that a tile takes.
+template <class T>
+uint8_t* makeBuffer(const QorResizePlan* plan, QorImageSize tile, int channels) {
+    int32_t bytes = -1;
+    EXPECT_EQ(QOR_OK, call(Exports<T>::getBufferSize, plan, tile, channels, &bytes));
+    return block(kBuffer, bytes, random().below(64)).template data<uint8_t>();
+}
+
+/// The bounding box of what a destination rectangle is made of.
+QorImageRect tapBox(const Job& job, QorImageRect dst) {
+    const auto ends = [&](int srcLength, int dstLength, int from, int count, int& first, int& length) {
+        first = std::max(0, reference::taps(job.method, srcLength, dstLength, from).front().index);
+        length =
+            std::min(srcLength - 1, reference::taps(job.method, srcLength, dstLength, from + count - 1).back().index) -
+            first + 1;
+    };
+    QorImageRect box;
+    ends(job.src.width, job.dst.width, dst.x, dst.width, box.x, box.width);
+    ends(job.src.height, job.dst.height, dst.y, dst.height, box.y, box.height);
+    return box;
+}
+
+/// Makes a tile from a copy of the source rectangle that the query reports, and of nothing else.
+template <class T, int channels, class Function>
+void runTileAlone(Function function, const Source<T, channels>& source, const TestImage& dst, QorImageRect tile,
+                  const QorResizePlan* plan) {
+    const Job& job = source.job;
+    QorImageRect from, trimmed;
+    ASSERT_EQ(QOR_OK, call(Exports<T>::getSrcRoi, plan, tile, &from, &trimmed));
+    ASSERT_EQ(0, std::memcmp(&tile, &trimmed, sizeof tile));
+    const QorImageRect box = tapBox(job, tile);
+    ASSERT_EQ(0, std::memcmp(&box, &from, sizeof box));
+    QorPoint2D at;
+    ASSERT_EQ(QOR_OK, call(Exports<T>::getSrcOffset, plan, QorPoint2D{tile.x, tile.y}, &at));
+    ASSERT_EQ(int64_t{tile.x} * job.src.width / job.dst.width, at.x);
+    ASSERT_EQ(int64_t{tile.y} * job.src.height / job.dst.height, at.y);
+    const TestImage part(
+        kTileSrc,
+        {.width = from.width, .height = from.height, .padding = random().below(9), .atBegin = random().oneIn(2)},
+        channels * int{sizeof(T)});
+    for (int y = 0; y < from.height; ++y)
+        for (int x = 0; x < from.width; ++x)
+            for (int c = 0; c < channels; ++c)
+                part.view<T>(channels).set(x, y, c, source.get(from.x + x, from.y + y, c));
+    constexpr ptrdiff_t pixel = int{sizeof(T)} * channels;
+    const auto* src = part.data<uint8_t>() + ptrdiff_t{part.step()} * (at.y - from.y) + pixel * (at.x - from.x);
+    auto* to = dst.data<uint8_t>() + ptrdiff_t{dst.step()} * tile.y + pixel * tile.x;
+    const QorImageSize size{tile.width, tile.height};
+    ASSERT_EQ(QOR_OK,
+              operate<T>(function, reinterpret_cast<const T*>(src), part.step(), reinterpret_cast<T*>(to), dst.step(),
+                         {tile.x, tile.y}, size, job.border, plan, makeBuffer<T>(plan, size, channels)));
+}
+
+/// A random partition of the destination, in random order.
+std::vector<QorImageRect> tiling(QorImageSize size) {
+    const auto cuts = [](int length) {
+        std::vector<int> at{0};
+        while (at.back() < length) at.push_back(std::min(length, at.back() + 1 + random().below(length)));
+        return at;
+    };
+    const std::vector<int> xs = cuts(size.width), ys = cuts(size.height);
+    std::vector<QorImageRect> tiles;
+    for (size_t j = 0; j + 1 < ys.size(); ++j)
+        for (size_t i = 0; i + 1 < xs.size(); ++i)
+            tiles.insert(tiles.begin() + random().below(static_cast<int>(tiles.size()) + 1),
+                         {xs[i], ys[j], xs[i + 1] - xs[i], ys[j + 1] - ys[j]});
+    return tiles;
+}
+
+template <class T, int channels, class Function>
+void checkJob(Function function, const Job& job) {
+    SCOPED_TRACE(describe(job));
+    const Source<T, channels> source(job);
+    const Snapshot sourceBefore = source.image.snapshot();
+    const QorResizePlan* plan = makePlan<T>(job.method, job.src, job.dst);
+    const TestImage dst(kDst,
+                        {.width = job.dst.width,
+                         .height = job.dst.height,
+                         .padding = random().below(20),
+                         .flipped = random().oneIn(3),
+                         .atBegin = random().oneIn(2)},
+                        channels * int{sizeof(T)});
+    const Snapshot untouched = dst.snapshot();
+    ASSERT_EQ(QOR_OK, operate<T>(function, source.pixel(0, 0), source.image.step(), dst.data<T>(), dst.step(), {0, 0},
+                                 job.dst, job.border, plan, makeBuffer<T>(plan, job.dst, channels)));
+    expectImage(source, dst);
+    QORI_EXPECT_UNCHANGED(source.image, sourceBefore);
+    // In tiles, cleared first: the same bytes, and none around them.
+    Snapshot whole = dst.snapshot();
+    dst.fill<T>(channels, [] { return T{}; });
+    for (const QorImageRect& tile : tiling(job.dst)) {
+        if (job.border == borderReplicate) {
+            runTileAlone<T, channels>(function, source, dst, tile, plan);
+            continue;
+        }
+        QorPoint2D at;
+        ASSERT_EQ(QOR_OK, call(Exports<T>::getSrcOffset, plan, QorPoint2D{tile.x, tile.y}, &at));
+        const QorImageSize size{tile.width, tile.height};
+        auto* to = dst.data<uint8_t>() + ptrdiff_t{dst.step()} * tile.y + ptrdiff_t{int{sizeof(T)} * channels} * tile.x;
+        ASSERT_EQ(QOR_OK, operate<T>(function, source.pixel(at.x, at.y), source.image.step(), reinterpret_cast<T*>(to),
+                                     dst.step(), {tile.x, tile.y}, size, job.border, plan,
+                                     makeBuffer<T>(plan, size, channels)));
+    }
+    QORI_EXPECT_UNCHANGED(dst, whole);
+    Snapshot cleared = whole;
+    const auto blank = cleared.view<T>(channels), before = const_cast<Snapshot&>(untouched).view<T>(channels);
+    for (int y = 0; y < job.dst.height; ++y)
+        for (int x = 0; x < job.dst.width; ++x)
+            for (int c = 0; c < channels; ++c) blank.set(x, y, c, before.get(x, y, c));
+    EXPECT_EQ(untouched.bytes, cleared.bytes) << "written around the destination";
+}
+
+/// Pairs of lengths: every ratio of small ones, powers and near-powers of two, the vector sizes, reductions by a lot.
+QorImageSize drawLengths(int least, bool reducesOnly) {
+    static constexpr int kFixed[][2] = {{2, 1}, {3, 2}, {1, 2}, {4, 1}, {5, 4}, {1, 1}, {9, 1}, {2, 3}};
+    int src, dst;
+    if (random().oneIn(2)) {
+        const auto& fixed = kFixed[random().below(8)];
+        const int times = 1 + random().below(random().oneIn(4) ? 60 : 12);
+        src = fixed[0] * times;
+        dst = fixed[1] * times;
+    } else {
+        src = 1 + random().below(random().oneIn(4) ? 400 : 40);
+        dst = 1 + random().below(random().oneIn(4) ? 150 : 40);
+    }
+    src = std::max(src, least);
+    return {src, reducesOnly ? std::min(src, dst) : dst};
+}
+
+Job drawJob(Method method) {
+    const int least = method.interpolation == interpLanczos  ? 2 * method.lobes
+                      : method.interpolation == interpCubic  ? 4
+                      : method.interpolation == interpLinear ? 2
+                                                             : 1;
+    const bool reduces = method.interpolation == interpSuper;
+    const QorImageSize x = drawLengths(least, reduces);
+    QorImageSize y = drawLengths(least, reduces);
+    while (y.width > 90) y = drawLengths(least, reduces);
+    Job job{method, {x.width, y.width}, {x.height, std::min(y.height, 90)}};
+    const bool bordered = method.interpolation != interpNearest && !reduces;
+    if (bordered && random().oneIn(2))
+        job.border = random().oneIn(4) ? borderReadAll : borderReplicate | 16 * random().below(16);
+    return job;
+}
+
+/// The initialiser and the queries by which a compared image was made.
+template <class T>
+void markUsed(const Method& m) {
+    const std::string kind = m.interpolation == interpNearest  ? "Nearest"
+                             : m.interpolation == interpLinear ? "Linear"
+                             : m.interpolation == interpCubic  ? "Cubic"
+                             : m.interpolation == interpSuper  ? "Super"
+                                                               : "Lanczos";
+    const std::string type = std::string("_") + Exports<T>::suffix;
+    markSwept(m.antialiasing ? ("qoriResizeAntialiasing" + kind + "Init").c_str()
+                             : ("qoriResize" + kind + "Init" + type).c_str());
+    for (const char* query : {"GetBufferSize", "GetSrcOffset", "GetSrcRoi"})
+        markSwept(("qoriResize" + (query + type)).c_str());
+}
+
+/// Wide enough for rows to be done in several strips.
+Job drawWideJob(Method method) {
+    const bool reduces = method.interpolation == interpSuper;
+    const int32_t src = 3000 + random().below(6000), dst = 2500 + random().below(2500);
+    return {method, {src, 6 + random().below(3)}, {reduces ? std::min(src, dst) : dst, 1 + random().below(6)}};
+}
+
+template <class T, int channels, class Function>
+void sweep(const char* name, Function function, const std::vector<Method>& methods, int jobs) {
+    constexpr int kWide = 4;
+    for (int i = 0; i < jobs + kWide && !testing::Test::HasFailure(); ++i) {
+        const Method& method = methods[static_cast<size_t>(i) % methods.size()];
+        checkJob<T, channels>(function, i < jobs ? drawJob(method) : drawWideJob(method));
+    }
+    markSwept(name);
+    for (const Method& m : methods) markUsed<T>(m);
+}
+
+constexpr float kThird = 1.0f / 3;
+const std::vector<Method> kCubics = {{.interpolation = interpCubic, .b = 0, .c = 0.5f},
+                                     {.interpolation = interpCubic, .b = 1, .c = 0},
+                                     {.interpolation = interpCubic, .b = 0.5f, .c = 0.3f},
+                                     {.interpolation = interpCubic, .b = kThird, .c = kThird}};
+const std::vector<Method> kLanczoses = {{.interpolation = interpLanczos, .lobes = 2},
+                                        {.interpolation = interpLanczos, .lobes = 3}};
+
+std::vector<Method> antialiasingMethods() {
+    std::vector<Method> all = kCubics;
+    all.insert(all.end(), kLanczoses.begin(), kLanczoses.end());
+    all.push_back({.interpolation = interpLinear});
+    for (Method& m : all) m.antialiasing = true;
+    return all;
+}
+
+// What each operation of the registry is swept with; a new one does not compile until it is here.
+#define QORI_METHODS(operation, methods, jobs)             \
+    template <class T, int channels, class Function>       \
+    void operation(const char* name, Function function) {  \
+        sweep<T, channels>(name, function, methods, jobs); \
+    }
+QORI_METHODS(resizeNearest, {Method{.interpolation = interpNearest}}, 240)
+QORI_METHODS(resizeLinear, {Method{.interpolation = interpLinear}}, 240)
+QORI_METHODS(resizeCubic, kCubics, 160)
+QORI_METHODS(resizeLanczos, kLanczoses, 160)
+QORI_METHODS(resizeSuper, {Method{.interpolation = interpSuper}}, 200)
+QORI_METHODS(resizeAntialiasing, antialiasingMethods(), 210)
+#undef QORI_METHODS
+
+#define QORI_SWEEP_(...)
+#define QORI_SWEEP_R(name, operation, S, SL) \
+    TEST(ResizeSweep, name) { operation<S, channels(Layout::SL)>(#name, &name); }
+#define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) QORI_SWEEP_##kind(name, operation, S, SL)
+#include "members/resize.inc"
+#undef QORI_MEMBER
+#undef QORI_SWEEP_
+#undef QORI_SWEEP_R
+
+// --- queries --------------------------------------------------------------------------------------------------------
+
+template <class T>
+class ResizeQueries : public testing::Test {};
+using Elements = testing::Types<uint8_t, uint16_t, int16_t, float, double>;
+TYPED_TEST_SUITE(ResizeQueries, Elements);
+
+TYPED_TEST(ResizeQueries, PlanSizesFollowTheirFormulas) {
+    using E = Exports<TypeParam>;
+    const auto sizes = [](QorImageSize dst, int32_t interpolation) {
+        std::pair<int32_t, int32_t> result{-1, -1};
+        EXPECT_EQ(QOR_OK,
+                  call(E::getSize, QorImageSize{4000, 4000}, dst, interpolation, 0, &result.first, &result.second));
+        return result;
+    };
+    using Pair = std::pair<int32_t, int32_t>;
+    const QorImageSize odd{33, 65};  // rounded up: 64 and 96
+    EXPECT_EQ(Pair(4 * 160 + 244, 64), sizes(odd, interpNearest));
+    EXPECT_EQ(Pair(8 * 160 + 244, 64), sizes(odd, interpLinear));
+    EXPECT_EQ(Pair(4 * 160 + 4 * (256 + 384) + 244, 4 * 160 + 64), sizes(odd, interpCubic));
+    EXPECT_EQ(Pair(4 * 160 + 4 * (384 + 576) + 244, 4 * 160 + 64), sizes(odd, interpLanczos));
+    EXPECT_EQ(Pair(4 * 64 + 4 * (128 + 128) + 244, 4 * 64 + 64), sizes({1, 1}, interpCubic));
+    EXPECT_EQ(Pair(8 * 4000 * 2 + 244, 64), sizes({4000, 4000}, interpLinear));
+    markSwept((std::string("qoriResizeGetSize_") + E::suffix).c_str());
+}
+
+TYPED_TEST(ResizeQueries, RefusesSizesBeyond32Bits) {
+    using E = Exports<TypeParam>;
+    int32_t plan = 7, init = 7;
+    const auto status = [&](QorImageSize dst, int32_t interpolation, int32_t antialiasing) {
+        return call(E::getSize, QorImageSize{1 << 29, 1 << 29}, dst, interpolation, antialiasing, &plan, &init);
+    };
+    // 8 * (W + H) + 244 reaches 2^31 at W + H = 2^28 - 30; lengths count in steps of 32.
+    EXPECT_EQ(QOR_ERR_SIZE, status({(1 << 28) - 32, 1}, interpLinear, 0));
+    EXPECT_EQ(QOR_ERR_SIZE, status({1 << 29, 1 << 29}, interpNearest, 0));
+    EXPECT_EQ(QOR_ERR_SIZE, status({1 << 27, 1}, interpCubic, 0));
+    EXPECT_EQ(QOR_ERR_SIZE, status({4, 1 << 28}, interpLanczos, 0));
+    EXPECT_EQ(QOR_ERR_SIZE, status({1 << 10, 1 << 10}, interpLanczos, 1));  // 12 taps per source pixel
+    EXPECT_EQ(7, plan);
+    EXPECT_EQ(7, init);
+    EXPECT_EQ(QOR_OK, status({(1 << 28) - 96, 1}, interpLinear, 0));
+    EXPECT_EQ(8 * ((1 << 28) - 64) + 244, plan);
+}
+
+TYPED_TEST(ResizeQueries, BordersAreTheReachOfTheFilter) {
+    using E = Exports<TypeParam>;
+    const auto expectBorder = [](const Method& m, QorImageSize src, QorImageSize dst) {
+        QorBorderExtent border{-1, -1, -1, -1};
+        EXPECT_EQ(QOR_OK, call(E::getBorderSize, makePlan<TypeParam>(m, src, dst), &border));
+        const int x = reference::halfWidth(m, src.width, dst.width),
+                  y = reference::halfWidth(m, src.height, dst.height);
+        EXPECT_TRUE(border.left == x && border.right == x && border.top == y && border.bottom == y) << m.interpolation;
+    };
+    expectBorder({.interpolation = interpLinear}, {60, 50}, {20, 90});
+    expectBorder({.interpolation = interpLinear, .antialiasing = true}, {60, 50}, {20, 90});
+    expectBorder({.interpolation = interpCubic, .antialiasing = true}, {61, 50}, {20, 19});
+    expectBorder({.interpolation = interpLanczos, .antialiasing = true, .lobes = 3}, {61, 50}, {20, 19});
+    if constexpr (!std::is_same_v<TypeParam, double>) {
+        expectBorder({.interpolation = interpNearest}, {60, 50}, {20, 90});
+        expectBorder({.interpolation = interpSuper}, {60, 50}, {20, 30});
+        expectBorder({.interpolation = interpCubic}, {60, 50}, {20, 90});
+        for (int lobes : {2, 3}) expectBorder({.interpolation = interpLanczos, .lobes = lobes}, {60, 50}, {20, 90});
+    }
+    markSwept((std::string("qoriResizeGetBorderSize_") + E::suffix).c_str());
+}
+
+TEST(Resize, IdentityMovesPixels) {
+    for (int32_t interpolation : {interpNearest, interpLinear, interpCubic, interpLanczos, interpSuper}) {
+        const Job job{{.interpolation = interpolation}, {37, 9}, {37, 9}};
+        const Source<uint8_t, 3> source(job);
+        const QorResizePlan* plan = makePlan<uint8_t>(job.method, job.src, job.dst);
+        const TestImage dst(kDst, {.width = 37, .height = 9}, 3);
+        const auto run = [&](auto function) {
+            return operate<uint8_t>(function, source.pixel(0, 0), source.image.step(), dst.data<uint8_t>(), dst.step(),
+                                    {0, 0}, job.dst, job.border, plan, makeBuffer<uint8_t>(plan, job.dst, 3));
+        };
+        EXPECT_EQ(QOR_OK, interpolation == interpNearest  ? run(qoriResizeNearest_8u_C3R)
+                          : interpolation == interpLinear ? run(qoriResizeLinear_8u_C3R)
+                          : interpolation == interpCubic  ? run(qoriResizeCubic_8u_C3R)
+                          : interpolation == interpSuper  ? run(qoriResizeSuper_8u_C3R)
+                                                          : run(qoriResizeLanczos_8u_C3R));
+        for (int y = 0; y < 9; ++y)
+            for (int x = 0; x < 37; ++x)
+                for (int c = 0; c < 3; ++c)
+                    ASSERT_EQ(source.get(x, y, c), dst.view<uint8_t>(3).get(x, y, c)) << interpolation;
+    }
+}
+
+TEST(Resize, MeansOfFourRoundTiesToEven) {
+    // Every sum of four bytes, in 8u and in the wider type whose plan takes the general way.
+    const QorImageSize src{2 * 1021, 2}, dst{1021, 1};
+    const TestImage bytes(kSrc, {.width = src.width, .height = 2}, 1),
+        words(kTileSrc, {.width = src.width, .height = 2}, 2);
+    for (int x = 0; x < src.width; ++x)
+        for (int y = 0; y < 2; ++y) {
+            const int sum = x / 2, place = 2 * y + x % 2, value = (sum + place) / 4;
+            bytes.view<uint8_t>(1).set(x, y, 0, static_cast<uint8_t>(value));
+            words.view<uint16_t>(1).set(x, y, 0, static_cast<uint16_t>(value));
+        }
+    const TestImage means(kDst, {.width = dst.width, .height = 1}, 1),
+        wide(kPlanCopy, {.width = dst.width, .height = 1}, 2);
+    const Method method{.interpolation = interpSuper};
+    const QorResizePlan* plan = makePlan<uint8_t>(method, src, dst);
+    ASSERT_EQ(QOR_OK,
+              operate<uint8_t>(qoriResizeSuper_8u_C1R, bytes.data<uint8_t>(), bytes.step(), means.data<uint8_t>(),
+                               means.step(), {0, 0}, dst, 0, plan, makeBuffer<uint8_t>(plan, dst, 1)));
+    plan = makePlan<uint16_t>(method, src, dst);
+    ASSERT_EQ(QOR_OK,
+              operate<uint16_t>(qoriResizeSuper_16u_C1R, words.data<uint16_t>(), words.step(), wide.data<uint16_t>(),
+                                wide.step(), {0, 0}, dst, 0, plan, makeBuffer<uint16_t>(plan, dst, 1)));
+    for (int sum = 0; sum <= 1020; ++sum) {
+        const int whole = sum / 4, rest = sum % 4, expected = whole + (rest == 3 || (rest == 2 && whole % 2 == 1));
+        ASSERT_EQ(expected, means.view<uint8_t>(1).get(sum, 0)) << sum;
+        ASSERT_EQ(expected, wide.view<uint16_t>(1).get(sum, 0)) << sum;
+    }
+}
+
+// --- statuses -------------------------------------------------------------------------------------------------------
+
+TEST(Resize, SizeQueryChecksInOrder) {
+    const TestImage out = block(kBuffer, 8);
+    int32_t *plan = out.data<int32_t>(), *init = plan + 1;
+    const QorImageSize ok{10, 10}, none{0, 10}, negative{10, -1};
+    const auto status = [&](QorImageSize src, QorImageSize dst, int32_t interpolation, int32_t antialiasing) {
+        return qoriResizeGetSize_16s(src, dst, interpolation, antialiasing, plan, init);
+    };
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetSize_8u(none, ok, 3, 0, nullptr, init));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetSize_8u(none, ok, 3, 0, plan, nullptr));
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, status(negative, none, 3, 0));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status(ok, negative, 3, 0));
+    for (int32_t bad : {-1, 3, 4, 5, 7, 9, 15, 17, INT32_MAX})
+        QORI_EXPECT_STATUS(QOR_ERR_INTERPOLATION, out, status(ok, ok, bad, 1));
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status(ok, ok, 0, 0));
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status(ok, ok, interpNearest, -1));
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, status({1, 1}, ok, interpSuper, 2));  // before the sizes of super
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({1, 2}, ok, interpLinear, 0));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({9, 3}, ok, interpCubic, 1));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({3, 9}, ok, interpLanczos, 0));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status({10, 9}, ok, interpSuper, 0));
+    EXPECT_EQ(QOR_OK, status({1, 1}, ok, interpNearest, 0));
+    EXPECT_EQ(QOR_OK, status({2, 2}, ok, interpLinear, 0));
+    EXPECT_EQ(QOR_OK, status({4, 4}, ok, interpLanczos, 1));
+    EXPECT_EQ(QOR_OK, status(ok, ok, interpSuper, 0));
+}
+
+TEST(Resize, InitialisersCheckInOrder) {
+    const TestImage out = block(kPlan, 4096), scratch = block(kInit, 4096);
+    auto* plan = out.data<QorResizePlan>();
+    auto* init = scratch.data<uint8_t>();
+    const QorImageSize ok{10, 10}, none{10, 0}, negative{-1, 10};
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeNearestInit_8u(none, ok, nullptr));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeCubicInit_32f(none, ok, 0, 0.5f, plan, nullptr));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeLanczosInit_16u(none, ok, 4, plan, nullptr));
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, qoriResizeNearestInit_16s(negative, none, plan));
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, qoriResizeLanczosInit_8u(none, ok, 4, plan, init));
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, qoriResizeAntialiasingLinearInit(none, ok, plan, init));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeNearestInit_32f(ok, negative, plan));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeLanczosInit_8u(negative, ok, 4, plan, init));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeLinearInit_64f({1, 10}, ok, plan));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeCubicInit_8u({10, 3}, ok, 0, 0.5f, plan, init));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeAntialiasingCubicInit({3, 10}, ok, 0, 0.5f, plan, init));
+    for (uint32_t lobes : {0u, 1u, 4u, 0x80000002u}) {
+        QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out, qoriResizeLanczosInit_16s({3, 3}, ok, lobes, plan, init));
+        QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, out,
+                           qoriResizeAntialiasingLanczosInit({3, 3}, ok, lobes, plan, init));
+    }
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeLanczosInit_32f({3, 10}, ok, 2, plan, init));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeAntialiasingLanczosInit({10, 5}, ok, 3, plan, init));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeSuperInit_8u({10, 9}, ok, plan));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, qoriResizeSuperInit_16u({9, 10}, ok, plan));
+}
+
+/// A plan of 20 x 20 to 12 x 15, and the arguments of a call with it that fits.
+struct Fixture {
+    const QorResizePlan* plan;
+    TestImage src, dst, memory;
+
+    explicit Fixture(const Method& m)
+        : plan(makePlan<uint8_t>(m, {20, 20}, {12, 15})),
+          src(kSrc, {.width = 20, .height = 20}, 1),
+          dst(kDst, {.width = 64, .height = 40}, 1),
+          memory(block(kBuffer, 1 << 17)) {
+        src.fill<uint8_t>(1, drawPixel<uint8_t>);
+    }
+    template <class Function>
+    QorResult run(Function function, QorPoint2D offset, QorImageSize size, int32_t border = borderReplicate) const {
+        return operate<uint8_t>(function, src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(), offset,
+                                size, border, plan, memory.data<uint8_t>());
+    }
+};
+
+TEST(Resize, OperationsCheckInOrder) {
+    const Fixture f({.interpolation = interpLinear});
+    const auto linear = qoriResizeLinear_8u_C1R;
+    const auto* s = f.src.data<uint8_t>();
+    auto *d = f.dst.data<uint8_t>(), *b = f.memory.data<uint8_t>();
+    const QorImageSize ok{12, 15}, none{0, -1};
+    const QorPoint2D zero{0, 0}, outside{12, 0};
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, f.dst, linear(nullptr, 20, d, 64, outside, none, 2, nullptr, f.plan, b));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, f.dst, linear(s, 20, nullptr, 64, outside, none, 2, nullptr, f.plan, b));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, f.dst, linear(s, 20, d, 64, outside, none, 2, nullptr, nullptr, b));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, f.dst, linear(s, 20, d, 64, outside, none, 2, nullptr, f.plan, nullptr));
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, f.dst, f.run(linear, outside, none, 2));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, f.dst, f.run(linear, outside, {4, -1}, 2));
+    const QorPoint2D badOffsets[] = {{-1, 0}, {0, -1}, outside, {0, 15}, {INT32_MIN, 0}};
+    for (QorPoint2D bad : badOffsets) QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, f.dst, f.run(linear, bad, ok, 2));
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(qoriResizeCubic_8u_C1R, zero, ok, 0x100));
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(qoriResizeNearest_8u_C1R, zero, ok));
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(qoriResizeAntialiasing_8u_C1R, zero, ok));
+    for (int32_t bad : {8, 9, 0x101, -1, 1 << 30})
+        QORI_EXPECT_STATUS(QOR_ERR_BORDER, f.dst, f.run(linear, zero, ok, bad));
+    for (int32_t bad : {0, 2, 3, 4, 5, 7, 0xF0, 0x10})
+        QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, f.dst, f.run(linear, zero, ok, bad));
+    const Fixture widened({.interpolation = interpLinear, .antialiasing = true});
+    QORI_EXPECT_STATUS(QOR_ERR_UNSUPPORTED_MODE, widened.dst, widened.run(linear, zero, ok));
+    // Another tag: nothing takes the block for a plan, and the tag is looked at before the size.
+    const TestImage other = block(kPlanCopy, 1024);
+    auto* fake = other.data<QorResizePlan>();
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, f.dst, linear(s, 20, d, 64, zero, {3, 0}, 1, nullptr, fake, b));
+    QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, f.dst, linear(s, 20, d, 64, outside, {3, -1}, 1, nullptr, fake, b));
+    QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, f.dst, qoriResizeSuper_8u_C1R(s, 20, d, 64, outside, {3, -1}, fake, b));
+}
+
+TEST(Resize, QueriesOfAPlanCheckInOrder) {
+    const Fixture f({.interpolation = interpCubic});
+    const TestImage other = block(kPlanCopy, 1024), out = block(kInit, 64);
+    auto* fake = other.data<QorResizePlan>();
+    auto* bytes = out.data<int32_t>();
+    const auto size = [&](const QorResizePlan* plan, QorImageSize tile, int32_t channels) {
+        return qoriResizeGetBufferSize_16u(plan, tile, channels, bytes);
+    };
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, size(nullptr, {0, 1}, 3));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetBufferSize_8u(fake, {0, 1}, 3, nullptr));
+    QORI_EXPECT_STATUS(QOR_WARN_NOTHING_TO_DO, out, size(fake, {0, 1}, 2));
+    QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, out, size(fake, {-1, 1}, 2));
+    for (int32_t channels : {0, 2, 5, -1})
+        QORI_EXPECT_STATUS(QOR_ERR_CHANNELS_UNSUPPORTED, out, size(f.plan, {-1, 1}, channels));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, size(f.plan, {1, -1}, 3));
+    EXPECT_EQ(QOR_OK, size(f.plan, {12, 15}, 3));
+    EXPECT_EQ(QOR_WARN_ADJUSTED, size(f.plan, {13, 15}, 3));
+    EXPECT_EQ(QOR_WARN_ADJUSTED, size(f.plan, {12, 16}, 3));
+    auto* border = out.data<QorBorderExtent>();
+    auto* point = out.data<QorPoint2D>();
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetBorderSize_8u(nullptr, border));
+    QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, out, qoriResizeGetBorderSize_8u(fake, border));
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, qoriResizeGetSrcOffset_32f(fake, {0, 0}, nullptr));
+    QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, out, qoriResizeGetSrcOffset_32f(fake, {-1, 0}, point));
+    const QorPoint2D badOffsets[] = {{-1, 0}, {0, -1}, {12, 0}, {0, 15}};
+    for (QorPoint2D bad : badOffsets)
+        QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, out, qoriResizeGetSrcOffset_32f(f.plan, bad, point));
+    auto* rects = out.data<QorImageRect>();
+    const auto roi = [&](const QorResizePlan* plan, QorImageRect rect) {
+        return qoriResizeGetSrcRoi_16s(plan, rect, rects, rects + 1);
+    };
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, roi(nullptr, {0, 0, 0, 0}));
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, roi(fake, {-1, 0, 0, 1}));
+    QORI_EXPECT_STATUS(QOR_ERR_CONTEXT, out, roi(fake, {-1, 0, 1, 1}));
+    QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, out, roi(f.plan, {-1, 0, 1, 1}));
+    QORI_EXPECT_STATUS(QOR_ERR_OUT_OF_RANGE, out, roi(f.plan, {0, 15, 1, 1}));
+    ASSERT_EQ(QOR_OK, roi(f.plan, {10, 3, 500, INT32_MAX}));
+    EXPECT_EQ(2, rects[1].width);
+    EXPECT_EQ(12, rects[1].height);
+}
+
+TEST(Resize, TilesBeyondTheDestinationAreTrimmed) {
+    const Fixture f({.interpolation = interpNearest});
+    const Snapshot untouched = f.dst.snapshot();
+    EXPECT_EQ(QOR_WARN_ADJUSTED, f.run(qoriResizeNearest_8u_C1R, {0, 0}, {13, 15}));
+    EXPECT_EQ(QOR_WARN_ADJUSTED, f.run(qoriResizeNearest_8u_C1R, {0, 0}, {12, 40}));
+    EXPECT_EQ(QOR_OK, f.run(qoriResizeNearest_8u_C1R, {5, 0}, {12, 15}));
+    Snapshot expected = f.dst.snapshot();  // only the plan's 12 x 15 pixels may differ
+    const auto now = expected.view<uint8_t>(1), before = const_cast<Snapshot&>(untouched).view<uint8_t>(1);
+    for (int y = 0; y < 15; ++y)
+        for (int x = 0; x < 12; ++x) now.set(x, y, 0, before.get(x, y));
+    EXPECT_EQ(untouched.bytes, expected.bytes);
+}
+
+}  // namespace
+}  // namespace qori::test

@@ -1,0 +1,366 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "harness/sweep.h"
+#include "reference/stats.h"
+
+namespace qori::test {
+namespace {
+
+enum class Measure { largest, magnitudes, squares, values, products };
+
+constexpr int resultsOf(Layout layout) { return layout == Layout::AC4 ? 3 : channels(layout); }
+
+/// Floats of moderate size, which a sum of any length does not carry to infinity; integers of any size.
+template <class T>
+T draw() {
+    if constexpr (std::is_floating_point_v<T>)
+        return static_cast<T>(static_cast<int32_t>(random().bits())) / static_cast<T>(1 << 20);
+    else
+        return random().value<T>();
+}
+
+/// Roundings between an element and the result: the difference or product, the additions of the busiest of `lanes`
+/// partial sums, the pairwise additions of 96 lanes at most, the final conversions. Integers: the conversions.
+template <class T>
+double relativeError(const Shape& shape, int n, bool accurate) {
+    const double kUnit = std::ldexp(1.0, std::is_integral_v<T> || accurate ? -53 : -24);
+    if (std::is_integral_v<T>) return 2 * kUnit;
+    const int lanes = accurate ? 24 : 48;
+    return kUnit * (2 + double(shape.height) * ((shape.width * n + lanes - 1) / lanes) + 7 + 2);
+}
+
+/// What the terms of a measure add up to, in channel values a and (where there is a second image) b, else empty.
+template <Measure measure, class T>
+reference::Sum<T> expectedTotal(const std::vector<T>& a, const std::vector<T>& b) {
+    using Number = typename reference::Sum<T>::Number;
+    const auto number = [&](size_t i) { return static_cast<Number>(a[i]); };
+    const auto difference = [&](size_t i) { return b.empty() ? number(i) : number(i) - static_cast<Number>(b[i]); };
+    const auto magnitude = [&](size_t i) { return difference(i) < 0 ? -difference(i) : difference(i); };
+    if constexpr (measure == Measure::values)
+        return reference::sumOf(a, number);
+    else if constexpr (measure == Measure::magnitudes)
+        return reference::sumOf(a, magnitude);
+    else if constexpr (measure == Measure::squares)
+        return reference::sumOf(a, [&](size_t i) { return difference(i) * difference(i); });
+    else if constexpr (measure == Measure::products)
+        return reference::sumOf(a, [&](size_t i) { return number(i) * static_cast<Number>(b[i]); });
+    else {
+        Number best = 0;
+        for (size_t i = 0; i < a.size(); ++i)  // differences of floats are single precision here
+            best = std::max(best,
+                            std::is_integral_v<T> ? magnitude(i) : static_cast<Number>(static_cast<T>(magnitude(i))));
+        return {best, best};
+    }
+}
+
+/// Calls with or without the hint, as the export has it.
+template <class Function, class... Arguments>
+QorResult callWith(int32_t hint, Function function, Arguments... arguments) {
+    if constexpr (std::is_invocable_v<Function, Arguments..., int32_t>)
+        return call(function, arguments..., hint);
+    else
+        return call(function, arguments...);
+}
+
+template <class Function, class T>
+constexpr bool isBinary =
+    std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*> ||
+    std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*, int32_t>;
+
+/// One channel of a call: its elements, what came out, and the status that the call should have.
+template <class T>
+struct Channel {
+    std::vector<T> a, b;
+    double result;
+    double relativeError;
+    QorResult* expectedStatus;
+};
+
+template <class T, Layout layout, class Function, class Check>
+void runMember(Function function, const Shape& shape, int32_t hint, Check check) {
+    constexpr int n = channels(layout);
+    constexpr bool binary = isBinary<Function, T>;
+    TestImage src1(0, shape, n * static_cast<int>(sizeof(T))), src2(1, shape, n * static_cast<int>(sizeof(T)));
+    src1.fill<T>(n, draw<T>);
+    src2.fill<T>(n, draw<T>);
+    const Snapshot before1 = src1.snapshot(), before2 = src2.snapshot();
+    double results[5] = {-7, -7, -7, -7, -7};
+    QorResult status, expectedStatus = QOR_OK;
+    if constexpr (binary)
+        status =
+            callWith(hint, function, src1.data<T>(), src1.step(), src2.data<T>(), src2.step(), shape.roi(), results);
+    else
+        status = callWith(hint, function, src1.data<T>(), src1.step(), shape.roi(), results);
+    const double relative = relativeError<T>(shape, n, hint == hintAccurate);
+    for (int c = 0; c < resultsOf(layout); ++c) {
+        SCOPED_TRACE("channel " + std::to_string(c));
+        const auto b = binary ? reference::channel(src2.view<T>(n), shape.roi(), c) : std::vector<T>{};
+        check(
+            Channel<T>{reference::channel(src1.view<T>(n), shape.roi(), c), b, results[c], relative, &expectedStatus});
+    }
+    EXPECT_EQ(expectedStatus, status);
+    for (int c = resultsOf(layout); c < 5; ++c) EXPECT_EQ(-7, results[c]) << "a result that nobody asked for";
+    QORI_EXPECT_UNCHANGED(src1, before1);
+    QORI_EXPECT_UNCHANGED(src2, before2);
+}
+
+/// Rows that follow upwards are left out where steps must be positive.
+template <class T, Layout layout, class Function, class Check>
+void sweepMember(const char* name, Function function, bool anyStep, Check check) {
+    for (int32_t hint : {int32_t{hintFast}, int32_t{hintAccurate}, -1}) {
+        forShapes(smallShapes(), [&](const Shape& shape) {
+            if (!shape.flipped || anyStep) runMember<T, layout>(function, shape, hint, check);
+        });
+        if (std::is_integral_v<T>) break;
+    }
+    markSwept(name);
+}
+
+template <Measure measure, class T, Layout layout, class Function>
+void sweepNorm(const char* name, Function function, bool anyStep) {
+    sweepMember<T, layout>(name, function, anyStep, [](const Channel<T>& channel) {
+        const auto expected = expectedTotal<measure>(channel.a, channel.b);
+        const double total = measure == Measure::squares ? channel.result * channel.result : channel.result;
+        const bool exact = measure == Measure::largest || (std::is_integral_v<T> && measure != Measure::squares);
+        EXPECT_NEAR(static_cast<double>(expected.total), total,
+                    exact ? 0 : channel.relativeError * static_cast<double>(expected.magnitude));
+    });
+}
+
+template <Measure measure, class T, Layout layout, class Function>
+void sweepRelative(const char* name, Function function) {
+    sweepMember<T, layout>(name, function, false, [](const Channel<T>& channel) {
+        double expected = static_cast<double>(expectedTotal<measure>(channel.a, channel.b).total);
+        const auto denominator = static_cast<double>(expectedTotal<measure, T>(channel.b, {}).total);
+        if (denominator == 0)
+            *channel.expectedStatus = QOR_WARN_DIV_BY_ZERO;
+        else
+            expected /= denominator;
+        const double value = measure == Measure::squares ? channel.result * channel.result : channel.result;
+        // The errors of numerator and denominator, of the quotient, of the root and of its square here.
+        const double roundings = 4 * std::ldexp(1.0, -53);
+        EXPECT_NEAR(expected, value,
+                    (measure == Measure::largest ? roundings : 2.01 * channel.relativeError + roundings) * expected);
+    });
+}
+
+#define QORI_SWEEP(operation, ...)                        \
+    template <class T, Layout layout, class Function>     \
+    void operation(const char* name, Function function) { \
+        __VA_ARGS__;                                      \
+    }
+QORI_SWEEP(sum, sweepNorm<Measure::values, T, layout>(name, function, true))
+QORI_SWEEP(normInf, sweepNorm<Measure::largest, T, layout>(name, function, false))
+QORI_SWEEP(normL1, sweepNorm<Measure::magnitudes, T, layout>(name, function, false))
+QORI_SWEEP(normL2, sweepNorm<Measure::squares, T, layout>(name, function, false))
+QORI_SWEEP(normDiffInf, sweepNorm<Measure::largest, T, layout>(name, function, false))
+QORI_SWEEP(normDiffL1, sweepNorm<Measure::magnitudes, T, layout>(name, function, false))
+QORI_SWEEP(normDiffL2, sweepNorm<Measure::squares, T, layout>(name, function, false))
+QORI_SWEEP(normRelInf, sweepRelative<Measure::largest, T, layout>(name, function))
+QORI_SWEEP(normRelL1, sweepRelative<Measure::magnitudes, T, layout>(name, function))
+QORI_SWEEP(normRelL2, sweepRelative<Measure::squares, T, layout>(name, function))
+
+template <class T, Layout layout, class Function>
+void mean(const char* name, Function function) {
+    sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) {
+        const auto sum = expectedTotal<Measure::values, T>(channel.a, {});
+        const auto pixels = static_cast<double>(channel.a.size());
+        const auto total = static_cast<double>(sum.total);
+        if (std::is_integral_v<T>)
+            EXPECT_EQ(layout == Layout::C1 ? total / pixels : total * (1 / pixels), channel.result);
+        else
+            EXPECT_NEAR(total / pixels, channel.result,
+                        channel.relativeError * static_cast<double>(sum.magnitude) / pixels);
+    });
+}
+
+template <class T, Layout layout, class Function>
+void dotProduct(const char* name, Function function) {
+    if constexpr (sizeof(T) < 4 || std::is_floating_point_v<T>) {
+        sweepNorm<Measure::products, T, layout>(name, function, true);
+    } else {
+        sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) {
+            double expected = 0;
+            for (size_t i = 0; i < channel.a.size(); ++i)
+                expected += static_cast<double>(channel.a[i]) * static_cast<double>(channel.b[i]);
+            EXPECT_EQ(expected, channel.result);
+        });
+    }
+}
+
+template <class T>
+void checkWeightedRows(QorResult(QORI_CALL* function)(const T* const*, const T*, int32_t, T*, int32_t)) {
+    for (int count : {1, 2, 3, 7})
+        forShapes(smallShapes(), [&](const Shape& shape) {
+            const Shape row{.width = shape.width, .atBegin = shape.atBegin, .shift = shape.shift};
+            std::vector<TestImage> images;
+            std::vector<const T*> rows;
+            T weights[7];
+            for (int i = 0; i < count; ++i) {
+                images.emplace_back(i, row, static_cast<int>(sizeof(T)));
+                images.back().template fill<T>(1, draw<T>);
+                rows.push_back(images.back().template data<T>());
+                weights[i] = draw<T>();
+            }
+            TestImage dst(7, row, static_cast<int>(sizeof(T)));
+            Snapshot expected = dst.snapshot();
+            for (int x = 0; x < row.width; ++x) {
+                T sum = weights[0] * images[0].template view<T>(1).get(x, 0);
+                for (int i = 1; i < count; ++i) {
+                    const T product = weights[i] * images[static_cast<size_t>(i)].template view<T>(1).get(x, 0);
+                    sum += product;
+                }
+                expected.template view<T>(1).set(x, 0, 0, sum);
+            }
+            ASSERT_EQ(QOR_OK,
+                      call(function, rows.data(), static_cast<const T*>(weights), count, dst.data<T>(), row.width));
+            QORI_EXPECT_UNCHANGED(dst, expected);
+        });
+}
+
+template <class, Layout, class Function>
+void sumWeightedRows(const char* name, Function function) {
+    checkWeightedRows(function);
+    markSwept(name);
+}
+
+#define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
+    TEST(NormsSweep, name) { operation<S, Layout::SL>(#name, &name); }
+#include "members/norms.inc"
+#undef QORI_MEMBER
+
+/// `pixels` equal elements; rows may overlap, so that regions far larger than the memory are seen.
+template <class T>
+std::vector<T> constant(T value, int pixels, int n) {
+    return std::vector<T>(static_cast<size_t>(pixels) * static_cast<size_t>(n), value);
+}
+
+TEST(Norms, IntegerTotalsOutgrowEveryLane) {
+    double r[4] = {};
+    {  // 2^32 pixels; the C3 and C4 sums fill their 16- and 32-bit lanes
+        const auto row = constant<uint8_t>(255, 65'536 + 8'192, 4);
+        ASSERT_EQ(QOR_OK, qoriSum_8u_C1R(row.data(), 0, {65'536, 65'536}, r));
+        EXPECT_EQ(255 * 4'294'967'296.0, r[0]);
+        ASSERT_EQ(QOR_OK, qoriSum_8u_C4R(row.data(), 0, {65'536, 8'192}, r));
+        for (double sum : r) EXPECT_EQ(255 * 536'870'912.0, sum);
+        const auto dark = constant<uint8_t>(0, 65'536 + 1'000, 1);
+        ASSERT_EQ(QOR_OK, qoriNormDiff_L2_8u_C1R(row.data(), 1, dark.data(), 1, {65'536, 1'000}, r));
+        EXPECT_EQ(255 * std::sqrt(65'536'000.0), r[0]);
+        ASSERT_EQ(QOR_OK, qoriNorm_L2_8u_C3R(row.data(), 1, {65'536, 100}, r));
+        for (int c = 0; c < 3; ++c) EXPECT_EQ(255 * std::sqrt(6'553'600.0), r[c]);
+        ASSERT_EQ(QOR_OK, qoriDotProd_8u64f_C1R(row.data(), 1, row.data(), -0x7FFFFFFF - 1, {65'536, 1}, r));
+        EXPECT_EQ(65'025 * 65'536.0, r[0]);
+    }
+    constexpr QorImageSize kRoi{40'001, 120};  // 4,800,120 pixels
+    constexpr uint64_t kPixels = 4'800'120;
+    const auto bright = constant<uint16_t>(65'535, 40'001 + 120, 4);
+    ASSERT_EQ(QOR_OK, qoriSum_16u_C3R(bright.data(), 2, kRoi, r));
+    for (int c = 0; c < 3; ++c) EXPECT_EQ(65'535.0 * kPixels, r[c]);
+    constexpr double kSquares = static_cast<double>(65'535ull * 65'535 * kPixels);  // above 2^53: rounded once
+    ASSERT_EQ(QOR_OK, qoriDotProd_16u64f_C4R(bright.data(), 2, bright.data(), 0, kRoi, r));
+    for (double product : r) EXPECT_EQ(kSquares, product);
+    ASSERT_EQ(QOR_OK, qoriNorm_L2_16u_C1R(bright.data(), 2, kRoi, r));
+    EXPECT_EQ(std::sqrt(kSquares), r[0]);
+    const auto lowest = constant<int16_t>(-32'768, 40'001 + 120, 3),
+               highest = constant<int16_t>(32'767, 40'001 + 120, 3);
+    ASSERT_EQ(QOR_OK, qoriSum_16s_C1R(lowest.data(), 2, kRoi, r));
+    EXPECT_EQ(-32'768.0 * kPixels, r[0]);
+    ASSERT_EQ(QOR_OK, qoriDotProd_16s64f_C3R(lowest.data(), 2, highest.data(), 2, kRoi, r));
+    for (int c = 0; c < 3; ++c) EXPECT_EQ(-32'768.0 * 32'767 * kPixels, r[c]);
+    ASSERT_EQ(QOR_OK, qoriNormDiff_L1_16s_C3R(lowest.data(), 2, highest.data(), 2, kRoi, r));
+    for (int c = 0; c < 3; ++c) EXPECT_EQ(65'535.0 * kPixels, r[c]);
+    const auto bytes = constant<int8_t>(-128, 40'001 + 120, 1);
+    ASSERT_EQ(QOR_OK, qoriDotProd_8s64f_C1R(bytes.data(), 1, bytes.data(), 1, kRoi, r));
+    EXPECT_EQ(16'384.0 * kPixels, r[0]);
+}
+
+TEST(Norms, AccurateFloatSumsCountPastSinglePrecision) {
+    const auto ones = constant<float>(1.0f, 16'777'217, 1);
+    double sum = 0;
+    EXPECT_EQ(QOR_OK, qoriSum_32f_C1R(ones.data(), 4, {16'777'217, 1}, &sum, hintAccurate));
+    EXPECT_EQ(16'777'217.0, sum);
+}
+
+TEST(Norms, MagnitudesOfLowestValues) {
+    double r = 0;
+    const int16_t lowest16 = INT16_MIN;
+    const int32_t lowest32 = INT32_MIN;
+    EXPECT_EQ(QOR_OK, qoriNorm_Inf_16s_C1R(&lowest16, 2, {1, 1}, &r));
+    EXPECT_EQ(32'768.0, r);
+    EXPECT_EQ(QOR_OK, qoriNorm_Inf_32s_C1R(&lowest32, 4, {1, 1}, &r));
+    EXPECT_EQ(2'147'483'648.0, r);
+}
+
+TEST(Norms, NotANumberCountsInSumsAndIsIgnoredInTheLargest) {
+    std::vector<float> row(101, 2.0f);
+    row[57] = std::nanf("");
+    double r = 0;
+    for (int32_t hint : {int32_t{hintFast}, int32_t{hintAccurate}}) {
+        EXPECT_EQ(QOR_OK, qoriSum_32f_C1R(row.data(), 404, {101, 1}, &r, hint));
+        EXPECT_TRUE(std::isnan(r));
+    }
+    EXPECT_EQ(QOR_OK, qoriNorm_Inf_32f_C1R(row.data(), 404, {101, 1}, &r));
+    EXPECT_EQ(2.0, r);
+}
+
+TEST(Norms, RelativeToZeroWarnsAndGivesTheDifference) {
+    const int16_t a[6] = {3, 5, -4, 0, 0, 0}, zeros[6] = {}, second[6] = {0, 2, 0, 0, 0, 0};
+    const float f[2] = {3, -4}, tiny[2] = {1e-45f, 0}, none[2] = {};
+    double r[3] = {};
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, qoriNormRel_L2_16s_C1R(a, 12, zeros, 12, {3, 1}, r));
+    EXPECT_EQ(std::sqrt(50.0), r[0]);
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, qoriNormRel_Inf_16s_C1R(a, 12, zeros, 12, {3, 1}, r));
+    EXPECT_EQ(5.0, r[0]);
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, qoriNormRel_L1_16s_C3R(a, 12, second, 12, {2, 1}, r));
+    EXPECT_EQ(3.0, r[0]);
+    EXPECT_EQ(1.5, r[1]);  // one channel's zero does not keep the others from being divided
+    EXPECT_EQ(4.0, r[2]);
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, qoriNormRel_L2_32f_C1R(f, 8, none, 8, {2, 1}, r, hintAccurate));
+    EXPECT_EQ(5.0, r[0]);
+    EXPECT_EQ(QOR_OK, qoriNormRel_Inf_32f_C1R(f, 8, tiny, 8, {2, 1}, r));  // subnormal, but not in double precision
+    EXPECT_EQ(4.0 / static_cast<double>(1e-45f), r[0]);
+}
+
+TEST(Norms, ChecksPointersSizesThenSteps) {
+    const uint8_t pixel[4] = {1, 2, 3, 4};
+    const uint8_t* none = nullptr;
+    double r[4] = {-7, -7, -7, -7};
+    const QorImageSize empty{0, 0}, one{1, 1};
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriSum_8u_C1R(none, 1, empty, r));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriSum_8u_C1R(pixel, 1, empty, nullptr));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriMean_8u_C1R(none, 1, empty, nullptr));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriMean_8u_C4R(none, 1, empty, r));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriNormDiff_L1_8u_C1R(pixel, 1, none, 1, empty, r));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriDotProd_8u64f_C1R(none, 0, pixel, 0, empty, r));
+    for (QorImageSize bad : {QorImageSize{0, 1}, QorImageSize{1, 0}, QorImageSize{INT32_MIN, 1}, QorImageSize{1, -1}}) {
+        EXPECT_EQ(QOR_ERR_SIZE, qoriSum_8u_C1R(pixel, 0, bad, r));
+        EXPECT_EQ(QOR_ERR_SIZE, qoriMean_8u_C3R(pixel, 0, bad, r));
+        EXPECT_EQ(QOR_ERR_SIZE, qoriNorm_L2_8u_AC4R(pixel, 0, bad, r));
+        EXPECT_EQ(QOR_ERR_SIZE, qoriNormRel_Inf_8u_C1R(pixel, 0, pixel, 0, bad, r));
+        EXPECT_EQ(QOR_ERR_SIZE, qoriDotProd_8u64f_C3R(pixel, 0, pixel, 0, bad, r));
+    }
+    for (int32_t step : {0, -4}) {
+        EXPECT_EQ(QOR_ERR_STEP, qoriNorm_Inf_8u_C1R(pixel, step, one, r));
+        EXPECT_EQ(QOR_ERR_STEP, qoriNormDiff_L2_8u_C1R(pixel, 4, pixel, step, one, r));
+        EXPECT_EQ(QOR_ERR_STEP, qoriNormRel_L1_8u_C4R(pixel, step, pixel, 4, one, r));
+    }
+    EXPECT_EQ(QOR_ERR_SIZE, qoriDotProd_8u64f_C1R(pixel, 0, pixel, 4, one, r));
+    EXPECT_EQ(QOR_ERR_SIZE, qoriDotProd_8u64f_C1R(pixel, 4, pixel, 0, one, r));
+    for (double untouched : r) EXPECT_EQ(-7, untouched);
+    EXPECT_EQ(QOR_OK, qoriDotProd_8u64f_C3R(pixel, 0, pixel, 0, one, r));
+}
+
+TEST(Norms, WeightedRowsCheckArraysLengthsThenRows) {
+    const float row[2] = {1, 2}, weights[2] = {1, 1};
+    const float* rows[2] = {row, nullptr};
+    float dst[2] = {-7, -7};
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriDotProdCol_32f_L2(nullptr, weights, 0, dst, 0));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriDotProdCol_32f_L2(rows, nullptr, 0, dst, 0));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriDotProdCol_32f_L2(rows, weights, 0, nullptr, 0));
+    EXPECT_EQ(QOR_ERR_SIZE, qoriDotProdCol_32f_L2(rows, weights, 2, dst, 0));
+    EXPECT_EQ(QOR_ERR_SIZE, qoriDotProdCol_32f_L2(rows, weights, 0, dst, 2));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, qoriDotProdCol_32f_L2(rows, weights, 2, dst, 2));
+    EXPECT_EQ(-7, dst[0]);
+}
+
+}  // namespace
+}  // namespace qori::test
