@@ -144,9 +144,9 @@ constexpr auto filter32f = filterAllocating<S, D, layout, float>;
 template <class T, class K, Layout layout>
 QorResult filterRound(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
                       int32_t divisor, int32_t roundMode, uint8_t* pBuffer) {
-    if (QorResult r = firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
-                              divisorCheck(divisor), stepsCheck<layout>(src, dst, roi, kernel.size),
-                              roundModeCheck(roundMode), nullCheck(pBuffer)))
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size), divisorCheck(divisor),
+                    stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
     runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
     return QOR_OK;
@@ -155,9 +155,9 @@ QorResult filterRound(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel
 template <class T, Layout layout>
 QorResult filterRoundFloats(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<float> kernel, QorPoint2D anchor,
                             int32_t roundMode, uint8_t* pBuffer) {
-    if (QorResult r = firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
-                              stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode),
-                              nullCheck(pBuffer)))
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
+                    stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
     runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
     return QOR_OK;

@@ -13,9 +13,7 @@ QorResult dataTypeCheck(int32_t dataType, bool floatsToo) {
     return known ? QOR_OK : QOR_ERR_DATA_TYPE;
 }
 
-QorResult channelsCheck(int32_t numChannels) {
-    return numChannels < 1 || numChannels > 4 ? QOR_ERR_CHANNELS : QOR_OK;
-}
+QorResult channelsCheck(int32_t numChannels) { return numChannels < 1 || numChannels > 4 ? QOR_ERR_CHANNELS : QOR_OK; }
 
 QorResult roundModeCheck(int32_t roundMode) {
     return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
@@ -33,7 +31,8 @@ QorResult filterBorderGetSize(QorImageSize kernelSize, QorImageSize roi, int32_t
     const int64_t work = workBytes(kernelSize, roi.width, dataType, kernelType, numChannels);
     const int64_t border = borderBytes(roi, Reach::ofKernel(kernelSize), numChannels * elementBytes);
     int32_t planSize, bufferSize;
-    if (QorResult r = firstOf(reportSize(plan, &planSize), reportSize(kBlockAlignment - 1 + work + border, &bufferSize)))
+    if (QorResult r =
+            firstOf(reportSize(plan, &planSize), reportSize(kBlockAlignment - 1 + work + border, &bufferSize)))
         return r;
     *pSpecSize = planSize;
     *pBufferSize = bufferSize;
@@ -73,8 +72,9 @@ template <class T, int channels>
 QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t border, const T* borderValue,
                        const QorLinearFilterPlan* pSpec, uint8_t* pBuffer) {
     constexpr int32_t pixelBytes = channels * elementBytes<T>;
-    if (QorResult r = firstOf(nullCheck(src, dst, borderValue, pSpec, pBuffer), sizeCheck(roi),
-                              filterStepCheck(src.step, dst.step, int64_t{roi.width} * pixelBytes), borderCheck(border)))
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, borderValue, pSpec, pBuffer), sizeCheck(roi),
+                    filterStepCheck(src.step, dst.step, int64_t{roi.width} * pixelBytes), borderCheck(border)))
         return r;
     const ControlScope scope;
     const auto& plan = *reinterpret_cast<const LinearPlan*>(blockStart(pSpec));
@@ -87,8 +87,8 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
                                                                  : -1;
     if constexpr (integerPath >= 0) {
         if (plan.pathKind == integerPath) {
-            filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0,
-                        {plan.divisor, plan.roundMode, plan.sumLimit}, target);
+            filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, {plan.divisor, plan.roundMode, plan.sumLimit},
+                        target);
             return QOR_OK;
         }
     }

@@ -75,8 +75,7 @@ int64_t workBytes(QorImageSize kernel, int32_t roiWidth, int32_t dataType, int32
     if (channels == 2 || (kernelType == k16s && dataType == k32f)) return 0;
     if (kernelType == k16s) {
         if (channels == 4) return rounded(dataType == k8u ? 16 * (area + w) : (16 * (area + w) + 124) / 16 * 16);
-        if (dataType == k8u)
-            return rounded(channels == 1 ? 32 * ((8 * area + w + 7) / 8) : 16 * ((p + 3 * w + 3) / 4));
+        if (dataType == k8u) return rounded(channels == 1 ? 32 * ((8 * area + w + 7) / 8) : 16 * ((p + 3 * w + 3) / 4));
         return rounded(channels == 1 ? 16 * ((p + w + 3) / 4) : 16 * ((p + 3 * w + 31) / 4));
     }
     if (dataType == k32f) return rounded((channels == 1 ? 32 : 16) * area);
@@ -90,8 +89,8 @@ void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize si
               int32_t roundMode) {
     const ControlScope scope;
     const bool is8u = dataType == k8u;
-    LinearPlan& plan = startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t),
-                                 roundMode);
+    LinearPlan& plan =
+        startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t), roundMode);
     classifyDivisor(plan, divisor);
     auto* copy = plan.table<int16_t>(plan.kernelOffset);
     std::copy_n(kernel, ptrdiff_t{size.width} * size.height, copy);

@@ -45,8 +45,8 @@ void filterBy(const PackedKernel<Taps>& kernel, const Rule& rule, Target<S, D>& 
     target.parts.forEach([&](const BorderPart& part) {
         const auto [x, y, width, height] = part.area;
         kernels::filterRows(kernel, reinterpret_cast<const S*>(part.window), part.step, n, ptrdiff_t{width} * n, height,
-                            part.slackBytes / elementBytes<S>, finish,
-                            asBytes(target.dst.row(y) + ptrdiff_t{x} * n), target.dst.step, elementBytes<D>);
+                            part.slackBytes / elementBytes<S>, finish, asBytes(target.dst.row(y) + ptrdiff_t{x} * n),
+                            target.dst.step, elementBytes<D>);
     });
 }
 

@@ -8,8 +8,8 @@
 
 namespace qori::filter {
 
-/// Coefficients of 16 bits in pairs from the last to the first, the first of a pair in the low half, each pair `repeats`
-/// times; a pair that ends an odd row holds one.
+/// Coefficients of 16 bits in pairs from the last to the first, the first of a pair in the low half, each pair
+/// `repeats` times; a pair that ends an odd row holds one.
 template <int repeats, class K>
 void packPairs(const K* kernel, QorImageSize size, int32_t* packed) {
     for (int32_t j = size.height - 1; j >= 0; --j) {

@@ -53,7 +53,8 @@ void BorderedImage::gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) con
         const uint8_t *first = pixel(0, row), *last = pixel(size.width - 1, row);
         repeat(to, rule.constant != nullptr ? rule.constant : first, pixelBytes, missingLeft);
         if (present > 0) kernels::copyRow(to + leftBytes, pixel(firstPresent, row), presentBytes);
-        repeat(to + leftBytes + presentBytes, rule.constant != nullptr ? rule.constant : last, pixelBytes, missingRight);
+        repeat(to + leftBytes + presentBytes, rule.constant != nullptr ? rule.constant : last, pixelBytes,
+               missingRight);
     }
 }
 
@@ -116,8 +117,8 @@ bool BorderParts::fits(int32_t width, ptrdiff_t slackBytes) const {
     return int64_t{rowBytes(width, slackBytes)} * (int64_t{reach_.rows()} + 1) <= capacity_;
 }
 
-/// The part of a job from its row y on: no more rows than the cache likes, and than the buffer takes together with those
-/// around them.
+/// The part of a job from its row y on: no more rows than the cache likes, and than the buffer takes together with
+/// those around them.
 BorderPart BorderParts::make(const Job& job, int32_t y) {
     QorImageRect area{job.area.x, job.area.y + y, job.area.width, job.area.height - y};
     const int32_t x = area.x - reach_.left, above = area.y - reach_.top;

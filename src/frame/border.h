@@ -2,8 +2,8 @@
 // What a neighbourhood operation sees beyond its region, for every operation that looks around a pixel.
 //
 // Each axis has its own rule: beyond an open side pixels are read from memory, beyond a closed one they are
-// synthesised, from the nearest pixel along that axis or as a constant. With the constant a pixel is missing when either
-// of its coordinates is.
+// synthesised, from the nearest pixel along that axis or as a constant. With the constant a pixel is missing when
+// either of its coordinates is.
 //
 // Synthesised pixels exist in the caller's work buffer only, and only where a window needs them. With a window that
 // reaches l, t, r, b pixels to the left, above, to the right and below, and with all sides closed:
@@ -66,15 +66,15 @@ struct BorderPart {
     ptrdiff_t slackBytes;  ///< May be read behind the last window of each row.
 };
 
-/// What an operation's kernel likes: strips of at least blockPixels, an interior of whole blocks, slackBytes that it may
-/// read behind a row's last window.
+/// What an operation's kernel likes: strips of at least blockPixels, an interior of whole blocks, slackBytes that it
+/// may read behind a row's last window.
 struct PartHints {
     int32_t blockPixels;
     int32_t slackBytes;
 };
 
-/// Bytes of buffer that make the parts of a region possible, whatever the rule: bands of 2 * rows() rows each, or strips
-/// for each row of the region.
+/// Bytes of buffer that make the parts of a region possible, whatever the rule: bands of 2 * rows() rows each, or
+/// strips for each row of the region.
 int64_t borderBytes(QorImageSize region, Reach reach, int32_t pixelBytes);
 
 /// The parts of a region one after the other; one buffer of borderBytes() serves them all in turn.

@@ -1,14 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
-// What becomes of a filter's sums: rounded and saturated elements. A rule turns the two vectors of a block into elements
-// in order; a choice of rules (withRule) names the rounding once per block of rows.
+// What becomes of a filter's sums: rounded and saturated elements. A rule turns the two vectors of a block into
+// elements in order; a choice of rules (withRule) names the rounding once per block of rows.
 //
 // The exact quotient S / d is rounded, though it is computed in floating point. With r the nearest number to 1 / d and
 // q = S * r, the remainder e = S - q * d is exact as a fused operation, and q + e * r, rounded once, lies within a
 // relative 2^-46 (single) or 2^-104 (double) of S / d before its rounding: a quotient that the format holds, as every
 // integer and every half are, comes out exactly. Any other lies at least 1 / (2d) from the nearest integer or half and
 // is rounded monotonically, which keeps it on its side while 1 / (2d) exceeds half a unit in the last place, 2^-17 for
-// single precision below 256, 2^-10 below 32768, 2^-9 below 65536, and 2^-38 for double precision below 65536; beyond the
-// elements' range everything saturates.
+// single precision below 256, 2^-10 below 32768, 2^-9 below 65536, and 2^-38 for double precision below 65536; beyond
+// the elements' range everything saturates.
 //   single: |S| < 2^24 (exact as a float) and |d| < 2^24 / 2^bits for unsigned elements, 2^24 / 2^15 for int16_t
 //   double: any 32-bit S and d, elements of 16 bits or less
 #pragma once
@@ -28,9 +28,12 @@ struct Elements {
 /// Calls use with the rounding of a mode; a value that is no mode rounds to nearest.
 template <class Use>
 QORI_INLINE void withMode(int32_t mode, Use use) {
-    if (mode == roundTowardZero) use(TowardZero{});
-    else if (mode == roundHalfAway) use(HalfAway{});
-    else use(NearestEven{});
+    if (mode == roundTowardZero)
+        use(TowardZero{});
+    else if (mode == roundHalfAway)
+        use(HalfAway{});
+    else
+        use(NearestEven{});
 }
 
 namespace detail {
@@ -39,8 +42,10 @@ namespace detail {
 template <class D>
 QORI_INLINE Elements<D, 16> packPairs(__m256i low, __m256i high) {
     const __m256i words = std::is_same_v<D, uint16_t> ? _mm256_packus_epi32(low, high) : _mm256_packs_epi32(low, high);
-    if constexpr (sizeof(D) == 2) return {{{words}}};
-    else return {{{_mm256_permute4x64_epi64(_mm256_packus_epi16(words, words), 0x08)}}};
+    if constexpr (sizeof(D) == 2)
+        return {{{words}}};
+    else
+        return {{{_mm256_permute4x64_epi64(_mm256_packus_epi16(words, words), 0x08)}}};
 }
 
 /// The limit from above keeps results within 32 bits; what is below becomes -2^31. A NaN passes and becomes -2^31 too.
@@ -74,8 +79,8 @@ struct Saturated {
     }
 };
 
-/// Integer sums by 2^shift, shift 1 to 30: q = floor(S / 2^shift) plus 1 where the rest of at most 2^shift - 1 and a bias
-/// of at most 2^shift - 1 reach 2^shift; below 2^31 in all.
+/// Integer sums by 2^shift, shift 1 to 30: q = floor(S / 2^shift) plus 1 where the rest of at most 2^shift - 1 and a
+/// bias of at most 2^shift - 1 reach 2^shift; below 2^31 in all.
 template <class D>
 struct Shifted {
     using Element = D;
@@ -118,18 +123,21 @@ struct QuotientInSingle {
     static constexpr int64_t kSumLimit = int64_t{1} << 24;
 
     QuotientInSingle(int32_t d, int32_t m) : divisor(d), mode(m) {}
-    uint32_t magnitude() const { return divisor < 0 ? 0 - static_cast<uint32_t>(divisor) : static_cast<uint32_t>(divisor); }
+    uint32_t magnitude() const {
+        return divisor < 0 ? 0 - static_cast<uint32_t>(divisor) : static_cast<uint32_t>(divisor);
+    }
     bool isPowerOfTwo() const { return std::has_single_bit(magnitude()); }
     /// Whether the quotients of sums below the limit are rounded rightly.
     bool isExact() const { return magnitude() < (1u << 24) / kRange || isPowerOfTwo(); }
-    /// Whether S * r rounds as S / d does. With d a power of two the product is exact. An odd d knows no halves, and the
-    /// product's relative error of at most 2^-23 is less than 1 / (2d) below the range.
+    /// Whether S * r rounds as S / d does. With d a power of two the product is exact. An odd d knows no halves, and
+    /// the product's relative error of at most 2^-23 is less than 1 / (2d) below the range.
     bool isSimple() const {
         return isPowerOfTwo() || (mode == roundNearestEven && divisor % 2 != 0 && magnitude() < (1u << 22) / kRange);
     }
     template <class Mode, bool simple>
     QORI_INLINE auto rule() const {
-        const __m256 d = _mm256_set1_ps(static_cast<float>(divisor)), r = _mm256_set1_ps(1.0f / static_cast<float>(divisor));
+        const __m256 d = _mm256_set1_ps(static_cast<float>(divisor)),
+                     r = _mm256_set1_ps(1.0f / static_cast<float>(divisor));
         return [=](const Vec<int32_t>(&sums)[2]) {
             __m256i whole[2];
             for (int k = 0; k < 2; ++k) {
@@ -228,7 +236,8 @@ struct Divided {
                 if constexpr (sizeof(D) == 4) {
                     return {{{_mm256_set_m128i(high, low)}}};
                 } else {
-                    const __m128i words = std::is_same_v<D, uint16_t> ? _mm_packus_epi32(low, high) : _mm_packs_epi32(low, high);
+                    const __m128i words =
+                        std::is_same_v<D, uint16_t> ? _mm_packus_epi32(low, high) : _mm_packs_epi32(low, high);
                     return {{{_mm256_castsi128_si256(sizeof(D) == 2 ? words : _mm_packus_epi16(words, words))}}};
                 }
             });

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Weighted sums over the windows of a region, by Taps (filter_taps.h), and what becomes of them, by Finish. The sums of a
-// few rows at a time lie on the stack between the two.
+// Weighted sums over the windows of a region, by Taps (filter_taps.h), and what becomes of them, by Finish. The sums of
+// a few rows at a time lie on the stack between the two.
 #pragma once
 #include "filter_taps.h"
 #include "frame/border.h"
@@ -47,8 +47,8 @@ struct Finish {
 
 namespace detail {
 
-/// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the first
-/// of them sees, and each further one sees the row before.
+/// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the
+/// first of them sees, and each further one sees the row before.
 template <class Taps, int first, int last, int rows, class Load>
 QORI_INLINE void addSourceRow(typename Taps::Sum (&sums)[rows][2], const typename Taps::Source* p, ptrdiff_t pixel,
                               const typename Taps::Coefficient* c, ptrdiff_t rowCoefficients, int taps,
