@@ -36,7 +36,13 @@ QORI_INLINE __m256i oddBytes(Vec<T> a) {
 
 }  // namespace detail
 
-/// Sums per element position; the general form is told below.
+/// A vector and the one at its place in the next round.
+template <class T>
+struct TwoVectors {
+    Vec<T> first, second;
+};
+
+/// Sums per element position.
 template <class T>
 struct SumLanes;
 
@@ -138,13 +144,36 @@ struct SadLanes {
 template <class T>
 struct ProductLanes;
 
-/// Byte products fit 16 bits: 255 * 255 < 2^16, -128 * -128 < 2^15.
+/// Byte products, of two rounds at a time: 16-bit words of both are interleaved, so that an instruction that adds pairs
+/// of products adds those of one channel. A round adds at most 2 * 255^2 = 130,050, and 33,025 * 130,050 < 2^32;
+/// signed, 33,025 * 2 * 128^2 < 2^31.
 template <class T>
-requires(sizeof(T) == 1) struct ProductLanes<T>
-    : EvenOddSums<std::conditional_t<std::is_signed_v<T>, int16_t, uint16_t>> {
-    QORI_INLINE void add(Vec<T> a, Vec<T> b) {
-        this->even.add({_mm256_mullo_epi16(detail::evenBytes(a), detail::evenBytes(b))});
-        this->odd.add({_mm256_mullo_epi16(detail::oddBytes(a), detail::oddBytes(b))});
+requires(sizeof(T) == 1) struct ProductLanes<T> {
+    using Word = std::conditional_t<std::is_signed_v<T>, int32_t, uint32_t>;
+    using Total = std::conditional_t<std::is_signed_v<T>, int64_t, uint64_t>;
+    static constexpr int banks = 1, count = 32;
+    static constexpr bool takesTwo = true;
+    static constexpr ptrdiff_t limit = 33'025;
+
+    struct Sums {
+        __m256i even, odd;
+
+        QORI_INLINE void add(Vec<T> a, Vec<T> b) {
+            even = _mm256_add_epi32(even, _mm256_madd_epi16(detail::evenBytes(a), detail::evenBytes(b)));
+            odd = _mm256_add_epi32(odd, _mm256_madd_epi16(detail::oddBytes(a), detail::oddBytes(b)));
+        }
+    };
+    Sums low, high;  ///< Of the lower and the upper 8 bytes of each half.
+
+    QORI_INLINE void add(TwoVectors<T> a, TwoVectors<T> b) {
+        low.add({_mm256_unpacklo_epi16(a.first.v, a.second.v)}, {_mm256_unpacklo_epi16(b.first.v, b.second.v)});
+        high.add({_mm256_unpackhi_epi16(a.first.v, a.second.v)}, {_mm256_unpackhi_epi16(b.first.v, b.second.v)});
+    }
+    void values(Total* out) const {
+        Word words[2][2][8];  // by part of the half, by half
+        detail::storeInterleaved(words[0][0], low.even, low.odd);
+        detail::storeInterleaved(words[1][0], high.even, high.odd);
+        for (int i = 0; i < count; ++i) out[i] = words[i / 8 % 2][i / 16][i % 8];
     }
 };
 

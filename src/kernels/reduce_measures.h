@@ -37,6 +37,11 @@ QORI_INLINE Vec<uint16_t> magnitude(Vec<int16_t> a, Vec<int16_t> b) {
 }
 QORI_INLINE Vec<float> magnitude(Vec<float> a, Vec<float> b) { return magnitude(Vec<float>{_mm256_sub_ps(a.v, b.v)}); }
 
+template <class T, class... Other>
+QORI_INLINE auto magnitude(TwoVectors<T> a, Other... b) {
+    return TwoVectors<Magnitude<T>>{magnitude(a.first, b.first...), magnitude(a.second, b.second...)};
+}
+
 /// Largest magnitude.
 template <class T>
 struct Largest {
@@ -99,7 +104,10 @@ struct Values<float> {
 template <class T>
 struct Products {
     using Lanes = ProductLanes<T>;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<T> a, Vec<T> b) { lanes.add(a, b); }
+    template <class V>
+    QORI_INLINE static void feed(Lanes& lanes, V a, V b) {
+        lanes.add(a, b);
+    }
 };
 template <>
 struct Products<float> {
@@ -111,7 +119,7 @@ struct Products<float> {
 struct Accurate {
     using Lanes = DoubleLanes;
     QORI_INLINE static Doubles loadVector(const float* p) { return loadDoubles(p); }
-    QORI_INLINE static Doubles loadRest(const float* p, ptrdiff_t n) { return toDoubles(loadPartial(p, n)); }
+    QORI_INLINE static Doubles loadRest(const float* p, ptrdiff_t n) { return toDoubles(loadUpTo(p, n)); }
 };
 
 struct AccurateMagnitudes : Accurate {
