@@ -262,10 +262,11 @@ template <class, Layout, class Function>
 void histogramUniformInit(const char* name, Function function) {
     const float lower[3] = {0, -10.5f, 0.1f}, upper[3] = {100, 10.5f, 1.3f};
     const int32_t counts[3] = {8, 5, 7};
-    Prepared floats(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
-        ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec));
+    const float three = 3;
+    Prepared narrow(qor8u, counts + 1, 1, [&](QorHistogramSpec* spec) {
+        ASSERT_EQ(QOR_WARN_ADJUSTED, call(function, int32_t{qor8u}, lower, &three, counts + 1, 1, spec));
     });
-    Prepared wide(qor16s, counts, 2 + 1, [&](QorHistogramSpec* spec) {
+    Prepared wide(qor16s, counts, 3, [&](QorHistogramSpec* spec) {
         ASSERT_EQ(QOR_WARN_ADJUSTED,
                   call(function, int32_t{qor16s}, lower, upper, counts, 3, spec));  // channel 2: width 0.2
     });
@@ -273,9 +274,8 @@ void histogramUniformInit(const char* name, Function function) {
     EXPECT_EQ(1, record[2]);
     EXPECT_EQ((std::vector{0, 14, 28, 42, 57, 71, 85, 100, -10, -5, 0, 5, 10, 0, 0, 0, 0, 0, 1, 1}),
               std::vector(record.begin() + 12, record.end()));
-    const float three = 3;
-    Prepared narrow(qor8u, counts + 1, 1, [&](QorHistogramSpec* spec) {
-        ASSERT_EQ(QOR_WARN_ADJUSTED, call(function, int32_t{qor8u}, lower, &three, counts + 1, 1, spec));
+    Prepared floats(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
+        ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec));
     });
     const auto levels = words<float>(floats.spec, floats.specSize);
     size_t at = 12;
