@@ -15,5 +15,6 @@ struct Panel {
 
 std::span<const Panel> copyPanels();
 std::span<const Panel> arithPanels();
+std::span<const Panel> statsPanels();
 
 }  // namespace demo
