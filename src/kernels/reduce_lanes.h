@@ -17,6 +17,11 @@ QORI_INLINE void storeInterleaved(Word* out, __m256i even, __m256i odd) {
     _mm256_storeu_si256(reinterpret_cast<__m256i*>(out + 8), _mm256_permute2x128_si256(low, high, 0x31));
 }
 
+template <class Word, class Total, int count>
+void widen(const Word (&words)[count], Total* out) {
+    for (int i = 0; i < count; ++i) out[i] = words[i];
+}
+
 /// The even and the odd elements of a vector of bytes as 16-bit numbers.
 template <class T>
 QORI_INLINE __m256i evenBytes(Vec<T> a) {
@@ -60,13 +65,10 @@ struct SumLanes<uint16_t> {
         all = _mm256_add_epi32(all, a.v);
         odd = _mm256_add_epi32(odd, _mm256_srli_epi32(a.v, 16));
     }
-    void sums(uint32_t* out) const {
-        detail::storeInterleaved(out, _mm256_sub_epi32(all, _mm256_slli_epi32(odd, 16)), odd);
-    }
     void values(Total* out) const {
         uint32_t words[count];
-        sums(words);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::storeInterleaved(words, _mm256_sub_epi32(all, _mm256_slli_epi32(odd, 16)), odd);
+        detail::widen(words, out);
     }
 };
 
@@ -83,23 +85,20 @@ struct SumLanes<int16_t> {
         even = _mm256_add_epi32(even, _mm256_madd_epi16(a.v, _mm256_set1_epi32(1)));
         odd = _mm256_add_epi32(odd, _mm256_srai_epi32(a.v, 16));
     }
-    void sums(int32_t* out) const { detail::storeInterleaved(out, even, odd); }
     void values(Total* out) const {
         int32_t words[count];
-        sums(words);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::storeInterleaved(words, even, odd);
+        detail::widen(words, out);
     }
 };
 
-/// Two sums of 16-bit numbers, of the even and of the odd bytes.
-template <class T>
+/// What 8-bit sums spill into: 16-bit numbers, of the even and of the odd bytes.
 struct EvenOddSums {
-    using Half = SumLanes<T>;
-    using Total = typename Half::Total;
+    using Total = uint64_t;
     static constexpr int banks = 1, count = 32;
-    static constexpr ptrdiff_t limit = Half::limit;
+    static constexpr ptrdiff_t limit = SumLanes<uint16_t>::limit;
 
-    Half even, odd;
+    SumLanes<uint16_t> even, odd;
 
     void values(Total* out) const {
         Total halves[2][16];
@@ -112,7 +111,7 @@ struct EvenOddSums {
 /// As for 16 bits, with halves that hold 255 * 257 = 2^16 - 1.
 template <>
 struct SumLanes<uint8_t> {
-    using Next = EvenOddSums<uint16_t>;
+    using Next = EvenOddSums;
     static constexpr int banks = 1;
     static constexpr ptrdiff_t limit = 257;
 
@@ -227,7 +226,7 @@ struct PairProductLanes {
     void values(Total* out) const {
         uint32_t words[count];
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(words), sum);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::widen(words, out);
     }
 };
 

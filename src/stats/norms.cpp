@@ -28,35 +28,37 @@ struct Type {
 /// The measure of a quantity; `single` where there is one channel.
 template <Quantity quantity, class T, bool single>
 constexpr auto chooseMeasure() {
+    using namespace kernels;
     constexpr bool bytes = single && std::is_same_v<T, uint8_t>;
     if constexpr (quantity == Quantity::largest)
-        return Type<kernels::Largest<T>>{};
+        return Type<Magnitudes<MaxLanes<Magnitude<T>>>>{};
     else if constexpr (bytes && quantity == Quantity::squares)
-        return Type<kernels::ByteSquares>{};
+        return Type<ByteSquares>{};
     else if constexpr (bytes && quantity == Quantity::products)
-        return Type<kernels::ByteProducts>{};
+        return Type<Products<PairProductLanes>>{};
     else if constexpr (bytes)
-        return Type<kernels::ByteMagnitudes>{};
+        return Type<ByteMagnitudes>{};
     else if constexpr (quantity == Quantity::magnitudes)
-        return Type<kernels::Magnitudes<T>>{};
+        return Type<Magnitudes<SumLanes<Magnitude<T>>>>{};
     else if constexpr (quantity == Quantity::squares)
-        return Type<kernels::Squares<T>>{};
+        return Type<Squares<ProductLanes<Magnitude<T>>>>{};
     else if constexpr (quantity == Quantity::values)
-        return Type<kernels::Values<T>>{};
+        return Type<Values<SumLanes<T>>>{};
     else
-        return Type<kernels::Products<T>>{};
+        return Type<Products<ProductLanes<T>>>{};
 }
 
 template <Quantity quantity>
 constexpr auto chooseAccurateMeasure() {
+    using Lanes = kernels::DoubleLanes;
     if constexpr (quantity == Quantity::magnitudes)
-        return Type<kernels::AccurateMagnitudes>{};
+        return Type<kernels::Magnitudes<Lanes>>{};
     else if constexpr (quantity == Quantity::squares)
-        return Type<kernels::AccurateSquares>{};
+        return Type<kernels::Squares<Lanes>>{};
     else if constexpr (quantity == Quantity::values)
-        return Type<kernels::AccurateValues>{};
+        return Type<kernels::Values<Lanes>>{};
     else
-        return Type<kernels::AccurateProducts>{};
+        return Type<kernels::Products<Lanes>>{};
 }
 
 /// Calls use(measure) with the measure that the type and the hint ask for.
