@@ -3142,7 +3142,7 @@ QORI_API void QORI_CALL qoriFree(void* ptr);
 /** Adds the elements of each channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
@@ -3183,7 +3183,7 @@ QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep
 /** Averages the elements of each channel: their sum over width * height.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
@@ -3228,7 +3228,7 @@ QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcSte
 /** Largest magnitude of each channel: max |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -3275,7 +3275,7 @@ QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t s
 /** Sum of magnitudes of each channel: sum |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -3319,7 +3319,7 @@ QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t src
 /** Euclidean norm of each channel: the square root of sum src^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -3367,7 +3367,7 @@ QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t src
 /** Largest magnitude of the difference in each channel: max |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3412,7 +3412,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3456,7 +3456,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3500,7 +3500,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_
 /** Largest magnitude of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3546,7 +3546,7 @@ QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_
 /** Sum of magnitudes of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3592,7 +3592,7 @@ QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t
 /** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3638,10 +3638,10 @@ QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_AC4R(const float* pSrc1, int32_t
 /** Dot product of two images, per channel: sum src1 * src2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  8- and 16-bit totals are exact and rounded once. 32u and 32s: products and sums in double
- *            precision, in the order of the pixels. 32f with hintAccurate: exact products, sums in double
- *            precision; with any other hint: 48 partial sums in single precision by fused multiply-add, added
- *            pairwise.
+ *  Elements  Integers: products and sums in double precision, in the order of the pixels, so that totals up to
+ *            2^53 in magnitude are exact for 8 and 16 bits. 32f with hintAccurate: exact products, sums in
+ *            double precision; with any other hint: 48 partial sums in single precision by fused multiply-add,
+ *            added pairwise.
  *  Units     Steps in bytes, not checked otherwise; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below

@@ -144,8 +144,11 @@ struct ChannelVectors {
 
 template <class T>
 ChannelVectors<T> channelVectors(const T* values, int channels) {
+    constexpr int kGroup = 12;  // whole pixels of 1, 3 and 4 channels
     alignas(32) T all[3 * Vec<T>::lanes];
-    for (int i = 0; i < 3 * Vec<T>::lanes; ++i) all[i] = values[i % channels];
+    T group[kGroup];
+    for (int i = 0, c = 0; i < kGroup; ++i, c = c + 1 < channels ? c + 1 : 0) group[i] = values[c];
+    for (int i = 0; i < 3 * Vec<T>::lanes; i += kGroup) __builtin_memcpy(all + i, group, sizeof group);
     return {{load(all), load(all + Vec<T>::lanes), load(all + 2 * Vec<T>::lanes)}};
 }
 
