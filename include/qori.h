@@ -3981,9 +3981,12 @@ QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C3R(const float* pSrc, int32_
 QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorPoint2D dstOffset, QorImageSize dstSize, const QorResizePlan* pPlan, uint8_t* pBuffer);
 
-/** Reduces a tile to means of areas, in single precision; integers round to nearest, ties to even.
+/** Reduces a tile to means of areas; integers round to nearest, ties to even.
  *  Shapes    dstOffset and dstSize name the tile; pSrc points at the pixel of qoriResizeGetSrcOffset, pDst at
  *            the tile's first.
+ *  Elements  8u, where both axes are reduced to a quarter at most and have 16 weights per position at most:
+ *            weights are rounded to 14 bits such that they sum to 1, rows in between to 1/128. Else, and for
+ *            the other types, single precision.
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
@@ -4130,10 +4133,12 @@ QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C4R(const float* pSrc, int32_t 
     QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const float* pBorderValue,
     const QorResizePlan* pPlan, uint8_t* pBuffer);
 
-/** Resizes a tile by Lanczos filtering in single precision; integers round to nearest, ties to even, and
- *  saturate.
+/** Resizes a tile by Lanczos filtering; integers round to nearest, ties to even, and saturate.
  *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; 4 x 4 (2 lobes) or 6 x 6 source pixels make
  *            one.
+ *  Elements  8u, where both axes are reduced to a quarter at most and have 16 weights per position at most:
+ *            weights are rounded to 14 bits such that they sum to 1, rows in between to 1/128. Else, and for
+ *            the other types, single precision.
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
@@ -4180,6 +4185,9 @@ QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C4R(const float* pSrc, int32_
  *  saturate.
  *  Shapes    Borders, tiles and statuses as for qoriResizeLinear; the filter spans twice
  *            qoriResizeGetBorderSize source pixels.
+ *  Elements  8u, where both axes are reduced to a quarter at most and have 16 weights per position at most:
+ *            weights are rounded to 14 bits such that they sum to 1, rows in between to 1/128. Else, and for
+ *            the other types, single precision.
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.

@@ -34,6 +34,7 @@ struct ResizePlan {
     Axis vertical, horizontal;
     int32_t columnTaps, rowTaps;  ///< Weights per position of the two directions.
     int32_t columnPeriod;         ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
+    int32_t words;                ///< Whether 8u is summed in integers: see fitsWords() for what that takes.
 
     template <class T>
     const T* table(int32_t offset) const {

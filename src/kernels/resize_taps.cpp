@@ -67,13 +67,14 @@ QORI_NOINLINE void turnRows(const T* const from[kTapRows], ptrdiff_t at, ptrdiff
                             float* out) {
     const T* rows[kTapRows];  // not reloaded after every store
     for (int j = 0; j < kTapRows; ++j) rows[j] = from[j];
-    // Eight rows at once are more streams than processors follow by themselves.
-    const auto bytes = elements * static_cast<ptrdiff_t>(sizeof(T));
-    for (int j = 0; j < kTapRows; ++j)
-        for (ptrdiff_t b = 0; b < bytes; b += 64) prefetchAhead(reinterpret_cast<const uint8_t*>(rows[j] + at) + b);
     ptrdiff_t done = 0;
-    // Elements beyond the ones asked for, but inside the row, keep the vectors whole.
-    for (; done < elements && at + done + 8 <= legalEnd; done += 8) turnIn(rows, at + done, 8, out + 8 * done);
+    // Elements beyond the ones asked for, but inside the row, keep the vectors whole. Eight rows at once are more
+    // streams than processors follow by themselves: each block asks for as many lines as it uses up.
+    constexpr int kLines = sizeof(T);
+    for (int row = 0; done < elements && at + done + 8 <= legalEnd; done += 8, row = (row + kLines) & (kTapRows - 1)) {
+        for (int j = row; j < row + kLines; ++j) prefetchAhead(rows[j] + at + done);
+        turnIn(rows, at + done, 8, out + 8 * done);
+    }
     if (done < elements) turnIn(rows, at + done, elements - done, out + 8 * done);
 }
 
@@ -213,6 +214,17 @@ QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_
 template <class T, int taps, bool scaled>
 QORI_NOINLINE void sumColumn(const float* const* rows, const float* weights, int32_t count, float scale, T* dst,
                              ptrdiff_t elements) {
+    // Copies of few rows and weights: not reloaded after every store.
+    const float* ownRows[taps > 0 ? taps : 1];
+    float ownWeights[taps > 0 ? taps : 1];
+    for (int k = 0; k < taps; ++k) {
+        ownRows[k] = rows[k];
+        ownWeights[k] = weights[k];
+    }
+    if constexpr (taps > 0) {
+        rows = ownRows;
+        weights = ownWeights;
+    }
     ptrdiff_t i = 0;
     for (; i + kTapBlock <= elements; i += kTapBlock) {
         prefetchAhead(dst + i);
@@ -263,6 +275,8 @@ void filterColumn(const float* const* rows, const float* weights, int32_t taps, 
         case 2: return sumColumn<T, 2, false>(rows, weights, taps, scale, dst, elements);
         case 4: return sumColumn<T, 4, false>(rows, weights, taps, scale, dst, elements);
         case 6: return sumColumn<T, 6, false>(rows, weights, taps, scale, dst, elements);
+        case 8: return sumColumn<T, 8, false>(rows, weights, taps, scale, dst, elements);
+        case 12: return sumColumn<T, 12, false>(rows, weights, taps, scale, dst, elements);
         default: return sumColumn<T, 0, false>(rows, weights, taps, scale, dst, elements);
     }
 }

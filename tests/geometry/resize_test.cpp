@@ -70,7 +70,10 @@ void expectPixel(const Job& job, const std::vector<Tap>& columns, const std::vec
         EXPECT_LE(std::abs(static_cast<double>(actual) - w.value), w.error * unit);
     } else {
         const double value = std::clamp<double>(w.value, std::numeric_limits<T>::min(), std::numeric_limits<T>::max());
-        EXPECT_LE(std::abs(actual - value), 0.5 + w.error * unit) << "expected about " << value << ", got " << +actual;
+        double bound = 0.5 + w.error * unit;
+        if (sizeof(T) == 1 && reference::inUnits(job.method, job.src, job.dst, columns.size(), rows.size()))
+            bound += reference::errorOfUnits(columns, rows);
+        EXPECT_LE(std::abs(actual - value), bound) << "expected about " << value << ", got " << +actual;
     }
 }
 
@@ -259,6 +262,54 @@ Job drawWideJob(Method method) {
     return {method, {src, 6 + random().below(3)}, {reduces ? std::min(src, dst) : dst, 1 + random().below(6)}};
 }
 
+void expectEach(std::initializer_list<std::pair<QorResult, QorResult>> expectedAndActual) {
+    int i = 0;
+    for (const auto& [expected, actual] : expectedAndActual) EXPECT_EQ(expected, actual) << "refusal " << i++;
+}
+
+/// What every member refuses, with its output left alone.
+template <class T, int channels, class Function>
+void expectRefusals(Function function, const Method& method) {
+    const QorImageSize size{12, 15};
+    const TestImage src(kSrc, {.width = 20, .height = 20}, channels * int{sizeof(T)}),
+        dst(kDst, {.width = size.width, .height = size.height}, channels * int{sizeof(T)});
+    const Snapshot before = dst.snapshot();
+    const T* s = src.data<T>();
+    T* d = dst.data<T>();
+    const auto run = [&](const T* from, T* to, const QorResizePlan* plan, uint8_t* buffer, QorPoint2D at = {0, 0},
+                         QorImageSize tile = {12, 15}, int32_t border = borderReplicate) {
+        return operate<T>(function, from, src.step(), to, dst.step(), at, tile, border, plan, buffer);
+    };
+    // A plan of another kind, and one whose tag is not that of a plan.
+    const Method other{.interpolation = interpLinear, .antialiasing = !method.antialiasing};
+    const QorResizePlan* plan = makePlan<T>(other, {20, 20}, size);
+    uint8_t* buffer = makeBuffer<T>(plan, size, channels);
+    expectEach({{QOR_ERR_UNSUPPORTED_MODE, run(s, d, plan, buffer)}});
+    if constexpr (!std::is_same_v<T, double>) {
+        plan = makePlan<T>({.interpolation = method.interpolation == interpNearest ? interpSuper : interpNearest},
+                           {20, 20}, size);
+        expectEach({{QOR_ERR_UNSUPPORTED_MODE, run(s, d, plan, buffer)}});
+    }
+    QorResizePlan* own = makePlan<T>(method, {20, 20}, size);
+    buffer = makeBuffer<T>(own, size, channels);
+    expectEach({{QOR_ERR_NULL_PTR, run(nullptr, d, own, buffer)},
+                {QOR_ERR_NULL_PTR, run(s, nullptr, own, buffer)},
+                {QOR_ERR_NULL_PTR, run(s, d, nullptr, buffer)},
+                {QOR_ERR_NULL_PTR, run(s, d, own, nullptr)},
+                {QOR_WARN_NOTHING_TO_DO, run(s, d, own, buffer, {0, 0}, {0, 15})},
+                {QOR_ERR_SIZE, run(s, d, own, buffer, {0, 0}, {12, -1})},
+                {QOR_ERR_OUT_OF_RANGE, run(s, d, own, buffer, {12, 0})},
+                {QOR_ERR_OUT_OF_RANGE, run(s, d, own, buffer, {0, -1})}});
+    if (method.interpolation != interpNearest && method.interpolation != interpSuper)
+        expectEach({{QOR_ERR_BORDER, run(s, d, own, buffer, {0, 0}, size, borderReplicate | 8)},
+                    {QOR_ERR_UNSUPPORTED_MODE, run(s, d, own, buffer, {0, 0}, size, 0xF0)}});
+    auto* tag = reinterpret_cast<uint32_t*>((reinterpret_cast<uintptr_t>(own) + 63) & ~uintptr_t{63});
+    EXPECT_EQ(0x4B617389u, *tag);
+    *tag ^= 1u << random().below(32);
+    expectEach({{QOR_ERR_CONTEXT, run(s, d, own, buffer)}});
+    QORI_EXPECT_UNCHANGED(dst, before);
+}
+
 template <class T, int channels, class Function>
 void sweep(const char* name, Function function, const std::vector<Method>& methods, int jobs) {
     constexpr int kWide = 4;
@@ -266,6 +317,7 @@ void sweep(const char* name, Function function, const std::vector<Method>& metho
         const Method& method = methods[static_cast<size_t>(i) % methods.size()];
         checkJob<T, channels>(function, i < jobs ? drawJob(method) : drawWideJob(method));
     }
+    expectRefusals<T, channels>(function, methods[0]);
     markSwept(name);
     for (const Method& m : methods) markUsed<T>(m);
 }
@@ -353,6 +405,20 @@ TYPED_TEST(ResizeQueries, RefusesSizesBeyond32Bits) {
     EXPECT_EQ(8 * ((1 << 28) - 64) + 244, plan);
 }
 
+TEST(Resize, RefusesWorkBuffersBeyond32Bits) {
+    // 144 bytes per pixel of four floats.
+    const QorImageSize dst{15'000'000, 1};
+    int32_t planBytes = 0, initBytes = 0, bytes = 7;
+    ASSERT_EQ(QOR_OK, qoriResizeGetSize_32f({4, 1}, dst, interpNearest, 0, &planBytes, &initBytes));
+    std::vector<uint8_t> memory(static_cast<size_t>(planBytes));
+    auto* plan = reinterpret_cast<QorResizePlan*>(memory.data());
+    ASSERT_EQ(QOR_OK, qoriResizeNearestInit_32f({4, 1}, dst, plan));
+    EXPECT_EQ(QOR_ERR_SIZE, qoriResizeGetBufferSize_32f(plan, dst, 4, &bytes));
+    EXPECT_EQ(7, bytes);
+    EXPECT_EQ(QOR_OK, qoriResizeGetBufferSize_32f(plan, dst, 3, &bytes));
+    EXPECT_LT(1'500'000'000, bytes);
+}
+
 TYPED_TEST(ResizeQueries, BordersAreTheReachOfTheFilter) {
     using E = Exports<TypeParam>;
     const auto expectBorder = [](const Method& m, QorImageSize src, QorImageSize dst) {
@@ -423,6 +489,32 @@ TEST(Resize, MeansOfFourRoundTiesToEven) {
         const int whole = sum / 4, rest = sum % 4, expected = whole + (rest == 3 || (rest == 2 && whole % 2 == 1));
         ASSERT_EQ(expected, means.view<uint8_t>(1).get(sum, 0)) << sum;
         ASSERT_EQ(expected, wide.view<uint16_t>(1).get(sum, 0)) << sum;
+    }
+}
+
+TEST(Resize, CubicIsExactWhereItsWeightsAre) {
+    // At quarters of a pixel the weights are multiples of 1/128: sums in double, and theirs, have no error.
+    const auto fetch = [](const Source<uint8_t, 3>& source, int c) {
+        return [&source, c](int x, int y) { return source.get(x, y, c); };
+    };
+    const QorImageSize sizes[] = {{120, 60}, {30, 15}, {90, 45}};
+    for (QorImageSize src : sizes) {
+        const Job job{{.interpolation = interpCubic}, src, {60, 30}};
+        const Source<uint8_t, 3> source(job);
+        const TestImage dst(kDst, {.width = 60, .height = 30}, 3);
+        const QorResizePlan* plan = makePlan<uint8_t>(job.method, job.src, job.dst);
+        ASSERT_EQ(QOR_OK, operate<uint8_t>(qoriResizeCubic_8u_C3R, source.pixel(0, 0), source.image.step(),
+                                           dst.data<uint8_t>(), dst.step(), {0, 0}, job.dst, job.border, plan,
+                                           makeBuffer<uint8_t>(plan, job.dst, 3)));
+        for (int y = 0; y < 30; ++y)
+            for (int x = 0; x < 60; ++x)
+                for (int c = 0; c < 3; ++c) {
+                    const double value =
+                        reference::weigh(reference::taps(job.method, src.width, 60, x),
+                                         reference::taps(job.method, src.height, 30, y), fetch(source, c))
+                            .value;
+                    ASSERT_EQ(std::nearbyint(std::clamp(value, 0.0, 255.0)), dst.view<uint8_t>(3).get(x, y, c));
+                }
     }
 }
 
