@@ -28,30 +28,21 @@ constexpr const char* kTypeName = sizeof(T) == 1 ? "8u" : sizeof(T) == 2 ? "16s"
 template <class T>
 void multiplyAdds(int64_t count) {
     constexpr int kSums = 10;
-    if constexpr (sizeof(T) == 4) {
-        __m256 sums[kSums], factor = _mm256_set1_ps(0.5f);
-        for (auto& s : sums) s = _mm256_setzero_ps();
-        for (int64_t i = 0; i < count; i += kSums) {
-#pragma GCC unroll 10
-            for (auto& s : sums) {
-                s = _mm256_fmadd_ps(factor, factor, s);
-                __asm__("" : "+x"(s));
-            }
-        }
-        for (auto& s : sums) __asm__ volatile("" : : "x"(s));
-    } else {
-        __m256i sums[kSums], factor = _mm256_set1_epi16(3);
-        for (auto& s : sums) s = _mm256_setzero_si256();
-        for (int64_t i = 0; i < count; i += kSums) {
-#pragma GCC unroll 10
-            for (auto& s : sums) {
-                __asm__("" : "+x"(factor));
-                s = _mm256_add_epi32(s, _mm256_madd_epi16(factor, factor));
-                __asm__("" : "+x"(s));
-            }
-        }
-        for (auto& s : sums) __asm__ volatile("" : : "x"(s));
+    using Vector = std::conditional_t<sizeof(T) == 4, __m256, __m256i>;
+    const auto step = [](Vector& s, Vector factor) {
+        if constexpr (sizeof(T) == 4)
+            s = _mm256_fmadd_ps(factor, factor, s);
+        else
+            s = _mm256_add_epi32(s, _mm256_madd_epi16(factor, s));
+        __asm__("" : "+x"(s));
+    };
+    Vector a{}, b{}, c{}, d{}, e{}, f{}, g{}, h{}, i{}, j{}, factor{};
+    __asm__("" : "+x"(factor));
+    for (int64_t done = 0; done < count; done += kSums) {
+        step(a, factor), step(b, factor), step(c, factor), step(d, factor), step(e, factor);
+        step(f, factor), step(g, factor), step(h, factor), step(i, factor), step(j, factor);
     }
+    __asm__ volatile("" : : "x"(a), "x"(b), "x"(c), "x"(d), "x"(e), "x"(f), "x"(g), "x"(h), "x"(i), "x"(j));
 }
 
 /// A kernel of the shape of a weighted mean with a negative rim, and its divisor.

@@ -80,6 +80,12 @@ void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
     const ControlScope scope;
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
+    if constexpr (std::is_same_v<S, uint8_t>)
+        if (division.sumLimit <= ByteTaps::kSumLimit) {
+            auto* packed = area.begin<int32_t>();
+            packBytes(kernel.data, kernel.size, packed);
+            return filterBytes(packed, kernel.size, division, target);
+        }
     if (division.sumLimit <= INT32_MAX && fitsPairs(kernel)) {
         auto* packed = area.begin<int32_t>();
         packPairs<PairTaps<S>::repeats>(kernel.data, kernel.size, packed);

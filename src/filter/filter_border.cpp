@@ -68,6 +68,15 @@ QorResult filterStepCheck(int32_t srcStep, int32_t dstStep, int64_t dstRowBytes)
     return srcStep < 1 || dstRowBytes > dstStep ? QOR_ERR_STEP : QOR_OK;
 }
 
+template <class T>
+void filterIntegers(const LinearPlan& plan, QorImageSize size, Target<T, T>& target) {
+    const Division division{plan.divisor, plan.roundMode, plan.sumLimit};
+    if constexpr (std::is_same_v<T, uint8_t>)
+        if (plan.bytesOffset != 0)
+            return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, division, target);
+    filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, division, target);
+}
+
 template <class T, int channels>
 QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t border, const T* borderValue,
                        const QorLinearFilterPlan* pSpec, uint8_t* pBuffer) {
@@ -87,8 +96,7 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
                                                                  : -1;
     if constexpr (integerPath >= 0) {
         if (plan.pathKind == integerPath) {
-            filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, {plan.divisor, plan.roundMode, plan.sumLimit},
-                        target);
+            filterIntegers(plan, size, target);
             return QOR_OK;
         }
     }
