@@ -20,23 +20,32 @@ Block allocate(int32_t bytes) {
 }
 
 template <class T>
-constexpr int32_t kTypeCode = sizeof(T) == 1 ? 1 : sizeof(T) == 2 ? 7 : 13;
+constexpr int32_t kTypeCode = sizeof(T) == 1   ? 1
+                              : sizeof(T) == 2 ? 7
+                                               : 13;
 template <class T>
-constexpr const char* kTypeName = sizeof(T) == 1 ? "8u" : sizeof(T) == 2 ? "16s" : "32f";
+constexpr const char* kTypeName = sizeof(T) == 1   ? "8u"
+                                  : sizeof(T) == 2 ? "16s"
+                                                   : "32f";
 
 /// Ten independent sums on registers: enough to fill the pipelines of two multiply-adds per cycle, five cycles deep.
 template <class T>
 void multiplyAdds(int64_t count) {
     constexpr int kSums = 10;
-    using Vector = std::conditional_t<sizeof(T) == 4, __m256, __m256i>;
-    const auto step = [](Vector& s, Vector factor) {
+    const auto zero = [] {
         if constexpr (sizeof(T) == 4)
-            s = _mm256_fmadd_ps(factor, factor, s);
+            return _mm256_setzero_ps();
         else
-            s = _mm256_add_epi32(s, _mm256_madd_epi16(factor, s));
+            return _mm256_setzero_si256();
+    };
+    auto factor = zero(), a = zero(), b = a, c = a, d = a, e = a, f = a, g = a, h = a, i = a, j = a;
+    const auto step = [](auto& s, auto by) {
+        if constexpr (sizeof(T) == 4)
+            s = _mm256_fmadd_ps(by, by, s);
+        else
+            s = _mm256_add_epi32(s, _mm256_madd_epi16(by, s));
         __asm__("" : "+x"(s));
     };
-    Vector a{}, b{}, c{}, d{}, e{}, f{}, g{}, h{}, i{}, j{}, factor{};
     __asm__("" : "+x"(factor));
     for (int64_t done = 0; done < count; done += kSums) {
         step(a, factor), step(b, factor), step(c, factor), step(d, factor), step(e, factor);
@@ -95,8 +104,8 @@ std::function<void()> plainOf(Image<T> src, Image<T> dst, int channels, int side
                 if constexpr (sizeof(T) == 4)
                     d[x] = sum;
                 else
-                    d[x] = static_cast<T>(std::clamp<K>(sum / divisor, std::numeric_limits<T>::min(),
-                                                        std::numeric_limits<T>::max()));
+                    d[x] = static_cast<T>(
+                        std::clamp<K>(sum / divisor, std::numeric_limits<T>::min(), std::numeric_limits<T>::max()));
             }
             keep(d);
         }
@@ -112,9 +121,8 @@ Row row(Function function, int side, double bestAtL2 = 0, double bestAtFrame = 0
         constexpr int lanes = 8;
         const int64_t perBlock = int64_t{side} * (sizeof(T) == 4 ? side : (side + 1) / 2);
         const int64_t count = size.pixels() * channels / lanes * perBlock;
-        Contenders all{oursOf<T, channels>(function, src, dst, size.roi(), side, divisor),
-                       {},
-                       [=] { multiplyAdds<T>(count); }};
+        Contenders all{
+            oursOf<T, channels>(function, src, dst, size.roi(), side, divisor), {}, [=] { multiplyAdds<T>(count); }};
         if (size.width == kCached.width) all.plain = plainOf(src, dst, channels, side, divisor);
         return all;
     };

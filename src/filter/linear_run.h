@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Packed kernels and rounding rules meet images: the run of every general linear filter.
 #pragma once
+#include "frame/checks.h"
 #include "frame/control_scope.h"
 #include "kernels/filter_rules.h"
 #include "kernels/filter_sums.h"
@@ -13,6 +14,10 @@ using kernels::DoubleTaps;
 using kernels::FloatTaps;
 using kernels::PackedKernel;
 using kernels::PairTaps;
+
+inline QorResult roundModeCheck(int32_t roundMode) {
+    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
+}
 
 /// Where results go, and how a region is cut so that its windows exist.
 template <class S, class D>

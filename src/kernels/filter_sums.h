@@ -51,8 +51,9 @@ QORI_INLINE void forEach(const Body& body) {
 }
 #define QORI_LAMBDA __attribute__((always_inline))
 
-/// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the first
-/// of them sees, and each further one sees the row before. `count` taps, or as many as the kernel has where it is 0.
+/// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the
+/// first of them sees, and each further one sees the row before. `count` taps, or as many as the kernel has where it is
+/// 0.
 template <class Taps, int first, int last, int count, int rows, int wide, class Load>
 QORI_INLINE void addSourceRow(const PackedKernel<Taps>& kernel, typename Taps::Partial (&sums)[rows][wide],
                               const typename Taps::Source* p, ptrdiff_t pixel, const typename Taps::Coefficient* c,
@@ -122,7 +123,8 @@ template <class Taps, int rows, int wide, int count>
 QORI_NOINLINE void sumBlocks(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
                              ptrdiff_t pixel, ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
     const typename Taps::Free free(pixel);
-    const auto load = [&](const typename Taps::Source* at, bool, typename Taps::Partial & v) QORI_LAMBDA { free(at, v); };
+    const auto load = [&](const typename Taps::Source* at, bool, typename Taps::Partial& v)
+                          QORI_LAMBDA { free(at, v); };
     for (ptrdiff_t b = 0; b + wide <= blocks; b += wide, p += wide * Taps::block) {
         typename Taps::Partial sums[rows][wide];
         sumBlock<Taps, count, rows, wide>(kernel, p, step, pixel, load, sums);
@@ -170,9 +172,8 @@ template <class Taps>
 QORI_NOINLINE void sumBlockExactly(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
                                    ptrdiff_t pixel, ptrdiff_t n, typename Taps::Sum (&out)[2]) {
     const bool endsAlone = kernel.endsAlone();
-    const auto load = [=](const typename Taps::Source* at, bool isLast, typename Taps::Partial & v) QORI_LAMBDA {
-        Taps::loadExactly(at, isLast && endsAlone ? nullptr : at + pixel, n, v);
-    };
+    const auto load = [=](const typename Taps::Source* at, bool isLast, typename Taps::Partial& v)
+                          QORI_LAMBDA { Taps::loadExactly(at, isLast && endsAlone ? nullptr : at + pixel, n, v); };
     typename Taps::Partial sums[1][1];
     sumBlock<Taps, 0>(kernel, p, step, pixel, load, sums);
     Taps::end(sums[0][0], out);
@@ -219,7 +220,8 @@ void filterChunk(const PackedKernel<Taps>& kernel, const Chunk<Taps>& chunk, Fin
 }
 
 template <class Taps, int rows>
-void filterBand(const PackedKernel<Taps>& kernel, Chunk<Taps> band, Finish<typename Taps::Sum> finish, ChunkSums<Taps>& sums) {
+void filterBand(const PackedKernel<Taps>& kernel, Chunk<Taps> band, Finish<typename Taps::Sum> finish,
+                ChunkSums<Taps>& sums) {
     for (ptrdiff_t rest = band.elements; rest > 0;) {
         band.elements = rest < kChunk + Taps::block ? rest : kChunk;
         filterChunk<Taps, rows>(kernel, band, finish, sums);
@@ -239,8 +241,8 @@ void filterRows(const PackedKernel<Taps>& kernel, const typename Taps::Source* p
                 ptrdiff_t dstStep, ptrdiff_t dstElementBytes) {
     ChunkSums<Taps> sums;
     // A block whose window and overread end within reach may be loaded freely; the last may hold elements in vain.
-    detail::Chunk<Taps> band{p, step, channels, elements, elements + slack - Taps::overread, dst, dstStep,
-                             dstElementBytes};
+    detail::Chunk<Taps> band{p,   step,    channels,       elements, elements + slack - Taps::overread,
+                             dst, dstStep, dstElementBytes};
     const auto bandsOf = [&]<int n>() {
         for (; rows >= n && kernel.size.height >= n; rows -= n) {
             detail::filterBand<Taps, n>(kernel, band, finish, sums);

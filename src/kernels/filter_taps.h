@@ -165,7 +165,8 @@ struct FloatTaps : TwoVectors<float> {
     using Coefficient = float;
     using Sum = Vec<float>;
     using Partial = TwoVectors<float>;
-    /// Three rows of two blocks have twelve sums on their way: as many as the latency of two multiply-adds a cycle asks.
+    /// Three rows of two blocks have twelve sums on their way: as many as the latency of two multiply-adds a cycle
+    /// asks.
     static constexpr int bandRows = kFewRegisters ? 2 : 3, bandBlocks = kFewRegisters ? 1 : 2;
     static constexpr bool unrolls = false;
     static constexpr int block = 16, pixels = 1, repeats = 4, overread = 0;
@@ -208,7 +209,8 @@ struct DoubleTaps : TwoVectors<double> {
     using Coefficient = double;
     using Sum = Vec<double>;
     using Partial = TwoVectors<double>;
-    /// Three rows of two blocks have twelve sums on their way: as many as the latency of two multiply-adds a cycle asks.
+    /// Three rows of two blocks have twelve sums on their way: as many as the latency of two multiply-adds a cycle
+    /// asks.
     static constexpr int bandRows = kFewRegisters ? 2 : 3, bandBlocks = kFewRegisters ? 1 : 2;
     static constexpr bool unrolls = false;
     static constexpr int block = 8, pixels = 1, repeats = 1, overread = 0;
