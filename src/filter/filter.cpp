@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 // General linear filters in one call: the neighbours of all pixels are read from memory.
-#include "frame/checks.h"
 #include "frame/plan.h"
 #include "linear_run.h"
 #include "qorcore.h"
@@ -15,10 +14,6 @@ struct Kernel {
 };
 
 QorResult divisorCheck(int32_t divisor) { return divisor == 0 ? QOR_ERR_DIVISOR : QOR_OK; }
-
-QorResult roundModeCheck(int32_t roundMode) {
-    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
-}
 
 /// The source row with its neighbours, and the destination row, must lie within their steps.
 template <Layout layout, class S, class D>
@@ -44,7 +39,9 @@ public:
     /// From the next multiple of 16 on, which every reported size allows for.
     template <class T>
     T* begin() const {
-        return reinterpret_cast<T*>((reinterpret_cast<uintptr_t>(memory_) + 15) & ~uintptr_t{15});
+        constexpr uintptr_t kAlignment = 16;
+        const auto beyond = reinterpret_cast<uintptr_t>(memory_) % kAlignment;
+        return reinterpret_cast<T*>(static_cast<uint8_t*>(memory_) + (kAlignment - beyond) % kAlignment);
     }
 
 private:
@@ -80,6 +77,12 @@ void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
     const ControlScope scope;
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
+    if constexpr (std::is_same_v<S, uint8_t>)
+        if (division.sumLimit <= ByteTaps::kSumLimit) {
+            auto* packed = area.begin<int32_t>();
+            packBytes(kernel.data, kernel.size, packed);
+            return filterBytes(packed, kernel.size, division, target);
+        }
     if (division.sumLimit <= INT32_MAX && fitsPairs(kernel)) {
         auto* packed = area.begin<int32_t>();
         packPairs<PairTaps<S>::repeats>(kernel.data, kernel.size, packed);

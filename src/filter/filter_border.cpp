@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 // General linear filters with a plan and a border.
-#include "frame/checks.h"
 #include "frame/plan.h"
 #include "linear_plan.h"
 #include "linear_run.h"
@@ -14,10 +13,6 @@ QorResult dataTypeCheck(int32_t dataType, bool floatsToo) {
 }
 
 QorResult channelsCheck(int32_t numChannels) { return numChannels < 1 || numChannels > 4 ? QOR_ERR_CHANNELS : QOR_OK; }
-
-QorResult roundModeCheck(int32_t roundMode) {
-    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
-}
 
 QorResult filterBorderGetSize(QorImageSize kernelSize, QorImageSize roi, int32_t dataType, int32_t kernelType,
                               int32_t numChannels, int32_t* pSpecSize, int32_t* pBufferSize) {
@@ -68,6 +63,14 @@ QorResult filterStepCheck(int32_t srcStep, int32_t dstStep, int64_t dstRowBytes)
     return srcStep < 1 || dstRowBytes > dstStep ? QOR_ERR_STEP : QOR_OK;
 }
 
+template <class T>
+void filterIntegers(const LinearPlan& plan, QorImageSize size, Target<T, T>& target) {
+    const Division division{plan.divisor, plan.roundMode, plan.sumLimit};
+    if constexpr (std::is_same_v<T, uint8_t>)
+        if (plan.bytesOffset != 0) return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, division, target);
+    filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, division, target);
+}
+
 template <class T, int channels>
 QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t border, const T* borderValue,
                        const QorLinearFilterPlan* pSpec, uint8_t* pBuffer) {
@@ -87,8 +90,7 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
                                                                  : -1;
     if constexpr (integerPath >= 0) {
         if (plan.pathKind == integerPath) {
-            filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, {plan.divisor, plan.roundMode, plan.sumLimit},
-                        target);
+            filterIntegers(plan, size, target);
             return QOR_OK;
         }
     }

@@ -5,6 +5,7 @@
 
 #include "frame/control_scope.h"
 #include "frame/plan.h"
+#include "kernels/filter_taps.h"
 #include "packing.h"
 
 namespace qori::filter {
@@ -14,6 +15,7 @@ constexpr int32_t kRecordBytes = 128;
 static_assert(sizeof(LinearPlan) <= kRecordBytes);
 
 constexpr int kCopies = 4;  ///< Of each packed coefficient.
+static_assert(kCopies == kernels::PairTaps<uint8_t>::repeats && kCopies == kernels::FloatTaps<float>::repeats);
 
 LinearPlan& startPlan(QorLinearFilterPlan* block, int32_t pathKind, QorImageSize size, int32_t coefficientBytes,
                       int32_t roundMode) {
@@ -97,6 +99,12 @@ void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize si
     packPairs<kCopies>(copy, size, plan.table<int32_t>(plan.packedOffset));
     const int64_t limit = is8u ? largestSum<uint8_t>(copy, size) : largestSum<int16_t>(copy, size);
     plan.sumLimit = static_cast<int32_t>(std::min<int64_t>(limit, INT32_MAX));
+    if (is8u && limit <= kernels::ByteTaps::kSumLimit) {
+        // Half of the packed kernel's region is free.
+        const int32_t pairs = (size.width + 1) / 2 * size.height;
+        plan.bytesOffset = plan.packedOffset + kCopies * int32_t{sizeof(int32_t)} * pairs;
+        packBytes(copy, size, plan.table<int32_t>(plan.bytesOffset));
+    }
     plan.fitsPairs = std::all_of(copy, copy + ptrdiff_t{size.width} * size.height,
                                  [](int16_t k) { return k != INT16_MIN && k != INT16_MAX; });
 }

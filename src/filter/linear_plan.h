@@ -23,8 +23,9 @@ struct LinearPlan {
     int32_t shiftMask;  ///< 2^n - 1
     int32_t roundMode;
     int32_t kernelOffset, packedOffset;  ///< Bytes from the start of the record.
-    int32_t fitsPairs;  ///< Every coefficient lies in -32767 to 32766: no pair of products leaves 32 bits.
-    int32_t sumLimit;   ///< No sum's magnitude is larger; INT32_MAX also where one may be.
+    int32_t fitsPairs;    ///< Every coefficient lies in -32767 to 32766: no pair of products leaves 32 bits.
+    int32_t bytesOffset;  ///< The kernel in bytes, behind the packed one, where its sums allow for them; else 0.
+    int32_t sumLimit;     ///< No sum's magnitude is larger; INT32_MAX also where one may be.
 
     template <class T>
     T* table(int32_t offset) {

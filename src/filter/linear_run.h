@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Packed kernels and rounding rules meet images: the run of every general linear filter.
 #pragma once
+#include "frame/checks.h"
 #include "frame/control_scope.h"
 #include "kernels/filter_rules.h"
 #include "kernels/filter_sums.h"
@@ -8,10 +9,15 @@
 
 namespace qori::filter {
 
+using kernels::ByteTaps;
 using kernels::DoubleTaps;
 using kernels::FloatTaps;
 using kernels::PackedKernel;
 using kernels::PairTaps;
+
+inline QorResult roundModeCheck(int32_t roundMode) {
+    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
+}
 
 /// Where results go, and how a region is cut so that its windows exist.
 template <class S, class D>
@@ -24,7 +30,7 @@ struct Target {
 
 /// Elements of a block in pixels that begin and end with it.
 constexpr PartHints partHints(int channels, int elementBytes) {
-    constexpr int kBlock = 16, kOverread = 4;
+    constexpr int kBlock = 16, kOverread = 8;
     return {channels == 4 ? kBlock / 4 : kBlock, kOverread * elementBytes};
 }
 
@@ -40,7 +46,8 @@ template <class Taps, class Rule, class S, class D>
 void filterBy(const PackedKernel<Taps>& kernel, const Rule& rule, Target<S, D>& target) {
     using Sum = typename Taps::Sum;
     const kernels::Finish<Sum> finish{
-        target.keepAlpha ? kernels::finishRow<Rule, true, Sum> : kernels::finishRow<Rule, false, Sum>, &rule};
+        target.keepAlpha ? kernels::finishRow<Rule, true, Sum> : kernels::finishRow<Rule, false, Sum>, &rule,
+        Rule::isCopy && !target.keepAlpha};
     const int n = target.channels;
     target.parts.forEach([&](const BorderPart& part) {
         const auto [x, y, width, height] = part.area;
@@ -57,10 +64,9 @@ struct Division {
 };
 
 /// By the cheapest rule that is exact for all sums.
-template <class S, class D>
-void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Division division, Target<S, D>& target) {
+template <class Taps, class S, class D>
+void divideSums(const PackedKernel<Taps>& kernel, Division division, Target<S, D>& target) {
     using Single = kernels::QuotientInSingle<D>;
-    const PackedKernel<PairTaps<S>> kernel{packed, size, {_mm256_set1_epi32(start)}};
     const auto [divisor, mode, sumLimit] = division;
     const Single single(divisor, mode);
     if (divisor == 1) return filterBy(kernel, kernels::Saturated<D>{}, target);
@@ -68,6 +74,16 @@ void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Divisi
     if (divisor > 1 && single.isPowerOfTwo())
         return filterBy(kernel, kernels::Shifted<D>{std::countr_zero(single.magnitude()), mode}, target);
     filterBy(kernel, kernels::QuotientInDouble<D>{divisor, mode}, target);
+}
+
+template <class S, class D>
+void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Division division, Target<S, D>& target) {
+    divideSums(PackedKernel<PairTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
+}
+
+template <class D>
+void filterBytes(const int32_t* packed, QorImageSize size, Division division, Target<uint8_t, D>& target) {
+    divideSums(PackedKernel<ByteTaps>{packed, size, {_mm256_setzero_si256()}}, division, target);
 }
 
 /// -0 begins a sum that may be a single product: +0 would turn a product of -0.

@@ -21,6 +21,18 @@ void packPairs(const K* kernel, QorImageSize size, int32_t* packed) {
     }
 }
 
+/// Coefficients of 8 bits in pairs as packPairs() orders them, each pair twice in a word.
+template <class K>
+void packBytes(const K* kernel, QorImageSize size, int32_t* packed) {
+    for (int32_t j = size.height - 1; j >= 0; --j) {
+        const K* const row = kernel + ptrdiff_t{j} * size.width;
+        for (int32_t i = size.width - 1; i >= 0; i -= 2) {
+            const uint32_t first = static_cast<uint8_t>(row[i]), second = i > 0 ? static_cast<uint8_t>(row[i - 1]) : 0u;
+            *packed++ = static_cast<int32_t>((first | second << 8) * 0x10001u);
+        }
+    }
+}
+
 /// Coefficients from the last to the first, `repeats` times each.
 template <int repeats, class C, class K>
 void packTurned(const K* kernel, QorImageSize size, C* packed) {

@@ -9,13 +9,13 @@
 // reaches l, t, r, b pixels to the left, above, to the right and below, and with all sides closed:
 //
 //     +-------------------------------+
-//     |            band: t rows       |   bands     whole rows whose windows leave the region above or below, with
-//     +---+-----------------------+---+             (t + l + r + ...) everything that they see, corners included
-//     | s |                       | s |   strips    columns of the other rows whose windows leave it to a side
-//     | t |       interior        | t |   interior  straight from the source
-//     | r |                       | r |
-//     +---+-----------------------+---+   Nothing outside the region is read beyond a closed side.
-//     |            band: b rows       |
+//     |         band of t rows        |   bands     rows whose windows leave the region above or below, gathered
+//     +---+-----------------------+---+             with everything that they see, corners included
+//     | s |                       | s |   strips    columns of the other rows whose windows leave it to a side,
+//     | t |       interior        | t |             gathered likewise, some rows at a time
+//     | r |                       | r |   interior  straight from the source
+//     +---+-----------------------+---+
+//     |         band of b rows        |   Nothing outside the region is read beyond a closed side.
 //     +-------------------------------+
 #pragma once
 #include "image.h"

@@ -12,12 +12,14 @@ inline constexpr int kBlockAlignment = 64;
 template <class T>
 auto* blockStart(T* block) {
     using Byte = std::conditional_t<std::is_const_v<T>, const uint8_t, uint8_t>;
-    constexpr uintptr_t mask = kBlockAlignment - 1;
-    return reinterpret_cast<Byte*>((reinterpret_cast<uintptr_t>(block) + mask) & ~mask);
+    const auto beyond = reinterpret_cast<uintptr_t>(block) % kBlockAlignment;
+    return reinterpret_cast<Byte*>(block) + (kBlockAlignment - beyond) % kBlockAlignment;
 }
 
 /// The next multiple of the alignment, for sizes of tables and rows inside a block.
-constexpr int64_t roundUpToBlock(int64_t bytes) { return (bytes + kBlockAlignment - 1) & ~int64_t{kBlockAlignment - 1}; }
+constexpr int64_t roundUpToBlock(int64_t bytes) {
+    return (bytes + kBlockAlignment - 1) & ~int64_t{kBlockAlignment - 1};
+}
 
 /// A reported size: QOR_ERR_SIZE and nothing stored where 32 bits do not hold it.
 inline QorResult reportSize(int64_t bytes, int32_t* size) {

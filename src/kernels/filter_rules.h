@@ -72,6 +72,7 @@ QORI_INLINE __m128i roundToInt32(__m256d x) {
 template <class D>
 struct Saturated {
     using Element = D;
+    static constexpr bool isCopy = false;
 
     template <class Use>
     QORI_INLINE void withRule(Use use) const {
@@ -84,6 +85,7 @@ struct Saturated {
 template <class D>
 struct Shifted {
     using Element = D;
+    static constexpr bool isCopy = false;
     int32_t shift, mode;
 
     template <class Mode>
@@ -117,6 +119,7 @@ struct Shifted {
 template <class D>
 struct QuotientInSingle {
     using Element = D;
+    static constexpr bool isCopy = false;
     int32_t divisor, mode;
 
     static constexpr uint32_t kRange = uint32_t{std::numeric_limits<D>::max()} + 1;
@@ -166,6 +169,7 @@ template <class D>
 struct QuotientInDouble {
     static_assert(sizeof(D) <= 2);
     using Element = D;
+    static constexpr bool isCopy = false;
     int32_t divisor, mode;
 
     template <class Use>
@@ -191,6 +195,7 @@ struct QuotientInDouble {
 template <class D>
 struct Kept {
     using Element = D;
+    static constexpr bool isCopy = true;
 
     template <class Use>
     QORI_INLINE void withRule(Use use) const {
@@ -202,6 +207,7 @@ struct Kept {
 template <class D>
 struct Rounded {
     using Element = D;
+    static constexpr bool isCopy = false;
     int32_t mode;
 
     template <class Use>
@@ -224,6 +230,7 @@ struct Rounded {
 template <class D>
 struct Divided {
     using Element = D;
+    static constexpr bool isCopy = false;
     int32_t divisor, mode;
 
     template <class Use>

@@ -214,10 +214,14 @@ TEST(FilterBorder, EveryQuotientIsRoundedExactly) {
     const Blocks blocks(job, 1, kIntegers, 1);
     const uint8_t zero = 0;
     for (int n = 0; n < 4000; ++n) {
-        const int16_t k = random().value<int16_t>();
-        // About the coefficient, so that quotients lie in the range and near its halves.
-        const int32_t scale = std::max(1, std::abs(int32_t{k}));
-        const int32_t divisor = random().oneIn(3) ? drawDivisor() : 1 + random().below(2 * scale), mode = n % 3;
+        auto k = random().value<int16_t>();
+        // About the coefficient, so that quotients lie in the range; halves of the divisor give integers and ties.
+        const int32_t scale = std::max(1, std::abs(int32_t{k})), mode = n % 3;
+        int32_t divisor = random().oneIn(4) ? drawDivisor() : 1 + random().below(2 * scale);
+        if (random().oneIn(2)) {
+            divisor = 1 + random().below(8000);
+            k = static_cast<int16_t>(divisor * (1 + random().below(8)) / 2);
+        }
         ASSERT_EQ(QOR_OK, qoriFilterBorderInit_16s(&k, {1, 1}, divisor, 1, 1, mode, blocks.plan));
         ASSERT_EQ(QOR_OK, call(qoriFilterBorder_8u_C1R, src.data(), 256, dst.data(), 256, job.roi, 1, &zero,
                                blocks.plan, blocks.buffer));
