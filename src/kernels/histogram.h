@@ -139,62 +139,77 @@ QORI_INLINE int32_t levelsUpTo(L value, const L* first, int32_t count) {
     return static_cast<int32_t>(at - first);
 }
 
-/// Finds bins of floats among increasing levels.
-struct FloatBins {
-    const float* levels;
-    int32_t count;
-
-    FloatBins(const float* l, int32_t n) : levels(l), count(n) {}
-
-    /// The bin, or something outside 0 .. count - 2. NaN is above no level.
-    QORI_INLINE int32_t operator()(float value) const { return levelsUpTo(value, levels, count) - 1; }
-};
-
-/// Finds bins of 16-bit elements among increasing levels: cells of 32 values narrow the search, mostly to nothing.
-struct WordBins {
-    static constexpr int kCellBits = 5;
-    static constexpr int32_t kCells = 65'536 >> kCellBits;
-    struct Cell {
-        int32_t below;   ///< Levels that are not above the cell's first value.
-        int32_t inside;  ///< Levels among its other values.
-    };
-
-    const int32_t* levels;
-    int32_t lowest;  ///< Least value of the element type.
-    Cell cells[kCells];
-
-    WordBins(const int32_t* l, int32_t n, int32_t least) : levels(l), lowest(least) {
-        int32_t k = 0, first = least;
-        for (Cell& cell : cells) {
-            while (k < n && levels[k] <= first) ++k;
-            cell.below = k;
+/// Counts 16-bit elements among increasing levels. Elements are counted by cells of 32 values, in two tables, so that
+/// equal neighbours do not wait for each other's store. Where levels lie inside a cell, its elements are searched for
+/// one by one.
+class WordBins {
+public:
+    WordBins(const int32_t* levels, int32_t count, int32_t lowest, int32_t* bins)
+        : levels_(levels), last_(count - 1), lowest_(lowest), bins_(bins) {
+        int32_t k = 0, first = lowest;
+        for (int cell = 0; cell < kCells; ++cell) {
+            while (k < count && levels[k] <= first) ++k;
+            below_[cell] = k;
             first += 1 << kCellBits;
-            while (k < n && levels[k] < first) ++k;
-            cell.inside = k - cell.below;
+            while (k < count && levels[k] < first) ++k;
+            inside_[cell] = static_cast<uint8_t>(k - below_[cell]);
         }
     }
-    QORI_INLINE int32_t operator()(int32_t value) const {
-        const Cell cell = cells[(value - lowest) >> kCellBits];
-        return cell.below + levelsUpTo(value, levels + cell.below, cell.inside) - 1;
+    template <class T>
+    QORI_NOINLINE void countRow(const T* src, ptrdiff_t pixels, int step) {
+        const auto countIn = [this](uint32_t* counts, int32_t value) {
+            const int32_t cell = (value - lowest_) >> kCellBits;
+            ++counts[cell];
+            if (inside_[cell] != 0) [[unlikely]]
+                addToBin(below_[cell] + levelsUpTo(value, levels_ + below_[cell], inside_[cell]) - 1, 1);
+        };
+        ptrdiff_t x = 0;
+        for (; x <= pixels - 2; x += 2, src += 2 * step) {
+            countIn(counts_[0], src[0]);
+            countIn(counts_[1], src[step]);
+        }
+        if (x < pixels) countIn(counts_[0], *src);
     }
+    /// Adds the counts of whole cells to their bins.
+    void finish() {
+        for (int cell = 0; cell < kCells; ++cell)
+            if (inside_[cell] == 0) addToBin(below_[cell] - 1, counts_[0][cell] + counts_[1][cell]);
+    }
+
+private:
+    static constexpr int kCellBits = 5;
+    static constexpr int32_t kCells = 65'536 >> kCellBits;
+
+    void addToBin(int32_t bin, uint32_t count) {
+        if (static_cast<uint32_t>(bin) < static_cast<uint32_t>(last_)) bins_[bin] += static_cast<int32_t>(count);
+    }
+
+    const int32_t* levels_;
+    int32_t last_;
+    int32_t lowest_;  ///< Least value of the element type.
+    int32_t* bins_;
+    int32_t below_[kCells];   ///< Levels that are not above the cell's first value.
+    uint8_t inside_[kCells];  ///< Levels among its other values.
+    uint32_t counts_[2][kCells] = {};
 };
 
-/// Counts one channel of a row through a finder of bins; step is the distance of its elements.
-template <class Bins, class T>
-QORI_NOINLINE void countByBinRow(const Bins& binOf, const T* src, ptrdiff_t pixels, int step, int32_t last,
-                                 int32_t* bins) {
-    const auto count = [=](int32_t bin) {
-        if (static_cast<uint32_t>(bin) < static_cast<uint32_t>(last)) ++bins[bin];
+/// Counts one channel of a row of floats among increasing levels; step is the distance of its elements.
+QORI_NOINLINE inline void countFloatsRow(const float* src, ptrdiff_t pixels, int step, const float* levels,
+                                         int32_t count, int32_t* bins) {
+    // Outside 0 .. count - 2 where there is no bin. NaN is above no level.
+    const auto binOf = [=](float value) { return levelsUpTo(value, levels, count) - 1; };
+    const auto countIn = [=](int32_t bin) {
+        if (static_cast<uint32_t>(bin) < static_cast<uint32_t>(count - 1)) ++bins[bin];
     };
     ptrdiff_t x = 0;
     for (; x <= pixels - 4; x += 4, src += 4 * step) {  // four searches at a time hide each other's latency
         const int32_t a = binOf(src[0]), b = binOf(src[step]), d = binOf(src[2 * step]), e = binOf(src[3 * step]);
-        count(a);
-        count(b);
-        count(d);
-        count(e);
+        countIn(a);
+        countIn(b);
+        countIn(d);
+        countIn(e);
     }
-    for (; x < pixels; ++x, src += step) count(binOf(*src));
+    for (; x < pixels; ++x, src += step) countIn(binOf(*src));
 }
 
 }  // namespace qori::kernels

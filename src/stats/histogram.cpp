@@ -72,25 +72,25 @@ void countWords(QorImageSize roi, Image<const T> src, const Channel<int32_t>* ou
         kernels::sumBins(table + c * kValues<T>, kValues<T>, kLowest<T>, out[c].levels, out[c].count, out[c].bins);
 }
 
-/// Element by element, channel by channel.
+/// One channel, element by element; src starts at its first one.
 template <class T>
 QORI_NOINLINE void countBySearch(QorImageSize roi, int stored, Image<const T> src, Channel<Level<T>> out) {
+    const auto eachRow = [&](auto count) { forEachRow(roi, count, walk(src, stored)); };
     for (int32_t k = 0; k < out.count - 1; ++k) out.bins[k] = 0;
-    const bool ordered = kernels::strictlyIncreasing(out.levels, out.count);
-    const auto finder = [&] {
-        if constexpr (std::is_floating_point_v<T>)
-            return kernels::FloatBins(out.levels, out.count);
-        else
-            return kernels::WordBins(out.levels, ordered ? out.count : 0, kLowest<T>);
-    }();
-    forEachRow(
-        roi,
-        [&](ptrdiff_t pixels, const T* row) {
-            if (ordered) return kernels::countByBinRow(finder, row, pixels, stored, out.count - 1, out.bins);
+    if (!kernels::strictlyIncreasing(out.levels, out.count)) {
+        eachRow([&](ptrdiff_t pixels, const T* row) {
             for (ptrdiff_t x = 0; x < pixels; ++x)
                 kernels::countInAllBins<Level<T>>(row[x * stored], out.levels, out.count, out.bins);
-        },
-        walk(src, stored));
+        });
+    } else if constexpr (std::is_floating_point_v<T>) {
+        eachRow([&](ptrdiff_t pixels, const T* row) {
+            kernels::countFloatsRow(row, pixels, stored, out.levels, out.count, out.bins);
+        });
+    } else {
+        kernels::WordBins bins(out.levels, out.count, kLowest<T>, out.bins);
+        eachRow([&](ptrdiff_t pixels, const T* row) { bins.countRow(row, pixels, stored); });
+        bins.finish();
+    }
 }
 
 template <class T, Layout layout>

@@ -273,21 +273,23 @@ public:
             } else {
                 kernels::reduceRow<Measure>(sums_, n, now * n, a, b);
                 room_ -= now;
+                pending_ = true;
             }
             a += now * n;
             b += now * n;
             pixels -= now;
         }
     }
-    /// Moves what the integers hold into the totals.
+    /// Moves what the integers hold into the totals, and looks how many pixels there is room for.
     void settle() {
-        const Totals moved = finish(sums_, {n, n});
-        sums_ = {};
-        double largest = 0;
-        for (int c = 0; c < n; ++c) {
-            totals.of[c] += moved.of[c];
-            largest = std::max(largest, __builtin_fabs(totals.of[c]));
+        if (pending_) {
+            const Totals moved = finish(sums_, {n, n});
+            for (int c = 0; c < n; ++c) totals.of[c] += moved.of[c];
+            sums_ = {};
+            pending_ = false;
         }
+        double largest = 0;
+        for (int c = 0; c < n; ++c) largest = std::max(largest, __builtin_fabs(totals.of[c]));
         room_ = static_cast<int64_t>(std::max(0x1p53 - largest, 0.0) / kLargestProduct);
     }
 
@@ -298,6 +300,7 @@ private:
     static constexpr int64_t kPiece = 4'096;
 
     kernels::AccumulatorsOf<Measure> sums_;
+    bool pending_ = false;
     int64_t room_ = static_cast<int64_t>(0x1p53 / kLargestProduct);  ///< Pixels that the integers may still take.
 };
 
