@@ -26,6 +26,9 @@ QORI_INLINE __m256 toFloats(const int16_t* p, ptrdiff_t n) {
     return _mm256_cvtepi32_ps(_mm256_cvtepi16_epi32(loadWords(p, n)));
 }
 
+/// Asks for p's cache line; a hint that touches nothing.
+QORI_INLINE void prefetch(const uint8_t* p) { _mm_prefetch(reinterpret_cast<const char*>(p), _MM_HINT_T0); }
+
 /// Asks for the cache line some way behind p; a hint that touches nothing.
 template <class T>
 QORI_INLINE void prefetchAhead(const T* p) {
