@@ -171,7 +171,8 @@ Row row(QorInterpolationKind kind, bool antialiasing, Sizes sizes, double best) 
                        {},
                        {}};
 #ifdef QORI_BENCH_ZIMG
-        if (kind == interpNearest || (kind != interpSuper && (antialiasing || ratio < 1))) all.peer = peerOf<T>(kind, channels, sizes);
+        if (kind == interpNearest || (kind != interpSuper && (antialiasing || ratio < 1)))
+            all.peer = peerOf<T>(kind, channels, sizes);
 #endif
         return all;
     };

@@ -9,7 +9,7 @@ namespace qori::geometry {
 template <class T>
 auto* blockStart(T* block) {
     using Byte = std::conditional_t<std::is_const_v<T>, const uint8_t, uint8_t>;
-    return reinterpret_cast<Byte*>((reinterpret_cast<uintptr_t>(block) + 63) & ~uintptr_t{63});
+    return reinterpret_cast<Byte*>(block) + (-reinterpret_cast<uintptr_t>(block) & 63);
 }
 
 constexpr int64_t roundUp(int64_t n, int64_t multiple) { return (n + multiple - 1) / multiple * multiple; }

@@ -36,8 +36,8 @@ QORI_INLINE Bytes gatherGroup(const uint8_t* row, const int32_t*& base, const ui
     return result;
 }
 
-/// dst[i] = row[offset of i] for `bytes` bytes, moved in elements of `elementBytes`. `later` is the memory of a row that
-/// will be needed soon; it is asked for, not read.
+/// dst[i] = row[offset of i] for `bytes` bytes, moved in elements of `elementBytes`. `later` is the memory of a row
+/// that will be needed soon; it is asked for, not read.
 void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst, ptrdiff_t bytes,
                int elementBytes);
 

@@ -11,6 +11,7 @@ template <int channels>
 void halveRow8u(const uint8_t* a, const uint8_t* b, ptrdiff_t later, uint8_t* dst, ptrdiff_t pixels, bool toEven);
 
 /// One channel: both directions weigh both pixels by `weight`, the result is multiplied by `scale`.
-void halveRow32f(const float* a, const float* b, ptrdiff_t later, float* dst, ptrdiff_t pixels, float weight, float scale);
+void halveRow32f(const float* a, const float* b, ptrdiff_t later, float* dst, ptrdiff_t pixels, float weight,
+                 float scale);
 
 }  // namespace qori::kernels
