@@ -118,11 +118,13 @@ public:
         const bool rowsApart = dst.step >= rowBytes_ || dst.step <= -rowBytes_;
         for (int32_t y = 0; y < tile.height; ++y) {
             const int32_t index = source_.plan.index(axis, tile.y + y);
+            const int32_t later = source_.plan.index(axis, tile.y + (y + 1 < tile.height ? y + 1 : y));
             uint8_t* to = asBytes(dst.row(y));
             if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1))
                 repeatRow(to, asBytes(dst.row(y - 1)));
             else
-                kernels::gatherRow(gather, rows_.row(index), to, rowBytes_, elementBytes<T>);
+                kernels::gatherRow(gather, rows_.row(index), asBytes(source_.at(later, source_.columns.first)), to,
+                                   rowBytes_, elementBytes<T>);
         }
     }
 

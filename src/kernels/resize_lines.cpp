@@ -60,7 +60,7 @@ QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, con
     };
     ptrdiff_t table = 0;
     for (ptrdiff_t g = 0; g < last; ++g) {
-        _mm_prefetch(reinterpret_cast<const char*>(later + ptrdiff_t{bases[g]} * bytes), _MM_HINT_T0);
+        prefetch(later + ptrdiff_t{bases[g]} * bytes);
         _mm256_storeu_ps(out + 8 * g, sum(g, table));
         table = table + 1 < cycle ? table + 1 : 0;
     }

@@ -207,7 +207,7 @@ QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_
         for (int j = 0; j < 4; ++j) sum[j] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(rows[k] + at + 8 * j), sum[j]);
     }
     if constexpr (scaled)
-        for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
+        for (__m256& part : sum) part = _mm256_mul_ps(part, _mm256_set1_ps(scale));
     storeSums(dst + at, sum, elements);
 }
 
@@ -284,12 +284,15 @@ void filterColumn(const float* const* rows, const float* weights, int32_t taps, 
 #define QORI_TAPS(T)                                                                                    \
     template void filterRows<T, 1>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
     template void filterRows<T, 3>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
-    template void filterRows<T, 4>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
-    template void filterColumn<T>(const float* const*, const float*, int32_t, float, T*, ptrdiff_t);
+    template void filterRows<T, 4>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]);
 QORI_TAPS(uint8_t)
 QORI_TAPS(uint16_t)
 QORI_TAPS(int16_t)
 QORI_TAPS(float)
 #undef QORI_TAPS
+template void filterColumn(const float* const*, const float*, int32_t, float, uint8_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const float*, int32_t, float, uint16_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const float*, int32_t, float, int16_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const float*, int32_t, float, float*, ptrdiff_t);
 
 }  // namespace qori::kernels

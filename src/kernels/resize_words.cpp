@@ -31,8 +31,8 @@ QORI_INLINE void filterGroup(const WordFilter& filter, const WordLines& lines, c
     const ptrdiff_t twoPixels = 2 * ptrdiff_t{filter.channels};
     const int32_t octet = (taps > 0 ? taps : filter.taps) / 2;
     // A group moves on by 64 bytes at most.
-    _mm_prefetch(reinterpret_cast<const char*>(lines.laterFirst + bases[0][0]), _MM_HINT_T0);
-    _mm_prefetch(reinterpret_cast<const char*>(lines.laterSecond + bases[0][0]), _MM_HINT_T0);
+    prefetch(lines.laterFirst + bases[0][0]);
+    prefetch(lines.laterSecond + bases[0][0]);
     const uint8_t* const rows[2] = {lines.first, lines.second};
     __m256i words[2];
     for (int row = 0; row < 2; ++row) {

@@ -1,4 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <array>
+#include <bit>
+
 #include "resize_jobs.h"
 
 namespace qori::test {
@@ -56,7 +59,8 @@ template <class T, class Fetch>
 void expectPixel(const Job& job, const std::vector<Tap>& columns, const std::vector<Tap>& rows, Fetch fetch, T actual) {
     if (job.method.interpolation == interpNearest) {
         const T expected = fetch(columns[0].index, rows[0].index);
-        EXPECT_EQ(0, std::memcmp(&expected, &actual, sizeof(T)));
+        using Bits = std::array<uint8_t, sizeof(T)>;
+        EXPECT_EQ(std::bit_cast<Bits>(expected), std::bit_cast<Bits>(actual));
         return;
     }
     if constexpr (std::is_same_v<T, uint8_t>)

@@ -50,7 +50,9 @@ inline double kernel(const Method& m, double distance) {
 
 inline double ratio(int src, int dst) {
     const int divisor = std::gcd(src, dst);
-    return static_cast<double>(src / divisor) / (dst / divisor);
+    src /= divisor;
+    dst /= divisor;
+    return static_cast<double>(src) / dst;
 }
 
 /// Half of the filter's width in source pixels along an axis; 0 for nearest and super.
