@@ -107,7 +107,7 @@ public:
         : source_{plan, tile},
           rows_(buffer),
           rowBytes_(ptrdiff_t{tile.width} * kPixel),
-          tables_(buffer.take<uint8_t>(2 * groups() * kernels::Gather::kLaneBytes)) {}
+          tables_(buffer.take<uint8_t>(2 * int64_t{groups()} * kernels::Gather::kLaneBytes)) {}
 
     void run(Image<const T> src, Image<T> dst, OpenSides) {
         source_.open(src, {});
@@ -204,7 +204,7 @@ public:
           rows_(buffer),
           elements_(ptrdiff_t{tile.width} * channels),
           padded_(static_cast<ptrdiff_t>(roundUp(elements_, 32))),
-          tables_(buffer.take<uint8_t>(padded_ / 8 * kernels::Gather::kLaneBytes)),
+          tables_(buffer.take<uint8_t>(int64_t{padded_} / 8 * kernels::Gather::kLaneBytes)),
           weights_(buffer.take<int16_t>(padded_)),
           pair_(buffer, padded_) {}
 

@@ -52,7 +52,7 @@ public:
             lines_.channels = channels;
             lines_.bases = buffer.take<int32_t>(ringStep_ / 8);
             lines_.order = buffer.take<int32_t>(ringStep_);
-            lines_.weights = buffer.take<float>(ringStep_ * plan.columnTaps);
+            lines_.weights = buffer.take<float>(int64_t{ringStep_} * plan.columnTaps);
         } else {
             columns_ = buffer.take<float>(kernels::tapColumnFloats(ratio, plan.columnTaps, channels));
             results_ = buffer.take<float>(8 * kernels::kTapChunk * channels);
