@@ -21,7 +21,8 @@ public:
         filter_.weights = buffer.take<int16_t>(int64_t{groups} * kernels::wordGroupBytes(filter_.taps) / 2);
         pixels_ = buffer.take<kernels::PixelTaps>(stripPixels_);
         const auto columns = static_cast<int64_t>((stripPixels_ - 1) * plan.horizontal.ratio()) + 1 + filter_.taps;
-        for (uint8_t*& line : lines_) line = buffer.take<uint8_t>(int64_t{columns} * channels + kernels::WordFilter::kOverrun);
+        for (uint8_t*& line : lines_)
+            line = buffer.take<uint8_t>(int64_t{columns} * channels + kernels::WordFilter::kOverrun);
         ring_ = buffer.take<int16_t>(int64_t{ringPairs()} * 2 * ringStep_);
     }
 
