@@ -214,6 +214,26 @@ TEST(Extrema, FirstOfEqualPixelsAcrossRowsAndPiecesOfRows) {
     at(12'287, 1);
 }
 
+TEST(Extrema, EachChannelKeepsItsFirstPieceWhenAnotherImproves) {
+    constexpr int kWidth = 30'000;
+    const auto check = [](auto function, int n) {
+        std::vector<uint8_t> image(size_t{kWidth} * 2 * static_cast<size_t>(n), 9);
+        const auto put = [&](int x, int y, int c, uint8_t value) { image.data()[(y * kWidth + x) * n + c] = value; };
+        put(5, 0, 0, 200);
+        put(12'000, 0, 2, 50);
+        for (int c = 0; c < n; ++c) put(29'999, 1, c, c == 0 ? 200 : c == 1 ? 100 : c == 2 ? 50 : 255);
+        uint8_t values[4];
+        int32_t x[4], y[4];
+        EXPECT_EQ(QOR_OK, function(image.data(), kWidth * n, {kWidth, 2}, values, x, y));
+        EXPECT_EQ((std::vector<int>{200, 100, 50}), std::vector<int>(values, values + 3));
+        EXPECT_EQ((std::vector{5, 29'999, 12'000}), std::vector(x, x + 3));
+        EXPECT_EQ((std::vector{0, 1, 0}), std::vector(y, y + 3));
+    };
+    check(qoriMaxIndx_8u_C3R, 3);
+    check(qoriMaxIndx_8u_C4R, 4);
+    check(qoriMaxIndx_8u_AC4R, 4);
+}
+
 TEST(Extrema, LowestValuesEverywhereAreFoundAtTheirFirstPixel) {
     const uint16_t zeros[6] = {};
     uint16_t value = 7;
