@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Resize of whole images; plans and buffers are made outside the timing. A peer resizes the planes of a packed image
-// one by one and always widens its filter on reductions, so it stands beside the antialiasing forms there.
+// one by one and widens all filters but nearest on reductions, so it stands beside the antialiasing forms there.
 #include "bench.h"
 
 #ifdef QORI_BENCH_ZIMG
@@ -132,15 +132,17 @@ std::function<void()> peerOf(QorInterpolationKind kind, int planes, Sizes sizes)
     size_t bytes = 0;
     zimg_filter_graph_get_tmp_size(graph.get(), &bytes);
     const Block buffer = allocate(bytes);
-    const Image<T> src(sizes.src, 1), dst(sizes.dst, 1);
+    std::vector<std::pair<Image<T>, Image<T>>> images;
+    for (int i = 0; i < planes; ++i) images.emplace_back(Image<T>(sizes.src, 1), Image<T>(sizes.dst, 1));
     return [=] {
         zimg_image_buffer_const in{};
         zimg_image_buffer out{};
         in.version = out.version = ZIMG_API_VERSION;
-        in.plane[0] = {src.data(), src.step(), ZIMG_BUFFER_MAX};
-        out.plane[0] = {dst.data(), dst.step(), ZIMG_BUFFER_MAX};
-        for (int i = 0; i < planes; ++i)
+        for (const auto& [src, dst] : images) {
+            in.plane[0] = {src.data(), src.step(), ZIMG_BUFFER_MAX};
+            out.plane[0] = {dst.data(), dst.step(), ZIMG_BUFFER_MAX};
             zimg_filter_graph_process(graph.get(), &in, &out, buffer.get(), nullptr, nullptr, nullptr, nullptr);
+        }
     };
 }
 #endif
@@ -169,7 +171,8 @@ Row row(QorInterpolationKind kind, bool antialiasing, Sizes sizes, double best) 
                        {},
                        {}};
 #ifdef QORI_BENCH_ZIMG
-        if (kind != interpSuper && (antialiasing || ratio < 1)) all.peer = peerOf<T>(kind, channels, sizes);
+        if (kind == interpNearest || (kind != interpSuper && (antialiasing || ratio < 1)))
+            all.peer = peerOf<T>(kind, channels, sizes);
 #endif
         return all;
     };

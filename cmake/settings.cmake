@@ -7,7 +7,7 @@ set(CMAKE_CXX_VISIBILITY_PRESET hidden)
 set(CMAKE_C_VISIBILITY_PRESET hidden)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
 set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
-option(QORI_SANITIZE "Address and undefined-behaviour sanitizers" OFF)
+set(QORI_SANITIZE OFF CACHE STRING "ON: address and undefined-behaviour sanitizers; thread: data races")
 option(QORI_WERROR "Treat warnings as errors" OFF)
 
 find_program(QORI_CCACHE ccache)
@@ -27,7 +27,10 @@ add_library(qori_target INTERFACE)
 target_compile_options(qori_target INTERFACE
     $<$<COMPILE_LANGUAGE:C,CXX>:-mavx2 -mfma -ffp-contract=off -fno-math-errno>
     $<$<AND:$<PLATFORM_ID:Windows>,$<COMPILE_LANGUAGE:C,CXX>>:-mfpmath=sse -mstackrealign>)
-if(QORI_SANITIZE)
+if(QORI_SANITIZE STREQUAL "thread")
+    add_compile_options("$<$<COMPILE_LANGUAGE:C,CXX>:-fsanitize=thread>")
+    add_link_options(-fsanitize=thread)
+elseif(QORI_SANITIZE)
     # Unaligned elements are part of the contract (steps of any value). The address sanitizer sees null and stray pointers
     # itself; its checks are calls in large functions, or these would take minutes to compile.
     set(sanitizers -fsanitize=address,undefined -fno-sanitize=alignment,null,object-size,vptr,pointer-overflow

@@ -34,6 +34,14 @@ target_link_options(companion PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
 set_target_properties(companion PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 add_test(NAME companion COMMAND companion)
 
+# Tiles of one image made in several threads; the preset tsan watches them.
+find_package(Threads REQUIRED)
+add_executable(resize_threads checks/resize_threads.cpp)
+target_link_libraries(resize_threads PRIVATE qorik5_link qori_warnings Threads::Threads)
+target_link_options(resize_threads PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
+set_target_properties(resize_threads PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
+add_test(NAME resize_threads COMMAND resize_threads)
+
 # The README's example is compiled and run as it stands there.
 set(readme ${PROJECT_SOURCE_DIR}/README.md)
 set(example ${CMAKE_CURRENT_BINARY_DIR}/readme_example.c)

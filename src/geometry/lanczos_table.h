@@ -21,7 +21,8 @@ constexpr double sineNearZero(double x) {
 
 /// sin(pi t) for 0 <= t <= 3.
 constexpr double sineOfPi(double t) {
-    const int turns = static_cast<int>(t + 0.5);
+    int turns = 0;
+    while (t - turns > 0.5) ++turns;
     const double sine = sineNearZero(std::numbers::pi * (t - turns));
     return turns % 2 == 0 ? sine : -sine;
 }

@@ -4,6 +4,7 @@
 #include "resize_half_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
+#include "resize_words_run.h"
 
 namespace qori::geometry {
 namespace {
@@ -93,9 +94,11 @@ auto withWay(const ResizePlan& plan, Visit visit) {
         if (plan.interpolation == interpNearest) return visit.template operator()<NearestTile<T, channels>>();
         if constexpr (HalfTile<T, channels>::exists)
             if (HalfTile<T, channels>::suits(plan)) return visit.template operator()<HalfTile<T, channels>>();
-        if constexpr (std::is_same_v<T, uint8_t>)
+        if constexpr (std::is_same_v<T, uint8_t>) {
             if (plan.interpolation == interpLinear && plan.antialiasing == 0)
                 return visit.template operator()<FixedLinearTile<channels>>();
+            if (WordsTile<channels>::suits(plan)) return visit.template operator()<WordsTile<channels>>();
+        }
         return visit.template operator()<TapsTile<T, channels>>();
     }
 }

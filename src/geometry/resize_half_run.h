@@ -27,11 +27,12 @@ public:
         for (int32_t y = 0; y < tile.height; ++y) {
             const T* upper = source_.at(2 * (tile.y + y), 2 * tile.x);
             const T* lower = source_.at(2 * (tile.y + y) + 1, 2 * tile.x);
+            const ptrdiff_t later = y + 1 < tile.height ? 2 * source_.image.step : 0;
             if constexpr (std::is_same_v<T, float>)
-                kernels::halveRow32f(upper, lower, dst.row(y), tile.width, isSuper ? 1.0f : 0.5f,
+                kernels::halveRow32f(upper, lower, later, dst.row(y), tile.width, isSuper ? 1.0f : 0.5f,
                                      isSuper ? 0.25f : 1.0f);
             else
-                kernels::halveRow8u<channels>(upper, lower, dst.row(y), tile.width, isSuper);
+                kernels::halveRow8u<channels>(upper, lower, later, dst.row(y), tile.width, isSuper);
         }
     }
 

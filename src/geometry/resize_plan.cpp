@@ -2,6 +2,7 @@
 #include "resize_plan.h"
 
 #include "frame/control_scope.h"
+#include "kernels/resize_words.h"
 #include "lanczos_table.h"
 
 namespace qori::geometry {
@@ -147,6 +148,32 @@ int32_t periodOf(const ResizePlan& plan, int32_t floatsPerColumn) {
     return period;
 }
 
+/// Whether the integer kernels hold the weights of an axis, whose sums are `sum`, and those are multiples of `unit`.
+bool fitsWords(const ResizePlan& plan, const Axis& axis, int32_t taps, double sum, double unit) {
+    if (axis.ratio() > kernels::kWordRatio || taps > kernels::kWordTaps) return false;
+    const bool isSuper = plan.interpolation == interpSuper;
+    const auto* weights = plan.table<float>(axis.weightTable);
+    for (int32_t i = isSuper ? axis.targetReduced : axis.targetLength; i > 0; --i) {
+        double magnitude = 0;
+        for (int32_t k = 0; k < taps; ++k, ++weights) {
+            const double w = static_cast<double>(*weights);
+            magnitude += __builtin_fabs(w);
+            if (unit > 0 && __builtin_floor(w / unit) * unit != w) return false;
+        }
+        if (!(magnitude <= kernels::kWordGain * sum)) return false;
+    }
+    return true;
+}
+
+/// Cubic 8u is defined in single precision. Where its weights are short binary fractions, as for simple ratios, nothing
+/// is rounded before the end in either arithmetic.
+bool fitsWords(const ResizePlan& plan) {
+    const bool exact = plan.interpolation == interpCubic && plan.antialiasing == 0;
+    const auto sum = [&](const Axis& axis) { return plan.interpolation == interpSuper ? axis.ratio() : 1; };
+    return fitsWords(plan, plan.horizontal, plan.columnTaps, sum(plan.horizontal), exact ? 0x1p-7 : 0) &&
+           fitsWords(plan, plan.vertical, plan.rowTaps, sum(plan.vertical), exact ? 0x1p-14 : 0);
+}
+
 }  // namespace
 
 int32_t ResizePlan::lastTap(const Axis& axis, int32_t position) const {
@@ -246,6 +273,7 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
         });
     }
     plan.columnPeriod = periodOf(plan, plan.columnTaps);
+    plan.words = fitsWords(plan);
 }
 
 void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
@@ -257,6 +285,7 @@ void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
     plan.columnPeriod = plan.horizontal.targetReduced;
     fillSuperAxis(builder, plan.horizontal, plan.columnTaps);
     fillSuperAxis(builder, plan.vertical, plan.rowTaps);
+    plan.words = fitsWords(plan);
 }
 
 }  // namespace qori::geometry

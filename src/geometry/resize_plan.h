@@ -1,16 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // The plan of a resize: a record and its tables in the caller's block, and what can be asked of it.
 #pragma once
-#include "frame/image.h"
+#include "frame/plan.h"
 
 namespace qori::geometry {
-
-/// Where a caller's record or buffer begins inside its block.
-template <class T>
-auto* blockStart(T* block) {
-    using Byte = std::conditional_t<std::is_const_v<T>, const uint8_t, uint8_t>;
-    return reinterpret_cast<Byte*>((reinterpret_cast<uintptr_t>(block) + 63) & ~uintptr_t{63});
-}
 
 constexpr int64_t roundUp(int64_t n, int64_t multiple) { return (n + multiple - 1) / multiple * multiple; }
 
@@ -34,6 +27,7 @@ struct ResizePlan {
     Axis vertical, horizontal;
     int32_t columnTaps, rowTaps;  ///< Weights per position of the two directions.
     int32_t columnPeriod;         ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
+    int32_t words;                ///< Whether 8u is summed in integers: see fitsWords() for what that takes.
 
     template <class T>
     const T* table(int32_t offset) const {

@@ -107,7 +107,7 @@ public:
         : source_{plan, tile},
           rows_(buffer),
           rowBytes_(ptrdiff_t{tile.width} * kPixel),
-          tables_(buffer.take<uint8_t>(2 * groups() * kernels::Gather::kLaneBytes)) {}
+          tables_(buffer.take<uint8_t>(2 * int64_t{groups()} * kernels::Gather::kLaneBytes)) {}
 
     void run(Image<const T> src, Image<T> dst, OpenSides) {
         source_.open(src, {});
@@ -118,11 +118,13 @@ public:
         const bool rowsApart = dst.step >= rowBytes_ || dst.step <= -rowBytes_;
         for (int32_t y = 0; y < tile.height; ++y) {
             const int32_t index = source_.plan.index(axis, tile.y + y);
+            const int32_t later = source_.plan.index(axis, tile.y + (y + 1 < tile.height ? y + 1 : y));
             uint8_t* to = asBytes(dst.row(y));
             if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1))
                 repeatRow(to, asBytes(dst.row(y - 1)));
             else
-                kernels::gatherRow(gather, rows_.row(index), to, rowBytes_, elementBytes<T>);
+                kernels::gatherRow(gather, rows_.row(index), asBytes(source_.at(later, source_.columns.first)), to,
+                                   rowBytes_, elementBytes<T>);
         }
     }
 
@@ -202,7 +204,7 @@ public:
           rows_(buffer),
           elements_(ptrdiff_t{tile.width} * channels),
           padded_(static_cast<ptrdiff_t>(roundUp(elements_, 32))),
-          tables_(buffer.take<uint8_t>(padded_ / 8 * kernels::Gather::kLaneBytes)),
+          tables_(buffer.take<uint8_t>(int64_t{padded_} / 8 * kernels::Gather::kLaneBytes)),
           weights_(buffer.take<int16_t>(padded_)),
           pair_(buffer, padded_) {}
 

@@ -40,9 +40,9 @@ class TapsTile {
 public:
     TapsTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer) : source_{plan, tile} {
         const double ratio = plan.horizontal.ratio();
-        byLines_ = kernels::suitsLines(ratio);
+        byLines_ = kernels::suitsLines(ratio, plan.columnTaps, channels, plan.columnPeriod == 1);
         stripPixels_ = byLines_ ? lineStripOf(tile.width) : stripOf(tile.width, plan.rowTaps);
-        ringRows_ = plan.rowTaps + kernels::kTapRows;
+        ringRows_ = byLines_ ? plan.rowTaps : plan.rowTaps + kernels::kTapRows;
         ringStep_ = static_cast<ptrdiff_t>(roundUp(int64_t{stripPixels_} * channels, kernels::kTapBlock));
         pixels_ = buffer.take<kernels::PixelTaps>(tile.width);
         pairs_ = isLinear() ? buffer.take<float>(2 * int64_t{tile.width}) : nullptr;
@@ -52,7 +52,7 @@ public:
             lines_.channels = channels;
             lines_.bases = buffer.take<int32_t>(ringStep_ / 8);
             lines_.order = buffer.take<int32_t>(ringStep_);
-            lines_.weights = buffer.take<float>(ringStep_ * plan.columnTaps);
+            lines_.weights = buffer.take<float>(int64_t{ringStep_} * plan.columnTaps);
         } else {
             columns_ = buffer.take<float>(kernels::tapColumnFloats(ratio, plan.columnTaps, channels));
             results_ = buffer.take<float>(8 * kernels::kTapChunk * channels);
@@ -84,7 +84,7 @@ private:
 
     /// Strips whose tables stay in the second-level cache. Longer ones follow the source better than shorter ones.
     static int32_t lineStripOf(int32_t width) {
-        constexpr int32_t kElements = 4096;
+        constexpr int32_t kElements = 2048;
         constexpr int32_t pixels = kElements / channels / kernels::kTapChunk * kernels::kTapChunk;
         return width < pixels ? width : pixels;
     }
@@ -185,10 +185,9 @@ private:
         if constexpr (std::is_same_v<T, float>) {
             if (ends_.whole) line = from;
         }
-        if (line == line_)
-            kernels::expandLine<T, channels>(from, ends_.elements, ends_.left, ends_.right,
-                                             source_.at(row + 1, ends_.first), line_);
-        kernels::filterLine(lines_, line, ringRow(filtered++));
+        if (line == line_) kernels::expandLine<T, channels>(from, ends_.elements, ends_.left, ends_.right, line_);
+        kernels::filterLine(lines_, line, asBytes(source_.at(row + 1, ends_.first)), elementBytes<T>,
+                            ringRow(filtered++));
     }
 
     /// Filters the next eight rows of the sequence; where there are fewer, the last is done again.

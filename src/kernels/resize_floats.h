@@ -26,11 +26,14 @@ QORI_INLINE __m256 toFloats(const int16_t* p, ptrdiff_t n) {
     return _mm256_cvtepi32_ps(_mm256_cvtepi16_epi32(loadWords(p, n)));
 }
 
-/// Asks for the cache line some way behind p; a hint that touches nothing.
+/// Asks for p's cache line; a hint that touches nothing.
+QORI_INLINE void prefetch(const uint8_t* p) { _mm_prefetch(reinterpret_cast<const char*>(p), _MM_HINT_T0); }
+
+/// Asks for the cache line some way behind p.
 template <class T>
 QORI_INLINE void prefetchAhead(const T* p) {
-    constexpr uintptr_t kBytes = 1024;
-    _mm_prefetch(reinterpret_cast<const char*>(reinterpret_cast<uintptr_t>(p) + kBytes), _MM_HINT_T0);
+    constexpr int kBytes = 1024;
+    prefetch(reinterpret_cast<const uint8_t*>(p) + kBytes);
 }
 
 }  // namespace qori::kernels

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "resize_gather.h"
 
+#include "resize_floats.h"
+
 namespace qori::kernels {
 namespace {
 
@@ -33,11 +35,15 @@ void makeMask(uint8_t* mask, const int32_t* offsets, int32_t base) {
 }
 
 template <int windows>
-QORI_NOINLINE void gatherRowOf(const Gather& gather, const uint8_t* row, uint8_t* dst, ptrdiff_t bytes) {
+QORI_NOINLINE void gatherRowOf(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst,
+                               ptrdiff_t bytes) {
     const int32_t* base = gather.bases;
     const uint8_t* mask = gather.masks;
     ptrdiff_t i = 0;
-    for (; i + 32 <= bytes; i += 32) store(dst + i, gatherGroup<windows>(row, base, mask));
+    for (; i + 32 <= bytes; i += 32) {
+        if constexpr (windows > 1) prefetch(later + base[0]);
+        store(dst + i, gatherGroup<windows>(row, base, mask));
+    }
     if (i < bytes) storePartial(dst + i, gatherGroup<windows>(row, base, mask), bytes - i);
 }
 
@@ -102,12 +108,13 @@ Gather buildGather(uint8_t* memory, ptrdiff_t groups, int32_t rowBytes) {
     return gather;
 }
 
-void gatherRow(const Gather& gather, const uint8_t* row, uint8_t* dst, ptrdiff_t bytes, int elementBytes) {
+void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst, ptrdiff_t bytes,
+               int elementBytes) {
     switch (gather.windows) {
-        case 1: return gatherRowOf<1>(gather, row, dst, bytes);
-        case 2: return gatherRowOf<2>(gather, row, dst, bytes);
-        case 3: return gatherRowOf<3>(gather, row, dst, bytes);
-        case 4: return gatherRowOf<4>(gather, row, dst, bytes);
+        case 1: return gatherRowOf<1>(gather, row, later, dst, bytes);
+        case 2: return gatherRowOf<2>(gather, row, later, dst, bytes);
+        case 3: return gatherRowOf<3>(gather, row, later, dst, bytes);
+        case 4: return gatherRowOf<4>(gather, row, later, dst, bytes);
         default: break;
     }
     switch (elementBytes) {

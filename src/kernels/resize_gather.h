@@ -36,8 +36,10 @@ QORI_INLINE Bytes gatherGroup(const uint8_t* row, const int32_t*& base, const ui
     return result;
 }
 
-/// dst[i] = row[offset of i] for `bytes` bytes, moved in elements of `elementBytes`.
-void gatherRow(const Gather& gather, const uint8_t* row, uint8_t* dst, ptrdiff_t bytes, int elementBytes);
+/// dst[i] = row[offset of i] for `bytes` bytes, moved in elements of `elementBytes`. `later` is the memory of a row
+/// that will be needed soon; it is asked for, not read.
+void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst, ptrdiff_t bytes,
+               int elementBytes);
 
 /// The fixed-point horizontal pass of linear 8u. A group is 16 pairs of neighbours (p0, p1); `weights` holds -2w per
 /// pair, w in 0..16384. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.

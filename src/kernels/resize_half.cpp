@@ -51,14 +51,14 @@ QORI_INLINE void halveBlock(const uint8_t* a, const uint8_t* b, uint8_t* dst) {
 }
 
 template <int channels, bool toEven>
-QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, uint8_t* dst, ptrdiff_t bytes) {
+QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, ptrdiff_t later, uint8_t* dst, ptrdiff_t bytes) {
     constexpr int kResult = 2 * kStride<channels>;
     constexpr int kExcess =
         16 - kStride<channels>;  // bytes beyond the block that are read and, for three channels, written
     ptrdiff_t i = 0;
     for (; i + kResult + kExcess <= bytes; i += kResult) {
-        prefetchAhead(a + 2 * i);
-        prefetchAhead(b + 2 * i);
+        prefetch(a + later + 2 * i);
+        prefetch(b + later + 2 * i);
         halveBlock<channels, toEven>(a + 2 * i, b + 2 * i, dst + i);
     }
     for (; i < bytes; i += kResult) {
@@ -76,15 +76,16 @@ QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, uint8_t* dst, 
 }  // namespace
 
 template <int channels>
-void halveRow8u(const uint8_t* a, const uint8_t* b, uint8_t* dst, ptrdiff_t pixels, bool toEven) {
-    (toEven ? halveRowOf<channels, true> : halveRowOf<channels, false>)(a, b, dst, pixels * channels);
+void halveRow8u(const uint8_t* a, const uint8_t* b, ptrdiff_t later, uint8_t* dst, ptrdiff_t pixels, bool toEven) {
+    (toEven ? halveRowOf<channels, true> : halveRowOf<channels, false>)(a, b, later, dst, pixels * channels);
 }
 
-template void halveRow8u<1>(const uint8_t*, const uint8_t*, uint8_t*, ptrdiff_t, bool);
-template void halveRow8u<3>(const uint8_t*, const uint8_t*, uint8_t*, ptrdiff_t, bool);
-template void halveRow8u<4>(const uint8_t*, const uint8_t*, uint8_t*, ptrdiff_t, bool);
+template void halveRow8u<1>(const uint8_t*, const uint8_t*, ptrdiff_t, uint8_t*, ptrdiff_t, bool);
+template void halveRow8u<3>(const uint8_t*, const uint8_t*, ptrdiff_t, uint8_t*, ptrdiff_t, bool);
+template void halveRow8u<4>(const uint8_t*, const uint8_t*, ptrdiff_t, uint8_t*, ptrdiff_t, bool);
 
-void halveRow32f(const float* a, const float* b, float* dst, ptrdiff_t pixels, float weight, float scale) {
+void halveRow32f(const float* a, const float* b, ptrdiff_t later, float* dst, ptrdiff_t pixels, float weight,
+                 float scale) {
     const __m256 weights = _mm256_set1_ps(weight), scales = _mm256_set1_ps(scale);
     const auto mix = [=](__m256 first, __m256 second) {
         return _mm256_fmadd_ps(weights, second, _mm256_mul_ps(weights, first));
@@ -99,8 +100,8 @@ void halveRow32f(const float* a, const float* b, float* dst, ptrdiff_t pixels, f
     };
     ptrdiff_t i = 0;
     for (; i + 8 <= pixels; i += 8) {
-        prefetchAhead(a + 2 * i);
-        prefetchAhead(b + 2 * i);
+        prefetch(reinterpret_cast<const uint8_t*>(a + 2 * i) + later);
+        prefetch(reinterpret_cast<const uint8_t*>(b + 2 * i) + later);
         block(i, 8);
     }
     if (i < pixels) block(i, pixels - i);

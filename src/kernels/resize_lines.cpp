@@ -6,25 +6,102 @@
 namespace qori::kernels {
 namespace {
 
-template <int taps>
-QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, float* out) {
-    const int32_t n = taps > 0 ? taps : filter.taps;
-    const int32_t* bases = filter.bases;
-    const int32_t* order = filter.order;
-    const float* weights = filter.weights;
-    const ptrdiff_t pixel = filter.channels;
-    for (ptrdiff_t g = 0; g < filter.groups; ++g, order += 8, weights += 8 * n, out += 8) {
-        const float* window = line + bases[g];
-        const __m256i places = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(order));
-        const auto gather = [&] { return _mm256_permutevar8x32_ps(_mm256_loadu_ps(window), places); };
-        __m256 sum = _mm256_mul_ps(_mm256_loadu_ps(weights), gather());
-#pragma GCC unroll 8
-        for (int32_t k = 1; k < n; ++k) {
-            window += pixel;
-            sum = _mm256_fmadd_ps(_mm256_loadu_ps(weights + 8 * k), gather(), sum);
-        }
-        _mm256_storeu_ps(out, sum);
+using Windows = LineFilter::Windows;
+
+/// Eight results. `taps` 0 is any number.
+template <int taps, Windows windows>
+QORI_INLINE __m256 sumWindows(const float* window, __m256i order, const float* weights, int32_t count,
+                              ptrdiff_t pixel) {
+    const int32_t n = taps > 0 ? taps : count;
+    const __m256 second = _mm256_castsi256_ps(_mm256_slli_epi32(order, 28));
+    const auto gather = [&] {
+        const __m256 low = _mm256_permutevar8x32_ps(_mm256_loadu_ps(window), order);
+        if constexpr (windows == Windows::one) return low;
+        const __m256 high = _mm256_permutevar8x32_ps(_mm256_loadu_ps(window + 8), order);
+        return _mm256_blendv_ps(low, high, second);
+    };
+    __m256 sum = _mm256_mul_ps(_mm256_loadu_ps(weights), gather());
+#pragma GCC unroll 12
+    for (int32_t k = 1; k < n; ++k) {
+        window += pixel;
+        sum = _mm256_fmadd_ps(_mm256_loadu_ps(weights + 8 * k), gather(), sum);
     }
+    return sum;
+}
+
+/// Eight results of one channel, two source columns apart. Their order becomes right at the end.
+template <int taps>
+QORI_INLINE __m256 sumPairs(const float* window, const float* weights, int32_t count) {
+    const int32_t n = taps > 0 ? taps : count;
+    __m256 sum = _mm256_setzero_ps();
+#pragma GCC unroll 12
+    for (int32_t k = 0; k < n; k += 2, window += 2) {
+        const __m256 low = _mm256_loadu_ps(window), high = _mm256_loadu_ps(window + 8);
+        const __m256 even = _mm256_shuffle_ps(low, high, 0x88), odd = _mm256_shuffle_ps(low, high, 0xDD);
+        const __m256 first = _mm256_loadu_ps(weights + 8 * k);
+        sum = k == 0 ? _mm256_mul_ps(first, even) : _mm256_fmadd_ps(first, even, sum);
+        sum = _mm256_fmadd_ps(_mm256_loadu_ps(weights + 8 * k + 8), odd, sum);
+    }
+    return _mm256_castpd_ps(_mm256_permute4x64_pd(_mm256_castps_pd(sum), 0xD8));
+}
+
+template <int taps, Windows windows>
+QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, const uint8_t* later, int bytes,
+                                float* out) {
+    const ptrdiff_t pixel = filter.channels, tableFloats = 8 * ptrdiff_t{taps > 0 ? taps : filter.taps};
+    const ptrdiff_t cycle = filter.cycle > 0 ? filter.cycle : filter.groups, last = filter.groups - 1;
+    const int32_t *bases = filter.bases, *order = filter.order;
+    const float* weights = filter.weights;
+    const auto sum = [&](ptrdiff_t g, ptrdiff_t table) {
+        const float* from = weights + table * tableFloats;
+        if constexpr (windows == Windows::pairs) return sumPairs<taps>(line + bases[g], from, filter.taps);
+        const __m256i places = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(order + 8 * table));
+        return sumWindows<taps, windows>(line + bases[g], places, from, filter.taps, pixel);
+    };
+    ptrdiff_t table = 0;
+    for (ptrdiff_t g = 0; g < last; ++g) {
+        prefetch(later + ptrdiff_t{bases[g]} * bytes);
+        _mm256_storeu_ps(out + 8 * g, sum(g, table));
+        table = table + 1 < cycle ? table + 1 : 0;
+    }
+    _mm256_storeu_ps(out + 8 * last, sum(last, last));
+}
+
+template <int taps>
+void filterLineOf(const LineFilter& filter, const float* line, const uint8_t* later, int bytes, float* out) {
+    switch (filter.windows) {
+        case Windows::one: return filterLineOf<taps, Windows::one>(filter, line, later, bytes, out);
+        case Windows::two: return filterLineOf<taps, Windows::two>(filter, line, later, bytes, out);
+        case Windows::pairs: return filterLineOf<taps, Windows::pairs>(filter, line, later, bytes, out);
+    }
+}
+
+/// Whether a group's tables are those of `cycle` groups before.
+bool repeats(const LineFilter& filter, ptrdiff_t g, ptrdiff_t cycle) {
+    __m256i difference = _mm256_setzero_si256();
+    const auto compare = [&](const auto* a, const auto* b) {
+        difference = _mm256_or_si256(difference, _mm256_xor_si256(toInteger(load(a).v), toInteger(load(b).v)));
+    };
+    compare(filter.order + 8 * g, filter.order + 8 * (g - cycle));
+    for (int32_t k = 0; k < filter.taps; ++k)
+        compare(filter.weights + 8 * (g * filter.taps + k), filter.weights + 8 * ((g - cycle) * filter.taps + k));
+    return _mm256_testz_si256(difference, difference) != 0;
+}
+
+/// Finds the cycle and which windows serve.
+void inspect(LineFilter& filter) {
+    const ptrdiff_t cycle = filter.channels == 3 ? 3 : 1;  // eight pixels for three channels
+    filter.cycle = filter.groups > cycle ? cycle : 0;
+    for (ptrdiff_t g = cycle; g + 1 < filter.groups && filter.cycle > 0; ++g)
+        if (!repeats(filter, g, cycle)) filter.cycle = 0;
+    bool one = true, pairs = filter.cycle == 1 && filter.taps % 2 == 0;
+    for (ptrdiff_t i = 0; i < 8 * filter.groups; ++i) {
+        one = one && filter.order[i] < 8;
+        pairs = pairs && filter.order[i] == 2 * (i & 7);
+    }
+    for (ptrdiff_t i = 0; i < 8 * filter.groups * filter.taps; ++i)
+        pairs = pairs && filter.weights[i] == filter.weights[i & ~ptrdiff_t{7}];
+    filter.windows = one ? Windows::one : pairs ? Windows::pairs : Windows::two;
 }
 
 template <int channels>
@@ -53,23 +130,23 @@ void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const 
         filter.bases[g] = base;
         for (int i = 0; i < 8; ++i) filter.order[8 * g + i] = places[i] - base;
     }
+    inspect(filter);
 }
 
-void filterLine(const LineFilter& filter, const float* line, float* out) {
+void filterLine(const LineFilter& filter, const float* line, const uint8_t* later, int bytes, float* out) {
     switch (filter.taps) {
-        case 2: return filterLineOf<2>(filter, line, out);
-        case 4: return filterLineOf<4>(filter, line, out);
-        case 6: return filterLineOf<6>(filter, line, out);
-        default: return filterLineOf<0>(filter, line, out);
+        case 2: return filterLineOf<2>(filter, line, later, bytes, out);
+        case 4: return filterLineOf<4>(filter, line, later, bytes, out);
+        case 6: return filterLineOf<6>(filter, line, later, bytes, out);
+        case 8: return filterLineOf<8>(filter, line, later, bytes, out);
+        case 12: return filterLineOf<12>(filter, line, later, bytes, out);
+        default: return filterLineOf<0>(filter, line, later, bytes, out);
     }
 }
 
 template <class T, int channels>
-void expandLine(const T* row, ptrdiff_t elements, int32_t left, int32_t right, const T* nextRow, float* line) {
+void expandLine(const T* row, ptrdiff_t elements, int32_t left, int32_t right, float* line) {
     float* const inside = line + ptrdiff_t{left} * channels;
-    constexpr ptrdiff_t kPerLine = 64 / static_cast<ptrdiff_t>(sizeof(T));
-    for (ptrdiff_t i = 0; i < elements; i += kPerLine)
-        _mm_prefetch(reinterpret_cast<const char*>(nextRow + i), _MM_HINT_T0);
     ptrdiff_t i = 0;
     for (; i + 8 <= elements; i += 8) _mm256_storeu_ps(inside + i, toFloats(row + i, 8));
     if (i < elements) _mm256_storeu_ps(inside + i, toFloats(row + i, elements - i));
@@ -77,10 +154,10 @@ void expandLine(const T* row, ptrdiff_t elements, int32_t left, int32_t right, c
     repeatFloats<channels>(inside + elements - channels, inside + elements, right);
 }
 
-#define QORI_LINES(T)                                                                        \
-    template void expandLine<T, 1>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*); \
-    template void expandLine<T, 3>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*); \
-    template void expandLine<T, 4>(const T*, ptrdiff_t, int32_t, int32_t, const T*, float*);
+#define QORI_LINES(T)                                                              \
+    template void expandLine<T, 1>(const T*, ptrdiff_t, int32_t, int32_t, float*); \
+    template void expandLine<T, 3>(const T*, ptrdiff_t, int32_t, int32_t, float*); \
+    template void expandLine<T, 4>(const T*, ptrdiff_t, int32_t, int32_t, float*);
 QORI_LINES(uint8_t)
 QORI_LINES(uint16_t)
 QORI_LINES(int16_t)

@@ -67,13 +67,14 @@ QORI_NOINLINE void turnRows(const T* const from[kTapRows], ptrdiff_t at, ptrdiff
                             float* out) {
     const T* rows[kTapRows];  // not reloaded after every store
     for (int j = 0; j < kTapRows; ++j) rows[j] = from[j];
-    // Eight rows at once are more streams than processors follow by themselves.
-    const auto bytes = elements * static_cast<ptrdiff_t>(sizeof(T));
-    for (int j = 0; j < kTapRows; ++j)
-        for (ptrdiff_t b = 0; b < bytes; b += 64) prefetchAhead(reinterpret_cast<const uint8_t*>(rows[j] + at) + b);
     ptrdiff_t done = 0;
-    // Elements beyond the ones asked for, but inside the row, keep the vectors whole.
-    for (; done < elements && at + done + 8 <= legalEnd; done += 8) turnIn(rows, at + done, 8, out + 8 * done);
+    // Elements beyond the ones asked for, but inside the row, keep the vectors whole. Eight rows at once are more
+    // streams than processors follow by themselves: each block asks for as many lines as it uses up.
+    constexpr int kLines = sizeof(T);
+    for (int row = 0; done < elements && at + done + 8 <= legalEnd; done += 8, row = (row + kLines) & (kTapRows - 1)) {
+        for (int j = row; j < row + kLines; ++j) prefetchAhead(rows[j] + at + done);
+        turnIn(rows, at + done, 8, out + 8 * done);
+    }
     if (done < elements) turnIn(rows, at + done, elements - done, out + 8 * done);
 }
 
@@ -206,13 +207,24 @@ QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_
         for (int j = 0; j < 4; ++j) sum[j] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(rows[k] + at + 8 * j), sum[j]);
     }
     if constexpr (scaled)
-        for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
+        for (__m256& part : sum) part = _mm256_mul_ps(part, _mm256_set1_ps(scale));
     storeSums(dst + at, sum, elements);
 }
 
 template <class T, int taps, bool scaled>
 QORI_NOINLINE void sumColumn(const float* const* rows, const float* weights, int32_t count, float scale, T* dst,
                              ptrdiff_t elements) {
+    // Copies of few rows and weights: not reloaded after every store.
+    const float* ownRows[taps > 0 ? taps : 1];
+    float ownWeights[taps > 0 ? taps : 1];
+    for (int k = 0; k < taps; ++k) {
+        ownRows[k] = rows[k];
+        ownWeights[k] = weights[k];
+    }
+    if constexpr (taps > 0) {
+        rows = ownRows;
+        weights = ownWeights;
+    }
     ptrdiff_t i = 0;
     for (; i + kTapBlock <= elements; i += kTapBlock) {
         prefetchAhead(dst + i);
@@ -263,6 +275,8 @@ void filterColumn(const float* const* rows, const float* weights, int32_t taps, 
         case 2: return sumColumn<T, 2, false>(rows, weights, taps, scale, dst, elements);
         case 4: return sumColumn<T, 4, false>(rows, weights, taps, scale, dst, elements);
         case 6: return sumColumn<T, 6, false>(rows, weights, taps, scale, dst, elements);
+        case 8: return sumColumn<T, 8, false>(rows, weights, taps, scale, dst, elements);
+        case 12: return sumColumn<T, 12, false>(rows, weights, taps, scale, dst, elements);
         default: return sumColumn<T, 0, false>(rows, weights, taps, scale, dst, elements);
     }
 }
@@ -270,12 +284,15 @@ void filterColumn(const float* const* rows, const float* weights, int32_t taps, 
 #define QORI_TAPS(T)                                                                                    \
     template void filterRows<T, 1>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
     template void filterRows<T, 3>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
-    template void filterRows<T, 4>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]); \
-    template void filterColumn<T>(const float* const*, const float*, int32_t, float, T*, ptrdiff_t);
+    template void filterRows<T, 4>(const RowFilter&, const T* const[kTapRows], float* const[kTapRows]);
 QORI_TAPS(uint8_t)
 QORI_TAPS(uint16_t)
 QORI_TAPS(int16_t)
 QORI_TAPS(float)
 #undef QORI_TAPS
+template void filterColumn(const float* const*, const float*, int32_t, float, uint8_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const float*, int32_t, float, uint16_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const float*, int32_t, float, int16_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const float*, int32_t, float, float*, ptrdiff_t);
 
 }  // namespace qori::kernels

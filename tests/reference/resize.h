@@ -50,7 +50,9 @@ inline double kernel(const Method& m, double distance) {
 
 inline double ratio(int src, int dst) {
     const int divisor = std::gcd(src, dst);
-    return static_cast<double>(src / divisor) / (dst / divisor);
+    src /= divisor;
+    dst /= divisor;
+    return static_cast<double>(src) / dst;
 }
 
 /// Half of the filter's width in source pixels along an axis; 0 for nearest and super.
@@ -105,6 +107,23 @@ Weighted weigh(const std::vector<Tap>& columns, const std::vector<Tap>& rows, Fe
     for (const Tap& column : columns) across += std::abs(column.weight);
     for (const Tap& row : rows) down += std::abs(row.weight);
     return {sum, static_cast<double>(columns.size() + rows.size() + 6) * largest * across * down};
+}
+
+/// Whether 8u is summed with weights in units of 2^-14. Plain cubic ones are only where that loses nothing.
+inline bool inUnits(const Method& m, QorImageSize src, QorImageSize dst, size_t columnTaps, size_t rowTaps) {
+    const bool free = m.antialiasing || m.interpolation == interpLanczos || m.interpolation == interpSuper;
+    return free && columnTaps <= 16 && rowTaps <= 16 && src.width <= 4 * dst.width && src.height <= 4 * dst.height;
+}
+
+/// How far such sums may be from the value. Of n weights all but one are off by half a unit at most, and that one by
+/// what makes the errors' sum 0, so that they weigh distances from 128 only. Rows are rounded to 2^-7 in between.
+inline double errorOfUnits(const std::vector<Tap>& columns, const std::vector<Tap>& rows) {
+    const auto errors = [](const std::vector<Tap>& taps) { return static_cast<double>(taps.size() - 1) * 0x1p-14; };
+    double across = 0, down = errors(rows);
+    for (const Tap& column : columns) across += std::abs(column.weight);
+    for (const Tap& row : rows) down += std::abs(row.weight);
+    const double ofRow = 128 * errors(columns) + 0x1p-8;
+    return down * ofRow + errors(rows) * 128 * across;
 }
 
 /// Linear 8u in its fixed-point arithmetic.

@@ -1,0 +1,115 @@
+// SPDX-License-Identifier: Apache-2.0
+// Tiles of the weighted 8u forms in integers, for plans whose weights allow it.
+#pragma once
+#include "kernels/resize_words.h"
+#include "resize_run.h"
+
+namespace qori::geometry {
+
+template <int channels>
+class WordsTile {
+public:
+    static bool suits(const ResizePlan& plan) { return plan.words != 0; }
+
+    WordsTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer) : source_{plan, tile} {
+        stripPixels_ = tile.width < kStripPixels ? tile.width : kStripPixels;
+        ringStep_ = static_cast<ptrdiff_t>(roundUp(int64_t{stripPixels_} * channels, kernels::kWordBlock));
+        filter_.taps = even(plan.columnTaps);
+        filter_.channels = channels;
+        const ptrdiff_t groups = ringStep_ / 16;
+        filter_.list = buffer.take<kernels::WordGroup>(groups);
+        filter_.weights = buffer.take<int16_t>(int64_t{groups} * kernels::wordGroupBytes(filter_.taps) / 2);
+        pixels_ = buffer.take<kernels::PixelTaps>(stripPixels_);
+        const auto columns = static_cast<int64_t>((stripPixels_ - 1) * plan.horizontal.ratio()) + 1 + filter_.taps;
+        for (uint8_t*& line : lines_) line = buffer.take<uint8_t>(int64_t{columns} * channels + kernels::WordFilter::kOverrun);
+        ring_ = buffer.take<int16_t>(int64_t{ringPairs()} * 2 * ringStep_);
+    }
+
+    void run(Image<const uint8_t> src, Image<uint8_t> dst, OpenSides open) {
+        source_.open(src, open);
+        for (int32_t x = 0; x < source_.tile.width; x += stripPixels_) {
+            const int32_t rest = source_.tile.width - x;
+            runStrip(dst, x, rest < stripPixels_ ? rest : stripPixels_);
+        }
+    }
+
+private:
+    /// Strips whose tables and rows stay in the second-level cache.
+    static constexpr int32_t kStripPixels = 4096 / channels / 32 * 32;
+
+    static int32_t even(int32_t taps) { return taps + (taps & 1); }
+
+    /// What brings the weights of an axis to a sum of 1.
+    float scale(const Axis& axis) const {
+        return source_.plan.interpolation == interpSuper ? static_cast<float>(1 / axis.ratio()) : 1.0f;
+    }
+
+    void listStrip(int32_t x, int32_t width) {
+        const ResizePlan& plan = source_.plan;
+        const Axis& axis = plan.horizontal;
+        for (int32_t i = 0; i < width; ++i) {
+            const int32_t position = source_.tile.x + x + i;
+            pixels_[i] = {plan.firstTap(axis, position), plan.weightSet(axis, position) * plan.columnTaps};
+        }
+        const int32_t first = pixels_[0].first, last = pixels_[width - 1].first + plan.columnTaps - 1;
+        const Range& legal = source_.columns;
+        const int32_t from = legal.clamp(first), to = legal.clamp(last);
+        from_ = from;
+        left_ = from - first;
+        right_ = last - to;
+        elements_ = ptrdiff_t{to - from + 1} * channels;
+        kernels::listWords(filter_, pixels_, width, plan.table<float>(axis.weightTable), plan.columnTaps, scale(axis),
+                           first);
+    }
+
+    void runStrip(Image<uint8_t> dst, int32_t x, int32_t width) {
+        listStrip(x, width);
+        const ResizePlan& plan = source_.plan;
+        const Tile& tile = source_.tile;
+        int32_t next = INT32_MIN;  // Pairs before it are in the ring as far as they are needed.
+        for (int32_t y = 0; y < tile.height; ++y) {
+            const int32_t tap = plan.firstTap(plan.vertical, tile.y + y);
+            const int32_t first = tap >> 1, count = ((tap + plan.rowTaps - 1) >> 1) - first + 1;
+            if (next < first) next = first;
+            for (; next < first + count; ++next) filterPair(next);
+            int16_t weights[2 * kMostPairs] = {};
+            const int16_t* pairs[kMostPairs];
+            const auto* given = plan.table<float>(plan.vertical.weightTable);
+            kernels::roundWeights(given + ptrdiff_t{plan.weightSet(plan.vertical, tile.y + y)} * plan.rowTaps,
+                                  plan.rowTaps, scale(plan.vertical), weights + (tap & 1));
+            for (int32_t k = 0; k < count; ++k) pairs[k] = ringPair(first + k);
+            kernels::filterWordColumn(pairs, weights, count, advance(dst.row(y), ptrdiff_t{x} * channels),
+                                      ptrdiff_t{width} * channels);
+        }
+    }
+
+    /// Filters rows 2 * pair and 2 * pair + 1, or those nearest to them.
+    void filterPair(int32_t pair) const {
+        const auto row = [&](int32_t i) { return source_.at(source_.rows.clamp(2 * pair + i), from_); };
+        for (int32_t i = 0; i < 2; ++i) kernels::padLine(row(i), elements_, left_, right_, channels, lines_[i]);
+        kernels::filterWords(filter_, {lines_[0], lines_[1], row(2), row(3)}, ringPair(pair));
+    }
+
+    static constexpr int32_t kMostPairs = kernels::kWordTaps / 2 + 1;
+
+    /// The pairs of rows that a destination row is made of at most; the ring holds as many.
+    int32_t ringPairs() const { return source_.plan.rowTaps / 2 + 1; }
+
+    int16_t* ringPair(int32_t pair) const {
+        const int32_t first = source_.plan.firstTap(source_.plan.vertical, source_.tile.y) >> 1;
+        return ring_ + (pair - first) % ringPairs() * 2 * ringStep_;
+    }
+
+    TileSource<uint8_t, channels> source_;
+    int32_t stripPixels_;
+    ptrdiff_t ringStep_;
+    kernels::WordFilter filter_{};
+    kernels::PixelTaps* pixels_;
+    uint8_t* lines_[2];
+    int16_t* ring_;
+    // The columns that a strip's taps reach: from which one, elements of legal ones, pixels repeated at the ends.
+    int32_t from_ = 0, left_ = 0, right_ = 0;
+    ptrdiff_t elements_ = 0;
+};
+
+}  // namespace qori::geometry

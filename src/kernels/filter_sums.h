@@ -1,0 +1,259 @@
+// SPDX-License-Identifier: Apache-2.0
+// Weighted sums over the windows of a region, by Taps (filter_taps.h), and what becomes of them, by Finish. The sums of
+// a few rows at a time lie on the stack between the two.
+#pragma once
+#include "filter_taps.h"
+#include "frame/border.h"
+
+namespace qori::kernels {
+
+/// A kernel as the sums want it: its coefficients from the last to the first, row by row, taps of one or two pixels,
+/// each Taps::repeats times.
+template <class Taps>
+struct PackedKernel {
+    const typename Taps::Coefficient* coefficients;
+    QorImageSize size;
+    typename Taps::Sum start;  ///< What a sum begins with.
+
+    int taps() const { return (size.width + Taps::pixels - 1) / Taps::pixels; }
+    bool endsAlone() const { return size.width % Taps::pixels != 0; }
+    ptrdiff_t rowCoefficients() const { return ptrdiff_t{taps()} * Taps::repeats; }
+};
+
+/// Elements whose sums are made before they are finished; a last chunk takes up to one block more, so that no chunk but
+/// that of a narrow region is smaller than a block.
+inline constexpr int kChunk = 256;
+
+template <class Taps>
+struct ChunkSums {
+    static constexpr int slots = kChunk / Taps::block + 1;
+    typename Taps::Sum row[Taps::bandRows][slots][2];
+};
+
+/// Turns the sums of a row into `elements` of dst. The last slot holds the sums of the last whole block of the row, or
+/// of all its elements where they are fewer.
+template <class Sum>
+struct Finish {
+    void (*row)(const void* rule, const Sum (*slots)[2], uint8_t* dst, ptrdiff_t elements);
+    const void* rule;
+    bool isCopy;  ///< The sums are the elements.
+};
+
+namespace detail {
+
+/// Calls body(first) to body(last) with constants: sums must not live in arrays that are walked.
+template <int first, int last, class Body>
+QORI_INLINE void forEach(const Body& body) {
+    if constexpr (first <= last) {
+        body(std::integral_constant<int, first>{});
+        forEach<first + 1, last>(body);
+    }
+}
+#define QORI_LAMBDA __attribute__((always_inline))
+
+/// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the
+/// first of them sees, and each further one sees the row before. `count` taps, or as many as the kernel has where it is
+/// 0.
+template <class Taps, int first, int last, int count, int rows, int wide, class Load>
+QORI_INLINE void addSourceRow(const PackedKernel<Taps>& kernel, typename Taps::Partial (&sums)[rows][wide],
+                              const typename Taps::Source* p, ptrdiff_t pixel, const typename Taps::Coefficient* c,
+                              const Load& load) {
+    const int taps = count > 0 ? count : kernel.taps();
+    const ptrdiff_t row = ptrdiff_t{taps} * Taps::repeats;
+    const auto addTap = [&](bool isLast) QORI_LAMBDA {
+        typename Taps::Partial v[wide];
+        forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { load(p + w * Taps::block, isLast, v[w]); });
+        forEach<first, last>([&](auto r) QORI_LAMBDA {
+            const auto k = Taps::broadcast(c - (r - first) * row);
+            forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { Taps::add(sums[r][w], v[w], k); });
+        });
+        p += Taps::pixels * pixel;
+        c += Taps::repeats;
+    };
+    if constexpr (count > 0) {
+        forEach<0, count - 1>([&](auto t) QORI_LAMBDA { addTap(t == count - 1); });
+        // Source rows that share coefficients would else share them through the stack.
+        __asm__ volatile("" : : : "memory");
+    } else {
+        for (int t = 0; t < taps; ++t) addTap(t == taps - 1);
+    }
+}
+
+/// The sums of `wide` blocks side by side in `rows` rows, of a kernel at least as high.
+template <class Taps, int count, int rows, int wide, class Load>
+QORI_INLINE void sumBlock(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
+                          ptrdiff_t pixel, const Load& load, typename Taps::Partial (&sums)[rows][wide]) {
+    forEach<0, rows - 1>([&](auto r) QORI_LAMBDA {
+        forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { Taps::begin(sums[r][w], kernel.start); });
+    });
+    const ptrdiff_t row = kernel.rowCoefficients();
+    const typename Taps::Coefficient* c = kernel.coefficients;
+    const auto add = [&]<int first, int last>() QORI_LAMBDA {
+        addSourceRow<Taps, first, last, count>(kernel, sums, p, pixel, c, load);
+        p = advance(p, step);
+    };
+    // Source row s meets kernel row s - r in output r: fewer outputs at both ends of the window.
+    if constexpr (rows >= 2) add.template operator()<0, 0>(), c += row;
+    if constexpr (rows >= 3) add.template operator()<0, 1>(), c += row;
+    if constexpr (rows >= 4) add.template operator()<0, 2>(), c += row;
+    for (int s = rows - 1; s < kernel.size.height; ++s) add.template operator()<0, rows - 1>(), c += row;
+    c -= row;
+    if constexpr (rows >= 2) add.template operator()<1, rows - 1>();
+    if constexpr (rows >= 3) add.template operator()<2, rows - 1>();
+    if constexpr (rows >= 4) add.template operator()<3, rows - 1>();
+}
+
+/// Where the sums of a band's blocks go.
+template <class Sum>
+struct SumRows {
+    uint8_t* first;  ///< The first block's in the first row.
+    ptrdiff_t step;
+
+    QORI_INLINE void put(int r, ptrdiff_t block, const Sum (&sums)[2]) const {
+        using Element = std::remove_reference_t<decltype(*elementOf(sums[0]))>;
+        auto* const at = reinterpret_cast<Element*>(first + r * step) + 2 * Sum::lanes * block;
+        store(at, sums[0]);
+        store(at + Sum::lanes, sums[1]);
+    }
+    template <class T>
+    static T* elementOf(Vec<T>);
+};
+
+template <class Taps, int rows, int wide, int count>
+QORI_NOINLINE void sumBlocks(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
+                             ptrdiff_t pixel, ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
+    const typename Taps::Free free(pixel);
+    const auto load = [&](const typename Taps::Source* at, bool, typename Taps::Partial& v)
+                          QORI_LAMBDA { free(at, v); };
+    for (ptrdiff_t b = 0; b + wide <= blocks; b += wide, p += wide * Taps::block) {
+        typename Taps::Partial sums[rows][wide];
+        sumBlock<Taps, count, rows, wide>(kernel, p, step, pixel, load, sums);
+        forEach<0, rows - 1>([&](auto r) QORI_LAMBDA {
+            forEach<0, wide - 1>([&](auto w) QORI_LAMBDA {
+                typename Taps::Sum whole[2];
+                Taps::end(sums[r][w], whole);
+                out.put(r, b + w, whole);
+            });
+        });
+    }
+}
+
+/// Common widths are unrolled where a type is worth it.
+template <class Taps, int rows, int wide>
+void sumBlocksOfWidth(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step, ptrdiff_t pixel,
+                      ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
+    if constexpr (Taps::unrolls && rows >= 3) {
+        switch (kernel.taps()) {
+            case 2: return sumBlocks<Taps, rows, wide, 2>(kernel, p, step, pixel, blocks, out);
+            case 3: return sumBlocks<Taps, rows, wide, 3>(kernel, p, step, pixel, blocks, out);
+            case 4: return sumBlocks<Taps, rows, wide, 4>(kernel, p, step, pixel, blocks, out);
+            case 5: return sumBlocks<Taps, rows, wide, 5>(kernel, p, step, pixel, blocks, out);
+            case 7: return sumBlocks<Taps, rows, wide, 7>(kernel, p, step, pixel, blocks, out);
+            case 8: return sumBlocks<Taps, rows, wide, 8>(kernel, p, step, pixel, blocks, out);
+            default: break;
+        }
+    }
+    sumBlocks<Taps, rows, wide, 0>(kernel, p, step, pixel, blocks, out);
+}
+
+template <class Taps, int rows>
+void sumBlocksFreely(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step, ptrdiff_t pixel,
+                     ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
+    constexpr int wide = Taps::bandBlocks;
+    const ptrdiff_t inWide = blocks - blocks % wide;
+    if (inWide > 0) sumBlocksOfWidth<Taps, rows, wide>(kernel, p, step, pixel, inWide, out);
+    if (inWide == blocks) return;
+    out.first += inWide * Taps::block * ptrdiff_t{sizeof(typename Taps::Sum)} / Taps::Sum::lanes;
+    sumBlocks<Taps, rows, 1, 0>(kernel, p + inWide * Taps::block, step, pixel, blocks - inWide, out);
+}
+
+/// The first n elements of a block, which nothing else is read for.
+template <class Taps>
+QORI_NOINLINE void sumBlockExactly(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
+                                   ptrdiff_t pixel, ptrdiff_t n, typename Taps::Sum (&out)[2]) {
+    const bool endsAlone = kernel.endsAlone();
+    const auto load = [=](const typename Taps::Source* at, bool isLast, typename Taps::Partial& v)
+                          QORI_LAMBDA { Taps::loadExactly(at, isLast && endsAlone ? nullptr : at + pixel, n, v); };
+    typename Taps::Partial sums[1][1];
+    sumBlock<Taps, 0>(kernel, p, step, pixel, load, sums);
+    Taps::end(sums[0][0], out);
+}
+
+/// A piece of a band: the same rows, `elements` wide; blocks that end within `readable` elements may be loaded freely.
+template <class Taps>
+struct Chunk {
+    const typename Taps::Source* window;
+    ptrdiff_t step, pixel, elements, readable;
+    uint8_t* dst;
+    ptrdiff_t dstStep, dstElementBytes;
+};
+
+template <class Taps, int rows>
+void filterChunk(const PackedKernel<Taps>& kernel, const Chunk<Taps>& chunk, Finish<typename Taps::Sum> finish,
+                 ChunkSums<Taps>& sums) {
+    constexpr ptrdiff_t block = Taps::block;
+    const auto [p, step, pixel, elements, readable, dst, dstStep, dstElementBytes] = chunk;
+    const ptrdiff_t whole = elements / block, all = whole + (elements % block > 0);
+    const ptrdiff_t freely = std::min(whole, readable > 0 ? readable / block : 0);
+    const auto slots = [&](ptrdiff_t slot) {
+        return SumRows<typename Taps::Sum>{reinterpret_cast<uint8_t*>(sums.row[0][slot]), sizeof sums.row[0]};
+    };
+    if (freely > 0)
+        sumBlocksFreely<Taps, rows>(kernel, p, step, pixel, freely,
+                                    finish.isCopy ? SumRows<typename Taps::Sum>{dst, dstStep} : slots(0));
+    for (ptrdiff_t slot = freely; slot < all; ++slot) {
+        const ptrdiff_t at = slot < whole ? slot * block : std::max<ptrdiff_t>(elements - block, 0);
+        if (at + block <= readable) {
+            sumBlocksFreely<Taps, rows>(kernel, p + at, step, pixel, 1, slots(slot));
+            continue;
+        }
+        for (int r = 0; r < rows; ++r)
+            sumBlockExactly(kernel, advance(p + at, r * step), step, pixel, std::min(block, elements - at),
+                            sums.row[r][slot]);
+    }
+    // Where the sums are the elements, whole blocks lie in dst already, and a last one may reach back over them.
+    const ptrdiff_t first = finish.isCopy ? std::min(freely * block, std::max<ptrdiff_t>(elements - block, 0)) : 0;
+    if (finish.isCopy && freely == all) return;
+    for (int r = 0; r < rows; ++r)
+        finish.row(finish.rule, sums.row[r] + (finish.isCopy ? freely : 0), dst + r * dstStep + first * dstElementBytes,
+                   elements - first);
+}
+
+template <class Taps, int rows>
+void filterBand(const PackedKernel<Taps>& kernel, Chunk<Taps> band, Finish<typename Taps::Sum> finish,
+                ChunkSums<Taps>& sums) {
+    for (ptrdiff_t rest = band.elements; rest > 0;) {
+        band.elements = rest < kChunk + Taps::block ? rest : kChunk;
+        filterChunk<Taps, rows>(kernel, band, finish, sums);
+        band.window += band.elements;
+        band.dst += band.elements * band.dstElementBytes;
+        band.readable -= band.elements;
+        rest -= band.elements;
+    }
+}
+
+}  // namespace detail
+
+/// Filters rows of elements whose windows begin at p; slack elements may be read behind the last window of a row.
+template <class Taps>
+void filterRows(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step, int channels,
+                ptrdiff_t elements, ptrdiff_t rows, ptrdiff_t slack, Finish<typename Taps::Sum> finish, uint8_t* dst,
+                ptrdiff_t dstStep, ptrdiff_t dstElementBytes) {
+    ChunkSums<Taps> sums;
+    // A block whose window and overread end within reach may be loaded freely; the last may hold elements in vain.
+    detail::Chunk<Taps> band{p,   step,    channels,       elements, elements + slack - Taps::overread,
+                             dst, dstStep, dstElementBytes};
+    const auto bandsOf = [&]<int n>() {
+        for (; rows >= n && kernel.size.height >= n; rows -= n) {
+            detail::filterBand<Taps, n>(kernel, band, finish, sums);
+            band.window = advance(band.window, n * step);
+            band.dst += n * dstStep;
+        }
+    };
+    if constexpr (Taps::bandRows >= 4) bandsOf.template operator()<4>();
+    if constexpr (Taps::bandRows >= 3) bandsOf.template operator()<3>();
+    bandsOf.template operator()<2>();
+    bandsOf.template operator()<1>();
+}
+
+}  // namespace qori::kernels
