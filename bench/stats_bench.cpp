@@ -264,15 +264,16 @@ Row histogramRow(std::string name, bool flat, Ours ours, Best best = {}) {
             for (int i = 0; i < image.elements(); ++i)
                 image.row(y)[i] = flat ? T{9} : static_cast<T>((state = state * 1664525u + 1013904223u) >> 12);
         const auto table = std::make_shared<std::vector<int32_t>>(n << 8 * sizeof(T));
-        return Contenders{[=] { ours(image, size.roi()); },
-                          [=] {
-                              for (int y = 0; y < size.height; ++y)
-                                  for (int x = 0; x < size.width; ++x)
-                                      for (int c = 0; c < n; ++c)
-                                          ++(*table)[static_cast<size_t>(image.row(y)[x * n + c] * n + c)];
-                              keep(table->data());
-                          },
-                          {}};
+        return Contenders{
+            [=] { ours(image, size.roi()); },
+            [=] {
+                for (int y = 0; y < size.height; ++y)
+                    for (int x = 0; x < size.width; ++x)
+                        for (int c = 0; c < n; ++c)
+                            ++(*table)[static_cast<size_t>(image.row(y)[x * n + c]) * n + static_cast<size_t>(c)];
+                keep(table->data());
+            },
+            {}};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = n * sizeof(T),

@@ -79,7 +79,7 @@ Picture blockMeans(const Picture& photo) {
     return tiles(photo, [&](int x, int y, QorImageSize tile, uint8_t(&colour)[3]) {
         double mean[3];
         require(qoriMean_8u_C3R(photo.at(x, y), photo.step(), tile, mean));
-        for (int c = 0; c < 3; ++c) colour[c] = static_cast<uint8_t>(mean[c] + 0.5);
+        for (int c = 0; c < 3; ++c) colour[c] = static_cast<uint8_t>(std::lround(mean[c]));
     });
 }
 

@@ -134,6 +134,7 @@ QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdif
                              const More*... more) {
     using Lanes = typename Measure::Lanes;
     constexpr int n = Vec<T>::lanes, vectors = AccumulatorsOf<Measure>::vectors;
+    static_assert(vectors == 3 || !detail::takesTwo<Lanes>);
     constexpr ptrdiff_t round = ptrdiff_t{n} * vectors * (detail::takesTwo<Lanes> ? 2 : 1);
     ptrdiff_t i = 0;
     while (elements - i >= round) {

@@ -23,6 +23,12 @@ void fill(const TestImage& image, int n, Fill style) {
 }
 
 template <class T>
+bool isNan(T v) {
+    if constexpr (std::is_floating_point_v<T>) return std::isnan(v);
+    return false;
+}
+
+template <class T>
 struct Extremum {
     T value;
     int x, y;
@@ -37,7 +43,7 @@ Extremum<T> firstBest(View<T> image, QorImageSize roi, int c, bool largest) {
     for (int y = 0; y < roi.height; ++y)
         for (int x = 0; x < roi.width; ++x) {
             const T v = image.get(x, y, c);
-            if (v != v) continue;
+            if (isNan(v)) continue;
             if (!found || (largest ? v > best.value : v < best.value)) best = {v, x, y};
             found = true;
         }
@@ -46,8 +52,8 @@ Extremum<T> firstBest(View<T> image, QorImageSize roi, int c, bool largest) {
 
 template <class T>
 void expectSame(T expected, T actual) {
-    if (expected != expected)
-        EXPECT_TRUE(actual != actual) << "not NaN: " << +actual;
+    if (isNan(expected))
+        EXPECT_TRUE(isNan(actual)) << "not NaN: " << +actual;
     else
         EXPECT_EQ(expected, actual);
 }
@@ -188,7 +194,7 @@ void countInRange(const char* name, Function function) {
 TEST(Extrema, FirstOfEqualPixelsAcrossRowsAndPiecesOfRows) {
     constexpr int kWidth = 30'000;  // three pieces a row
     std::vector<uint16_t> image(kWidth * 3, 9);
-    const auto put = [&](int x, int y) { image[static_cast<size_t>(y * kWidth + x)] = 500; };
+    const auto put = [&](int x, int y) { image[static_cast<size_t>(y) * kWidth + static_cast<size_t>(x)] = 500; };
     const auto at = [&](int expectedX, int expectedY) {
         uint16_t value = 0;
         int32_t x = -1, y = -1;
@@ -206,6 +212,26 @@ TEST(Extrema, FirstOfEqualPixelsAcrossRowsAndPiecesOfRows) {
     at(12'288, 1);
     put(12'287, 1);
     at(12'287, 1);
+}
+
+TEST(Extrema, EachChannelKeepsItsFirstPieceWhenAnotherImproves) {
+    constexpr int kWidth = 30'000;
+    const auto check = [](auto function, int n) {
+        std::vector<uint8_t> image(size_t{kWidth} * 2 * static_cast<size_t>(n), 9);
+        const auto put = [&](int x, int y, int c, uint8_t value) { image.data()[(y * kWidth + x) * n + c] = value; };
+        put(5, 0, 0, 200);
+        put(12'000, 0, 2, 50);
+        for (int c = 0; c < n; ++c) put(29'999, 1, c, c == 0 ? 200 : c == 1 ? 100 : c == 2 ? 50 : 255);
+        uint8_t values[4];
+        int32_t x[4], y[4];
+        EXPECT_EQ(QOR_OK, function(image.data(), kWidth * n, {kWidth, 2}, values, x, y));
+        EXPECT_EQ((std::vector<int>{200, 100, 50}), std::vector<int>(values, values + 3));
+        EXPECT_EQ((std::vector{5, 29'999, 12'000}), std::vector(x, x + 3));
+        EXPECT_EQ((std::vector{0, 1, 0}), std::vector(y, y + 3));
+    };
+    check(qoriMaxIndx_8u_C3R, 3);
+    check(qoriMaxIndx_8u_C4R, 4);
+    check(qoriMaxIndx_8u_AC4R, 4);
 }
 
 TEST(Extrema, LowestValuesEverywhereAreFoundAtTheirFirstPixel) {

@@ -24,7 +24,8 @@ T draw() {
 double relativeError(const Shape& shape, int n, bool accurate) {
     const int lanes = accurate ? 24 : 48;
     const double u = std::ldexp(1.0, accurate ? -53 : -24);
-    const double k = 2 + double(shape.height) * ((shape.width * n + lanes - 1) / lanes) + 7 + 2;
+    const int ofRow = (shape.width * n + lanes - 1) / lanes;
+    const double k = 2 + double(shape.height) * ofRow + 7 + 2;
     return k * u / (1 - k * u);
 }
 
