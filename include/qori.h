@@ -656,9 +656,9 @@ QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4IR(const uint16_t* pSrc, int32_
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value);
- *            then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value),
+ *            QOR_ERR_NULL_PTR (value is null); then nothing is written.
  *  Example   const uint8_t warmer[3] = {0, 4, 16};
  *            qoriAddC_8u_C3IRSfs(warmer, picture, step, (QorImageSize){640, 480}, 0);
  */
@@ -771,9 +771,9 @@ QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
- *            written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value), QOR_ERR_NULL_PTR (value
+ *            is null); then nothing is written.
  *  Example   qoriSubC_16u_C1IRSfs(blackLevel, raw, rawStep, roi, 0);
  */
 QORI_API QorResult QORI_CALL qoriSubC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -885,9 +885,9 @@ QORI_API QorResult QORI_CALL qoriSubC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
- *            written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value), QOR_ERR_NULL_PTR (value
+ *            is null); then nothing is written.
  *  Example   qoriMulC_8u_C1RSfs(src, srcStep, 181, dst, dstStep, roi, 7);   // brighter by half a stop: 181/128 = 2^0.5
  */
 QORI_API QorResult QORI_CALL qoriMulC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -1000,9 +1000,9 @@ QORI_API QorResult QORI_CALL qoriMulC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_DIV_BY_ZERO (the value of a channel is 0); then nothing
- *            is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (value is null), QOR_ERR_DIV_BY_ZERO (the value of
+ *            a channel is 0); then nothing is written.
  *  Example   qoriDivC_16s_C1RSfs(src, srcStep, 3, dst, dstStep, roi, -4);   // src / 3 in sixteenths
  */
 QORI_API QorResult QORI_CALL qoriDivC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -1112,8 +1112,8 @@ QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4IR(const QorComplex32f value[3], Q
  *  Units     Steps in bytes; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (value is null); then nothing is written.
  *  Example   qoriMulCScale_8u_C1IR(128, picture, step, roi);   // half as bright
  */
 QORI_API QorResult QORI_CALL qoriMulCScale_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -1877,6 +1877,8 @@ QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1RSfs(const float* pSrc, int32_
     int32_t dstStep, QorImageSize roiSize, int32_t roundMode, int32_t scaleFactor);
 QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1IRSfs(uint32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
     int32_t roundMode, int32_t scaleFactor);
+
+/* ---- Convert bits --------------------------------------------------------------------------------------------- */
 
 /** Unpacks bits into bytes: a set bit gives 255, a clear one 0.
  *  Units     Steps in bytes, at least 1; roiSize in pixels. Pixel 0 of a row is the bit at srcBitOffset,
@@ -3140,7 +3142,7 @@ QORI_API void QORI_CALL qoriFree(void* ptr);
 /** Adds the elements of each channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
@@ -3181,7 +3183,7 @@ QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep
 /** Averages the elements of each channel: their sum over width * height.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
@@ -3226,7 +3228,7 @@ QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcSte
 /** Largest magnitude of each channel: max |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -3273,7 +3275,7 @@ QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t s
 /** Sum of magnitudes of each channel: sum |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -3317,7 +3319,7 @@ QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t src
 /** Euclidean norm of each channel: the square root of sum src^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -3365,7 +3367,7 @@ QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t src
 /** Largest magnitude of the difference in each channel: max |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3410,7 +3412,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3454,7 +3456,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3498,7 +3500,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_
 /** Largest magnitude of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3544,7 +3546,7 @@ QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_
 /** Sum of magnitudes of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3590,7 +3592,7 @@ QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t
 /** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3636,10 +3638,10 @@ QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_AC4R(const float* pSrc1, int32_t
 /** Dot product of two images, per channel: sum src1 * src2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  8- and 16-bit totals are exact and rounded once. 32u and 32s: products and sums in double
- *            precision, in the order of the pixels. 32f with hintAccurate: exact products, sums in double
- *            precision; with any other hint: 48 partial sums in single precision by fused multiply-add, added
- *            pairwise.
+ *  Elements  Integers: products and sums in double precision, in the order of the pixels, so that totals up to
+ *            2^53 in magnitude are exact for 8 and 16 bits. 32f with hintAccurate: exact products, sums in
+ *            double precision; with any other hint: 48 partial sums in single precision by fused multiply-add,
+ *            added pairwise.
  *  Units     Steps in bytes, not checked otherwise; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
