@@ -39,7 +39,7 @@ Row reductionRow(std::string name, Ours ours, Plain plain, Best best = {}, std::
 
 /// One term per element, added as the compiler likes: in 64-bit integers, or in the float type of Real.
 template <class T, int n, class Real = float, class Term>
-auto plainSum(Term term) {
+constexpr auto plainSum(Term term) {
     return [=](const T* a, const T* b, int width, double* sums) {
         using Total = std::conditional_t<std::is_floating_point_v<T>, Real, int64_t>;
         Total row[n] = {};
@@ -51,13 +51,11 @@ auto plainSum(Term term) {
 }
 
 template <class T, int n>
-auto plainLargest() {
-    return [](const T* a, const T*, int width, double* sums) {
-        T row[n] = {};
-        for (int x = 0; x < width; ++x)
-            for (int c = 0; c < n; ++c) row[c] = std::max(row[c], a[x * n + c]);
-        for (int c = 0; c < n; ++c) sums[c] = std::max(sums[c], static_cast<double>(row[c]));
-    };
+void plainLargest(const T* a, const T*, int width, double* sums) {
+    T row[n] = {};
+    for (int x = 0; x < width; ++x)
+        for (int c = 0; c < n; ++c) row[c] = std::max(row[c], a[x * n + c]);
+    for (int c = 0; c < n; ++c) sums[c] = std::max(sums[c], static_cast<double>(row[c]));
 }
 
 constexpr auto kValue = [](auto a, auto) { return a; };
@@ -84,28 +82,71 @@ auto binary(Function function, Hint... hint) {
     };
 }
 
+template <class T, class Function>
+auto extremum(Function function) {
+    return [=](const auto& images, QorImageSize roi) {
+        T result[4];
+        function(images[0].data(), images[0].step(), roi, result);
+        keep(result);
+    };
+}
+
+template <class T, class Function>
+auto bothExtrema(Function function) {
+    return [=](const auto& images, QorImageSize roi) {
+        T low[4], high[4];
+        function(images[0].data(), images[0].step(), roi, low, high);
+        keep(low);
+        keep(high);
+    };
+}
+
+template <class T, int n>
+constexpr auto plainValues = plainSum<T, n>(kValue);
+template <class T, int n>
+constexpr auto plainMagnitudes = plainSum<T, n>([](auto a, auto) { return std::abs(a); });
+template <class T, int n>
+constexpr auto plainSquares = plainSum<T, n>(kSquare);
+
+/// One source in each layout, in L2 and beyond the cache: what layouts cost beside each other.
+const std::vector<Size> kOfLayouts = {{256, 256}, kFrame};
+#define QORI_LAYOUT_ROWS(title, T, plain, wrap, function, ...)                                                        \
+    reductionRow<T, 1, 1>(title " C1", wrap(function##_C1R __VA_OPT__(, ) __VA_ARGS__), plain<T, 1>, {}, kOfLayouts), \
+        reductionRow<T, 3, 1>(title " C3", wrap(function##_C3R __VA_OPT__(, ) __VA_ARGS__), plain<T, 3>, {},          \
+                              kOfLayouts),                                                                            \
+        reductionRow<T, 4, 1>(title " C4", wrap(function##_C4R __VA_OPT__(, ) __VA_ARGS__), plain<T, 4>, {},          \
+                              {kOfLayouts[0]})
+
+const Rows layouts{{
+    QORI_LAYOUT_ROWS("layouts: sum 8u", uint8_t, plainValues, unary, qoriSum_8u),
+    QORI_LAYOUT_ROWS("layouts: sum 16u", uint16_t, plainValues, unary, qoriSum_16u),
+    QORI_LAYOUT_ROWS("layouts: sum 16s", int16_t, plainValues, unary, qoriSum_16s),
+    QORI_LAYOUT_ROWS("layouts: sum 32f fast", float, plainValues, unary, qoriSum_32f, hintFast),
+    QORI_LAYOUT_ROWS("layouts: norm Inf 8u", uint8_t, plainLargest, unary, qoriNorm_Inf_8u),
+    QORI_LAYOUT_ROWS("layouts: norm Inf 16u", uint16_t, plainLargest, unary, qoriNorm_Inf_16u),
+    QORI_LAYOUT_ROWS("layouts: norm Inf 32f", float, plainLargest, unary, qoriNorm_Inf_32f),
+    QORI_LAYOUT_ROWS("layouts: norm L1 8u", uint8_t, plainMagnitudes, unary, qoriNorm_L1_8u),
+    QORI_LAYOUT_ROWS("layouts: norm L1 16u", uint16_t, plainMagnitudes, unary, qoriNorm_L1_16u),
+    QORI_LAYOUT_ROWS("layouts: norm L1 32f fast", float, plainMagnitudes, unary, qoriNorm_L1_32f, hintFast),
+    QORI_LAYOUT_ROWS("layouts: norm L2 8u", uint8_t, plainSquares, unary, qoriNorm_L2_8u),
+    QORI_LAYOUT_ROWS("layouts: norm L2 16u", uint16_t, plainSquares, unary, qoriNorm_L2_16u),
+    QORI_LAYOUT_ROWS("layouts: norm L2 32f fast", float, plainSquares, unary, qoriNorm_L2_32f, hintFast),
+    QORI_LAYOUT_ROWS("layouts: max 8u", uint8_t, plainLargest, extremum<uint8_t>, qoriMax_8u),
+    QORI_LAYOUT_ROWS("layouts: max 16u", uint16_t, plainLargest, extremum<uint16_t>, qoriMax_16u),
+    QORI_LAYOUT_ROWS("layouts: max 32f", float, plainLargest, extremum<float>, qoriMax_32f),
+    QORI_LAYOUT_ROWS("layouts: minMax 8u", uint8_t, plainLargest, bothExtrema<uint8_t>, qoriMinMax_8u),
+    QORI_LAYOUT_ROWS("layouts: minMax 16u", uint16_t, plainLargest, bothExtrema<uint16_t>, qoriMinMax_16u),
+    QORI_LAYOUT_ROWS("layouts: minMax 32f", float, plainLargest, bothExtrema<float>, qoriMinMax_32f),
+}};
+
 const Rows norms{{
-    reductionRow<uint8_t, 1, 1>("sum 8u C1", unary(qoriSum_8u_C1R), plainSum<uint8_t, 1>(kValue), {120'205, 31'314}),
-    reductionRow<uint8_t, 3, 1>("mean 8u C3", unary(qoriMean_8u_C3R), plainSum<uint8_t, 3>(kValue), {3'561, 3'689}),
-    reductionRow<uint8_t, 4, 1>("sum 8u C4", unary(qoriSum_8u_C4R), plainSum<uint8_t, 4>(kValue)),
-    reductionRow<uint16_t, 1, 1>("sum 16u C1", unary(qoriSum_16u_C1R), plainSum<uint16_t, 1>(kValue)),
-    reductionRow<int16_t, 3, 1>("sum 16s C3", unary(qoriSum_16s_C3R), plainSum<int16_t, 3>(kValue)),
-    reductionRow<float, 1, 1>("sum 32f C1 fast", unary(qoriSum_32f_C1R, hintFast), plainSum<float, 1>(kValue),
+    reductionRow<uint8_t, 1, 1>("sum 8u C1", unary(qoriSum_8u_C1R), plainValues<uint8_t, 1>, {120'205, 31'314}),
+    reductionRow<uint8_t, 3, 1>("mean 8u C3", unary(qoriMean_8u_C3R), plainValues<uint8_t, 3>, {3'561, 3'689}),
+    reductionRow<float, 1, 1>("sum 32f C1 fast", unary(qoriSum_32f_C1R, hintFast), plainValues<float, 1>,
                               {11'570, 5'701}),
     reductionRow<float, 1, 1>("sum 32f C1 accurate", unary(qoriSum_32f_C1R, hintAccurate),
                               plainSum<float, 1, double>(kValue), {11'521, 5'723}),
-    reductionRow<float, 3, 1>("sum 32f C3 fast", unary(qoriSum_32f_C3R, hintFast), plainSum<float, 3>(kValue)),
-    reductionRow<uint8_t, 1, 1>("norm Inf 8u C1", unary(qoriNorm_Inf_8u_C1R), plainLargest<uint8_t, 1>()),
-    reductionRow<uint8_t, 3, 1>("norm Inf 8u C3", unary(qoriNorm_Inf_8u_C3R), plainLargest<uint8_t, 3>()),
-    reductionRow<float, 1, 1>("norm L1 32f C1 fast", unary(qoriNorm_L1_32f_C1R, hintFast),
-                              plainSum<float, 1>([](auto a, auto) { return std::abs(a); })),
-    reductionRow<uint8_t, 1, 1>("norm L2 8u C1", unary(qoriNorm_L2_8u_C1R), plainSum<uint8_t, 1>(kSquare),
-                                {54'766, 28'426}),
-    reductionRow<uint8_t, 3, 1>("norm L2 8u C3", unary(qoriNorm_L2_8u_C3R), plainSum<uint8_t, 3>(kSquare)),
-    reductionRow<uint8_t, 4, 1>("norm L2 8u C4", unary(qoriNorm_L2_8u_C4R), plainSum<uint8_t, 4>(kSquare)),
-    reductionRow<uint16_t, 1, 1>("norm L2 16u C1", unary(qoriNorm_L2_16u_C1R), plainSum<uint16_t, 1>(kSquare)),
-    reductionRow<float, 1, 1>("norm L2 32f C1 fast", unary(qoriNorm_L2_32f_C1R, hintFast), plainSum<float, 1>(kSquare)),
-    reductionRow<float, 3, 1>("norm L2 32f C3 fast", unary(qoriNorm_L2_32f_C3R, hintFast), plainSum<float, 3>(kSquare)),
+    reductionRow<uint8_t, 1, 1>("norm L2 8u C1", unary(qoriNorm_L2_8u_C1R), plainSquares<uint8_t, 1>, {54'766, 28'426}),
     reductionRow<uint8_t, 1, 2>("normdiff L1 8u C1", binary(qoriNormDiff_L1_8u_C1R), plainSum<uint8_t, 1>(kDistance),
                                 {76'990, 14'682}),
     reductionRow<uint8_t, 3, 2>("normdiff L1 8u C3", binary(qoriNormDiff_L1_8u_C3R), plainSum<uint8_t, 3>(kDistance)),
@@ -123,25 +164,6 @@ const Rows norms{{
     reductionRow<float, 1, 2>("dot product 32f C1 accurate", binary(qoriDotProd_32f64f_C1R, hintAccurate),
                               plainSum<float, 1, double>(kProduct)),
 }};
-
-template <class T, int n, class Function>
-auto extremum(Function function) {
-    return [=](const auto& images, QorImageSize roi) {
-        T result[4];
-        function(images[0].data(), images[0].step(), roi, result);
-        keep(result);
-    };
-}
-
-template <class T, int n, class Function>
-auto bothExtrema(Function function) {
-    return [=](const auto& images, QorImageSize roi) {
-        T low[4], high[4];
-        function(images[0].data(), images[0].step(), roi, low, high);
-        keep(low);
-        keep(high);
-    };
-}
 
 template <class T, class Function>
 auto indexed(Function function) {
@@ -219,13 +241,11 @@ const auto inRange8u = [](const auto& images, QorImageSize roi) {
 };
 
 const Rows extrema{{
-    reductionRow<uint8_t, 1, 1>("max 8u C1", extremum<uint8_t, 1>(qoriMax_8u_C1R), plainLargest<uint8_t, 1>()),
-    reductionRow<uint8_t, 3, 1>("max 8u C3", extremum<uint8_t, 3>(qoriMax_8u_C3R), plainLargest<uint8_t, 3>()),
-    reductionRow<uint16_t, 1, 1>("max 16u C1", extremum<uint16_t, 1>(qoriMax_16u_C1R), plainLargest<uint16_t, 1>()),
-    reductionRow<float, 1, 1>("max 32f C1", extremum<float, 1>(qoriMax_32f_C1R), plainLargest<float, 1>()),
-    reductionRow<uint8_t, 1, 1>("minMax 8u C1", bothExtrema<uint8_t, 1>(qoriMinMax_8u_C1R), plainMinMax<uint8_t>,
+    reductionRow<uint8_t, 1, 1>("max 8u C1", extremum<uint8_t>(qoriMax_8u_C1R), plainLargest<uint8_t, 1>),
+    reductionRow<float, 1, 1>("max 32f C1", extremum<float>(qoriMax_32f_C1R), plainLargest<float, 1>),
+    reductionRow<uint8_t, 1, 1>("minMax 8u C1", bothExtrema<uint8_t>(qoriMinMax_8u_C1R), plainMinMax<uint8_t>,
                                 {71'798, 29'263}),
-    reductionRow<float, 1, 1>("minMax 32f C1", bothExtrema<float, 1>(qoriMinMax_32f_C1R), plainMinMax<float>,
+    reductionRow<float, 1, 1>("minMax 32f C1", bothExtrema<float>(qoriMinMax_32f_C1R), plainMinMax<float>,
                               {2'580, 1'665}),
     indexRow<uint8_t>("maxIndx 8u C1", qoriMaxIndx_8u_C1R, {10'793, 7'467}),
     indexRow<float>("maxIndx 32f C1", qoriMaxIndx_32f_C1R, {2'623, 1'573}),

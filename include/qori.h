@@ -231,6 +231,11 @@ typedef struct QorLibraryVersion {
     const char* buildDateText; /**< Build date as "Mmm dd yyyy". */
 } QorLibraryVersion;
 
+/** A kernel prepared for filtering, in the caller's memory: as many bytes as qoriFilterBorderGetSize reports, at any
+ *  address. It may be copied to a block whose address is equal modulo 64. Once filled it is only read: any number of
+ *  threads may use it at once. */
+typedef struct QorLinearFilterPlan QorLinearFilterPlan;
+
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
 /** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
@@ -651,9 +656,9 @@ QORI_API QorResult QORI_CALL qoriMulScale_16u_AC4IR(const uint16_t* pSrc, int32_
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value);
- *            then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u and qoriAddC_32f_C1R, which take steps of any value),
+ *            QOR_ERR_NULL_PTR (value is null); then nothing is written.
  *  Example   const uint8_t warmer[3] = {0, 4, 16};
  *            qoriAddC_8u_C3IRSfs(warmer, picture, step, (QorImageSize){640, 480}, 0);
  */
@@ -766,9 +771,9 @@ QORI_API QorResult QORI_CALL qoriAddC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
- *            written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value), QOR_ERR_NULL_PTR (value
+ *            is null); then nothing is written.
  *  Example   qoriSubC_16u_C1IRSfs(blackLevel, raw, rawStep, roi, 0);
  */
 QORI_API QorResult QORI_CALL qoriSubC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -880,9 +885,9 @@ QORI_API QorResult QORI_CALL qoriSubC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value); then nothing is
- *            written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1; not for 8u, which takes steps of any value), QOR_ERR_NULL_PTR (value
+ *            is null); then nothing is written.
  *  Example   qoriMulC_8u_C1RSfs(src, srcStep, 181, dst, dstStep, roi, 7);   // brighter by half a stop: 181/128 = 2^0.5
  */
 QORI_API QorResult QORI_CALL qoriMulC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -995,9 +1000,9 @@ QORI_API QorResult QORI_CALL qoriMulC_32fc_AC4IR(const QorComplex32f value[3], Q
  *            2^-scaleFactor.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_DIV_BY_ZERO (the value of a channel is 0); then nothing
- *            is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (value is null), QOR_ERR_DIV_BY_ZERO (the value of
+ *            a channel is 0); then nothing is written.
  *  Example   qoriDivC_16s_C1RSfs(src, srcStep, 3, dst, dstStep, roi, -4);   // src / 3 in sixteenths
  */
 QORI_API QorResult QORI_CALL qoriDivC_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -1107,8 +1112,8 @@ QORI_API QorResult QORI_CALL qoriDivC_32fc_AC4IR(const QorComplex32f value[3], Q
  *  Units     Steps in bytes; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1); then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (value is null); then nothing is written.
  *  Example   qoriMulCScale_8u_C1IR(128, picture, step, roi);   // half as bright
  */
 QORI_API QorResult QORI_CALL qoriMulCScale_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t value, uint8_t* pDst,
@@ -1873,6 +1878,8 @@ QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1RSfs(const float* pSrc, int32_
 QORI_API QorResult QORI_CALL qoriConvert_32f32u_C1IRSfs(uint32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
     int32_t roundMode, int32_t scaleFactor);
 
+/* ---- Convert bits --------------------------------------------------------------------------------------------- */
+
 /** Unpacks bits into bytes: a set bit gives 255, a clear one 0.
  *  Units     Steps in bytes, at least 1; roiSize in pixels. Pixel 0 of a row is the bit at srcBitOffset,
  *            counted from the most significant bit of the row's first byte; 8 and more step into later bytes.
@@ -2469,6 +2476,422 @@ QORI_API QorResult QORI_CALL qoriCountInRange_32f_C3R(const float* pSrc, int32_t
 QORI_API QorResult QORI_CALL qoriCountInRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
     int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
 
+/* ---- General linear filter around an anchor ------------------------------------------------------------------- */
+
+/** Convolves with integers around an anchor: dst = saturate(round(sum / divisor)), ties to even.
+ *  Shapes    The window of pixel (x, y) spans columns x + anchor.x - (width - 1) to x + anchor.x and rows y +
+ *            anchor.y - (height - 1) to y + anchor.y; all of it is read. AC4 keeps the destination's channel 3.
+ *  Elements  The sum is exact where the sum of all |coefficient| times the largest |pixel| is below 2^53.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     Takes a work area from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the region or
+ *            the kernel below 1), QOR_ERR_DIVISOR (divisor 0), QOR_ERR_STEP (srcStep below the bytes of
+ *            roiSize.width + kernelSize.width - 1 pixels; dstStep below those of roiSize.width),
+ *            QOR_ERR_NO_MEMORY (no work area); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilter_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+QORI_API QorResult QORI_CALL qoriFilter_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor, int32_t divisor);
+
+/** Convolves with floats around an anchor; sums are fused multiply-adds in the type of the pixels.
+ *  Shapes    The window is that of the integer forms. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     Takes a work area from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the region or
+ *            the kernel below 1), QOR_ERR_STEP (srcStep below the bytes of roiSize.width + kernelSize.width - 1
+ *            pixels; dstStep below those of roiSize.width), QOR_ERR_NO_MEMORY (no work area); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriFilter_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst, int32_t dstStep,
+    QorImageSize roiSize, const double* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+
+/** Convolves integers with floats around an anchor: dst = saturate(round(sum)), ties to even.
+ *  Shapes    The window is that of qoriFilter. AC4 keeps the destination's channel 3.
+ *  Elements  Fused multiply-adds in 32-bit float, for 32s in 64-bit; a NaN gives the destination type's
+ *            minimum.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     Takes a work area from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the region or
+ *            the kernel below 1), QOR_ERR_STEP (srcStep below the bytes of roiSize.width + kernelSize.width - 1
+ *            pixels; dstStep below those of roiSize.width), QOR_ERR_NO_MEMORY (no work area); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriFilter32f_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_32s_C1R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_32s_C3R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_32s_C4R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8s_C1R(const int8_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8s_C3R(const int8_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8s_C4R(const int8_t* pSrc, int32_t srcStep, int8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8s16s_C1R(const int8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8s16s_C3R(const int8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8s16s_C4R(const int8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8u16s_C3R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilter32f_8u16s_C4R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor);
+
+/** Convolves with integers around an anchor: dst = saturate(round(sum / divisor)) by a rounding mode.
+ *  Shapes    The window is that of qoriFilter. AC4 keeps the destination's channel 3.
+ *  Elements  The sum is exact where the sum of all |coefficient| times the largest |pixel| is below 2^53.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     pBuffer: as many bytes as the qoriFilterRoundGetBufSize function of these types reports, at any
+ *            address.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst or pKernel is null), QOR_ERR_SIZE (a side of
+ *            the region or the kernel below 1), QOR_ERR_DIVISOR (divisor 0), QOR_ERR_STEP (srcStep below the
+ *            bytes of roiSize.width + kernelSize.width - 1 pixels; dstStep below those of roiSize.width),
+ *            QOR_ERR_ROUND_MODE (no QorRoundingMode), QOR_ERR_NULL_PTR (pBuffer is null); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriFilter_Round16s_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round16s_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round16s_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round16s_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32s_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t divisor, int32_t roundMode, uint8_t* pBuffer);
+
+/** Convolves with floats around an anchor: dst = saturate(round(sum)) by a rounding mode.
+ *  Shapes    The window is that of qoriFilter. AC4 keeps the destination's channel 3.
+ *  Elements  Fused multiply-adds in 32-bit float; a NaN gives the type's minimum.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     pBuffer: as many bytes as the qoriFilterRoundGetBufSize32f function of the pixels reports, at any
+ *            address.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst or pKernel is null), QOR_ERR_SIZE (a side of
+ *            the region or the kernel below 1), QOR_ERR_STEP (srcStep below the bytes of roiSize.width +
+ *            kernelSize.width - 1 pixels; dstStep below those of roiSize.width), QOR_ERR_ROUND_MODE (no
+ *            QorRoundingMode), QOR_ERR_NULL_PTR (pBuffer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilter_Round32f_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float* pKernel, QorImageSize kernelSize, QorPoint2D anchor,
+    int32_t roundMode, uint8_t* pBuffer);
+
+/** Reports the bytes of work buffer of qoriFilter_Round16s: 16 * kw * kh + 4 * w * channels + 15.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the kernel or
+ *            roiWidth below 1; a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize16s_8u_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize16s_8u_C3R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize16s_8u_C4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize16s_8u_AC4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+
+/** Reports the bytes of work buffer of qoriFilter_Round32f: 16 * kw * kh + 8 * w * channels + 43, for four
+ *  channels + 15.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the kernel or
+ *            roiWidth below 1; a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_8u_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16s_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16u_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_8u_C3R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16s_C3R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16u_C3R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_8u_C4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_8u_AC4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16s_C4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16s_AC4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16u_C4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32f_16u_AC4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+
+/** Reports the bytes of work buffer of qoriFilter_Round32s: 16 * kw * kh + 4 * w * channels + 31 for 16s, 16 *
+ *  kw * kh + 8 * w * channels + 43 for 16u.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the kernel or
+ *            roiWidth below 1; a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16s_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16s_C3R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16s_C4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16s_AC4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16u_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16u_C3R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16u_C4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+QORI_API QorResult QORI_CALL qoriFilterRoundGetBufSize32s_16u_AC4R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+
+/** Reports 0: the 64f filter takes no work buffer.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the kernel or
+ *            roiWidth below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterGetBufSize_64f_C1R(QorImageSize kernelSize, int32_t roiWidth,
+    int32_t* pBufferSize);
+
+/* ---- General linear filter with a border ---------------------------------------------------------------------- */
+
+/** Reports how many bytes the plan of a general filter and the work buffer of its calls take.
+ *  Elements  dataType: type code of the pixels, 1 (8u), 5 (16u), 7 (16s) or 13 (32f); kernelType: of the
+ *            kernel, 7 (16s) or 13 (32f).
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_SIZE (a side of the kernel or the region below 1), QOR_ERR_DATA_TYPE
+ *            (another type code), QOR_ERR_CHANNELS (numChannels not 1 to 4), QOR_ERR_NULL_PTR (a pointer is
+ *            null), QOR_ERR_SIZE (a result of 2^31 or more); then nothing is written.
+ *  Example   int32_t planBytes, bufferBytes;   // emboss, with the edge pixels repeated outwards
+ *            const int16_t emboss[9] = {-2, -1, 0, -1, 1, 1, 0, 1, 2};
+ *            const QorImageSize kernelSize = {3, 3};
+ *            qoriFilterBorderGetSize(kernelSize, roi, 1, 7, 3, &planBytes, &bufferBytes);
+ *            QorLinearFilterPlan* plan = malloc(planBytes);
+ *            uint8_t* buffer = malloc(bufferBytes);
+ *            const uint8_t black[3] = {0, 0, 0};   // not read: the border is replicated
+ *            qoriFilterBorderInit_16s(emboss, kernelSize, 1, 1, 3, roundNearestEven, plan);
+ *            qoriFilterBorder_8u_C3R(src, srcStep, dst, dstStep, roi, borderReplicate, black, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriFilterBorderGetSize(QorImageSize kernelSize, QorImageSize dstRoiSize, int32_t dataType,
+    int32_t kernelType, int32_t numChannels, int32_t* pSpecSize, int32_t* pBufferSize);
+
+/** Fills the plan of a filter by integers and a divisor.
+ *  Shapes    pKernel: kernelSize.width x kernelSize.height coefficients, row by row. They are applied turned by
+ *            180 degrees.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     For 16u pixels, and 16s pixels of 3 or 4 channels, the plan is that of the float kernel with the
+ *            coefficients times 1 / divisor. A plan may be moved to a block whose address is equal modulo 64.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the kernel
+ *            below 1), QOR_ERR_DATA_TYPE (dataType not 1, 5 or 7), QOR_ERR_CHANNELS (numChannels not 1 to 4),
+ *            QOR_ERR_ROUND_MODE (no QorRoundingMode), QOR_ERR_DIVISOR (divisor 0); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBorderInit_16s(const int16_t* pKernel, QorImageSize kernelSize, int32_t divisor,
+    int32_t dataType, int32_t numChannels, int32_t roundMode, QorLinearFilterPlan* pSpec);
+
+/** Fills the plan of a filter by floats.
+ *  Shapes    pKernel: kernelSize.width x kernelSize.height coefficients, row by row. They are applied turned by
+ *            180 degrees.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a side of the kernel
+ *            below 1), QOR_ERR_DATA_TYPE (dataType not 1, 5, 7 or 13), QOR_ERR_CHANNELS (numChannels not 1 to
+ *            4), QOR_ERR_ROUND_MODE (no QorRoundingMode); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBorderInit_32f(const float* pKernel, QorImageSize kernelSize, int32_t dataType,
+    int32_t numChannels, int32_t roundMode, QorLinearFilterPlan* pSpec);
+
+/** Convolves with the kernel of a plan: dst(x, y) = sum of K(i, j) * src(x + ax - i, y + ay - j), divided and
+ *  rounded as the plan says.
+ *  Shapes    ax = width - 1 - floor(width / 2) of the kernel and ay likewise: an even kernel reaches further to
+ *            the left and above. borderValue: one value per channel, read for borderConstant only but never
+ *            null.
+ *  Elements  Integer kernels: the sum modulo 2^32, exactly divided, rounded, saturated. Float kernels: fused
+ *            multiply-adds in 32-bit float, then rounded and saturated for integers; a NaN gives the type's
+ *            minimum.
+ *  Units     Steps in bytes. Sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination; pBuffer must not
+ *            overlap anything.
+ *  Notes     Each axis follows its own rule: a side whose flag is set is read from memory, the others are
+ *            synthesised. borderReadAll, or all four flags, read everything from memory. Kinds that are not
+ *            named behave as borderReplicate. The plan must have been made for these pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (srcStep below 1; dstStep below the bytes of a row), QOR_ERR_BORDER (border is 2,
+ *            3 or 4); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const uint8_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const uint8_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const uint8_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const int16_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const int16_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const int16_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const uint16_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const uint16_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t border, const uint16_t* borderValue,
+    const QorLinearFilterPlan* pSpec, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, int32_t border, const float* borderValue, const QorLinearFilterPlan* pSpec,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, int32_t border, const float* borderValue, const QorLinearFilterPlan* pSpec,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBorder_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, int32_t border, const float* borderValue, const QorLinearFilterPlan* pSpec,
+    uint8_t* pBuffer);
+
 /* ---- Histograms ----------------------------------------------------------------------------------------------- */
 
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1].
@@ -2719,7 +3142,7 @@ QORI_API void QORI_CALL qoriFree(void* ptr);
 /** Adds the elements of each channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
@@ -2760,7 +3183,7 @@ QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep
 /** Averages the elements of each channel: their sum over width * height.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
@@ -2805,7 +3228,7 @@ QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcSte
 /** Largest magnitude of each channel: max |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -2852,7 +3275,7 @@ QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t s
 /** Sum of magnitudes of each channel: sum |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -2896,7 +3319,7 @@ QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t src
 /** Euclidean norm of each channel: the square root of sum src^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
@@ -2944,7 +3367,7 @@ QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t src
 /** Largest magnitude of the difference in each channel: max |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -2989,7 +3412,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3033,7 +3456,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3077,7 +3500,7 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_
 /** Largest magnitude of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3123,7 +3546,7 @@ QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_
 /** Sum of magnitudes of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3169,7 +3592,7 @@ QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t
 /** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer totals are exact for regions of any size and rounded once, to double. 32f with
+ *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
  *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
  *            single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
@@ -3215,10 +3638,10 @@ QORI_API QorResult QORI_CALL qoriNormRel_L2_32f_AC4R(const float* pSrc1, int32_t
 /** Dot product of two images, per channel: sum src1 * src2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  8- and 16-bit totals are exact and rounded once. 32u and 32s: products and sums in double
- *            precision, in the order of the pixels. 32f with hintAccurate: exact products, sums in double
- *            precision; with any other hint: 48 partial sums in single precision by fused multiply-add, added
- *            pairwise.
+ *  Elements  Integers: products and sums in double precision, in the order of the pixels, so that totals up to
+ *            2^53 in magnitude are exact for 8 and 16 bits. 32f with hintAccurate: exact products, sums in
+ *            double precision; with any other hint: 48 partial sums in single precision by fused multiply-add,
+ *            added pairwise.
  *  Units     Steps in bytes, not checked otherwise; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below

@@ -5,35 +5,32 @@
 namespace qori::arith {
 namespace {
 
-template <class Op, Layout layout, class T>
+template <class Op, bool anyStep, Layout layout, class T>
 QorResult combine(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale) {
+    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
+    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
     const auto run = [&](auto operation) { runBinary<layout>(operation, src1, src2, dst, roi); };
     if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
     return QOR_OK;
 }
 
+template <class T>
+constexpr bool isByte = std::is_same_v<T, uint8_t>;
+
 template <class T, Layout layout>
 QorResult add(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t> || std::is_same_v<T, int16_t> || std::is_same_v<T, float>;
-    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
-    return combine<kernels::Sum<T>, layout>(src1, src2, dst, roi, scale);
+    constexpr bool anyStep = isByte<T> || std::is_same_v<T, int16_t> || std::is_same_v<T, float>;
+    return combine<kernels::Sum<T>, anyStep, layout>(src1, src2, dst, roi, scale);
 }
 
 template <class T, Layout layout>
 QorResult subtract(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
-    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
-    return combine<kernels::Difference<T>, layout>(src1, src2, dst, roi, scale);
+    return combine<kernels::Difference<T>, isByte<T>, layout>(src1, src2, dst, roi, scale);
 }
 
 template <class T, Layout layout>
 QorResult multiply(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
-    if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
-    return combine<kernels::Product<T>, layout>(src1, src2, dst, roi, scale);
+    return combine<kernels::Product<T>, isByte<T>, layout>(src1, src2, dst, roi, scale);
 }
 
 template <class T, Layout layout>

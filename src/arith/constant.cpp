@@ -9,6 +9,11 @@ namespace {
 
 enum class Kind { R, IR };
 
+template <bool anyStep, class T>
+QorResult check(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi) {
+    return firstOf(nullCheck(src, dst), sizeCheck(roi), anyStep ? QOR_OK : stepCheck(src, dst), nullCheck(value));
+}
+
 template <Layout layout, class T, class Predicate>
 bool allValues(const T* value, Predicate predicate) {
     for (int c = 0; c < processedChannels(layout); ++c)
@@ -70,10 +75,9 @@ QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize
 
 template <class T, Layout layout, Kind kind>
 QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
     constexpr bool anyStep =
         std::is_same_v<T, uint8_t> || (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
-    if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
+    if (QorResult r = check<anyStep>(src, value, dst, roi)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
             copyImage<layout>(src, dst, roi);
@@ -92,9 +96,7 @@ QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImage
 
 template <class T, Layout layout>
 QorResult subtractConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
-    if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
+    if (QorResult r = check<std::is_same_v<T, uint8_t>>(src, value, dst, roi)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
             copyImage<layout>(src, dst, roi);
@@ -106,9 +108,7 @@ QorResult subtractConstant(Image<const T> src, const T* value, Image<T> dst, Qor
 
 template <class T, Layout layout>
 QorResult multiplyConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi))) return r;
-    constexpr bool anyStep = std::is_same_v<T, uint8_t>;
-    if (QorResult r = anyStep ? QOR_OK : stepCheck(src, dst)) return r;
+    if (QorResult r = check<std::is_same_v<T, uint8_t>>(src, value, dst, roi)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (allValues<layout>(value, isZeroValue<T>)) {
             fillConstant<layout>(dst, roi, T{});
@@ -126,7 +126,7 @@ QorResult multiplyConstant(Image<const T> src, const T* value, Image<T> dst, Qor
 
 template <class T, Layout layout>
 QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
+    if (QorResult r = check<false>(src, value, dst, roi)) return r;
     if (!allValues<layout>(value, [](T v) { return !isZeroValue(v); })) return QOR_ERR_DIV_BY_ZERO;
     if constexpr (std::is_integral_v<T>) {
         // Up to 2^(scale-1): at most a half, which goes to 0.
@@ -152,7 +152,7 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
 
 template <class T, Layout layout>
 QorResult multiplyConstantFraction(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi) {
-    if (QorResult r = firstOf(nullCheck(src, value, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
+    if (QorResult r = check<false>(src, value, dst, roi)) return r;
     const auto product = [](auto a, auto b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
     runConstant<layout>(kernels::Binary<T, decltype(product)>{product}, value, src, dst, roi);
     return QOR_OK;

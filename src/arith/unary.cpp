@@ -62,9 +62,10 @@ QORI_INLINE Vec<int32_t> nearest(__m256d low, __m256d high) {
         _mm256_set_m128i(_mm256_cvtpd_epi32(_mm256_min_pd(high, most)), _mm256_cvtpd_epi32(_mm256_min_pd(low, most)))};
 }
 
-/// In float, for scale factors from -2 up. With y = sqrt(x) 2^-s and t a half: y^2 - t^2 is 0 or at least 1/4 (s = 0;
-/// the other scales shift both alike), so y is t or at least 2^-11 from it while y <= 2^8, and at least 2^-13 for s =
-/// -2 with y <= 2^10. Half a unit in y's last place is 2^-17 and 2^-15: it rounds to neither t nor past it.
+/// In float, for 8 bits, and for scale factors from -2 up. With y = sqrt(x) 2^-s and t a half: y^2 - t^2 is 0 or at
+/// least 1/4 (s = 0; the other scales shift both alike), so y is t or at least 2^-11 from it while y <= 2^8, and at
+/// least 2^-13 for s = -2 with y <= 2^10. Half a unit in y's last place is 2^-17 and 2^-15: it rounds to neither t nor
+/// past it. Bytes saturate above 2^8.
 template <class T>
 struct FloatRoot {
     float factor;
@@ -250,8 +251,9 @@ QorResult squareRoot(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t
         return runFloats<layout>([](__m256 v) { return _mm256_sqrt_ps(v); }, src, dst, roi);
     } else {
         const int exponent = boundedExponent(scale);
-        if (exponent > 2) return runUnary<layout>(DoubleRoot<T>{powerOfTwo(exponent)}, src, dst, roi);
-        return runUnary<layout>(FloatRoot<T>{std::ldexp(1.0f, exponent)}, src, dst, roi);
+        if (sizeof(T) == 1 || exponent <= 2)
+            return runUnary<layout>(FloatRoot<T>{std::ldexp(1.0f, exponent)}, src, dst, roi);
+        return runUnary<layout>(DoubleRoot<T>{powerOfTwo(exponent)}, src, dst, roi);
     }
 }
 

@@ -178,3 +178,4 @@ QorResult unpackBits(Image<const uint8_t> src, int32_t srcBitOffset, Image<uint8
 }  // namespace qori::convert
 
 #include "entries/convert.inc"
+#include "entries/convert_bits.inc"

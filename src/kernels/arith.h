@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Sums, differences and products of elements. Each operation tells, per element type:
-//     exact(a, b)   the result without scaling, saturated by the processor itself, where it can;
+//     exact(a, b)   the result without scaling, saturated by the processor itself, where it can (hasExact);
 //     wide(a, b)    the exact value in lanes W, of magnitude up to `limit`, for the scaling rule.
 // b is the second operand: differences are b - a.
 #pragma once
@@ -90,6 +90,7 @@ template <class T>
 struct Sum {
     using C = Component<T>;
     using W = SignedLane<C>;
+    static constexpr bool hasExact = true;
     static constexpr uint64_t limit = 2 * magnitude<C>;  // at most 2^32, in lanes of 64 bits
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
@@ -125,6 +126,7 @@ template <class T>
 struct Difference {
     using C = Component<T>;
     using W = SignedLane<C>;
+    static constexpr bool hasExact = true;
     static constexpr uint64_t limit = std::is_signed_v<C> ? 2 * magnitude<C> - 1 : magnitude<C>;
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
@@ -166,11 +168,12 @@ template <class T>
 struct Product {
     using C = Component<T>;
     using W = std::conditional_t<std::is_signed_v<C>, SignedLane<C>, std::make_unsigned_t<SignedLane<C>>>;
+    static constexpr bool hasExact = isFloat<T>;
     // 8u: 65,025. 16u: 65,535^2. 16s: 2^30. Complex parts reach 2^31 and 2^63, which the lane does not
     // hold and mendMinimum() lowers by 256.
     static constexpr uint64_t square = magnitude<C> * magnitude<C>, limit = isComplex<T> ? 2 * square - 256 : square;
 
-    static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) requires isFloat<T> {
+    static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const __m256 a = components(first).v, b = components(second).v;
         if constexpr (isComplex<T>) {
             const __m256 byReal = _mm256_mul_ps(a, _mm256_moveldup_ps(b));
@@ -239,14 +242,21 @@ struct WithConstant {
     }
 };
 
+template <class Op>
+struct Exact {
+    template <class V>
+    QORI_INLINE V operator()(V a, V b) const {
+        return Op::exact(a, b);
+    }
+};
+
 /// Calls run(operation) with the row operation for the scale; false where all results are 0.
 template <class Op, class T, class Run>
 bool withScaledOperation(int32_t scale, Run run) {
     using C = Component<T>;
     const auto binary = [&](auto function) { run(Binary<T, decltype(function)>{function}); };
-    const auto exact = [](auto a, auto b) __attribute__((always_inline)) { return Op::exact(a, b); };
     if constexpr (isFloat<T>) {
-        binary(exact);
+        binary(Exact<Op>{});
         return true;
     } else {
         if constexpr (requires(Vec<T> a) { Op::halved(a, a); }) {
@@ -257,8 +267,8 @@ bool withScaledOperation(int32_t scale, Run run) {
         }
         return withScaleRule<C, typename Op::W, Op::limit>(scale, [&](auto rule) {
             constexpr bool unscaled = std::is_same_v<decltype(rule), Saturate<C, typename Op::W>>;
-            if constexpr (unscaled && requires(Vec<T> a) { Op::exact(a, a); }) {
-                binary(exact);
+            if constexpr (unscaled && Op::hasExact) {
+                binary(Exact<Op>{});
             } else {
                 binary([rule](Vec<T> a, Vec<T> b) __attribute__((always_inline)) {
                     const auto wide = Op::wide(a, b);

@@ -244,7 +244,7 @@ private:
     QORI_INLINE __m128i quotient(__m256d n, __m256d d) const {
         const __m256d x = _mm256_div_pd(_mm256_mul_pd(n, _mm256_set1_pd(factor)), d);
         const __m256d clamped = _mm256_min_pd(_mm256_max_pd(x, _mm256_set1_pd(INT16_MIN)), _mm256_set1_pd(INT16_MAX));
-        return _mm256_cvttpd_epi32(roundToEven({clamped}).v);
+        return _mm256_cvttpd_epi32(roundToEven(Vec<double>{clamped}).v);
     }
     double factor;
 };
@@ -281,7 +281,7 @@ private:
         const __m256d size = _mm256_add_pd(_mm256_andnot_pd(sign, byReal), _mm256_andnot_pd(sign, byImaginary));
         const __m256d q = _mm256_mul_pd(sum, inverse);
         const __m256d error = _mm256_mul_pd(_mm256_mul_pd(size, inverse), _mm256_set1_pd(0x1p-49));
-        const __m256d whole = roundToEven({q}).v, off = _mm256_andnot_pd(sign, _mm256_sub_pd(q, whole));
+        const __m256d whole = roundToEven(Vec<double>{q}).v, off = _mm256_andnot_pd(sign, _mm256_sub_pd(q, whole));
         const __m256d isNear = _mm256_cmp_pd(_mm256_add_pd(off, error), _mm256_set1_pd(.5), _CMP_NLT_UQ);
         unsure = _mm256_or_si256(unsure, _mm256_castpd_si256(isNear));
         const __m256d least = _mm256_set1_pd(INT32_MIN), most = _mm256_set1_pd(INT32_MAX);

@@ -38,6 +38,10 @@ QORI_INLINE Pack<T, n> loadPack(const T* p) {
 template <class T, int n>
 QORI_INLINE Pack<T, n> loadPackUpTo(const T* p, ptrdiff_t count) {
     Pack<T, n> pack;
+    if constexpr (Pack<T, n>::vectors == 1) {
+        pack.v[0] = loadPartial(p, count);  // a block is one vector, and less than that is left
+        return pack;
+    }
     for (int i = 0; i < Pack<T, n>::vectors; ++i)
         pack.v[i] = loadUpTo(p + i * Vec<T>::lanes, count - i * Vec<T>::lanes);
     return pack;
@@ -74,7 +78,10 @@ QORI_INLINE void storePackUpTo(T* p, Pack<T, n> pack, ptrdiff_t count) {
         const ptrdiff_t rest = count - i * Vec<T>::lanes;
         if (rest <= 0) return;
         if constexpr (keepAlpha) pack.v[i] = withAlphaOf(pack.v[i], loadUpTo(at, rest));
-        storeUpTo(at, pack.v[i], rest);
+        if constexpr (Pack<T, n>::vectors == 1)
+            storePartial(at, pack.v[i], rest);
+        else
+            storeUpTo(at, pack.v[i], rest);
     }
 }
 
@@ -86,6 +93,24 @@ QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
         return op(phase, packs...);
 }
 
+/// Blocks three at a time, then one at a time, then what is left. Pointers come by value: through a reference, every
+/// store might change them, and they would be loaded again for each vector.
+template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
+QORI_INLINE void mapBlocks(Op& op, ptrdiff_t elements, D* dst, const S*... src) {
+    ptrdiff_t i = 0;
+    for (; i <= elements - 3 * n; i += 3 * n) {
+        for (int phase = 0; phase < 3; ++phase)
+            storePack<keepAlpha, streams>(dst + i + phase * n, op(phase, loadPack<S, n>(src + i + phase * n)...));
+    }
+    int phase = 0;
+    for (; i <= elements - n; i += n, ++phase)
+        storePack<keepAlpha, streams>(dst + i, op(phase, loadPack<S, n>(src + i)...));
+    if (i < elements) {
+        const ptrdiff_t rest = elements - i;
+        storePackUpTo<keepAlpha>(dst + i, applyTail(op, phase, rest, loadPackUpTo<S, n>(src + i, rest)...), rest);
+    }
+}
+
 }  // namespace detail
 
 /// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
@@ -93,27 +118,11 @@ QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
 template <bool keepAlpha, class Op, class D, class... S>
 QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
-    constexpr bool mayStream = requires { Op::mayStream; };
-    const auto body = [&]<bool streams>(std::bool_constant<streams>) {
-        ptrdiff_t i = 0;
-        for (; i <= elements - 3 * n; i += 3 * n) {
-            for (int phase = 0; phase < 3; ++phase)
-                detail::storePack<keepAlpha, streams>(dst + i + phase * n,
-                                                      op(phase, detail::loadPack<S, n>(src + i + phase * n)...));
-        }
-        int phase = 0;
-        for (; i <= elements - n; i += n, ++phase)
-            detail::storePack<keepAlpha, streams>(dst + i, op(phase, detail::loadPack<S, n>(src + i)...));
-        if (i < elements) {
-            const ptrdiff_t rest = elements - i;
-            detail::storePackUpTo<keepAlpha>(
-                dst + i, detail::applyTail(op, phase, rest, detail::loadPackUpTo<S, n>(src + i, rest)...), rest);
-        }
-    };
-    if constexpr (mayStream) {
-        if (streaming && reinterpret_cast<uintptr_t>(dst) % 32 == 0) return body(std::true_type{});
+    if constexpr (requires { Op::mayStream; }) {
+        if (streaming && reinterpret_cast<uintptr_t>(dst) % 32 == 0)
+            return detail::mapBlocks<keepAlpha, true, n>(op, elements, dst, src...);
     }
-    body(std::false_type{});
+    detail::mapBlocks<keepAlpha, false, n>(op, elements, dst, src...);
 }
 
 /// mapRow over a region of `channels` interleaved channels.
@@ -135,8 +144,11 @@ struct ChannelVectors {
 
 template <class T>
 ChannelVectors<T> channelVectors(const T* values, int channels) {
+    constexpr int kGroup = 12;  // whole pixels of 1, 3 and 4 channels
     alignas(32) T all[3 * Vec<T>::lanes];
-    for (int i = 0; i < 3 * Vec<T>::lanes; ++i) all[i] = values[i % channels];
+    T group[kGroup];
+    for (int i = 0, c = 0; i < kGroup; ++i, c = c + 1 < channels ? c + 1 : 0) group[i] = values[c];
+    for (int i = 0; i < 3 * Vec<T>::lanes; i += kGroup) __builtin_memcpy(all + i, group, sizeof group);
     return {{load(all), load(all + Vec<T>::lanes), load(all + 2 * Vec<T>::lanes)}};
 }
 

@@ -8,18 +8,19 @@
 // A measure says what is accumulated:
 //     Lanes                            accumulators of one vector position, see reduce_lanes.h
 //     static void feed(Lanes&, Vec<T>...)   adds one vector of each source; zeros add nothing
-//     optionally loadVector(p) and loadRest(p, n)   where vectors are not simply loaded
 // Lanes offer
 //     Total                            type of a channel's result
 //     static constexpr int banks       vectors of a round, in threes: more than 3 where latency would bind
 //     static constexpr ptrdiff_t limit rounds before a lane could overflow
+//     optionally  takesTwo             lanes are fed with TwoVectors, and a round has as many vectors again
+//     optionally  loadVector(p) and loadRest(p, n)   where vectors are not simply loaded; n may reach a vector
 //     and either  values(Total*)       one value per element position
 //     or          Next, spillTo(Next&) wider accumulators that take over before the limit
 //     optionally  static Total join(Total, Total)   what brings lanes together if not +
 #pragma once
 #include <algorithm>
 
-#include "simd.h"
+#include "reduce_lanes.h"
 
 namespace qori::kernels {
 
@@ -47,20 +48,30 @@ typename Lanes::Total joinChannel(const typename Lanes::Total* values, int chann
     return own[0];
 }
 
-template <class Measure, class T>
+template <class Lanes>
+constexpr bool takesTwo = requires {
+    Lanes::takesTwo;
+};
+
+template <class Lanes, class T>
 QORI_INLINE auto loadFor(const T* p) {
-    if constexpr (requires { Measure::loadVector(p); })
-        return Measure::loadVector(p);
+    if constexpr (requires { Lanes::loadVector(p); })
+        return Lanes::loadVector(p);
+    else if constexpr (takesTwo<Lanes>)
+        return TwoVectors<T>{load(p), load(p + 3 * Vec<T>::lanes)};
     else
         return load(p);
 }
 
-template <class Measure, class T>
+/// Up to one vector.
+template <class Lanes, class T>
 QORI_INLINE auto loadRestFor(const T* p, ptrdiff_t n) {
-    if constexpr (requires { Measure::loadRest(p, n); })
-        return Measure::loadRest(p, n);
+    if constexpr (requires { Lanes::loadRest(p, n); })
+        return Lanes::loadRest(p, n);
+    else if constexpr (takesTwo<Lanes>)
+        return TwoVectors<T>{loadUpTo(p, n), zero<T>()};
     else
-        return loadPartial(p, n);
+        return loadUpTo(p, n);
 }
 
 }  // namespace detail
@@ -121,29 +132,27 @@ using AccumulatorsOf = Accumulators<typename Measure::Lanes>;
 template <class Measure, class T, class... More>
 QORI_NOINLINE void reduceRow(AccumulatorsOf<Measure>& sums, int channels, ptrdiff_t elements, const T* first,
                              const More*... more) {
+    using Lanes = typename Measure::Lanes;
     constexpr int n = Vec<T>::lanes, vectors = AccumulatorsOf<Measure>::vectors;
-    constexpr ptrdiff_t round = ptrdiff_t{n} * vectors;
+    constexpr ptrdiff_t round = ptrdiff_t{n} * vectors * (detail::takesTwo<Lanes> ? 2 : 1);
     ptrdiff_t i = 0;
     while (elements - i >= round) {
-        typename Measure::Lanes lanes[vectors];
+        Lanes lanes[vectors];
         for (int v = 0; v < vectors; ++v) lanes[v] = sums.lanes[v];
         const ptrdiff_t rounds = std::min((elements - i) / round, sums.left);
         for (const ptrdiff_t end = i + rounds * round; i < end; i += round) {
 #pragma GCC unroll 6
             for (int v = 0; v < vectors; ++v)
-                Measure::feed(lanes[v], detail::loadFor<Measure>(first + i + v * n),
-                              detail::loadFor<Measure>(more + i + v * n)...);
+                Measure::feed(lanes[v], detail::loadFor<Lanes>(first + i + v * n),
+                              detail::loadFor<Lanes>(more + i + v * n)...);
         }
         for (int v = 0; v < vectors; ++v) sums.lanes[v] = lanes[v];
         if ((sums.left -= rounds) == 0) sums.spill(channels);
     }
     if (i == elements) return;
-    int v = 0;
-    for (; elements - i >= n; i += n, ++v)
-        Measure::feed(sums.lanes[v], detail::loadFor<Measure>(first + i), detail::loadFor<Measure>(more + i)...);
-    if (const ptrdiff_t rest = elements - i; rest > 0)
-        Measure::feed(sums.lanes[v], detail::loadRestFor<Measure>(first + i, rest),
-                      detail::loadRestFor<Measure>(more + i, rest)...);
+    for (int v = 0; i < elements; i += n, v = v < vectors - 1 ? v + 1 : 0)
+        Measure::feed(sums.lanes[v], detail::loadRestFor<Lanes>(first + i, elements - i),
+                      detail::loadRestFor<Lanes>(more + i, elements - i)...);
     if (--sums.left == 0) sums.spill(channels);
 }
 

@@ -34,7 +34,7 @@ struct CountLanes<float> {
     void values(Total* out) const {
         uint32_t words[count];
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(words), counts);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::widen(words, out);
     }
 };
 

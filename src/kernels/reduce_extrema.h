@@ -82,14 +82,15 @@ QORI_INLINE Vec<T> select(Vec<T> a, T other, __m256i mask) {
     return fromInteger<T>(_mm256_blendv_epi8(toInteger(filled(other).v), toInteger(a.v), mask));
 }
 
+/// All bits of the equal lanes.
 template <class T>
-QORI_INLINE uint32_t equalBytes(Vec<T> a, Vec<T> b) {
+QORI_INLINE __m256i equal(Vec<T> a, Vec<T> b) {
     if constexpr (std::is_same_v<T, float>)
-        return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_castps_si256(_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ))));
+        return toInteger(_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ));
     else if constexpr (sizeof(T) == 1)
-        return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(a.v, b.v)));
+        return _mm256_cmpeq_epi8(a.v, b.v);
     else
-        return static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi16(a.v, b.v)));
+        return _mm256_cmpeq_epi16(a.v, b.v);
 }
 
 }  // namespace detail
@@ -103,10 +104,14 @@ struct ExtremumLanes {
     Vec<T> best[vectors] = {filled(Order::start), filled(Order::start), filled(Order::start)};
 
     T ofChannel(int channels, int channel) const {
-        T values[vectors * Vec<T>::lanes];
-        for (int v = 0; v < vectors; ++v) store(values + v * Vec<T>::lanes, best[v]);
+        constexpr int n = Vec<T>::lanes;
+        // Whole pixels of 1 and of 4 channels fill a vector, so that the three are alike.
+        const bool alike = channels != 3;
+        T values[vectors * n];
+        if (alike) store(values, Order::join(Order::join(best[0], best[1]), best[2]));
+        for (int v = 0; v < vectors && !alike; ++v) store(values + v * n, best[v]);
         T result = values[channel];
-        for (int i = channel + channels; i < vectors * Vec<T>::lanes; i += channels)
+        for (int i = channel + channels; i < (alike ? n : vectors * n); i += channels)
             if (Order::better(values[i], result)) result = values[i];
         return result;
     }
@@ -146,34 +151,39 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
 /// Whether any lane has become better than its channel's best.
 template <class Order, class T>
 QORI_INLINE bool anyBetter(const ExtremumLanes<Order>& lanes, const ChannelVectors<T>& best) {
-    uint32_t same = ~0u;
-    for (int v = 0; v < 3; ++v) same &= detail::equalBytes(Order::join(lanes.best[v], best.v[v]), best.v[v]);
-    return same != ~0u;
+    __m256i same = _mm256_set1_epi8(-1);
+    for (int v = 0; v < 3; ++v)
+        same = _mm256_and_si256(same, detail::equal(Order::join(lanes.best[v], best.v[v]), best.v[v]));
+    return _mm256_movemask_epi8(same) != -1;
 }
 
-/// Which bytes of each vector of a round belong to a channel, as bits.
-struct ChannelBits {
-    uint32_t bits[3];
-
-    ChannelBits(int elementBytes, int channels, int channel) : bits{} {
-        for (int at = channel * elementBytes; at < 96; at += channels * elementBytes)
-            bits[at / 32] |= ((1u << elementBytes) - 1) << at % 32;
-    }
-};
+/// All bits of one channel's elements.
+template <class T>
+ChannelVectors<T> channelMasks(int channels, int channel) {
+    T masks[4] = {};
+    __builtin_memset(masks + channel, 0xFF, sizeof(T));
+    return channelVectors(masks, channels);
+}
 
 /// The index of a row's first element of a channel that equals value, or -1.
 template <class T>
-QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const ChannelBits& channel, T value) {
+QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const ChannelVectors<T>& masks, T value) {
     constexpr int n = Vec<T>::lanes;
     const Vec<T> wanted = filled(value);
-    int phase = 0;
-    for (ptrdiff_t i = 0; i < elements; i += n) {
-        const uint32_t found = detail::equalBytes(loadUpTo(src + i, elements - i), wanted) & channel.bits[phase];
-        if (found != 0) {
-            const ptrdiff_t at = i + __builtin_ctz(found) / static_cast<int>(sizeof(T));
-            return at < elements ? at : -1;  // zeros behind the row may equal the value
-        }
-        phase = phase == 2 ? 0 : phase + 1;
+    const auto found = [&](Vec<T> a, int phase) {
+        return _mm256_and_si256(detail::equal(a, wanted), toInteger(masks.v[phase].v));
+    };
+    ptrdiff_t i = 0;
+    for (; i <= elements - 3 * n; i += 3 * n) {
+        const __m256i first = found(load(src + i), 0), second = found(load(src + i + n), 1);
+        const __m256i any = _mm256_or_si256(_mm256_or_si256(first, second), found(load(src + i + 2 * n), 2));
+        if (!_mm256_testz_si256(any, any)) break;
+    }
+    for (int phase = 0; i < elements; i += n, phase = phase < 2 ? phase + 1 : 0) {
+        const int bits = _mm256_movemask_epi8(found(loadUpTo(src + i, elements - i), phase));
+        if (bits == 0) continue;
+        const ptrdiff_t at = i + __builtin_ctz(static_cast<unsigned>(bits)) / static_cast<int>(sizeof(T));
+        return at < elements ? at : -1;  // zeros behind the row may equal the value
     }
     return -1;
 }

@@ -29,6 +29,7 @@ QORI_INLINE Doubles magnitude(Doubles a) {
     return {_mm256_andnot_pd(sign, a.low), _mm256_andnot_pd(sign, a.high)};
 }
 
+/// In single precision: sums of values and of products alike.
 struct FloatLanes {
     using Total = float;
     static constexpr int banks = 2, count = 8;
@@ -41,6 +42,12 @@ struct FloatLanes {
     void values(Total* out) const { _mm256_storeu_ps(out, sum); }
 };
 
+template <>
+struct SumLanes<float> : FloatLanes {};
+template <>
+struct ProductLanes<float> : FloatLanes {};
+
+/// In double precision from the element on: the difference of two sources too is taken there.
 struct DoubleLanes {
     using Total = double;
     static constexpr int banks = 1, count = 8;
@@ -48,6 +55,8 @@ struct DoubleLanes {
 
     __m256d low, high;
 
+    QORI_INLINE static Doubles loadVector(const float* p) { return loadDoubles(p); }
+    QORI_INLINE static Doubles loadRest(const float* p, ptrdiff_t n) { return toDoubles(loadUpTo(p, n)); }
     QORI_INLINE void add(Doubles a) {
         low = _mm256_add_pd(low, a.low);
         high = _mm256_add_pd(high, a.high);

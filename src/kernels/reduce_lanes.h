@@ -17,6 +17,11 @@ QORI_INLINE void storeInterleaved(Word* out, __m256i even, __m256i odd) {
     _mm256_storeu_si256(reinterpret_cast<__m256i*>(out + 8), _mm256_permute2x128_si256(low, high, 0x31));
 }
 
+template <class Word, class Total, int count>
+void widen(const Word (&words)[count], Total* out) {
+    for (int i = 0; i < count; ++i) out[i] = words[i];
+}
+
 /// The even and the odd elements of a vector of bytes as 16-bit numbers.
 template <class T>
 QORI_INLINE __m256i evenBytes(Vec<T> a) {
@@ -36,7 +41,13 @@ QORI_INLINE __m256i oddBytes(Vec<T> a) {
 
 }  // namespace detail
 
-/// Sums per element position; the general form is told below.
+/// A vector and the one at its place in the next round.
+template <class T>
+struct TwoVectors {
+    Vec<T> first, second;
+};
+
+/// Sums per element position.
 template <class T>
 struct SumLanes;
 
@@ -54,13 +65,10 @@ struct SumLanes<uint16_t> {
         all = _mm256_add_epi32(all, a.v);
         odd = _mm256_add_epi32(odd, _mm256_srli_epi32(a.v, 16));
     }
-    void sums(uint32_t* out) const {
-        detail::storeInterleaved(out, _mm256_sub_epi32(all, _mm256_slli_epi32(odd, 16)), odd);
-    }
     void values(Total* out) const {
         uint32_t words[count];
-        sums(words);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::storeInterleaved(words, _mm256_sub_epi32(all, _mm256_slli_epi32(odd, 16)), odd);
+        detail::widen(words, out);
     }
 };
 
@@ -77,23 +85,20 @@ struct SumLanes<int16_t> {
         even = _mm256_add_epi32(even, _mm256_madd_epi16(a.v, _mm256_set1_epi32(1)));
         odd = _mm256_add_epi32(odd, _mm256_srai_epi32(a.v, 16));
     }
-    void sums(int32_t* out) const { detail::storeInterleaved(out, even, odd); }
     void values(Total* out) const {
         int32_t words[count];
-        sums(words);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::storeInterleaved(words, even, odd);
+        detail::widen(words, out);
     }
 };
 
-/// Two sums of 16-bit numbers, of the even and of the odd bytes.
-template <class T>
+/// What 8-bit sums spill into: 16-bit numbers, of the even and of the odd bytes.
 struct EvenOddSums {
-    using Half = SumLanes<T>;
-    using Total = typename Half::Total;
+    using Total = uint64_t;
     static constexpr int banks = 1, count = 32;
-    static constexpr ptrdiff_t limit = Half::limit;
+    static constexpr ptrdiff_t limit = SumLanes<uint16_t>::limit;
 
-    Half even, odd;
+    SumLanes<uint16_t> even, odd;
 
     void values(Total* out) const {
         Total halves[2][16];
@@ -106,7 +111,7 @@ struct EvenOddSums {
 /// As for 16 bits, with halves that hold 255 * 257 = 2^16 - 1.
 template <>
 struct SumLanes<uint8_t> {
-    using Next = EvenOddSums<uint16_t>;
+    using Next = EvenOddSums;
     static constexpr int banks = 1;
     static constexpr ptrdiff_t limit = 257;
 
@@ -138,13 +143,36 @@ struct SadLanes {
 template <class T>
 struct ProductLanes;
 
-/// Byte products fit 16 bits: 255 * 255 < 2^16, -128 * -128 < 2^15.
+/// Byte products, of two rounds at a time: 16-bit words of both are interleaved, so that an instruction that adds pairs
+/// of products adds those of one channel. A round adds at most 2 * 255^2 = 130,050, and 33,025 * 130,050 < 2^32;
+/// signed, 33,025 * 2 * 128^2 < 2^31.
 template <class T>
-requires(sizeof(T) == 1) struct ProductLanes<T>
-    : EvenOddSums<std::conditional_t<std::is_signed_v<T>, int16_t, uint16_t>> {
-    QORI_INLINE void add(Vec<T> a, Vec<T> b) {
-        this->even.add({_mm256_mullo_epi16(detail::evenBytes(a), detail::evenBytes(b))});
-        this->odd.add({_mm256_mullo_epi16(detail::oddBytes(a), detail::oddBytes(b))});
+requires(sizeof(T) == 1) struct ProductLanes<T> {
+    using Word = std::conditional_t<std::is_signed_v<T>, int32_t, uint32_t>;
+    using Total = std::conditional_t<std::is_signed_v<T>, int64_t, uint64_t>;
+    static constexpr int banks = 1, count = 32;
+    static constexpr bool takesTwo = true;
+    static constexpr ptrdiff_t limit = 33'025;
+
+    struct Sums {
+        __m256i even, odd;
+
+        QORI_INLINE void add(Vec<T> a, Vec<T> b) {
+            even = _mm256_add_epi32(even, _mm256_madd_epi16(detail::evenBytes(a), detail::evenBytes(b)));
+            odd = _mm256_add_epi32(odd, _mm256_madd_epi16(detail::oddBytes(a), detail::oddBytes(b)));
+        }
+    };
+    Sums low, high;  ///< Of the lower and the upper 8 bytes of each half.
+
+    QORI_INLINE void add(TwoVectors<T> a, TwoVectors<T> b) {
+        low.add({_mm256_unpacklo_epi16(a.first.v, a.second.v)}, {_mm256_unpacklo_epi16(b.first.v, b.second.v)});
+        high.add({_mm256_unpackhi_epi16(a.first.v, a.second.v)}, {_mm256_unpackhi_epi16(b.first.v, b.second.v)});
+    }
+    void values(Total* out) const {
+        Word words[2][2][8];  // by part of the half, by half
+        detail::storeInterleaved(words[0][0], low.even, low.odd);
+        detail::storeInterleaved(words[1][0], high.even, high.odd);
+        for (int i = 0; i < count; ++i) out[i] = words[i / 8 % 2][i / 16][i % 8];
     }
 };
 
@@ -198,7 +226,7 @@ struct PairProductLanes {
     void values(Total* out) const {
         uint32_t words[count];
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(words), sum);
-        for (int i = 0; i < count; ++i) out[i] = words[i];
+        detail::widen(words, out);
     }
 };
 

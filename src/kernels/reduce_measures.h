@@ -37,99 +37,59 @@ QORI_INLINE Vec<uint16_t> magnitude(Vec<int16_t> a, Vec<int16_t> b) {
 }
 QORI_INLINE Vec<float> magnitude(Vec<float> a, Vec<float> b) { return magnitude(Vec<float>{_mm256_sub_ps(a.v, b.v)}); }
 
-/// Largest magnitude.
-template <class T>
-struct Largest {
-    using Lanes = MaxLanes<Magnitude<T>>;
-    template <class... V>
-    QORI_INLINE static void feed(Lanes& lanes, V... v) {
-        lanes.add(magnitude(v...));
+QORI_INLINE Doubles magnitude(Doubles a, Doubles b) { return magnitude(a - b); }
+
+template <class T, class... Other>
+QORI_INLINE auto magnitude(TwoVectors<T> a, Other... b) {
+    return TwoVectors<Magnitude<T>>{magnitude(a.first, b.first...), magnitude(a.second, b.second...)};
+}
+
+/// What is squared: integers by their magnitude, which has no sign to care for, floats as they are.
+template <class... V>
+QORI_INLINE auto difference(V... v) {
+    return magnitude(v...);
+}
+QORI_INLINE Vec<float> difference(Vec<float> a) { return a; }
+QORI_INLINE Vec<float> difference(Vec<float> a, Vec<float> b) { return {_mm256_sub_ps(a.v, b.v)}; }
+QORI_INLINE Doubles difference(Doubles a) { return a; }
+QORI_INLINE Doubles difference(Doubles a, Doubles b) { return a - b; }
+
+template <class L>
+struct Values {
+    using Lanes = L;
+    template <class V>
+    QORI_INLINE static void feed(Lanes& lanes, V a) {
+        lanes.add(a);
     }
 };
 
-/// Sum of magnitudes.
-template <class T>
+/// Their sum or their maximum, as the lanes have it.
+template <class L>
 struct Magnitudes {
-    using Lanes = SumLanes<Magnitude<T>>;
-    template <class... V>
-    QORI_INLINE static void feed(Lanes& lanes, V... v) {
-        lanes.add(magnitude(v...));
-    }
-};
-template <>
-struct Magnitudes<float> {
-    using Lanes = FloatLanes;
+    using Lanes = L;
     template <class... V>
     QORI_INLINE static void feed(Lanes& lanes, V... v) {
         lanes.add(magnitude(v...));
     }
 };
 
-/// Sum of squared magnitudes.
-template <class T>
+template <class L>
 struct Squares {
-    using Lanes = ProductLanes<Magnitude<T>>;
+    using Lanes = L;
     template <class... V>
     QORI_INLINE static void feed(Lanes& lanes, V... v) {
-        const auto m = magnitude(v...);
-        lanes.add(m, m);
-    }
-};
-template <>
-struct Squares<float> {
-    using Lanes = FloatLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a) { lanes.add(a, a); }
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a, Vec<float> b) {
-        const Vec<float> d{_mm256_sub_ps(a.v, b.v)};
+        const auto d = difference(v...);
         lanes.add(d, d);
     }
 };
 
-template <class T>
-struct Values {
-    using Lanes = SumLanes<T>;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<T> a) { lanes.add(a); }
-};
-template <>
-struct Values<float> {
-    using Lanes = FloatLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a) { lanes.add(a); }
-};
-
-template <class T>
+template <class L>
 struct Products {
-    using Lanes = ProductLanes<T>;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<T> a, Vec<T> b) { lanes.add(a, b); }
-};
-template <>
-struct Products<float> {
-    using Lanes = FloatLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Vec<float> a, Vec<float> b) { lanes.add(a, b); }
-};
-
-/// In double precision from the element on: the difference too is taken there.
-struct Accurate {
-    using Lanes = DoubleLanes;
-    QORI_INLINE static Doubles loadVector(const float* p) { return loadDoubles(p); }
-    QORI_INLINE static Doubles loadRest(const float* p, ptrdiff_t n) { return toDoubles(loadPartial(p, n)); }
-};
-
-struct AccurateMagnitudes : Accurate {
-    QORI_INLINE static void feed(Lanes& lanes, Doubles a) { lanes.add(magnitude(a)); }
-    QORI_INLINE static void feed(Lanes& lanes, Doubles a, Doubles b) { lanes.add(magnitude(a - b)); }
-};
-
-struct AccurateSquares : Accurate {
-    QORI_INLINE static void feed(Lanes& lanes, Doubles a) { lanes.add(a, a); }
-    QORI_INLINE static void feed(Lanes& lanes, Doubles a, Doubles b) { lanes.add(a - b, a - b); }
-};
-
-struct AccurateValues : Accurate {
-    QORI_INLINE static void feed(Lanes& lanes, Doubles a) { lanes.add(a); }
-};
-
-struct AccurateProducts : Accurate {
-    QORI_INLINE static void feed(Lanes& lanes, Doubles a, Doubles b) { lanes.add(a, b); }
+    using Lanes = L;
+    template <class V>
+    QORI_INLINE static void feed(Lanes& lanes, V a, V b) {
+        lanes.add(a, b);
+    }
 };
 
 /// For one channel of bytes, neighbours may be added: these need fewer operations than their general forms.
@@ -143,11 +103,6 @@ struct ByteSquares {
     using Lanes = PairProductLanes;
     QORI_INLINE static void feed(Lanes& lanes, Bytes a) { lanes.add(a, a); }
     QORI_INLINE static void feed(Lanes& lanes, Bytes a, Bytes b) { lanes.addSquaredDifference(a, b); }
-};
-
-struct ByteProducts {
-    using Lanes = PairProductLanes;
-    QORI_INLINE static void feed(Lanes& lanes, Bytes a, Bytes b) { lanes.add(a, b); }
 };
 
 }  // namespace qori::kernels

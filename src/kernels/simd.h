@@ -173,6 +173,7 @@ QORI_INLINE void storePartial(T* p, Vec<T> a, ptrdiff_t n) {
     if (count >= 16) {
         _mm_storeu_si128(reinterpret_cast<__m128i*>(bytes), half);
         half = _mm256_extracti128_si256(toInteger(a.v), 1);
+        if (count == 16) return;
         bytes += 16;
         count -= 16;
     }

@@ -139,13 +139,18 @@ void scanPieces(QorImageSize roi, int stored, int results, Image<const T> src, B
     ExtremumLanes<Order> lanes;
     // The fourth channel of AC4 takes part in the lanes, but nothing of it is better than the limit.
     T values[4] = {Order::start, Order::start, Order::start, results < stored ? Order::limit : Order::start};
-    auto pattern = kernels::channelVectors(values, stored);
+    kernels::ChannelVectors<T> bestSoFar;
+    bool changed = true;
     forEachPiece(roi, stored, [&](const Piece& piece) {
         joinRegion(piece.size, stored, imageOf(src, stored, piece), lanes);
-        if (!kernels::anyBetter(lanes, pattern)) return true;
+        if (piece.x > 0 || piece.y > 0) {
+            if (changed) bestSoFar = kernels::channelVectors(values, stored);
+            changed = false;
+            if (!kernels::anyBetter(lanes, bestSoFar)) return true;
+        }
         if (!keepBetter<Order, T>(lanes, stored, results, piece, best)) return false;
         for (int c = 0; c < results; ++c) values[c] = best[c].value;
-        pattern = kernels::channelVectors(values, stored);
+        changed = true;
         return true;
     });
 }
@@ -153,13 +158,15 @@ void scanPieces(QorImageSize roi, int stored, int results, Image<const T> src, B
 /// The first pixel of the region whose element equals value; false, with (0, 0), where there is none.
 template <class T>
 bool locate(QorImageSize roi, int stored, int channel, Image<const T> src, T value, int32_t* x, int32_t* y) {
-    const kernels::ChannelBits bits(elementBytes<T>, stored, channel);
+    const auto masks = kernels::channelMasks<T>(stored, channel);
+    const QorImageSize rows = isOneRun(roi, walk(src, stored)) ? QorImageSize{roi.width * roi.height, 1} : roi;
     *x = *y = 0;
-    for (int32_t row = 0; row < roi.height; ++row) {
-        const ptrdiff_t at = kernels::findInRow(src.row(row), ptrdiff_t{roi.width} * stored, bits, value);
+    for (int32_t row = 0; row < rows.height; ++row) {
+        const ptrdiff_t at = kernels::findInRow(src.row(row), ptrdiff_t{rows.width} * stored, masks, value);
         if (at < 0) continue;
-        *x = static_cast<int32_t>(at / stored);
-        *y = row;
+        const auto pixel = static_cast<int32_t>(at / stored);
+        *x = pixel % roi.width;
+        *y = row + pixel / roi.width;
         return true;
     }
     return false;

@@ -28,35 +28,37 @@ struct Type {
 /// The measure of a quantity; `single` where there is one channel.
 template <Quantity quantity, class T, bool single>
 constexpr auto chooseMeasure() {
+    using namespace kernels;
     constexpr bool bytes = single && std::is_same_v<T, uint8_t>;
     if constexpr (quantity == Quantity::largest)
-        return Type<kernels::Largest<T>>{};
+        return Type<Magnitudes<MaxLanes<Magnitude<T>>>>{};
     else if constexpr (bytes && quantity == Quantity::squares)
-        return Type<kernels::ByteSquares>{};
+        return Type<ByteSquares>{};
     else if constexpr (bytes && quantity == Quantity::products)
-        return Type<kernels::ByteProducts>{};
+        return Type<Products<PairProductLanes>>{};
     else if constexpr (bytes)
-        return Type<kernels::ByteMagnitudes>{};
+        return Type<ByteMagnitudes>{};
     else if constexpr (quantity == Quantity::magnitudes)
-        return Type<kernels::Magnitudes<T>>{};
+        return Type<Magnitudes<SumLanes<Magnitude<T>>>>{};
     else if constexpr (quantity == Quantity::squares)
-        return Type<kernels::Squares<T>>{};
+        return Type<Squares<ProductLanes<Magnitude<T>>>>{};
     else if constexpr (quantity == Quantity::values)
-        return Type<kernels::Values<T>>{};
+        return Type<Values<SumLanes<T>>>{};
     else
-        return Type<kernels::Products<T>>{};
+        return Type<Products<ProductLanes<T>>>{};
 }
 
 template <Quantity quantity>
 constexpr auto chooseAccurateMeasure() {
+    using Lanes = kernels::DoubleLanes;
     if constexpr (quantity == Quantity::magnitudes)
-        return Type<kernels::AccurateMagnitudes>{};
+        return Type<kernels::Magnitudes<Lanes>>{};
     else if constexpr (quantity == Quantity::squares)
-        return Type<kernels::AccurateSquares>{};
+        return Type<kernels::Squares<Lanes>>{};
     else if constexpr (quantity == Quantity::values)
-        return Type<kernels::AccurateValues>{};
+        return Type<kernels::Values<Lanes>>{};
     else
-        return Type<kernels::AccurateProducts>{};
+        return Type<kernels::Products<Lanes>>{};
 }
 
 /// Calls use(measure) with the measure that the type and the hint ask for.
@@ -255,24 +257,79 @@ QorResult normRelL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, 
 
 // --- dot products ---------------------------------------------------------------------------------------------------
 
+/// Doubles added from left to right. As long as no partial sum can pass 2^53 all of them are exact, and integers in any
+/// order give the same.
+template <class T, int n>
+class OrderedDotProduct {
+public:
+    Totals totals{};
+
+    void addRow(ptrdiff_t pixels, const T* a, const T* b) {
+        while (pixels > 0) {
+            if (room_ < kPiece) settle();
+            const auto now = static_cast<ptrdiff_t>(std::min<int64_t>(pixels, std::max(room_, kPiece)));
+            if (room_ < kPiece) {
+                kernels::sequentialDotRow<n>(totals.of, now, a, b);
+            } else {
+                kernels::reduceRow<Measure>(sums_, n, now * n, a, b);
+                room_ -= now;
+            }
+            a += now * n;
+            b += now * n;
+            pixels -= now;
+        }
+    }
+    /// Moves what the integers hold into the totals.
+    void settle() {
+        const Totals moved = finish(sums_, {n, n});
+        sums_ = {};
+        double largest = 0;
+        for (int c = 0; c < n; ++c) {
+            totals.of[c] += moved.of[c];
+            largest = std::max(largest, __builtin_fabs(totals.of[c]));
+        }
+        room_ = static_cast<int64_t>(std::max(0x1p53 - largest, 0.0) / kLargestProduct);
+    }
+
+private:
+    using Measure = typename decltype(chooseMeasure<Quantity::products, T, n == 1>())::type;
+    static constexpr double kLargestValue = std::is_signed_v<T> ? 1 << (8 * sizeof(T) - 1) : (1 << 8 * sizeof(T)) - 1;
+    static constexpr double kLargestProduct = kLargestValue * kLargestValue;
+    static constexpr int64_t kPiece = 4'096;
+
+    kernels::AccumulatorsOf<Measure> sums_;
+    int64_t room_ = static_cast<int64_t>(0x1p53 / kLargestProduct);  ///< Pixels that the integers may still take.
+};
+
+template <class T, Layout layout>
+Totals dotProductTotals(QorImageSize roi, int32_t hint, Image<const T> src1, Image<const T> src2) {
+    constexpr int n = channels(layout);
+    if constexpr (std::is_same_v<T, float>) {
+        return totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
+    } else if constexpr (sizeof(T) == 4) {
+        Totals totals{};
+        forEachRow(
+            roi,
+            [&](ptrdiff_t pixels, const T* a, const T* b) { kernels::sequentialDotRow<n>(totals.of, pixels, a, b); },
+            walk(src1, n), walk(src2, n));
+        return totals;
+    } else {
+        OrderedDotProduct<T, n> sum;
+        forEachRow(
+            roi, [&](ptrdiff_t pixels, const T* a, const T* b) { sum.addRow(pixels, a, b); }, walk(src1, n),
+            walk(src2, n));
+        sum.settle();
+        return sum.totals;
+    }
+}
+
 template <class T, Layout layout>
 QorResult dotProduct(Image<const T> src1, Image<const T> src2, QorImageSize roi, double* pDp, int32_t hint = hintFast) {
-    constexpr int n = channels(layout);
     constexpr bool refusesZeroSteps = std::is_same_v<T, uint8_t> && layout == Layout::C1;
     if (QorResult r = firstOf(nullCheck(src1, src2, pDp), sizeCheck(roi))) return r;
     if (refusesZeroSteps && (src1.step == 0 || src2.step == 0)) return QOR_ERR_SIZE;
     return underDefaultRounding([&] {
-        Totals totals{};
-        if constexpr (std::is_integral_v<T> && sizeof(T) == 4) {
-            forEachRow(
-                roi,
-                [&](ptrdiff_t pixels, const T* a, const T* b) {
-                    kernels::sequentialDotRow<n>(totals.of, pixels, a, b);
-                },
-                walk(src1, n), walk(src2, n));
-        } else {
-            totals = totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
-        }
+        const Totals totals = dotProductTotals<T, layout>(roi, hint, src1, src2);
         for (int c = 0; c < processedChannels(layout); ++c) pDp[c] = totals.of[c];
         return QOR_OK;
     });

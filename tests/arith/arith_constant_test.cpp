@@ -145,7 +145,9 @@ void checkStatuses(Function function, Parameters... parameters) {
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(true, true, anyZero, 0, 0, none));
     if (layout != Layout::C1) {
         const T* missing = layout == Layout::C1 ? good : nullptr;
-        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(false, false, missing, 0, 0, none));
+        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(false, false, missing, 32, 32, ok));
+        QORI_EXPECT_STATUS(anyStep ? QOR_ERR_NULL_PTR : QOR_ERR_STEP, dst, statusOf(false, false, missing, 0, 0, ok));
+        QORI_EXPECT_STATUS(QOR_ERR_SIZE, dst, statusOf(false, false, missing, 0, 0, none));
     }
     if (kind == Kind::R) QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(true, false, good, 32, 32, ok));
     for (QorImageSize bad : {none, QorImageSize{4, 0}, QorImageSize{-4, INT32_MIN}})

@@ -149,9 +149,10 @@ TEST(Division, FloatsOverZero) {
     const float numerators[] = {2, -2, 0, nan, 2, -2, -inf, 3, -nan};
     const uint32_t expected[] = {0x7F800000, 0xFF800000, 0x7FBFFFFF, 0x7FBFFFFF, 0xFF800000,
                                  0x7F800000, 0xFF800000, 0x3FC00000, 0x7FBFFFFF};
-    float results[9];
+    uint32_t results[9];
     const QorImageSize roi{9, 1};
-    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_32f_C1R, divisors, 36, numerators, 36, results, 36, roi));
+    auto* const dst = reinterpret_cast<float*>(results);
+    EXPECT_EQ(QOR_WARN_DIV_BY_ZERO, call(qoriDiv_32f_C1R, divisors, 36, numerators, 36, dst, 36, roi));
     EXPECT_EQ(0, std::memcmp(expected, results, sizeof results));
 }
 

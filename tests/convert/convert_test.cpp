@@ -234,6 +234,7 @@ void scaleDown(const char* name, Function function) {
 #define QORI_scaleFloats(name, S, D, L, kind) \
     TEST(Sweep, name) { scaleFloats<S, D, Layout::L, Kind::kind>(#name, &name); }
 #include "members/convert.inc"
+#include "members/convert_bits.inc"
 #include "members/scale.inc"
 #undef QORI_MEMBER
 

@@ -62,8 +62,9 @@ template <class T>
 T argument(Input& in) {
     const bool isStep = std::exchange(in.stepFollows, false);
     if constexpr (std::is_pointer_v<T> && std::is_pointer_v<std::remove_pointer_t<T>>) {
-        static uint8_t* planes[4];
-        for (uint8_t*& plane : planes) plane = in.memory();
+        // As many as the next integer may say, of four kinds.
+        static uint8_t* planes[kMostStep];
+        for (int i = 0; i < kMostStep; ++i) planes[i] = i < 4 ? in.memory() : planes[i - 4];
         in.stepFollows = true;
         return in.take<uint8_t>() >= 250 ? nullptr : reinterpret_cast<T>(planes);
     } else if constexpr (std::is_pointer_v<T>) {

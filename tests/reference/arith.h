@@ -49,7 +49,9 @@ struct Big {
         }
         return r;
     }
-    auto operator<=>(const Big&) const = default;
+    bool operator>=(const Big& b) const { return limb >= b.limb; }
+    bool operator>(const Big& b) const { return limb > b.limb; }
+    bool operator==(const Big& b) const { return limb == b.limb; }
 };
 
 /// numerator * 2^-scale / denominator, rounded; some value above 2^32 where it is beyond.

@@ -243,6 +243,8 @@ void histogramInit(const char* name, Function function) {
         const auto record = words<int32_t>(prepared.spec, prepared.specSize);
         EXPECT_EQ((std::vector<int32_t>{type, 3, 0, 0x74736968, 3, 2, 4, 0}),
                   std::vector(record.begin(), record.begin() + 8));
+        const auto at = reinterpret_cast<uintptr_t>(prepared.spec.data<uint8_t>());
+        EXPECT_EQ(static_cast<int32_t>(48 + (sizeof at == 4 ? at : 0)), record[8]);
         EXPECT_EQ(12, record[9] - record[8]);
         EXPECT_EQ(8, record[10] - record[9]);
         EXPECT_EQ(0, record[11]);
@@ -260,10 +262,11 @@ template <class, Layout, class Function>
 void histogramUniformInit(const char* name, Function function) {
     const float lower[3] = {0, -10.5f, 0.1f}, upper[3] = {100, 10.5f, 1.3f};
     const int32_t counts[3] = {8, 5, 7};
-    Prepared floats(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
-        ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec));
+    const float three = 3;
+    Prepared narrow(qor8u, counts + 1, 1, [&](QorHistogramSpec* spec) {
+        ASSERT_EQ(QOR_WARN_ADJUSTED, call(function, int32_t{qor8u}, lower, &three, counts + 1, 1, spec));
     });
-    Prepared wide(qor16s, counts, 2 + 1, [&](QorHistogramSpec* spec) {
+    Prepared wide(qor16s, counts, 3, [&](QorHistogramSpec* spec) {
         ASSERT_EQ(QOR_WARN_ADJUSTED,
                   call(function, int32_t{qor16s}, lower, upper, counts, 3, spec));  // channel 2: width 0.2
     });
@@ -271,7 +274,7 @@ void histogramUniformInit(const char* name, Function function) {
     EXPECT_EQ(1, record[2]);
     EXPECT_EQ((std::vector{0, 14, 28, 42, 57, 71, 85, 100, -10, -5, 0, 5, 10, 0, 0, 0, 0, 0, 1, 1}),
               std::vector(record.begin() + 12, record.end()));
-    floats = Prepared(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
+    Prepared floats(qor32f, counts, 3, [&](QorHistogramSpec* spec) {
         ASSERT_EQ(QOR_OK, call(function, int32_t{qor32f}, lower, upper, counts, 3, spec));
     });
     const auto levels = words<float>(floats.spec, floats.specSize);

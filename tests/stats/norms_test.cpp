@@ -18,19 +18,30 @@ T draw() {
         return random().value<T>();
 }
 
-/// Roundings between an element and the result: the difference or product, the additions of the busiest of `lanes`
-/// partial sums, the pairwise additions of 96 lanes at most, the final conversions. Integers: the conversions.
-template <class T>
+/// Roundings between an element and a float result: the difference or product, the additions of the busiest of `lanes`
+/// partial sums, the pairwise additions of 96 lanes at most, the final conversions. k of them keep a sum of magnitudes
+/// within k u / (1 - k u) (Higham: Accuracy and stability of numerical algorithms, lemma 3.1).
 double relativeError(const Shape& shape, int n, bool accurate) {
-    const double kUnit = std::ldexp(1.0, std::is_integral_v<T> || accurate ? -53 : -24);
-    if (std::is_integral_v<T>) return 2 * kUnit;
     const int lanes = accurate ? 24 : 48;
-    return kUnit * (2 + double(shape.height) * ((shape.width * n + lanes - 1) / lanes) + 7 + 2);
+    const double u = std::ldexp(1.0, accurate ? -53 : -24);
+    const double k = 2 + double(shape.height) * ((shape.width * n + lanes - 1) / lanes) + 7 + 2;
+    return k * u / (1 - k * u);
 }
 
-/// What the terms of a measure add up to, in channel values a and (where there is a second image) b, else empty.
+/// One channel of a call: its elements (those of the second image, if any, too), how often each of them occurs, what
+/// came out, and the status that the call should have.
+template <class T>
+struct Channel {
+    std::vector<T> a, b;
+    int times;
+    double result;
+    double relativeError;
+    QorResult* expectedStatus;
+};
+
+/// What the terms of a measure add up to, in elements a and (where there is a second image) b, else empty.
 template <Measure measure, class T>
-reference::Sum<T> expectedTotal(const std::vector<T>& a, const std::vector<T>& b) {
+reference::Sum<T> totalOf(const std::vector<T>& a, const std::vector<T>& b) {
     using Number = typename reference::Sum<T>::Number;
     const auto number = [&](size_t i) { return static_cast<Number>(a[i]); };
     const auto difference = [&](size_t i) { return b.empty() ? number(i) : number(i) - static_cast<Number>(b[i]); };
@@ -52,6 +63,18 @@ reference::Sum<T> expectedTotal(const std::vector<T>& a, const std::vector<T>& b
     }
 }
 
+template <Measure measure, class T>
+reference::Sum<T> expectedTotal(const Channel<T>& channel, const std::vector<T>& a, const std::vector<T>& b) {
+    const auto once = totalOf<measure>(a, b);
+    const int times = measure == Measure::largest ? 1 : channel.times;
+    return {once.total * times, once.magnitude * times};
+}
+
+template <Measure measure>
+double rooted(double total) {
+    return measure == Measure::squares ? std::sqrt(total) : total;
+}
+
 /// Calls with or without the hint, as the export has it.
 template <class Function, class... Arguments>
 QorResult callWith(int32_t hint, Function function, Arguments... arguments) {
@@ -65,15 +88,6 @@ template <class Function, class T>
 constexpr bool isBinary =
     std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*> ||
     std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*, int32_t>;
-
-/// One channel of a call: its elements, what came out, and the status that the call should have.
-template <class T>
-struct Channel {
-    std::vector<T> a, b;
-    double result;
-    double relativeError;
-    QorResult* expectedStatus;
-};
 
 template <class T, Layout layout, class Function, class Check>
 void runMember(Function function, const Shape& shape, int32_t hint, Check check) {
@@ -90,17 +104,50 @@ void runMember(Function function, const Shape& shape, int32_t hint, Check check)
             callWith(hint, function, src1.data<T>(), src1.step(), src2.data<T>(), src2.step(), shape.roi(), results);
     else
         status = callWith(hint, function, src1.data<T>(), src1.step(), shape.roi(), results);
-    const double relative = relativeError<T>(shape, n, hint == hintAccurate);
+    const double relative = relativeError(shape, n, hint == hintAccurate);
     for (int c = 0; c < resultsOf(layout); ++c) {
         SCOPED_TRACE("channel " + std::to_string(c));
         const auto b = binary ? reference::channel(src2.view<T>(n), shape.roi(), c) : std::vector<T>{};
-        check(
-            Channel<T>{reference::channel(src1.view<T>(n), shape.roi(), c), b, results[c], relative, &expectedStatus});
+        const auto a = reference::channel(src1.view<T>(n), shape.roi(), c);
+        check(Channel<T>{a, b, 1, results[c], relative, &expectedStatus});
     }
     EXPECT_EQ(expectedStatus, status);
     for (int c = resultsOf(layout); c < 5; ++c) EXPECT_EQ(-7, results[c]) << "a result that nobody asked for";
     QORI_EXPECT_UNCHANGED(src1, before1);
     QORI_EXPECT_UNCHANGED(src2, before2);
+}
+
+constexpr int kExtremeWidth = 37'500, kExtremeElements = kExtremeWidth * 192;
+
+/// As many of the type's smallest and of its largest value.
+template <class T>
+const std::vector<T>& extremeElements(bool largest) {
+    static const std::vector<T> all[2] = {std::vector<T>(kExtremeElements, std::numeric_limits<T>::min()),
+                                          std::vector<T>(kExtremeElements, std::numeric_limits<T>::max())};
+    return all[largest];
+}
+
+/// Regions of extreme pixels that fill every lane: rows beyond 32,768 pixels, merged into one and not.
+template <class T, Layout layout, class Function, class Check>
+void runExtremes(Function function, Check check) {
+    constexpr int n = channels(layout), width = kExtremeWidth, height = kExtremeElements / width / n;
+    for (int choice = 0; choice < 4; ++choice) {
+        const auto &src1 = extremeElements<T>(choice % 2), &src2 = extremeElements<T>(choice / 2);
+        const QorImageSize roi{choice % 3 == 0 ? width : width - 1, height};
+        const int32_t step = width * n * static_cast<int>(sizeof(T));
+        double results[4];
+        QorResult status, expectedStatus = QOR_OK;
+        std::vector<T> second;
+        if constexpr (isBinary<Function, T>) {
+            status = call(function, src1.data(), step, src2.data(), step, roi, results);
+            second.push_back(src2[0]);
+        } else {
+            status = call(function, src1.data(), step, roi, results);
+        }
+        for (int c = 0; c < resultsOf(layout); ++c)
+            check(Channel<T>{{src1[0]}, second, roi.width * roi.height, results[c], 0, &expectedStatus});
+        EXPECT_EQ(expectedStatus, status);
+    }
 }
 
 /// Rows that follow upwards are left out where steps must be positive.
@@ -112,34 +159,40 @@ void sweepMember(const char* name, Function function, bool anyStep, Check check)
         });
         if (std::is_integral_v<T>) break;
     }
+    if constexpr (std::is_integral_v<T>) runExtremes<T, layout>(function, check);
     markSwept(name);
 }
 
+/// Integers are exact, roots and quotients of them correctly rounded.
 template <Measure measure, class T, Layout layout, class Function>
 void sweepNorm(const char* name, Function function, bool anyStep) {
     sweepMember<T, layout>(name, function, anyStep, [](const Channel<T>& channel) {
-        const auto expected = expectedTotal<measure>(channel.a, channel.b);
-        const double total = measure == Measure::squares ? channel.result * channel.result : channel.result;
-        const bool exact = measure == Measure::largest || (std::is_integral_v<T> && measure != Measure::squares);
-        EXPECT_NEAR(static_cast<double>(expected.total), total,
-                    exact ? 0 : channel.relativeError * static_cast<double>(expected.magnitude));
+        const auto expected = expectedTotal<measure>(channel, channel.a, channel.b);
+        const auto total = static_cast<double>(expected.total);
+        if (std::is_integral_v<T> || measure == Measure::largest) {
+            EXPECT_EQ(rooted<measure>(total), channel.result);
+        } else {  // the root halves a relative error, and squaring its result doubles it again
+            const double result = measure == Measure::squares ? channel.result * channel.result : channel.result;
+            EXPECT_NEAR(total, result, channel.relativeError * static_cast<double>(expected.magnitude));
+        }
     });
 }
 
 template <Measure measure, class T, Layout layout, class Function>
 void sweepRelative(const char* name, Function function) {
     sweepMember<T, layout>(name, function, false, [](const Channel<T>& channel) {
-        double expected = static_cast<double>(expectedTotal<measure>(channel.a, channel.b).total);
-        const auto denominator = static_cast<double>(expectedTotal<measure, T>(channel.b, {}).total);
+        auto expected = static_cast<double>(expectedTotal<measure>(channel, channel.a, channel.b).total);
+        const auto denominator = static_cast<double>(expectedTotal<measure, T>(channel, channel.b, {}).total);
         if (denominator == 0)
             *channel.expectedStatus = QOR_WARN_DIV_BY_ZERO;
         else
             expected /= denominator;
-        const double value = measure == Measure::squares ? channel.result * channel.result : channel.result;
-        // The errors of numerator and denominator, of the quotient, of the root and of its square here.
-        const double roundings = 4 * std::ldexp(1.0, -53);
-        EXPECT_NEAR(expected, value,
-                    (measure == Measure::largest ? roundings : 2.01 * channel.relativeError + roundings) * expected);
+        if (std::is_integral_v<T> || measure == Measure::largest) {
+            EXPECT_EQ(rooted<measure>(expected), channel.result);
+        } else {  // numerator and denominator may err in opposite directions
+            const double result = measure == Measure::squares ? channel.result * channel.result : channel.result;
+            EXPECT_NEAR(expected, result, 2 * channel.relativeError / (1 - channel.relativeError) * expected);
+        }
     });
 }
 
@@ -162,8 +215,8 @@ QORI_SWEEP(normRelL2, sweepRelative<Measure::squares, T, layout>(name, function)
 template <class T, Layout layout, class Function>
 void mean(const char* name, Function function) {
     sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) {
-        const auto sum = expectedTotal<Measure::values, T>(channel.a, {});
-        const auto pixels = static_cast<double>(channel.a.size());
+        const auto sum = expectedTotal<Measure::values, T>(channel, channel.a, {});
+        const auto pixels = static_cast<double>(channel.a.size()) * channel.times;
         const auto total = static_cast<double>(sum.total);
         if (std::is_integral_v<T>)
             EXPECT_EQ(layout == Layout::C1 ? total / pixels : total * (1 / pixels), channel.result);
@@ -173,18 +226,19 @@ void mean(const char* name, Function function) {
     });
 }
 
+/// Integers: doubles added from left to right, which shows beyond 2^53.
 template <class T, Layout layout, class Function>
 void dotProduct(const char* name, Function function) {
-    if constexpr (sizeof(T) < 4 || std::is_floating_point_v<T>) {
+    if constexpr (std::is_floating_point_v<T>)
         sweepNorm<Measure::products, T, layout>(name, function, true);
-    } else {
+    else
         sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) {
             double expected = 0;
-            for (size_t i = 0; i < channel.a.size(); ++i)
-                expected += static_cast<double>(channel.a[i]) * static_cast<double>(channel.b[i]);
+            for (int time = 0; time < channel.times; ++time)
+                for (size_t i = 0; i < channel.a.size(); ++i)
+                    expected += static_cast<double>(channel.a[i]) * static_cast<double>(channel.b[i]);
             EXPECT_EQ(expected, channel.result);
         });
-    }
 }
 
 template <class T>
@@ -228,53 +282,38 @@ void sumWeightedRows(const char* name, Function function) {
 #include "members/norms.inc"
 #undef QORI_MEMBER
 
-/// `pixels` equal elements; rows may overlap, so that regions far larger than the memory are seen.
-template <class T>
-std::vector<T> constant(T value, int pixels, int n) {
-    return std::vector<T>(static_cast<size_t>(pixels) * static_cast<size_t>(n), value);
+TEST(Norms, SumsOfMorePixelsThan32BitsCount) {
+    const std::vector<uint8_t> row(65'536 * 4, 255);
+    double r[4] = {};
+    ASSERT_EQ(QOR_OK, qoriSum_8u_C1R(row.data(), 0, {65'536, 65'536}, r));
+    EXPECT_EQ(255 * 4'294'967'296.0, r[0]);
+    ASSERT_EQ(QOR_OK, qoriSum_8u_C4R(row.data(), 0, {65'536, 8'192}, r));
+    for (double sum : r) EXPECT_EQ(255 * 536'870'912.0, sum);
+    // The number of pixels wraps around: 2^31 reads as -2^31.
+    ASSERT_EQ(QOR_OK, qoriMean_8u_C1R(row.data(), 0, {65'536, 32'768}, r));
+    EXPECT_EQ(-255.0, r[0]);
 }
 
-TEST(Norms, IntegerTotalsOutgrowEveryLane) {
-    double r[4] = {};
-    {  // 2^32 pixels; the C3 and C4 sums fill their 16- and 32-bit lanes
-        const auto row = constant<uint8_t>(255, 65'536 + 8'192, 4);
-        ASSERT_EQ(QOR_OK, qoriSum_8u_C1R(row.data(), 0, {65'536, 65'536}, r));
-        EXPECT_EQ(255 * 4'294'967'296.0, r[0]);
-        ASSERT_EQ(QOR_OK, qoriSum_8u_C4R(row.data(), 0, {65'536, 8'192}, r));
-        for (double sum : r) EXPECT_EQ(255 * 536'870'912.0, sum);
-        const auto dark = constant<uint8_t>(0, 65'536 + 1'000, 1);
-        ASSERT_EQ(QOR_OK, qoriNormDiff_L2_8u_C1R(row.data(), 1, dark.data(), 1, {65'536, 1'000}, r));
-        EXPECT_EQ(255 * std::sqrt(65'536'000.0), r[0]);
-        ASSERT_EQ(QOR_OK, qoriNorm_L2_8u_C3R(row.data(), 1, {65'536, 100}, r));
-        for (int c = 0; c < 3; ++c) EXPECT_EQ(255 * std::sqrt(6'553'600.0), r[c]);
-        ASSERT_EQ(QOR_OK, qoriDotProd_8u64f_C1R(row.data(), 1, row.data(), -0x7FFFFFFF - 1, {65'536, 1}, r));
-        EXPECT_EQ(65'025 * 65'536.0, r[0]);
-    }
-    constexpr QorImageSize kRoi{40'001, 120};  // 4,800,120 pixels
-    constexpr uint64_t kPixels = 4'800'120;
-    const auto bright = constant<uint16_t>(65'535, 40'001 + 120, 4);
-    ASSERT_EQ(QOR_OK, qoriSum_16u_C3R(bright.data(), 2, kRoi, r));
-    for (int c = 0; c < 3; ++c) EXPECT_EQ(65'535.0 * kPixels, r[c]);
-    constexpr double kSquares = static_cast<double>(65'535ull * 65'535 * kPixels);  // above 2^53: rounded once
-    ASSERT_EQ(QOR_OK, qoriDotProd_16u64f_C4R(bright.data(), 2, bright.data(), 0, kRoi, r));
-    for (double product : r) EXPECT_EQ(kSquares, product);
-    ASSERT_EQ(QOR_OK, qoriNorm_L2_16u_C1R(bright.data(), 2, kRoi, r));
-    EXPECT_EQ(std::sqrt(kSquares), r[0]);
-    const auto lowest = constant<int16_t>(-32'768, 40'001 + 120, 3),
-               highest = constant<int16_t>(32'767, 40'001 + 120, 3);
-    ASSERT_EQ(QOR_OK, qoriSum_16s_C1R(lowest.data(), 2, kRoi, r));
-    EXPECT_EQ(-32'768.0 * kPixels, r[0]);
-    ASSERT_EQ(QOR_OK, qoriDotProd_16s64f_C3R(lowest.data(), 2, highest.data(), 2, kRoi, r));
-    for (int c = 0; c < 3; ++c) EXPECT_EQ(-32'768.0 * 32'767 * kPixels, r[c]);
-    ASSERT_EQ(QOR_OK, qoriNormDiff_L1_16s_C3R(lowest.data(), 2, highest.data(), 2, kRoi, r));
-    for (int c = 0; c < 3; ++c) EXPECT_EQ(65'535.0 * kPixels, r[c]);
-    const auto bytes = constant<int8_t>(-128, 40'001 + 120, 1);
-    ASSERT_EQ(QOR_OK, qoriDotProd_8s64f_C1R(bytes.data(), 1, bytes.data(), 1, kRoi, r));
-    EXPECT_EQ(16'384.0 * kPixels, r[0]);
+TEST(Norms, DotProductsAddFromLeftToRightBeyond53Bits) {
+    constexpr int kPixels = 3'000'000;  // above 2^53 after some two million
+    std::vector<uint16_t> a(kPixels * 3), b(kPixels * 3);
+    for (auto* image : {&a, &b})
+        for (uint16_t& element : *image) element = static_cast<uint16_t>(65'535 - random().below(1'000));
+    const auto expected = [&](int channel, int n, int pixels) {
+        double sum = 0;
+        for (int i = channel; i < pixels * n; i += n)
+            sum += static_cast<double>(a[static_cast<size_t>(i)]) * static_cast<double>(b[static_cast<size_t>(i)]);
+        return sum;
+    };
+    double r[3] = {};
+    EXPECT_EQ(QOR_OK, qoriDotProd_16u64f_C1R(a.data(), 6'000, b.data(), 6'000, {3'000, 3'000}, r));
+    EXPECT_EQ(expected(0, 1, 9'000'000), r[0]);
+    EXPECT_EQ(QOR_OK, qoriDotProd_16u64f_C3R(a.data(), 6, b.data(), 6, {kPixels, 1}, r));
+    for (int c = 0; c < 3; ++c) EXPECT_EQ(expected(c, 3, kPixels), r[c]);
 }
 
 TEST(Norms, AccurateFloatSumsCountPastSinglePrecision) {
-    const auto ones = constant<float>(1.0f, 16'777'217, 1);
+    const std::vector<float> ones(16'777'217, 1.0f);
     double sum = 0;
     EXPECT_EQ(QOR_OK, qoriSum_32f_C1R(ones.data(), 4, {16'777'217, 1}, &sum, hintAccurate));
     EXPECT_EQ(16'777'217.0, sum);

@@ -1,0 +1,106 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
+#include <vector>
+
+#include "panels.h"
+
+namespace demo {
+namespace {
+
+enum class Kind { nearest, linear, cubic, lanczos, super, smoothLanczos };
+
+/// Plan, initialisation and work buffer of one resize of three channels.
+class Resizer {
+public:
+    Resizer(QorImageSize from, QorImageSize to, Kind kind) : size_(to), kind_(kind) {
+        constexpr int32_t interpolations[] = {interpNearest, interpLinear, interpCubic,
+                                              interpLanczos, interpSuper,  interpLanczos};
+        const bool smooth = kind == Kind::smoothLanczos;
+        int32_t planBytes = 0, initBytes = 0, workBytes = 0;
+        require(qoriResizeGetSize_8u(from, to, interpolations[static_cast<int>(kind)], smooth, &planBytes, &initBytes));
+        plan_.resize(static_cast<size_t>(planBytes));
+        std::vector<uint8_t> init(static_cast<size_t>(initBytes));
+        switch (kind) {
+            case Kind::nearest: require(qoriResizeNearestInit_8u(from, to, plan())); break;
+            case Kind::linear: require(qoriResizeLinearInit_8u(from, to, plan())); break;
+            case Kind::cubic: require(qoriResizeCubicInit_8u(from, to, 0.0f, 0.5f, plan(), init.data())); break;
+            case Kind::lanczos: require(qoriResizeLanczosInit_8u(from, to, 3, plan(), init.data())); break;
+            case Kind::super: require(qoriResizeSuperInit_8u(from, to, plan())); break;
+            case Kind::smoothLanczos:
+                require(qoriResizeAntialiasingLanczosInit(from, to, 3, plan(), init.data()));
+                break;
+        }
+        require(qoriResizeGetBufferSize_8u(plan(), to, 3, &workBytes));
+        work_.resize(static_cast<size_t>(workBytes));
+    }
+
+    /// The regions have the sizes that the plan was made for.
+    void run(const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t dstStep) {
+        const auto with = [&](auto resize, auto... border) {
+            require(resize(src, srcStep, dst, dstStep, {0, 0}, size_, border..., plan(), work_.data()));
+        };
+        constexpr auto edge = static_cast<int32_t>(borderReplicate);
+        constexpr const uint8_t* none = nullptr;
+        switch (kind_) {
+            case Kind::nearest: return with(qoriResizeNearest_8u_C3R);
+            case Kind::super: return with(qoriResizeSuper_8u_C3R);
+            case Kind::linear: return with(qoriResizeLinear_8u_C3R, edge, none);
+            case Kind::cubic: return with(qoriResizeCubic_8u_C3R, edge, none);
+            case Kind::lanczos: return with(qoriResizeLanczos_8u_C3R, edge, none);
+            case Kind::smoothLanczos: return with(qoriResizeAntialiasing_8u_C3R, edge, none);
+        }
+    }
+
+private:
+    QorResizePlan* plan() { return reinterpret_cast<QorResizePlan*>(plan_.data()); }
+
+    QorImageSize size_;
+    Kind kind_;
+    std::vector<uint8_t> plan_, work_;
+};
+
+/// Calls draw(kind, x, y, size) for each quarter of a picture.
+template <class Draw>
+Picture quarters(const Picture& photo, const Kind (&kinds)[4], Draw draw) {
+    Picture out(photo.size(), 3);
+    for (int i = 0; i < 4; ++i) {
+        const int x = i % 2 * (photo.width() / 2), y = i / 2 * (photo.height() / 2);
+        const QorImageSize size{i % 2 ? photo.width() - x : photo.width() / 2,
+                                i / 2 ? photo.height() - y : photo.height() / 2};
+        if (size.width > 0 && size.height > 0) draw(kinds[i], out.at(x, y), out.step(), size);
+    }
+    return out;
+}
+
+/// A detail, enlarged six times by each interpolation.
+Picture enlarged(const Picture& photo) {
+    constexpr Kind kinds[4] = {Kind::nearest, Kind::linear, Kind::cubic, Kind::lanczos};
+    return quarters(photo, kinds, [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
+        const QorImageSize from{std::max(size.width / 6, 1), std::max(size.height / 6, 1)};
+        const uint8_t* detail =
+            photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) * 9 / 20);
+        Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
+    });
+}
+
+/// The whole photograph on a sixth of its width, shown in squares: what aliasing each way leaves.
+Picture reduced(const Picture& photo) {
+    constexpr Kind kinds[4] = {Kind::nearest, Kind::linear, Kind::super, Kind::smoothLanczos};
+    return quarters(photo, kinds, [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
+        const QorImageSize to{std::max(size.width / 3, 1), std::max(size.height / 3, 1)};
+        const Picture small(to, 3);
+        Resizer(photo.size(), to, kind).run(photo.data(), photo.step(), small.data(), small.step());
+        Resizer(to, size, Kind::nearest).run(small.data(), small.step(), dst, dstStep);
+    });
+}
+
+constexpr Panel kPanels[] = {
+    {"6 x: nearest, linear, cubic, Lanczos", "ResizeNearest, Linear, Cubic, Lanczos C3", enlarged},
+    {"1/6: nearest, linear, super, antialiased", "ResizeNearest, Linear, Super, Antialiasing C3", reduced},
+};
+
+}  // namespace
+
+std::span<const Panel> resizePanels() { return kPanels; }
+
+}  // namespace demo

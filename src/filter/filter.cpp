@@ -1,0 +1,188 @@
+// SPDX-License-Identifier: Apache-2.0
+// General linear filters in one call: the neighbours of all pixels are read from memory.
+#include "frame/checks.h"
+#include "frame/plan.h"
+#include "linear_run.h"
+#include "qorcore.h"
+
+namespace qori::filter {
+namespace {
+
+template <class K>
+struct Kernel {
+    const K* data;
+    QorImageSize size;
+};
+
+QorResult divisorCheck(int32_t divisor) { return divisor == 0 ? QOR_ERR_DIVISOR : QOR_OK; }
+
+QorResult roundModeCheck(int32_t roundMode) {
+    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
+}
+
+/// The source row with its neighbours, and the destination row, must lie within their steps.
+template <Layout layout, class S, class D>
+QorResult stepsCheck(Image<const S> src, Image<D> dst, QorImageSize roi, QorImageSize kernel) {
+    const int64_t seen = (int64_t{roi.width} + kernel.width - 1) * channels(layout) * elementBytes<S>;
+    const int64_t made = int64_t{roi.width} * channels(layout) * elementBytes<D>;
+    return seen > src.step || made > dst.step ? QOR_ERR_STEP : QOR_OK;
+}
+
+/// Memory of the caller, or of the allocator for the duration of a call.
+class WorkArea {
+public:
+    explicit WorkArea(uint8_t* callers) : memory_(callers) {}
+    explicit WorkArea(int64_t bytes)
+        : memory_(bytes > INT32_MAX ? nullptr : qorMalloc(static_cast<int32_t>(bytes))), isOwned_(true) {}
+    ~WorkArea() {
+        if (isOwned_) qorFree(memory_);
+    }
+    WorkArea(const WorkArea&) = delete;
+    WorkArea& operator=(const WorkArea&) = delete;
+
+    bool isMissing() const { return memory_ == nullptr; }
+    /// From the next multiple of 16 on, which every reported size allows for.
+    template <class T>
+    T* begin() const {
+        return reinterpret_cast<T*>((reinterpret_cast<uintptr_t>(memory_) + 15) & ~uintptr_t{15});
+    }
+
+private:
+    void* memory_;
+    bool isOwned_ = false;
+};
+
+/// Bytes of any packed kernel: four copies of a word of 4 bytes, or one of 8, per coefficient.
+int64_t packedBytes(QorImageSize kernel) {
+    const int64_t area = int64_t{kernel.width} * kernel.height;
+    return area > INT32_MAX ? INT64_MAX : 16 * area;
+}
+
+/// Every window as it lies in memory, its last column and row `anchor` beyond the pixel.
+template <Layout layout, class S, class D>
+Target<S, D> openTarget(Image<const S> src, Image<D> dst, QorImageSize roi, QorImageSize kernel, QorPoint2D anchor) {
+    const Reach reach{kernel.width - 1 - anchor.x, kernel.height - 1 - anchor.y, anchor.x, anchor.y};
+    return makeTarget(src, dst, roi, layout, reach, BorderRule::of(borderReadAll, nullptr), nullptr);
+}
+
+template <class K>
+bool fitsPairs(Kernel<K> kernel) {
+    if constexpr (sizeof(K) > 2)
+        return std::all_of(kernel.data, kernel.data + ptrdiff_t{kernel.size.width} * kernel.size.height,
+                           [](K k) { return k == static_cast<int16_t>(k); });
+    return true;
+}
+
+/// In 32 bits where no sum leaves them, else in double precision.
+template <Layout layout, class S, class K>
+void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
+                 int32_t divisor, int32_t mode, const WorkArea& area) {
+    const ControlScope scope;
+    auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
+    const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
+    if (division.sumLimit <= INT32_MAX && fitsPairs(kernel)) {
+        auto* packed = area.begin<int32_t>();
+        packPairs<PairTaps<S>::repeats>(kernel.data, kernel.size, packed);
+        // Unsigned 16-bit pixels are taken less 32768.
+        uint32_t start = 0;
+        if constexpr (std::is_same_v<S, uint16_t>)
+            for (ptrdiff_t i = 0; i < ptrdiff_t{kernel.size.width} * kernel.size.height; ++i)
+                start += static_cast<uint32_t>(kernel.data[i]) << 15;
+        return filterPairs(packed, kernel.size, static_cast<int32_t>(start), division, target);
+    }
+    auto* packed = area.begin<double>();
+    packTurned<DoubleTaps<S>::repeats>(kernel.data, kernel.size, packed);
+    filterDouble(packed, kernel.size, division, target);
+}
+
+/// In single precision, or in double where the elements have more digits.
+template <Layout layout, class S, class D, class K>
+void runFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor, int32_t mode,
+               const WorkArea& area) {
+    const ControlScope scope;
+    auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
+    constexpr bool isDouble = std::is_same_v<S, double> || std::is_same_v<S, int32_t>;
+    if constexpr (isDouble) {
+        auto* packed = area.begin<double>();
+        packTurned<DoubleTaps<S>::repeats>(kernel.data, kernel.size, packed);
+        filterDouble(packed, kernel.size, {1, mode, 0}, target);
+    } else {
+        auto* packed = area.begin<float>();
+        packTurned<FloatTaps<S>::repeats>(kernel.data, kernel.size, packed);
+        filterSingle(packed, kernel.size, mode, target);
+    }
+}
+
+template <class T, Layout layout>
+QorResult filterIntegers(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<int32_t> kernel, QorPoint2D anchor,
+                         int32_t divisor) {
+    if (QorResult r = firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
+                              divisorCheck(divisor), stepsCheck<layout>(src, dst, roi, kernel.size)))
+        return r;
+    const WorkArea area(packedBytes(kernel.size));
+    if (area.isMissing()) return QOR_ERR_NO_MEMORY;
+    runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundNearestEven, area);
+    return QOR_OK;
+}
+
+template <class S, class D, Layout layout, class K>
+QorResult filterAllocating(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor) {
+    if (QorResult r = firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
+                              stepsCheck<layout>(src, dst, roi, kernel.size)))
+        return r;
+    const WorkArea area(packedBytes(kernel.size));
+    if (area.isMissing()) return QOR_ERR_NO_MEMORY;
+    runFloats<layout>(src, dst, roi, kernel, anchor, roundNearestEven, area);
+    return QOR_OK;
+}
+
+template <class T, Layout layout>
+constexpr auto filterFloats = filterAllocating<T, T, layout, T>;
+template <class S, class D, Layout layout>
+constexpr auto filter32f = filterAllocating<S, D, layout, float>;
+
+template <class T, class K, Layout layout>
+QorResult filterRound(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
+                      int32_t divisor, int32_t roundMode, uint8_t* pBuffer) {
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size), divisorCheck(divisor),
+                    stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
+        return r;
+    runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
+    return QOR_OK;
+}
+
+template <class T, Layout layout>
+QorResult filterRoundFloats(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<float> kernel, QorPoint2D anchor,
+                            int32_t roundMode, uint8_t* pBuffer) {
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
+                    stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
+        return r;
+    runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
+    return QOR_OK;
+}
+
+QorResult rowBufferCheck(QorImageSize kernelSize, int32_t roiWidth, const int32_t* pBufferSize) {
+    return firstOf(nullCheck(pBufferSize), sizeCheck(kernelSize), sizeCheck({roiWidth, 1}));
+}
+
+/// (4 * kernel area + perPixel * roiWidth) * 4 + extra
+template <int perPixel, int extra>
+QorResult rowBufferSize(QorImageSize kernelSize, int32_t roiWidth, int32_t* pBufferSize) {
+    if (QorResult r = rowBufferCheck(kernelSize, roiWidth, pBufferSize)) return r;
+    const int64_t packed = packedBytes(kernelSize);
+    if (packed > INT32_MAX) return QOR_ERR_SIZE;
+    return reportSize(packed + 4 * int64_t{perPixel} * roiWidth + extra, pBufferSize);
+}
+
+QorResult noBuffer(QorImageSize kernelSize, int32_t roiWidth, int32_t* pBufferSize) {
+    if (QorResult r = rowBufferCheck(kernelSize, roiWidth, pBufferSize)) return r;
+    *pBufferSize = 0;
+    return QOR_OK;
+}
+
+}  // namespace
+}  // namespace qori::filter
+
+#include "entries/filter.inc"

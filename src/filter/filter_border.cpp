@@ -1,0 +1,102 @@
+// SPDX-License-Identifier: Apache-2.0
+// General linear filters with a plan and a border.
+#include "frame/checks.h"
+#include "frame/plan.h"
+#include "linear_plan.h"
+#include "linear_run.h"
+
+namespace qori::filter {
+namespace {
+
+QorResult dataTypeCheck(int32_t dataType, bool floatsToo) {
+    const bool known = dataType == k8u || dataType == k16u || dataType == k16s || (floatsToo && dataType == k32f);
+    return known ? QOR_OK : QOR_ERR_DATA_TYPE;
+}
+
+QorResult channelsCheck(int32_t numChannels) { return numChannels < 1 || numChannels > 4 ? QOR_ERR_CHANNELS : QOR_OK; }
+
+QorResult roundModeCheck(int32_t roundMode) {
+    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
+}
+
+QorResult filterBorderGetSize(QorImageSize kernelSize, QorImageSize roi, int32_t dataType, int32_t kernelType,
+                              int32_t numChannels, int32_t* pSpecSize, int32_t* pBufferSize) {
+    if (QorResult r = firstOf(sizeCheck(kernelSize), sizeCheck(roi), dataTypeCheck(dataType, true))) return r;
+    if (kernelType != k16s && kernelType != k32f) return QOR_ERR_DATA_TYPE;
+    if (QorResult r = firstOf(channelsCheck(numChannels), nullCheck(pSpecSize, pBufferSize))) return r;
+    if (!isModest(kernelSize)) return QOR_ERR_SIZE;
+    if (kernelType == k16s && isConverted(dataType, numChannels)) kernelType = k32f;
+    const int32_t elementBytes = dataType == k8u ? 1 : dataType == k32f ? 4 : 2;
+    const int64_t plan = planBytes(kernelSize, kernelType);
+    const int64_t work = workBytes(kernelSize, roi.width, dataType, kernelType, numChannels);
+    const int64_t border = borderBytes(roi, Reach::ofKernel(kernelSize), numChannels * elementBytes);
+    int32_t planSize, bufferSize;
+    if (QorResult r =
+            firstOf(reportSize(plan, &planSize), reportSize(kBlockAlignment - 1 + work + border, &bufferSize)))
+        return r;
+    *pSpecSize = planSize;
+    *pBufferSize = bufferSize;
+    return QOR_OK;
+}
+
+QorResult filterBorderInit16s(const int16_t* pKernel, QorImageSize size, int32_t divisor, int32_t dataType,
+                              int32_t numChannels, int32_t roundMode, QorLinearFilterPlan* pSpec) {
+    if (QorResult r = firstOf(nullCheck(pKernel, pSpec), sizeCheck(size), dataTypeCheck(dataType, false),
+                              channelsCheck(numChannels), roundModeCheck(roundMode)))
+        return r;
+    if (divisor == 0) return QOR_ERR_DIVISOR;
+    if (isConverted(dataType, numChannels))
+        fillConvertedPlan(pSpec, pKernel, size, divisor, dataType, numChannels, roundMode);
+    else
+        fillPlan(pSpec, pKernel, size, divisor, dataType, roundMode);
+    return QOR_OK;
+}
+
+QorResult filterBorderInit32f(const float* pKernel, QorImageSize size, int32_t dataType, int32_t numChannels,
+                              int32_t roundMode, QorLinearFilterPlan* pSpec) {
+    if (QorResult r = firstOf(nullCheck(pKernel, pSpec), sizeCheck(size), dataTypeCheck(dataType, true),
+                              channelsCheck(numChannels), roundModeCheck(roundMode)))
+        return r;
+    fillPlan(pSpec, pKernel, size, dataType, numChannels, roundMode);
+    return QOR_OK;
+}
+
+QorResult borderCheck(int32_t border) { return border >= 2 && border <= 4 ? QOR_ERR_BORDER : QOR_OK; }
+
+/// Only the destination has to hold a whole row within its step.
+QorResult filterStepCheck(int32_t srcStep, int32_t dstStep, int64_t dstRowBytes) {
+    return srcStep < 1 || dstRowBytes > dstStep ? QOR_ERR_STEP : QOR_OK;
+}
+
+template <class T, int channels>
+QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t border, const T* borderValue,
+                       const QorLinearFilterPlan* pSpec, uint8_t* pBuffer) {
+    constexpr int32_t pixelBytes = channels * elementBytes<T>;
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, borderValue, pSpec, pBuffer), sizeCheck(roi),
+                    filterStepCheck(src.step, dst.step, int64_t{roi.width} * pixelBytes), borderCheck(border)))
+        return r;
+    const ControlScope scope;
+    const auto& plan = *reinterpret_cast<const LinearPlan*>(blockStart(pSpec));
+    const QorImageSize size{plan.kernelWidth, plan.kernelHeight};
+    constexpr Layout layout = channels == 1 ? Layout::C1 : channels == 3 ? Layout::C3 : Layout::C4;
+    auto target = makeTarget(src, dst, roi, layout, Reach::ofKernel(size), BorderRule::of(border, borderValue),
+                             blockStart(pBuffer));
+    constexpr int32_t integerPath = std::is_same_v<T, uint8_t>   ? int32_t{LinearPlan::integer8u}
+                                    : std::is_same_v<T, int16_t> ? int32_t{LinearPlan::integer16s}
+                                                                 : -1;
+    if constexpr (integerPath >= 0) {
+        if (plan.pathKind == integerPath) {
+            filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, {plan.divisor, plan.roundMode, plan.sumLimit},
+                        target);
+            return QOR_OK;
+        }
+    }
+    filterSingle(plan.table<float>(plan.packedOffset), size, plan.roundMode, target);
+    return QOR_OK;
+}
+
+}  // namespace
+}  // namespace qori::filter
+
+#include "entries/filter_border.inc"

@@ -1,0 +1,117 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "linear_plan.h"
+
+#include <bit>
+
+#include "frame/control_scope.h"
+#include "frame/plan.h"
+#include "packing.h"
+
+namespace qori::filter {
+namespace {
+
+constexpr int32_t kRecordBytes = 128;
+static_assert(sizeof(LinearPlan) <= kRecordBytes);
+
+constexpr int kCopies = 4;  ///< Of each packed coefficient.
+
+LinearPlan& startPlan(QorLinearFilterPlan* block, int32_t pathKind, QorImageSize size, int32_t coefficientBytes,
+                      int32_t roundMode) {
+    auto& plan = *reinterpret_cast<LinearPlan*>(blockStart(block));
+    plan = {};
+    plan.pathKind = pathKind;
+    plan.kernelWidth = size.width;
+    plan.kernelHeight = size.height;
+    plan.roundMode = roundMode;
+    plan.kernelOffset = kRecordBytes;
+    const int64_t kernelBytes = int64_t{size.width} * size.height * coefficientBytes;
+    plan.packedOffset = kRecordBytes + static_cast<int32_t>(roundUpToBlock(kernelBytes));
+    return plan;
+}
+
+void classifyDivisor(LinearPlan& plan, int32_t divisor) {
+    plan.divisor = divisor;
+    plan.divisorSingle = static_cast<float>(divisor);
+    plan.divisorDouble = divisor;
+    plan.reciprocal = 1.0f / plan.divisorSingle;
+    const bool isPower = divisor > 1 && std::has_single_bit(static_cast<uint32_t>(divisor));
+    plan.divideMode = divisor == 1 ? LinearPlan::none : isPower ? LinearPlan::byShift : LinearPlan::byQuotient;
+    if (!isPower) return;
+    plan.shift = std::countr_zero(static_cast<uint32_t>(divisor));
+    plan.roundHalf = divisor / 2;
+    plan.shiftMask = divisor - 1;
+}
+
+int32_t floatPath(int32_t dataType) {
+    switch (dataType) {
+        case k8u: return LinearPlan::float8u;
+        case k16s: return LinearPlan::float16s;
+        case k16u: return LinearPlan::float16u;
+        default: return LinearPlan::float32f;
+    }
+}
+
+/// coefficient(i) for each coefficient of a float plan.
+template <class Coefficient>
+void fillFloats(QorLinearFilterPlan* block, QorImageSize size, int32_t dataType, int32_t channels, int32_t roundMode,
+                Coefficient coefficient) {
+    LinearPlan& plan = startPlan(block, floatPath(dataType), size, sizeof(float), roundMode);
+    auto* copy = plan.table<float>(plan.kernelOffset);
+    for (ptrdiff_t i = 0; i < ptrdiff_t{size.width} * size.height; ++i) copy[i] = coefficient(i);
+    if (channels != 2) packTurned<kCopies>(copy, size, plan.table<float>(plan.packedOffset));
+}
+
+}  // namespace
+
+int64_t planBytes(QorImageSize kernel, int32_t kernelType) {
+    const int64_t pairs = (int64_t{kernel.width} + 1) / 2 * kernel.height;
+    const int64_t coefficients = int64_t{kernel.width} * kernel.height * (kernelType == k16s ? 2 : 4);
+    return roundUpToBlock(32 * pairs) + roundUpToBlock(coefficients) + kRecordBytes + kBlockAlignment - 1;
+}
+
+int64_t workBytes(QorImageSize kernel, int32_t roiWidth, int32_t dataType, int32_t kernelType, int32_t channels) {
+    const int64_t area = int64_t{kernel.width} * kernel.height, p = 4 * area, w = roiWidth;
+    const auto rounded = [](int64_t bytes) { return bytes == 0 ? 0 : (bytes + 191) / 64 * 64; };
+    if (channels == 2 || (kernelType == k16s && dataType == k32f)) return 0;
+    if (kernelType == k16s) {
+        if (channels == 4) return rounded(dataType == k8u ? 16 * (area + w) : (16 * (area + w) + 124) / 16 * 16);
+        if (dataType == k8u) return rounded(channels == 1 ? 32 * ((8 * area + w + 7) / 8) : 16 * ((p + 3 * w + 3) / 4));
+        return rounded(channels == 1 ? 16 * ((p + w + 3) / 4) : 16 * ((p + 3 * w + 31) / 4));
+    }
+    if (dataType == k32f) return rounded((channels == 1 ? 32 : 16) * area);
+    if (channels == 4) return rounded(32 * w + 4 * (p + 8 * w));
+    if (channels == 3) return rounded(32 * ((3 * w + 3) / 4) + 16 * ((p + 6 * w + 10) / 4));
+    if (dataType == k16u) return rounded(16 * ((w + 10) / 4));
+    return rounded(32 * ((w + 3) / 4) + 16 * ((p + 2 * w + 10) / 4));
+}
+
+void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
+              int32_t roundMode) {
+    const ControlScope scope;
+    const bool is8u = dataType == k8u;
+    LinearPlan& plan =
+        startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t), roundMode);
+    classifyDivisor(plan, divisor);
+    auto* copy = plan.table<int16_t>(plan.kernelOffset);
+    std::copy_n(kernel, ptrdiff_t{size.width} * size.height, copy);
+    packPairs<kCopies>(copy, size, plan.table<int32_t>(plan.packedOffset));
+    const int64_t limit = is8u ? largestSum<uint8_t>(copy, size) : largestSum<int16_t>(copy, size);
+    plan.sumLimit = static_cast<int32_t>(std::min<int64_t>(limit, INT32_MAX));
+    plan.fitsPairs = std::all_of(copy, copy + ptrdiff_t{size.width} * size.height,
+                                 [](int16_t k) { return k != INT16_MIN && k != INT16_MAX; });
+}
+
+void fillPlan(QorLinearFilterPlan* block, const float* kernel, QorImageSize size, int32_t dataType, int32_t channels,
+              int32_t roundMode) {
+    fillFloats(block, size, dataType, channels, roundMode, [=](ptrdiff_t i) { return kernel[i]; });
+}
+
+void fillConvertedPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor,
+                       int32_t dataType, int32_t channels, int32_t roundMode) {
+    const ControlScope scope;
+    const double factor = 1.0 / divisor;
+    fillFloats(block, size, dataType, channels, roundMode,
+               [=](ptrdiff_t i) { return static_cast<float>(kernel[i] * factor); });
+}
+
+}  // namespace qori::filter

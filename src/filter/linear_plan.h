@@ -1,0 +1,61 @@
+// SPDX-License-Identifier: Apache-2.0
+// The plan of a general linear filter: a record in the caller's block, the kernel as given and as the sums want it.
+#pragma once
+#include "frame/image.h"
+
+namespace qori::filter {
+
+enum TypeCode : int32_t { k8u = 1, k16u = 5, k16s = 7, k32f = 13 };
+
+struct LinearPlan {
+    enum Path : int32_t { integer8u = 0, integer16s = 1, float8u = 3, float16s = 4, float16u = 5, float32f = 6 };
+    enum Divide : int32_t { none = 0, byShift = 1, byQuotient = 2 };
+
+    int32_t pathKind;
+    int32_t kernelWidth, kernelHeight;
+    // Integer kernels only.
+    int32_t divideMode;
+    int32_t shift, roundHalf;  ///< n and 2^(n-1) for a divisor of 2^n.
+    float reciprocal;
+    int32_t divisor;
+    float divisorSingle;
+    double divisorDouble;
+    int32_t shiftMask;  ///< 2^n - 1
+    int32_t roundMode;
+    int32_t kernelOffset, packedOffset;  ///< Bytes from the start of the record.
+    int32_t fitsPairs;  ///< Every coefficient lies in -32767 to 32766: no pair of products leaves 32 bits.
+    int32_t sumLimit;   ///< No sum's magnitude is larger; INT32_MAX also where one may be.
+
+    template <class T>
+    T* table(int32_t offset) {
+        return reinterpret_cast<T*>(reinterpret_cast<uint8_t*>(this) + offset);
+    }
+    template <class T>
+    const T* table(int32_t offset) const {
+        return reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(this) + offset);
+    }
+};
+
+/// Whether such pixels take an integer kernel as floats.
+constexpr bool isConverted(int32_t dataType, int32_t channels) {
+    return dataType == k16u || (dataType == k16s && channels > 2);
+}
+
+/// Bytes of a plan, slack for its alignment included.
+int64_t planBytes(QorImageSize kernel, int32_t kernelType);
+
+/// Bytes that a work buffer has besides those of the border.
+int64_t workBytes(QorImageSize kernel, int32_t width, int32_t dataType, int32_t kernelType, int32_t channels);
+
+/// Whether these sizes' products stay so small that the formulas above cannot leave 64 bits.
+constexpr bool isModest(QorImageSize kernel) { return int64_t{kernel.width} * kernel.height <= INT32_MAX; }
+
+void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
+              int32_t roundMode);
+void fillPlan(QorLinearFilterPlan* block, const float* kernel, QorImageSize size, int32_t dataType, int32_t channels,
+              int32_t roundMode);
+/// The float plan of an integer kernel.
+void fillConvertedPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor,
+                       int32_t dataType, int32_t channels, int32_t roundMode);
+
+}  // namespace qori::filter

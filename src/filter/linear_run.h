@@ -1,0 +1,92 @@
+// SPDX-License-Identifier: Apache-2.0
+// Packed kernels and rounding rules meet images: the run of every general linear filter.
+#pragma once
+#include "frame/control_scope.h"
+#include "kernels/filter_rules.h"
+#include "kernels/filter_sums.h"
+#include "packing.h"
+
+namespace qori::filter {
+
+using kernels::DoubleTaps;
+using kernels::FloatTaps;
+using kernels::PackedKernel;
+using kernels::PairTaps;
+
+/// Where results go, and how a region is cut so that its windows exist.
+template <class S, class D>
+struct Target {
+    BorderParts parts;
+    Image<D> dst;
+    int channels;
+    bool keepAlpha;
+};
+
+/// Elements of a block in pixels that begin and end with it.
+constexpr PartHints partHints(int channels, int elementBytes) {
+    constexpr int kBlock = 16, kOverread = 4;
+    return {channels == 4 ? kBlock / 4 : kBlock, kOverread * elementBytes};
+}
+
+template <class S, class D>
+Target<S, D> makeTarget(Image<const S> src, Image<D> dst, QorImageSize roi, Layout layout, Reach reach,
+                        const BorderRule& rule, uint8_t* buffer) {
+    const int n = channels(layout);
+    const BorderedImage image{asBytes(src.data), src.step, roi, n * elementBytes<S>, rule};
+    return {BorderParts(image, reach, partHints(n, elementBytes<S>), buffer), dst, n, layout == Layout::AC4};
+}
+
+template <class Taps, class Rule, class S, class D>
+void filterBy(const PackedKernel<Taps>& kernel, const Rule& rule, Target<S, D>& target) {
+    using Sum = typename Taps::Sum;
+    const kernels::Finish<Sum> finish{
+        target.keepAlpha ? kernels::finishRow<Rule, true, Sum> : kernels::finishRow<Rule, false, Sum>, &rule};
+    const int n = target.channels;
+    target.parts.forEach([&](const BorderPart& part) {
+        const auto [x, y, width, height] = part.area;
+        kernels::filterRows(kernel, reinterpret_cast<const S*>(part.window), part.step, n, ptrdiff_t{width} * n, height,
+                            part.slackBytes / elementBytes<S>, finish, asBytes(target.dst.row(y) + ptrdiff_t{x} * n),
+                            target.dst.step, elementBytes<D>);
+    });
+}
+
+/// How integer sums become elements.
+struct Division {
+    int32_t divisor, mode;
+    int64_t sumLimit;  ///< No sum's magnitude is larger. From 2^31 on sums are taken modulo 2^32.
+};
+
+/// By the cheapest rule that is exact for all sums.
+template <class S, class D>
+void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Division division, Target<S, D>& target) {
+    using Single = kernels::QuotientInSingle<D>;
+    const PackedKernel<PairTaps<S>> kernel{packed, size, {_mm256_set1_epi32(start)}};
+    const auto [divisor, mode, sumLimit] = division;
+    const Single single(divisor, mode);
+    if (divisor == 1) return filterBy(kernel, kernels::Saturated<D>{}, target);
+    if (sumLimit < Single::kSumLimit && single.isExact()) return filterBy(kernel, single, target);
+    if (divisor > 1 && single.isPowerOfTwo())
+        return filterBy(kernel, kernels::Shifted<D>{std::countr_zero(single.magnitude()), mode}, target);
+    filterBy(kernel, kernels::QuotientInDouble<D>{divisor, mode}, target);
+}
+
+/// -0 begins a sum that may be a single product: +0 would turn a product of -0.
+template <class S, class D>
+void filterSingle(const float* packed, QorImageSize size, int32_t mode, Target<S, D>& target) {
+    const PackedKernel<FloatTaps<S>> kernel{packed, size, {_mm256_set1_ps(-0.0f)}};
+    if constexpr (std::is_same_v<D, float>)
+        filterBy(kernel, kernels::Kept<float>{}, target);
+    else
+        filterBy(kernel, kernels::Rounded<D>{mode}, target);
+}
+
+template <class S, class D>
+void filterDouble(const double* packed, QorImageSize size, Division division, Target<S, D>& target) {
+    const PackedKernel<DoubleTaps<S>> kernel{packed, size, {_mm256_set1_pd(-0.0)}};
+    if constexpr (std::is_same_v<D, double>)
+        filterBy(kernel, kernels::Kept<double>{}, target);
+    else
+        filterBy(kernel, kernels::Divided<D>{division.divisor, division.mode}, target);
+}
+
+}  // namespace qori::filter

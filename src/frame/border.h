@@ -1,0 +1,120 @@
+// SPDX-License-Identifier: Apache-2.0
+// What a neighbourhood operation sees beyond its region, for every operation that looks around a pixel.
+//
+// Each axis has its own rule: beyond an open side pixels are read from memory, beyond a closed one they are
+// synthesised, from the nearest pixel along that axis or as a constant. With the constant a pixel is missing when
+// either of its coordinates is.
+//
+// Synthesised pixels exist in the caller's work buffer only, and only where a window needs them. With a window that
+// reaches l, t, r, b pixels to the left, above, to the right and below, and with all sides closed:
+//
+//     +-------------------------------+
+//     |            band: t rows       |   bands     whole rows whose windows leave the region above or below, with
+//     +---+-----------------------+---+             (t + l + r + ...) everything that they see, corners included
+//     | s |                       | s |   strips    columns of the other rows whose windows leave it to a side
+//     | t |       interior        | t |   interior  straight from the source
+//     | r |                       | r |
+//     +---+-----------------------+---+   Nothing outside the region is read beyond a closed side.
+//     |            band: b rows       |
+//     +-------------------------------+
+#pragma once
+#include "image.h"
+
+namespace qori {
+
+/// How far a window reaches beyond its pixel.
+struct Reach {
+    int32_t left, top, right, bottom;
+
+    /// That of a width x height kernel; an even one reaches further to the left and above.
+    static Reach ofKernel(QorImageSize kernel) {
+        const int32_t left = kernel.width / 2, top = kernel.height / 2;
+        return {left, top, kernel.width - 1 - left, kernel.height - 1 - top};
+    }
+    int32_t columns() const { return left + right; }
+    int32_t rows() const { return top + bottom; }
+};
+
+/// What lies beyond each side.
+struct BorderRule {
+    bool openLeft, openTop, openRight, openBottom;  ///< Read from memory.
+    const uint8_t* constant;                        ///< The missing pixel, or null where pixels are replicated.
+
+    /// From a QorBorderMode; kinds that are no kind of this model replicate.
+    static BorderRule of(int32_t border, const void* value);
+    bool isOpen() const { return openLeft && openTop && openRight && openBottom; }
+};
+
+/// A region and its surroundings by a rule.
+struct BorderedImage {
+    const uint8_t* origin;  ///< Pixel (0, 0).
+    ptrdiff_t step;
+    QorImageSize size;
+    int32_t pixelBytes;
+    BorderRule rule;
+
+    const uint8_t* pixel(int32_t x, int32_t y) const { return origin + y * step + ptrdiff_t{x} * pixelBytes; }
+    /// Writes the pixels of a rectangle, which may lie anywhere around the region.
+    void gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) const;
+};
+
+/// Pixels to be made and where their windows lie.
+struct BorderPart {
+    QorImageRect area;      ///< In the region.
+    const uint8_t* window;  ///< First pixel of the window of the area's first pixel.
+    ptrdiff_t step;
+    ptrdiff_t slackBytes;  ///< May be read behind the last window of each row.
+};
+
+/// What an operation's kernel likes: strips of at least blockPixels, an interior of whole blocks, slackBytes that it
+/// may read behind a row's last window.
+struct PartHints {
+    int32_t blockPixels;
+    int32_t slackBytes;
+};
+
+/// Bytes of buffer that make the parts of a region possible, whatever the rule: bands of 2 * rows() rows each, or
+/// strips for each row of the region.
+int64_t borderBytes(QorImageSize region, Reach reach, int32_t pixelBytes);
+
+/// The parts of a region one after the other; one buffer of borderBytes() serves them all in turn.
+class BorderParts {
+public:
+    BorderParts(const BorderedImage& image, Reach reach, PartHints hints, uint8_t* buffer);
+
+    /// Calls visit(BorderPart) for each part.
+    template <class Visit>
+    void forEach(Visit visit) {
+        for (int32_t i = 0; i < jobs_; ++i)
+            for (int32_t y = 0; y < job_[i].area.height;) {
+                const BorderPart part = make(job_[i], y);
+                visit(part);
+                y += part.area.height;
+            }
+    }
+
+private:
+    /// A band, a strip or the interior.
+    struct Job {
+        QorImageRect area;
+        bool fromSource;
+        ptrdiff_t slackBytes;
+    };
+
+    void addRows();
+    void addColumns(int32_t y, int32_t height);
+    void add(const Job& job) { job_[jobs_++] = job; }
+    bool fits(int32_t width, ptrdiff_t slackBytes) const;
+    ptrdiff_t rowBytes(int32_t width, ptrdiff_t slackBytes) const;
+    BorderPart make(const Job& job, int32_t y);
+
+    BorderedImage image_;
+    Reach reach_;
+    PartHints hints_;
+    uint8_t* buffer_;
+    int64_t capacity_;
+    Job job_[5];
+    int32_t jobs_ = 0;
+};
+
+}  // namespace qori
