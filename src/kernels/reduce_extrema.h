@@ -132,7 +132,8 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
     const auto rounds = [&](ExtremumLanes<Orders>... own) {  // copies: lanes in registers
         for (; i <= elements - 3 * n; i += 3 * n)
             for (int v = 0; v < 3; ++v) {
-                const Vec<T> a = load(src + i + v * n);
+                Vec<T> a = load(src + i + v * n);
+                if (sizeof...(Orders) > 1) loadOnce(a.v);
                 (join(own.best[v], a, Orders{}), ...);
             }
         ((lanes = own), ...);
@@ -203,7 +204,8 @@ QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptr
         Vec<T> high[2] = {filled(Biggest<T>::start), filled(Biggest<T>::start)};
         for (int32_t y = 0; y < rows; ++y, p = advanced(p))
             for (int v = 0; v < 2; ++v) {
-                const Vec<T> a = load(p + v * n);
+                Vec<T> a = load(p + v * n);
+                loadOnce(a.v);
                 low[v] = Smallest<T>::join(a, low[v]);
                 high[v] = Biggest<T>::join(a, high[v]);
             }

@@ -62,6 +62,7 @@ struct SumLanes<uint16_t> {
     __m256i all, odd;
 
     QORI_INLINE void add(Vec<uint16_t> a) {
+        loadOnce(a.v);
         all = _mm256_add_epi32(all, a.v);
         odd = _mm256_add_epi32(odd, _mm256_srli_epi32(a.v, 16));
     }
@@ -82,6 +83,7 @@ struct SumLanes<int16_t> {
     __m256i even, odd;
 
     QORI_INLINE void add(Vec<int16_t> a) {
+        loadOnce(a.v);
         even = _mm256_add_epi32(even, _mm256_madd_epi16(a.v, _mm256_set1_epi32(1)));
         odd = _mm256_add_epi32(odd, _mm256_srai_epi32(a.v, 16));
     }
@@ -118,6 +120,7 @@ struct SumLanes<uint8_t> {
     __m256i all, odd;
 
     QORI_INLINE void add(Bytes a) {
+        loadOnce(a.v);
         all = _mm256_add_epi16(all, a.v);
         odd = _mm256_add_epi16(odd, _mm256_srli_epi16(a.v, 8));
     }
@@ -187,6 +190,8 @@ requires(sizeof(T) == 2) struct ProductLanes<T> {
     SumLanes<T> high;
 
     QORI_INLINE void add(Vec<T> a, Vec<T> b) {
+        loadOnce(a.v);
+        loadOnce(b.v);
         low.add({_mm256_mullo_epi16(a.v, b.v)});
         if constexpr (std::is_signed_v<T>)
             high.add({_mm256_mulhi_epi16(a.v, b.v)});
@@ -212,11 +217,15 @@ struct PairProductLanes {
 
     QORI_INLINE void addPairs(__m256i a, __m256i b) { sum = _mm256_add_epi32(sum, _mm256_madd_epi16(a, b)); }
     QORI_INLINE void add(Bytes a, Bytes b) {
+        loadOnce(a.v);
+        loadOnce(b.v);
         addPairs(detail::evenBytes(a), detail::evenBytes(b));
         addPairs(detail::oddBytes(a), detail::oddBytes(b));
     }
     /// Squares of a - b: the bytes interleaved, then multiplied by 1 and -1 and added in pairs.
     QORI_INLINE void addSquaredDifference(Bytes a, Bytes b) {
+        loadOnce(a.v);
+        loadOnce(b.v);
         const __m256i signs = _mm256_set1_epi16(static_cast<int16_t>(0xFF01));
         const __m256i low = _mm256_maddubs_epi16(_mm256_unpacklo_epi8(a.v, b.v), signs);
         const __m256i high = _mm256_maddubs_epi16(_mm256_unpackhi_epi8(a.v, b.v), signs);

@@ -27,12 +27,18 @@ QORI_INLINE Vec<uint32_t> magnitude(Vec<int32_t> a) { return {_mm256_abs_epi32(a
 QORI_INLINE Vec<float> magnitude(Vec<float> a) { return {_mm256_andnot_ps(_mm256_set1_ps(-0.0f), a.v)}; }
 
 QORI_INLINE Vec<uint8_t> magnitude(Vec<uint8_t> a, Vec<uint8_t> b) {
+    loadOnce(a.v);
+    loadOnce(b.v);
     return {_mm256_sub_epi8(_mm256_max_epu8(a.v, b.v), _mm256_min_epu8(a.v, b.v))};
 }
 QORI_INLINE Vec<uint16_t> magnitude(Vec<uint16_t> a, Vec<uint16_t> b) {
+    loadOnce(a.v);
+    loadOnce(b.v);
     return {_mm256_sub_epi16(_mm256_max_epu16(a.v, b.v), _mm256_min_epu16(a.v, b.v))};
 }
 QORI_INLINE Vec<uint16_t> magnitude(Vec<int16_t> a, Vec<int16_t> b) {
+    loadOnce(a.v);
+    loadOnce(b.v);
     return {_mm256_sub_epi16(_mm256_max_epi16(a.v, b.v), _mm256_min_epi16(a.v, b.v))};
 }
 QORI_INLINE Vec<float> magnitude(Vec<float> a, Vec<float> b) { return magnitude(Vec<float>{_mm256_sub_ps(a.v, b.v)}); }

@@ -52,6 +52,13 @@ QORI_INLINE Vec<T> fromInteger(__m256i v) {
 
 // --- whole vectors --------------------------------------------------------------------------------------------------
 
+/// For a loaded vector that is used more than once. Compilers fold the load into the first use and load again for the
+/// next, and what streams from the second-level cache then waits for the load ports.
+template <class V>
+QORI_INLINE void loadOnce(V& v) {
+    __asm__("" : "+x"(v));
+}
+
 template <class T>
 QORI_INLINE Vec<T> load(const T* p) {
     return fromInteger<T>(_mm256_loadu_si256(reinterpret_cast<const __m256i*>(p)));
