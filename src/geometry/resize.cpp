@@ -99,7 +99,11 @@ auto withWay(const ResizePlan& plan, Visit visit) {
                 return visit.template operator()<FixedLinearTile<channels>>();
             if (WordsTile<channels>::suits(plan)) return visit.template operator()<WordsTile<channels>>();
         }
-        return visit.template operator()<TapsTile<T, channels>>();
+        if constexpr (channels == 1)
+            if (PhaseRows<T>::suits(plan)) return visit.template operator()<TapsTile<T, 1, PhaseRows<T>>>();
+        using Lines = LineRows<T, channels>;
+        if (Lines::suits(plan)) return visit.template operator()<TapsTile<T, channels, Lines>>();
+        return visit.template operator()<TapsTile<T, channels, TurnedRows<T, channels>>>();
     }
 }
 

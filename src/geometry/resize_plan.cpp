@@ -86,6 +86,7 @@ struct Builder {
         plan->horizontal.indexTable = layout.horizontalIndices;
         plan->horizontal.weightTable = layout.horizontalWeights;
         plan->columnTaps = plan->rowTaps = 1;
+        plan->bounded = 1;
     }
 
     template <class T>
@@ -250,6 +251,9 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
     if (!fixedPoint) builder.plan->columnPeriod = periodOf(*builder.plan, 1);
 }
 
+/// Two passes of it leave 16-bit elements below 2^30.
+constexpr double kMostGain = 128;
+
 void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
     const ControlScope scope;
     const int32_t interpolation = filter.shape == Filter::Shape::linear  ? interpLinear
@@ -266,10 +270,14 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
         auto* weights = builder.table<float>(axis->weightTable);
         builder.forPositions(*axis, [&](int32_t, double fraction) {
             const auto weight = [&](int32_t k) { return filter(scale * (k - (half - 1) - fraction)); };
-            double sum = 0;
+            double sum = 0, magnitude = 0;
             for (int32_t k = 0; k < 2 * half; ++k) sum += weight(k);
-            for (int32_t k = 0; k < 2 * half; ++k)
-                *weights++ = static_cast<float>(normalises ? weight(k) / sum : weight(k));
+            for (int32_t k = 0; k < 2 * half; ++k) {
+                const double w = normalises ? weight(k) / sum : weight(k);
+                magnitude += __builtin_fabs(w);
+                *weights++ = static_cast<float>(w);
+            }
+            if (!(magnitude <= kMostGain)) plan.bounded = 0;
         });
     }
     plan.columnPeriod = periodOf(plan, plan.columnTaps);

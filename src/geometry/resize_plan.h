@@ -27,6 +27,7 @@ struct ResizePlan {
     Axis vertical, horizontal;
     int32_t columnTaps, rowTaps;  ///< Weights per position of the two directions.
     int32_t columnPeriod;         ///< Columns after which the weights repeat, bit for bit; 0 where that is not known.
+    int32_t bounded;              ///< Sums of 16-bit elements stay below 2^31.
     int32_t words;                ///< Whether 8u is summed in integers: see fitsWords() for what that takes.
 
     template <class T>
@@ -42,6 +43,17 @@ struct ResizePlan {
     /// Which of the stored sets of weights a position has: super keeps those of one period.
     int32_t weightSet(const Axis& axis, int32_t position) const {
         return interpolation == interpSuper ? position % axis.targetReduced : position;
+    }
+    /// Linear plans hold fractions instead of weights.
+    bool isPlainLinear() const { return interpolation == interpLinear && antialiasing == 0; }
+    /// The weights of a position, in the plan or in `pair`.
+    const float* weights(const Axis& axis, int32_t position, float (&pair)[2]) const {
+        const auto* stored = table<float>(axis.weightTable);
+        if (!isPlainLinear())
+            return stored + ptrdiff_t{weightSet(axis, position)} * (&axis == &vertical ? rowTaps : columnTaps);
+        pair[0] = 1 - stored[position];
+        pair[1] = stored[position];
+        return pair;
     }
     int32_t half(const Axis& axis) const { return &axis == &vertical ? halfHeight : halfWidth; }
     int32_t firstTap(const Axis& axis, int32_t position) const {

@@ -57,8 +57,8 @@ QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, ptrdiff_t late
         16 - kStride<channels>;  // bytes beyond the block that are read and, for three channels, written
     ptrdiff_t i = 0;
     for (; i + kResult + kExcess <= bytes; i += kResult) {
-        prefetch(a + later + 2 * i);
-        prefetch(b + later + 2 * i);
+        prefetchToL2(a + later + 2 * i);
+        prefetchToL2(b + later + 2 * i);
         halveBlock<channels, toEven>(a + 2 * i, b + 2 * i, dst + i);
     }
     for (; i < bytes; i += kResult) {
@@ -100,8 +100,8 @@ void halveRow32f(const float* a, const float* b, ptrdiff_t later, float* dst, pt
     };
     ptrdiff_t i = 0;
     for (; i + 8 <= pixels; i += 8) {
-        prefetch(reinterpret_cast<const uint8_t*>(a + 2 * i) + later);
-        prefetch(reinterpret_cast<const uint8_t*>(b + 2 * i) + later);
+        prefetchToL2(reinterpret_cast<const uint8_t*>(a + 2 * i) + later);
+        prefetchToL2(reinterpret_cast<const uint8_t*>(b + 2 * i) + later);
         block(i, 8);
     }
     if (i < pixels) block(i, pixels - i);

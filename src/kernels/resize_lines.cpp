@@ -29,22 +29,6 @@ QORI_INLINE __m256 sumWindows(const float* window, __m256i order, const float* w
     return sum;
 }
 
-/// Eight results of one channel, two source columns apart. Their order becomes right at the end.
-template <int taps>
-QORI_INLINE __m256 sumPairs(const float* window, const float* weights, int32_t count) {
-    const int32_t n = taps > 0 ? taps : count;
-    __m256 sum = _mm256_setzero_ps();
-#pragma GCC unroll 12
-    for (int32_t k = 0; k < n; k += 2, window += 2) {
-        const __m256 low = _mm256_loadu_ps(window), high = _mm256_loadu_ps(window + 8);
-        const __m256 even = _mm256_shuffle_ps(low, high, 0x88), odd = _mm256_shuffle_ps(low, high, 0xDD);
-        const __m256 first = _mm256_loadu_ps(weights + 8 * k);
-        sum = k == 0 ? _mm256_mul_ps(first, even) : _mm256_fmadd_ps(first, even, sum);
-        sum = _mm256_fmadd_ps(_mm256_loadu_ps(weights + 8 * k + 8), odd, sum);
-    }
-    return _mm256_castpd_ps(_mm256_permute4x64_pd(_mm256_castps_pd(sum), 0xD8));
-}
-
 template <int taps, Windows windows>
 QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, const uint8_t* later, int bytes,
                                 float* out) {
@@ -54,7 +38,6 @@ QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, con
     const float* weights = filter.weights;
     const auto sum = [&](ptrdiff_t g, ptrdiff_t table) {
         const float* from = weights + table * tableFloats;
-        if constexpr (windows == Windows::pairs) return sumPairs<taps>(line + bases[g], from, filter.taps);
         const __m256i places = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(order + 8 * table));
         return sumWindows<taps, windows>(line + bases[g], places, from, filter.taps, pixel);
     };
@@ -69,11 +52,10 @@ QORI_NOINLINE void filterLineOf(const LineFilter& filter, const float* line, con
 
 template <int taps>
 void filterLineOf(const LineFilter& filter, const float* line, const uint8_t* later, int bytes, float* out) {
-    switch (filter.windows) {
-        case Windows::one: return filterLineOf<taps, Windows::one>(filter, line, later, bytes, out);
-        case Windows::two: return filterLineOf<taps, Windows::two>(filter, line, later, bytes, out);
-        case Windows::pairs: return filterLineOf<taps, Windows::pairs>(filter, line, later, bytes, out);
-    }
+    if (filter.windows == Windows::one)
+        filterLineOf<taps, Windows::one>(filter, line, later, bytes, out);
+    else
+        filterLineOf<taps, Windows::two>(filter, line, later, bytes, out);
 }
 
 /// Whether a group's tables are those of `cycle` groups before.
@@ -94,14 +76,9 @@ void inspect(LineFilter& filter) {
     filter.cycle = filter.groups > cycle ? cycle : 0;
     for (ptrdiff_t g = cycle; g + 1 < filter.groups && filter.cycle > 0; ++g)
         if (!repeats(filter, g, cycle)) filter.cycle = 0;
-    bool one = true, pairs = filter.cycle == 1 && filter.taps % 2 == 0;
-    for (ptrdiff_t i = 0; i < 8 * filter.groups; ++i) {
-        one = one && filter.order[i] < 8;
-        pairs = pairs && filter.order[i] == 2 * (i & 7);
-    }
-    for (ptrdiff_t i = 0; i < 8 * filter.groups * filter.taps; ++i)
-        pairs = pairs && filter.weights[i] == filter.weights[i & ~ptrdiff_t{7}];
-    filter.windows = one ? Windows::one : pairs ? Windows::pairs : Windows::two;
+    bool one = true;
+    for (ptrdiff_t i = 0; i < 8 * filter.groups; ++i) one = one && filter.order[i] < 8;
+    filter.windows = one ? Windows::one : Windows::two;
 }
 
 template <int channels>

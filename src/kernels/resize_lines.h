@@ -9,9 +9,9 @@ namespace qori::kernels {
 
 /// Whether lines are the way: eight neighbouring results must look at sixteen neighbouring floats, and one window
 /// serves many taps better than two do. Pixels n apart look ceil(n * ratio) apart at most; eight elements are of pixels
-/// 7, 3 (from a last channel on) or 1 apart. `even` says that the weights of all results are the same.
-constexpr bool suitsLines(double ratio, int32_t taps, int channels, bool even) {
-    if (ratio <= 1 || (channels == 1 && ratio == 2 && even)) return true;
+/// 7, 3 (from a last channel on) or 1 apart.
+constexpr bool suitsLines(double ratio, int32_t taps, int channels) {
+    if (ratio <= 1) return true;
     return taps <= 2 && ratio <= (channels == 1 ? 2 : channels == 3 ? 4.0 / 3 : 3);
 }
 
@@ -19,9 +19,8 @@ struct LineFilter {
     static constexpr int kOverrun = 16;  ///< Floats behind a line's last that may be read.
 
     enum class Windows {
-        one,   ///< Eight floats.
-        two,   ///< Sixteen.
-        pairs  ///< Sixteen, of which every second; the weights of all results are the same.
+        one,  ///< Eight floats.
+        two   ///< Sixteen.
     };
 
     int32_t taps = 0, channels = 0;

@@ -160,78 +160,97 @@ auto chooseSum(int32_t taps) {
     }
 }
 
-/// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; above, sums
-/// are cut where they saturate anyway.
-QORI_INLINE __m256i toIntegers(__m256 sum) { return _mm256_cvtps_epi32(_mm256_min_ps(sum, _mm256_set1_ps(0x1p30f))); }
+enum class Finish { plain, scaled, limited };
 
-/// Rounds and saturates 32 sums.
-QORI_INLINE void storeSums(uint8_t* dst, const __m256 sum[4], ptrdiff_t n) {
-    __m256i whole[4];
-    for (int j = 0; j < 4; ++j) whole[j] = toIntegers(sum[j]);
-    const __m256i packed =
-        _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
-    storeUpTo(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))}, n);
+/// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; where sums
+/// may be so large, those above are cut where they saturate anyway.
+template <Finish finish>
+QORI_INLINE __m256i toIntegers(__m256 sum) {
+    return _mm256_cvtps_epi32(finish == Finish::limited ? _mm256_min_ps(sum, _mm256_set1_ps(0x1p30f)) : sum);
 }
 
-template <class T, class Pack>
-QORI_INLINE void storeWords(T* dst, const __m256 sum[4], ptrdiff_t n, Pack pack) {
-    __m256i whole[4];
-    for (int j = 0; j < 4; ++j) whole[j] = toIntegers(sum[j]);
-    storeUpTo(dst, Vec<T>{_mm256_permute4x64_epi64(pack(whole[0], whole[1]), 0xD8)}, n);
-    storeUpTo(dst + 16, Vec<T>{_mm256_permute4x64_epi64(pack(whole[2], whole[3]), 0xD8)}, n - 16);
-}
-
-QORI_INLINE void storeSums(uint16_t* dst, const __m256 sum[4], ptrdiff_t n) {
-    storeWords<uint16_t>(dst, sum, n, [](__m256i a, __m256i b) { return _mm256_packus_epi32(a, b); });
-}
-
-QORI_INLINE void storeSums(int16_t* dst, const __m256 sum[4], ptrdiff_t n) {
-    storeWords<int16_t>(dst, sum, n, [](__m256i a, __m256i b) { return _mm256_packs_epi32(a, b); });
-}
-
-QORI_INLINE void storeSums(float* dst, const __m256 sum[4], ptrdiff_t n) {
-    for (int j = 0; j < 4; ++j) storeUpTo(dst + 8 * j, Vec<float>{sum[j]}, n - 8 * j);
-}
-
-/// Sums kTapBlock elements. `taps` 0 is any number.
-template <class T, int taps, bool scaled>
-QORI_INLINE void sumBlock(const float* const* rows, const float* weights, int32_t count, float scale, ptrdiff_t at,
-                          T* dst, ptrdiff_t elements) {
-    const int32_t n = taps > 0 ? taps : count;
-    __m256 sum[4];
-    const __m256 first = _mm256_broadcast_ss(weights);
-    for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(first, _mm256_loadu_ps(rows[0] + at + 8 * j));
-#pragma GCC unroll 12
-    for (int32_t k = 1; k < n; ++k) {
-        const __m256 weight = _mm256_broadcast_ss(weights + k);
-        for (int j = 0; j < 4; ++j) sum[j] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(rows[k] + at + 8 * j), sum[j]);
+/// Rounds and saturates the n (at most kTapBlock) elements of four sums.
+template <Finish finish, class T>
+QORI_INLINE void storeSums(T* dst, const __m256 sum[4], ptrdiff_t n) {
+    if constexpr (std::is_same_v<T, float>) {
+        for (int j = 0; j < 4; ++j) storeUpTo(dst + 8 * j, Vec<float>{sum[j]}, n - 8 * j);
+    } else {
+        __m256i whole[4];
+        for (int j = 0; j < 4; ++j) whole[j] = toIntegers<finish>(sum[j]);
+        if constexpr (sizeof(T) == 1) {
+            const __m256i packed =
+                _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
+            storeUpTo(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))}, n);
+        } else {
+            for (int j = 0; j < 4; j += 2) {
+                const __m256i packed = std::is_signed_v<T> ? _mm256_packs_epi32(whole[j], whole[j + 1])
+                                                           : _mm256_packus_epi32(whole[j], whole[j + 1]);
+                storeUpTo(dst + 8 * j, Vec<T>{_mm256_permute4x64_epi64(packed, 0xD8)}, n - 8 * j);
+            }
+        }
     }
-    if constexpr (scaled)
-        for (__m256& part : sum) part = _mm256_mul_ps(part, _mm256_set1_ps(scale));
-    storeSums(dst + at, sum, elements);
 }
 
-template <class T, int taps, bool scaled>
-QORI_NOINLINE void sumColumn(const float* const* rows, const float* weights, int32_t count, float scale, T* dst,
+template <Finish finish, class T>
+QORI_INLINE void finishSums(T* dst, __m256 sum[4], float scale, ptrdiff_t n) {
+    if constexpr (finish == Finish::scaled)
+        for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
+    storeSums<finish>(dst, sum, n);
+}
+
+template <Finish finish, class T>
+QORI_NOINLINE void sumColumn(const float* const* rows, const PairedTaps& given, float scale, T* dst,
                              ptrdiff_t elements) {
-    // Copies of few rows and weights: not reloaded after every store.
-    const float* ownRows[taps > 0 ? taps : 1];
-    float ownWeights[taps > 0 ? taps : 1];
-    for (int k = 0; k < taps; ++k) {
-        ownRows[k] = rows[k];
-        ownWeights[k] = weights[k];
+    const PairedTaps taps = given;  // not reloaded after every store
+    for (ptrdiff_t i = 0; i < elements; i += kTapBlock) {
+        __m256 sums[4];
+        for (int j = 0; j < 4; j += kPairVectors)
+            sumOne<kPairVectors>(
+                taps, [&](int32_t k) { return rows[k] + i + 8 * j; }, sums + j);
+        finishSums<finish>(dst + i, sums, scale, elements - i);
     }
-    if constexpr (taps > 0) {
-        rows = ownRows;
-        weights = ownWeights;
-    }
+}
+
+template <Finish finish, class Fixed, class T>
+QORI_INLINE void sumBlockPair(const float* const* rows, const PairedTaps& taps, float scale, ptrdiff_t at, T* dst,
+                              T* second, ptrdiff_t n) {
+    __m256 sums[4], others[4];
+    for (int j = 0; j < 4; j += kPairVectors)
+        sumPair<kPairVectors>(
+            taps, Fixed{}, [&](int32_t k) { return rows[k] + at + 8 * j; }, sums + j, others + j);
+    finishSums<finish>(dst + at, sums, scale, n);
+    finishSums<finish>(second + at, others, scale, n);
+}
+
+template <Finish finish, class Fixed, class T>
+QORI_NOINLINE void sumColumnPair(const float* const* rows, const PairedTaps& given, float scale, T* dst, T* second,
+                                 ptrdiff_t elements) {
+    const PairedTaps taps = given;
+    const float* own[Fixed::count + Fixed::shift + 1];
+    for (int k = 0; k < Fixed::count + Fixed::shift; ++k) own[k] = rows[k];
+    const float* const* const from = Fixed::count > 0 ? own : rows;
+    // Whole blocks first: with partial ones in the same loop, registers do not suffice.
     ptrdiff_t i = 0;
     for (; i + kTapBlock <= elements; i += kTapBlock) {
-        prefetchAhead(dst + i);
-        if constexpr (sizeof(T) == 4) prefetchAhead(dst + i + 16);
-        sumBlock<T, taps, scaled>(rows, weights, count, scale, i, dst, kTapBlock);
+        if constexpr (sizeof(T) < 4) {
+            prefetchAhead(dst + i);
+            prefetchAhead(second + i);
+        }
+        sumBlockPair<finish, Fixed>(from, taps, scale, i, dst, second, kTapBlock);
     }
-    if (i < elements) sumBlock<T, taps, scaled>(rows, weights, count, scale, i, dst, elements - i);
+    if (i < elements) sumBlockPair<finish, Fixed>(from, taps, scale, i, dst, second, elements - i);
+}
+
+template <Finish finish, class T>
+void sumColumns(const float* const* rows, const PairedTaps& taps, float scale, T* dst, T* second, ptrdiff_t elements) {
+    if (second == nullptr) return sumColumn<finish>(rows, taps, scale, dst, elements);
+    const auto sum = [&]<class Fixed>(Fixed) {
+        sumColumnPair<finish, Fixed>(rows, taps, scale, dst, second, elements);
+    };
+    if constexpr (finish == Finish::plain)
+        withFixedTaps(taps, sum);
+    else
+        sum(AnyTaps{});
 }
 
 /// Source columns that a group may span before it is made smaller.
@@ -268,17 +287,12 @@ void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* c
 }
 
 template <class T>
-void filterColumn(const float* const* rows, const float* weights, int32_t taps, float scale, T* dst,
+void filterColumn(const float* const* rows, const PairedTaps& taps, ColumnFinish finish, T* dst, T* second,
                   ptrdiff_t elements) {
-    if (scale != 1) return sumColumn<T, 0, true>(rows, weights, taps, scale, dst, elements);
-    switch (taps) {
-        case 2: return sumColumn<T, 2, false>(rows, weights, taps, scale, dst, elements);
-        case 4: return sumColumn<T, 4, false>(rows, weights, taps, scale, dst, elements);
-        case 6: return sumColumn<T, 6, false>(rows, weights, taps, scale, dst, elements);
-        case 8: return sumColumn<T, 8, false>(rows, weights, taps, scale, dst, elements);
-        case 12: return sumColumn<T, 12, false>(rows, weights, taps, scale, dst, elements);
-        default: return sumColumn<T, 0, false>(rows, weights, taps, scale, dst, elements);
-    }
+    if (finish.scale != 1) return sumColumns<Finish::scaled>(rows, taps, finish.scale, dst, second, elements);
+    if (finish.isBounded || std::is_same_v<T, float>)
+        return sumColumns<Finish::plain>(rows, taps, 1, dst, second, elements);
+    if constexpr (!std::is_same_v<T, float>) sumColumns<Finish::limited>(rows, taps, 1, dst, second, elements);
 }
 
 #define QORI_TAPS(T)                                                                                    \
@@ -290,9 +304,9 @@ QORI_TAPS(uint16_t)
 QORI_TAPS(int16_t)
 QORI_TAPS(float)
 #undef QORI_TAPS
-template void filterColumn(const float* const*, const float*, int32_t, float, uint8_t*, ptrdiff_t);
-template void filterColumn(const float* const*, const float*, int32_t, float, uint16_t*, ptrdiff_t);
-template void filterColumn(const float* const*, const float*, int32_t, float, int16_t*, ptrdiff_t);
-template void filterColumn(const float* const*, const float*, int32_t, float, float*, ptrdiff_t);
+template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, uint8_t*, uint8_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, uint16_t*, uint16_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, int16_t*, int16_t*, ptrdiff_t);
+template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, float*, float*, ptrdiff_t);
 
 }  // namespace qori::kernels

@@ -3,10 +3,9 @@
 // that a column's eight elements fill a vector, each result is a weighted sum of such vectors, and the results are
 // turned back into rows. This costs the same for every ratio and number of channels, and reads no element twice.
 //
-// A sum is w[0] * p[0], then one fused multiply-add per tap in ascending order, wherever it is computed: how an image
-// is cut into tiles changes no bit.
+// The order of resize_pairs.h: how an image is cut into tiles changes no bit.
 #pragma once
-#include "simd.h"
+#include "resize_pairs.h"
 
 namespace qori::kernels {
 
@@ -41,9 +40,14 @@ int64_t tapColumnFloats(double ratio, int32_t taps, int channels);
 template <class T, int channels>
 void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* const out[kTapRows]);
 
-/// dst = the sum of the rows by their weights, times `scale` where it is not 1; integers are rounded and saturated.
+struct ColumnFinish {
+    float scale;     ///< Factor of the sums.
+    bool isBounded;  ///< Sums stay below 2^31.
+};
+
+/// dst, and `second` unless it is null, become sums of rows, scaled; integers are rounded and saturated.
 template <class T>
-void filterColumn(const float* const* rows, const float* weights, int32_t taps, float scale, T* dst,
+void filterColumn(const float* const* rows, const PairedTaps& taps, ColumnFinish finish, T* dst, T* second,
                   ptrdiff_t elements);
 
 }  // namespace qori::kernels

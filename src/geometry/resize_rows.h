@@ -1,0 +1,297 @@
+// SPDX-License-Identifier: Apache-2.0
+// Filtering the rows of a tile, strip by strip, into rows of floats: three ways that give the same bits. Each is a
+// class that TapsTile is made with:
+//     suits(plan)                     whether it can do the plan
+//     Rows(source, buffer)            takes its memory
+//     stripPixels()                   width of a strip
+//     ringRows()                      rows of floats that it needs room for
+//     begin()                         the source is open
+//     beginStrip(x, width)            a strip of the tile begins
+//     filterNext(sequence, ring)      filters one or more rows
+#pragma once
+#include <algorithm>
+
+#include "kernels/resize_lines.h"
+#include "kernels/resize_phases.h"
+#include "resize_run.h"
+
+namespace qori::geometry {
+
+/// The source rows that a tile is made of, each once, in ascending order. Destination row y is made of consecutive
+/// ones.
+class RowSequence {
+public:
+    RowSequence(const ResizePlan& plan, Tile tile, Range legal) : plan_(plan), tile_(tile), legal_(legal) { enter(0); }
+
+    bool done() const { return y_ == tile_.height; }
+    int32_t next() {
+        const int32_t row = next_++;
+        while (!done() && next_ > last_) enter(y_ + 1);
+        return row;
+    }
+
+private:
+    /// Goes on with the rows of destination row y that are still to come.
+    void enter(int32_t y) {
+        y_ = y;
+        if (done()) return;
+        const int32_t first = legal_.clamp(plan_.firstTap(plan_.vertical, tile_.y + y));
+        last_ = legal_.clamp(plan_.firstTap(plan_.vertical, tile_.y + y) + plan_.rowTaps - 1);
+        if (y == 0 || first > next_) next_ = first;
+    }
+
+    const ResizePlan& plan_;
+    Tile tile_;
+    Range legal_;
+    int32_t y_ = 0, next_ = 0, last_ = 0;
+};
+
+/// Filtered rows, the last few of them, counted from the strip's first.
+struct Ring {
+    float* memory;
+    int32_t rows;
+    ptrdiff_t step;
+    int32_t filtered;
+
+    float* row(int32_t place) const { return memory + place % rows * step; }
+    float* next() { return row(filtered++); }
+};
+
+/// Whether two destination rows share source rows, or nearly so, and are made together.
+inline bool makesPairs(const ResizePlan& plan) { return plan.vertical.ratio() <= plan.rowTaps; }
+
+/// The source rows that a pair is made of at most, or a single row.
+inline int32_t rowsOfPairs(const ResizePlan& plan) {
+    if (!makesPairs(plan)) return plan.rowTaps;
+    return plan.rowTaps + static_cast<int32_t>(__builtin_ceil(plan.vertical.ratio()));
+}
+
+inline int32_t wholeChunks(int32_t pixels) {
+    const int32_t chunks = pixels / kernels::kTapChunk * kernels::kTapChunk;
+    return chunks > 0 ? chunks : kernels::kTapChunk;
+}
+
+/// The taps of a tile's columns one by one.
+template <class T, int channels>
+class ColumnTaps {
+public:
+    ColumnTaps(const TileSource<T, channels>& source, WorkBuffer& buffer)
+        : pixels(buffer.take<kernels::PixelTaps>(source.tile.width)),
+          pairs_(source.plan.isPlainLinear() ? buffer.take<float>(2 * int64_t{source.tile.width}) : nullptr) {}
+
+    void list(const TileSource<T, channels>& source) {
+        const ResizePlan& plan = source.plan;
+        const Axis& axis = plan.horizontal;
+        const auto* table = plan.table<float>(axis.weightTable);
+        weights = pairs_ != nullptr ? pairs_ : table;
+        const int32_t period = plan.columnPeriod;
+        for (int32_t x = 0; x < source.tile.width; ++x) {
+            const int32_t position = source.tile.x + x, at = pairs_ != nullptr ? x : position;
+            pixels[x] = {plan.firstTap(axis, position), (period > 0 ? at % period : at) * plan.columnTaps};
+            if (pairs_ == nullptr) continue;
+            pairs_[2 * x] = 1 - table[position];
+            pairs_[2 * x + 1] = table[position];
+        }
+    }
+
+    kernels::PixelTaps* pixels;
+    const float* weights = nullptr;
+
+private:
+    float* pairs_;
+};
+
+/// Any plan: eight rows at once, turned.
+template <class T, int channels>
+class TurnedRows {
+public:
+    static bool suits(const ResizePlan&) { return true; }
+
+    TurnedRows(const TileSource<T, channels>& source, WorkBuffer& buffer)
+        : source_(source),
+          taps_(source, buffer),
+          columns_(buffer.take<float>(
+              kernels::tapColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps, channels))),
+          results_(buffer.take<float>(8 * kernels::kTapChunk * channels)) {}
+
+    /// Such that the filtered rows of a strip stay in the second-level cache.
+    int32_t stripPixels() const {
+        constexpr int32_t kRingFloats = 24576;
+        return wholeChunks(kRingFloats / ringRows() / channels);
+    }
+    int32_t ringRows() const { return rowsOfPairs(source_.plan) + kernels::kTapRows - 1; }
+
+    void begin() { taps_.list(source_); }
+    void beginStrip(int32_t x, int32_t width) {
+        const ResizePlan& plan = source_.plan;
+        filter_ = {taps_.pixels + x,
+                   taps_.weights,
+                   plan.columnTaps,
+                   width,
+                   source_.columns.first,
+                   source_.columns.last,
+                   kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps),
+                   plan.columnPeriod,
+                   columns_,
+                   results_};
+        newest_ = INT32_MIN;
+    }
+    /// Where there are fewer than eight rows left, the last is done again.
+    void filterNext(RowSequence& sequence, Ring& ring) {
+        const T* rows[kernels::kTapRows];
+        float* out[kernels::kTapRows];
+        for (int32_t i = 0; i < kernels::kTapRows; ++i) {
+            if (!sequence.done()) {
+                newest_ = sequence.next();
+                out[i] = ring.next();
+            } else {
+                out[i] = out[i - 1];
+            }
+            rows[i] = source_.at(newest_, 0);
+        }
+        kernels::filterRows<T, channels>(filter_, rows, out);
+    }
+
+private:
+    const TileSource<T, channels>& source_;
+    ColumnTaps<T, channels> taps_;
+    float *columns_, *results_;
+    kernels::RowFilter filter_{};
+    int32_t newest_ = 0;
+};
+
+/// The source columns that the taps of a strip reach.
+struct Reached {
+    int32_t from;         ///< The first that is legal.
+    int32_t left, right;  ///< So many outside the legal ones, at either end.
+    ptrdiff_t columns;    ///< Legal ones.
+
+    Reached(const Range& legal, int32_t first, int32_t last)
+        : from(legal.clamp(first)),
+          left(from - first),
+          right(last - legal.clamp(last)),
+          columns(last - right - from + 1) {}
+};
+
+/// Enlargements and small reductions: rows as lines of floats.
+template <class T, int channels>
+class LineRows {
+public:
+    static bool suits(const ResizePlan& plan) {
+        return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps, channels);
+    }
+
+    LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer) : source_(source), taps_(source, buffer) {
+        const int64_t pixels = source.tile.width < stripPixels() ? source.tile.width : stripPixels();
+        const int64_t elements = roundUp(pixels * channels, kernels::kTapBlock);
+        const ResizePlan& plan = source.plan;
+        const int64_t columns =
+            static_cast<int64_t>(double(pixels - 1) * plan.horizontal.ratio()) + 1 + plan.columnTaps;
+        line_ = buffer.take<float>(columns * channels + kernels::LineFilter::kOverrun + 8);
+        filter_.taps = plan.columnTaps;
+        filter_.channels = channels;
+        filter_.bases = buffer.take<int32_t>(elements / 8);
+        filter_.order = buffer.take<int32_t>(elements);
+        filter_.weights = buffer.take<float>(elements * plan.columnTaps);
+    }
+
+    /// Strips whose tables stay in the second-level cache. Longer ones follow the source better than shorter ones.
+    int32_t stripPixels() const { return wholeChunks(2048 / channels); }
+    int32_t ringRows() const { return rowsOfPairs(source_.plan); }
+
+    void begin() { taps_.list(source_); }
+    void beginStrip(int32_t x, int32_t width) {
+        const kernels::PixelTaps* const pixels = taps_.pixels + x;
+        const int32_t first = pixels[0].first;
+        reached_ = Reached(source_.columns, first, pixels[width - 1].first + filter_.taps - 1);
+        const ptrdiff_t behind = source_.columns.last - reached_.from + 1 - reached_.columns;
+        isWhole_ = reached_.left == 0 && reached_.right == 0 && behind * channels >= kernels::LineFilter::kOverrun;
+        kernels::listLine(filter_, pixels, width, taps_.weights, first);
+    }
+    void filterNext(RowSequence& sequence, Ring& ring) {
+        const int32_t row = sequence.next();
+        const T* from = source_.at(row, reached_.from);
+        const float* line = line_;
+        if constexpr (std::is_same_v<T, float>) {
+            if (isWhole_) line = from;
+        }
+        if (line == line_)
+            kernels::expandLine<T, channels>(from, reached_.columns * channels, reached_.left, reached_.right, line_);
+        kernels::filterLine(filter_, line, asBytes(source_.at(row + 1, reached_.from)), elementBytes<T>, ring.next());
+    }
+
+private:
+    const TileSource<T, channels>& source_;
+    ColumnTaps<T, channels> taps_;
+    float* line_;
+    kernels::LineFilter filter_{};
+    Reached reached_{{0, 0}, 0, 0};
+    bool isWhole_ = false;  ///< Rows of floats serve as lines: windows stay among the legal columns.
+};
+
+/// One channel at the simplest ratios. They are binary fractions, so that positions and weights repeat exactly.
+template <class T>
+class PhaseRows {
+public:
+    static bool suits(const ResizePlan& plan) {
+        const Axis& axis = plan.horizontal;
+        return axis.sourceReduced <= kernels::PhaseFilter::kMostStreams &&
+               axis.targetReduced <= kernels::PhaseFilter::kMostPhases;
+    }
+
+    PhaseRows(const TileSource<T, 1>& source, WorkBuffer& buffer) : source_(source) {
+        const ResizePlan& plan = source.plan;
+        filter_.streams = plan.horizontal.sourceReduced;
+        filter_.phases = plan.horizontal.targetReduced;
+        const int64_t pixels = source.tile.width < stripPixels() ? source.tile.width : stripPixels();
+        const int64_t columns =
+            static_cast<int64_t>(double(pixels - 1) * plan.horizontal.ratio()) + 1 + plan.columnTaps;
+        filter_.streamFloats = static_cast<ptrdiff_t>(kernels::streamFloats(columns, filter_.streams));
+        weights_ = buffer.take<float>(2 * int64_t{plan.columnTaps});
+        offsets_ = buffer.take<int32_t>(2 * int64_t{plan.columnTaps});
+        line_ = buffer.take<float>(lineFloats());
+        filter_.offsets = offsets_;
+    }
+
+    /// Long strips read the source in long runs, which counts for more than filtered rows close at hand.
+    static int32_t stripPixels() { return 4096; }
+    int32_t ringRows() const { return rowsOfPairs(source_.plan); }
+
+    void begin() { std::fill_n(line_, lineFloats(), 0.0f); }  // nothing denormal where nothing is written
+    void beginStrip(int32_t x, int32_t width) {
+        const ResizePlan& plan = source_.plan;
+        const Axis& axis = plan.horizontal;
+        const int32_t position = source_.tile.x + x;
+        const int32_t first = plan.firstTap(axis, position), taps = plan.columnTaps;
+        reached_ = Reached(source_.columns, first, plan.firstTap(axis, position + width - 1) + taps - 1);
+        width_ = width;
+        // A strip of one pixel has no second one, and may end the table.
+        const int32_t second = filter_.phases > 1 && width > 1 ? position + 1 : position;
+        filter_.taps = {weights_, weights_ + taps, taps, plan.firstTap(axis, second) - first};
+        float pair[2];
+        std::copy_n(plan.weights(axis, position, pair), taps, weights_);
+        std::copy_n(plan.weights(axis, second, pair), taps, weights_ + taps);
+        for (int32_t k = 0; k < filter_.taps.all(); ++k)
+            offsets_[k] = static_cast<int32_t>(filter_.place(first + k - reached_.from));
+    }
+    void filterNext(RowSequence& sequence, Ring& ring) {
+        const int32_t row = sequence.next();
+        const kernels::LineEnds ends{reached_.columns, source_.columns.last - reached_.from + 1, reached_.left,
+                                     reached_.right};
+        kernels::dealOut(filter_, source_.at(row, reached_.from), ends, line_);
+        kernels::filterPhases(filter_, line_, asBytes(source_.at(row + 1, reached_.from)), elementBytes<T>, width_,
+                              ring.next());
+    }
+
+private:
+    int64_t lineFloats() const { return int64_t{filter_.streamFloats} * filter_.streams; }
+
+    const TileSource<T, 1>& source_;
+    kernels::PhaseFilter filter_;
+    int32_t* offsets_;
+    float *weights_, *line_;
+    Reached reached_{{0, 0}, 0, 0};
+    int32_t width_ = 0;
+};
+
+}  // namespace qori::geometry
