@@ -247,7 +247,9 @@ private:
             for (int c = 0; c < channels; ++c, ++i) place(i, first + c, second + c, w);
         }
         for (; i < padded_; ++i) place(i, first, second, 0);
-        return kernels::buildGather(tables_, padded_ / 16, rows_.bytes());
+        kernels::Gather gather = kernels::buildGather(tables_, padded_ / 16, rows_.bytes());
+        kernels::compareWeights(gather, weights_);
+        return gather;
     }
 
     TileSource<uint8_t, channels> source_;

@@ -55,18 +55,41 @@ void moveElements(const int32_t* offsets, const uint8_t* row, uint8_t* dst, ptrd
 
 /// With a = 64 (p0 - p1), the product a * -2w is 128 w (p1 - p0), below 2^29, and the rounding high multiply gives
 /// (w (p1 - p0) + 128) >> 8. -2w reaches -32768, a never does.
-QORI_INLINE __m256i interpolatePairs(Bytes pairs, const int16_t* weights) {
+QORI_INLINE __m256i interpolatePairs(Bytes pairs, __m256i weights) {
     const __m256i difference = _mm256_maddubs_epi16(pairs.v, _mm256_set1_epi16(static_cast<int16_t>(0xC040)));
     const __m256i first = _mm256_maddubs_epi16(pairs.v, _mm256_set1_epi16(0x0040));
-    return _mm256_add_epi16(first, _mm256_mulhrs_epi16(difference, load(weights).v));
+    return _mm256_add_epi16(first, _mm256_mulhrs_epi16(difference, weights));
+}
+
+template <int windows>
+QORI_INLINE void linearGroups(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out,
+                              ptrdiff_t g, ptrdiff_t end) {
+    const int32_t* base = gather.bases + 2 * windows * g;
+    const uint8_t* mask = gather.masks + 32 * windows * g;
+    for (; g < end; ++g)
+        store(out + 16 * g,
+              Vec<int16_t>{interpolatePairs(gatherGroup<windows>(row, base, mask), load(weights + 16 * g).v)});
 }
 
 template <int windows>
 QORI_NOINLINE void linearRowOf(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out) {
-    const int32_t* base = gather.bases;
-    const uint8_t* mask = gather.masks;
-    for (ptrdiff_t g = 0; g < gather.groups; ++g)
-        store(out + 16 * g, Vec<int16_t>{interpolatePairs(gatherGroup<windows>(row, base, mask), weights + 16 * g)});
+    linearGroups<windows>(gather, row, weights, out, 0, gather.groups);
+}
+
+/// Masks and weights of alike groups stay in registers.
+QORI_NOINLINE void linearRowAlike(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out) {
+    constexpr ptrdiff_t kFirst = 2;
+    linearGroups<1>(gather, row, weights, out, 0, kFirst);
+    const Bytes masks[2] = {load(gather.masks + 32 * kFirst), load(gather.masks + 32 * kFirst + 32)};
+    const __m256i factors[2] = {load(weights + 16 * kFirst).v, load(weights + 16 * kFirst + 16).v};
+    const int32_t* base = gather.bases + 2 * kFirst;
+    ptrdiff_t g = kFirst;
+    for (; g + 2 <= gather.alikeEnd; g += 2, row += gather.stride)
+        for (int i = 0; i < 2; ++i) {
+            const Bytes pairs = shuffleHalves(loadHalves(row + base[2 * i], row + base[2 * i + 1]), masks[i]);
+            store(out + 16 * (g + i), Vec<int16_t>{interpolatePairs(pairs, factors[i])});
+        }
+    linearGroups<1>(gather, row - (g - kFirst) / 2 * gather.stride, weights, out, g, gather.groups);
 }
 
 QORI_NOINLINE void linearRowByElements(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out) {
@@ -74,6 +97,25 @@ QORI_NOINLINE void linearRowByElements(const Gather& gather, const uint8_t* row,
         const int p0 = row[gather.offsets[2 * i]], p1 = row[gather.offsets[2 * i + 1]], w = -weights[i] >> 1;
         out[i] = static_cast<int16_t>((p0 << 6) + (((p1 - p0) * w + 128) >> 8));
     }
+}
+
+template <class T>
+bool isSame(const T* a, const T* b) {
+    const __m256i difference = _mm256_xor_si256(load(a).v, load(b).v);
+    return _mm256_testz_si256(difference, difference) != 0;
+}
+
+void findAlike(Gather& gather) {
+    const int32_t* bases = gather.bases;
+    if (gather.groups < 6) return;
+    gather.stride = bases[8] - bases[4];
+    const auto isAlike = [&](ptrdiff_t g) {
+        return bases[2 * g] - bases[2 * g - 4] == gather.stride &&
+               bases[2 * g + 1] - bases[2 * g - 3] == gather.stride &&
+               isSame(gather.masks + 32 * g, gather.masks + 32 * g - 64);
+    };
+    gather.alikeEnd = 4;
+    while (gather.alikeEnd < gather.groups && isAlike(gather.alikeEnd)) ++gather.alikeEnd;
 }
 
 }  // namespace
@@ -105,7 +147,14 @@ Gather buildGather(uint8_t* memory, ptrdiff_t groups, int32_t rowBytes) {
             bases[2 * (at + w) + (lane & 1)] = base;
         }
     }
+    if (windows == 1) findAlike(gather);
     return gather;
+}
+
+void compareWeights(Gather& gather, const int16_t* weights) {
+    ptrdiff_t g = 4;
+    while (g < gather.alikeEnd && isSame(weights + 16 * g, weights + 16 * g - 32)) ++g;
+    if (g < gather.alikeEnd) gather.alikeEnd = g;
 }
 
 void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst, ptrdiff_t bytes,
@@ -125,6 +174,7 @@ void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, u
 }
 
 void linearRow8u(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out) {
+    if (gather.alikeEnd > 4) return linearRowAlike(gather, row, weights, out);
     switch (gather.windows) {
         case 1: return linearRowOf<1>(gather, row, weights, out);
         case 2: return linearRowOf<2>(gather, row, weights, out);

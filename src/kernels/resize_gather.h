@@ -17,6 +17,10 @@ struct Gather {
     const int32_t* offsets = nullptr;  ///< Byte of the row for each byte of the result.
     const int32_t* bases = nullptr;    ///< Per group and window: starts of both lanes' loads.
     const uint8_t* masks = nullptr;  ///< Per group and window: 32 shuffle indices, negative for another window's bytes.
+    /// Groups from the third to before this one have the masks of the groups two before them, and bases `stride` bytes
+    /// behind theirs: at simple ratios all but those at the ends. Known for one window only.
+    ptrdiff_t alikeEnd = 0;
+    ptrdiff_t stride = 0;
 };
 
 /// Builds the tables for `groups` pairs of lanes whose 32 offsets each are already stored at the start of `memory`, for
@@ -40,6 +44,9 @@ QORI_INLINE Bytes gatherGroup(const uint8_t* row, const int32_t*& base, const ui
 /// that will be needed soon; it is asked for, not read.
 void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst, ptrdiff_t bytes,
                int elementBytes);
+
+/// Leaves alike only those groups that have the 16 weights of the group two before them, too.
+void compareWeights(Gather& gather, const int16_t* weights);
 
 /// The fixed-point horizontal pass of linear 8u. A group is 16 pairs of neighbours (p0, p1); `weights` holds -2w per
 /// pair, w in 0..16384. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.

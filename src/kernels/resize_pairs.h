@@ -10,26 +10,33 @@ namespace qori::kernels {
 /// So many vectors of two results at a time, as the registers allow.
 inline constexpr int kPairVectors = sizeof(void*) == 4 ? 2 : 4;
 
+/// A weight in every lane, from memory or from a register.
+QORI_INLINE __m256 weightOf(const float* w) { return _mm256_broadcast_ss(w); }
+QORI_INLINE __m256 weightOf(const Vec<float>* w) { return w->v; }
+
 /// Taps of two results, the second's `shift` (0 to count) behind the first's.
-struct PairedTaps {
-    const float *first, *second;  ///< Their weights.
+template <class Weight>
+struct PairedTapsOf {
+    const Weight *first, *second;  ///< Their weights.
     int32_t count, shift;
 
     /// Taps of either.
     int32_t all() const { return count + shift; }
 };
 
+using PairedTaps = PairedTapsOf<float>;
+
 namespace detail {
 
-template <int vectors>
-QORI_INLINE void beginSum(const float* p, const float* w, __m256* sum) {
-    const __m256 weight = _mm256_broadcast_ss(w);
+template <int vectors, class Weight>
+QORI_INLINE void beginSum(const float* p, const Weight* w, __m256* sum) {
+    const __m256 weight = weightOf(w);
     for (int v = 0; v < vectors; ++v) sum[v] = _mm256_mul_ps(weight, _mm256_loadu_ps(p + 8 * v));
 }
 
-template <int vectors>
-QORI_INLINE void addTap(const float* p, const float* w, __m256* sum) {
-    const __m256 weight = _mm256_broadcast_ss(w);
+template <int vectors, class Weight>
+QORI_INLINE void addTap(const float* p, const Weight* w, __m256* sum) {
+    const __m256 weight = weightOf(w);
     for (int v = 0; v < vectors; ++v) sum[v] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(p + 8 * v), sum[v]);
 }
 
@@ -44,8 +51,8 @@ QORI_INLINE void sumOne(const PairedTaps& taps, At at, __m256* sum) {
 
 /// Sums up both at once, so that a tap of both is loaded once; taps are counted from the first result's. Where Fixed
 /// tells their numbers, the compiler knows them.
-template <int vectors, class Fixed, class At>
-QORI_INLINE void sumPair(const PairedTaps& taps, Fixed, At at, __m256* first, __m256* second) {
+template <int vectors, class Fixed, class Weight, class At>
+QORI_INLINE void sumPair(const PairedTapsOf<Weight>& taps, Fixed, At at, __m256* first, __m256* second) {
     const int32_t count = Fixed::count > 0 ? Fixed::count : taps.count;
     const int32_t shift = Fixed::count > 0 ? Fixed::shift : taps.shift;
     const int32_t alone = std::min(shift + 1, count);
@@ -56,7 +63,7 @@ QORI_INLINE void sumPair(const PairedTaps& taps, Fixed, At at, __m256* first, __
 #pragma GCC unroll 8
     for (int32_t k = alone; k < count; ++k) {
         const float* const p = at(k);
-        const __m256 a = _mm256_broadcast_ss(taps.first + k), b = _mm256_broadcast_ss(taps.second + k - shift);
+        const __m256 a = weightOf(taps.first + k), b = weightOf(taps.second + k - shift);
         for (int v = 0; v < vectors; ++v) {
             __m256 both = _mm256_loadu_ps(p + 8 * v);
             loadOnce(both);

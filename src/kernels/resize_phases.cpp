@@ -90,6 +90,15 @@ QORI_INLINE void sumBlock(const PhaseFilter& filter, const float* line, float* o
 }
 
 /// Results of both phases take turns.
+template <int vectors>
+QORI_INLINE void storeTurns(const __m256 (&even)[vectors], const __m256 (&odd)[vectors], float* out) {
+    for (int v = 0; v < vectors; ++v, out += 16) {
+        const __m256 low = _mm256_unpacklo_ps(even[v], odd[v]), high = _mm256_unpackhi_ps(even[v], odd[v]);
+        _mm256_storeu_ps(out, _mm256_permute2f128_ps(low, high, 0x20));
+        _mm256_storeu_ps(out + 8, _mm256_permute2f128_ps(low, high, 0x31));
+    }
+}
+
 template <class Fixed>
 QORI_NOINLINE void filterBoth(const PhaseFilter& filter, const float* line, Later later, ptrdiff_t results,
                               float* out) {
@@ -99,11 +108,30 @@ QORI_NOINLINE void filterBoth(const PhaseFilter& filter, const float* line, Late
         __m256 even[kPairVectors], odd[kPairVectors];
         sumPair<kPairVectors>(
             taps, Fixed{}, [&](int32_t k) { return line + filter.offsets[k]; }, even, odd);
-        for (int v = 0; v < kPairVectors; ++v, out += 16) {
-            const __m256 low = _mm256_unpacklo_ps(even[v], odd[v]), high = _mm256_unpackhi_ps(even[v], odd[v]);
-            _mm256_storeu_ps(out, _mm256_permute2f128_ps(low, high, 0x20));
-            _mm256_storeu_ps(out + 8, _mm256_permute2f128_ps(low, high, 0x31));
-        }
+        storeTurns(even, odd, out + i);
+    }
+}
+
+/// The same for few taps. These begin anywhere in their streams, so that half of the loads touch two cache lines:
+/// weights stay in registers to spare the load ports.
+template <class Fixed>
+QORI_NOINLINE void filterBothOfFew(const PhaseFilter& filter, const float* line, Later later, ptrdiff_t results,
+                                   float* out) {
+    constexpr int kVectors = 2, kResults = 16 * kVectors;
+    Vec<float> first[Fixed::count], second[Fixed::count];
+    const float* places[Fixed::count + Fixed::shift];
+    for (int k = 0; k < Fixed::count; ++k) {
+        first[k] = {weightOf(filter.taps.first + k)};
+        second[k] = {weightOf(filter.taps.second + k)};
+    }
+    for (int k = 0; k < Fixed::count + Fixed::shift; ++k) places[k] = line + filter.offsets[k];
+    const PairedTapsOf<Vec<float>> taps{first, second, Fixed::count, Fixed::shift};
+    for (ptrdiff_t i = 0; i < results; i += kResults) {
+        if (i % PhaseFilter::kBlock == 0) later.prefetchNext();
+        __m256 even[kVectors], odd[kVectors];
+        sumPair<kVectors>(
+            taps, Fixed{}, [&](int32_t k) { return places[k] + i / 2; }, even, odd);
+        storeTurns(even, odd, out + i);
     }
 }
 
@@ -126,8 +154,13 @@ void filterPhases(const PhaseFilter& filter, const float* line, const uint8_t* l
                   ptrdiff_t results, float* out) {
     Later ahead{later, PhaseFilter::kBlock * elementBytes * filter.streams / filter.phases};
     if (filter.phases == 2)
-        return withFixedTaps(filter.taps,
-                             [&]<class Fixed>(Fixed) { filterBoth<Fixed>(filter, line, ahead, results, out); });
+        return withFixedTaps(filter.taps, [&]<class Fixed>(Fixed) {
+            constexpr bool few = 0 < Fixed::count && Fixed::count <= 4 && kPairVectors == 4;
+            if constexpr (few)
+                filterBothOfFew<Fixed>(filter, line, ahead, results, out);
+            else
+                filterBoth<Fixed>(filter, line, ahead, results, out);
+        });
     for (ptrdiff_t i = 0; i < results; i += PhaseFilter::kBlock) {
         ahead.prefetchNext();
         sumBlock(filter, line + i, out + i);

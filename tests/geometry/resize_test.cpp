@@ -213,10 +213,10 @@ void checkJob(Function function, const Job& job) {
 
 /// Pairs of lengths: every ratio of small ones, powers and near-powers of two, the vector sizes, reductions by a lot.
 QorImageSize drawLengths(int least, bool reducesOnly) {
-    static constexpr int kFixed[][2] = {{2, 1}, {3, 2}, {1, 2}, {4, 1}, {5, 4}, {1, 1}, {9, 1}, {2, 3}};
+    static constexpr int kFixed[][2] = {{2, 1}, {3, 2}, {1, 2}, {3, 1}, {4, 1}, {5, 4}, {1, 1}, {9, 1}, {2, 3}};
     int src, dst;
     if (random().oneIn(2)) {
-        const auto& fixed = kFixed[random().below(8)];
+        const auto& fixed = kFixed[random().below(9)];
         const int times = 1 + random().below(random().oneIn(4) ? 60 : 12);
         src = fixed[0] * times;
         dst = fixed[1] * times;
@@ -262,7 +262,12 @@ void markUsed(const Method& m) {
 /// Wide enough for rows to be done in several strips.
 Job drawWideJob(Method method) {
     const bool reduces = method.interpolation == interpSuper;
-    const int32_t src = 3000 + random().below(6000), dst = 2500 + random().below(2500);
+    int32_t src = 3000 + random().below(6000), dst = 2500 + random().below(2500);
+    if (random().oneIn(2)) {  // ratios that have ways of their own
+        const int half = 2100 + random().below(500), from = 2 + random().below(3);
+        dst = 2 * half;
+        src = from * half;
+    }
     return {method, {src, 6 + random().below(3)}, {reduces ? std::min(src, dst) : dst, 1 + random().below(6)}};
 }
 
@@ -330,7 +335,8 @@ constexpr float kThird = 1.0f / 3;
 const std::vector<Method> kCubics = {{.interpolation = interpCubic, .b = 0, .c = 0.5f},
                                      {.interpolation = interpCubic, .b = 1, .c = 0},
                                      {.interpolation = interpCubic, .b = 0.5f, .c = 0.3f},
-                                     {.interpolation = interpCubic, .b = kThird, .c = kThird}};
+                                     {.interpolation = interpCubic, .b = kThird, .c = kThird},
+                                     {.interpolation = interpCubic, .b = 4000, .c = -3000}};  // sums leave 32 bits
 const std::vector<Method> kLanczoses = {{.interpolation = interpLanczos, .lobes = 2},
                                         {.interpolation = interpLanczos, .lobes = 3}};
 
