@@ -83,11 +83,11 @@ struct Timed {
     }
 };
 
-/// Enough calls for a fifth of a millisecond, so that the clock does not matter.
+/// Enough calls for a fifth of a millisecond, so that the clock does not matter, and for caches to settle.
 Timed prepare(std::function<void()> work) {
     Timed timed{std::move(work)};
     const double once = secondsOf(timed.work, 3);
-    timed.repeats = static_cast<int>(std::clamp(2e-4 / std::max(once, 1e-9), 1.0, 1e6));
+    timed.repeats = static_cast<int>(std::clamp(2e-4 / std::max(once, 1e-9), 4.0, 1e6));
     return timed;
 }
 
@@ -136,7 +136,7 @@ void registerAll() {
                 (row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
                 [&row, size](benchmark::State& state) { run(state, row, size); })
                 ->UseManualTime()
-                ->Iterations(size.pixels() > 20'000'000 ? 7 : 41)
+                ->Iterations(size.pixels() > 20'000'000 ? 5 : size.pixels() > 500'000 ? 15 : 41)
                 ->Unit(benchmark::kMicrosecond);
 }
 
