@@ -136,7 +136,9 @@ void registerAll() {
                 (row.operation + "/" + std::to_string(size.width) + "x" + std::to_string(size.height)).c_str(),
                 [&row, size](benchmark::State& state) { run(state, row, size); })
                 ->UseManualTime()
-                ->Iterations(size.pixels() > 20'000'000 ? 5 : size.pixels() > 500'000 ? 15 : 41)
+                ->Iterations(size.pixels() > 20'000'000 ? 5
+                             : size.pixels() > 500'000  ? 15
+                                                        : 41)
                 ->Unit(benchmark::kMicrosecond);
 }
 

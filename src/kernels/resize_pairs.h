@@ -57,10 +57,10 @@ QORI_INLINE void sumPair(const PairedTapsOf<Weight>& taps, Fixed, At at, __m256*
     const int32_t shift = Fixed::count > 0 ? Fixed::shift : taps.shift;
     const int32_t alone = std::min(shift + 1, count);
     detail::beginSum<vectors>(at(0), taps.first, first);
-#pragma GCC unroll 8
+#pragma GCC unroll 16
     for (int32_t k = 1; k < alone; ++k) detail::addTap<vectors>(at(k), taps.first + k, first);
     detail::beginSum<vectors>(at(shift), taps.second, second);
-#pragma GCC unroll 8
+#pragma GCC unroll 16
     for (int32_t k = alone; k < count; ++k) {
         const float* const p = at(k);
         const __m256 a = weightOf(taps.first + k), b = weightOf(taps.second + k - shift);
@@ -71,7 +71,7 @@ QORI_INLINE void sumPair(const PairedTapsOf<Weight>& taps, Fixed, At at, __m256*
             second[v] = _mm256_fmadd_ps(b, both, second[v]);
         }
     }
-#pragma GCC unroll 8
+#pragma GCC unroll 16
     for (int32_t k = std::max(count, shift + 1); k < count + shift; ++k)
         detail::addTap<vectors>(at(k), taps.second + k - shift, second);
 }
@@ -98,6 +98,7 @@ QORI_INLINE void withFixedTaps(const PairedTaps& taps, Use use) {
         case 2: return shifted.template operator()<2>();
         case 4: return shifted.template operator()<4>();
         case 6: return shifted.template operator()<6>();
+        case 10: return shifted.template operator()<10>();
         default: return use(AnyTaps{});
     }
 }
