@@ -34,18 +34,18 @@ constexpr auto join(typename Lanes::Total a, typename Lanes::Total b) {
         return static_cast<typename Lanes::Total>(a + b);
 }
 
-/// Brings the values of one channel together pairwise, which keeps float rounding to the depth of the tree.
+/// Brings the values of each channel together, which alternate: halves onto each other as long as they begin with the
+/// same channel, which compilers turn into vectors and which keeps float rounding to the depth of a tree.
 template <class Lanes, int count>
-typename Lanes::Total joinChannel(const typename Lanes::Total* values, int channels, int channel) {
-    typename Lanes::Total own[count];
-    own[0] = values[channel];
-    int n = 1;
-    for (int i = channel + channels; i < count; i += channels) own[n++] = values[i];
-    for (; n > 1; n = (n + 1) / 2) {
-        for (int i = 0; i < n / 2; ++i) own[i] = join<Lanes>(own[2 * i], own[2 * i + 1]);
-        if (n % 2 != 0) own[n / 2] = own[n - 1];
+void joinChannels(typename Lanes::Total* values, int channels, typename Lanes::Total* totals) {
+    int n = count;
+    for (; n % (2 * channels) == 0; n /= 2)
+        for (int i = 0; i < n / 2; ++i) values[i] = join<Lanes>(values[i], values[n / 2 + i]);
+    for (int c = 0; c < channels; ++c) {
+        typename Lanes::Total own = values[c];
+        for (int i = c + channels; i < n; i += channels) own = join<Lanes>(own, values[i]);
+        totals[c] = join<Lanes>(totals[c], own);
     }
-    return own[0];
 }
 
 template <class Lanes>
@@ -91,8 +91,7 @@ struct Accumulators {
         constexpr int perVector = L::count;
         Total values[vectors * perVector];
         for (int v = 0; v < vectors; ++v) lanes[v].values(values + v * perVector);
-        for (int c = 0; c < channels; ++c)
-            totals[c] = detail::join<L>(totals[c], detail::joinChannel<L, vectors * perVector>(values, channels, c));
+        detail::joinChannels<L, vectors * perVector>(values, channels, totals);
         for (L& lane : lanes) lane = L{};
         left = L::limit;
     }

@@ -103,17 +103,24 @@ struct ExtremumLanes {
 
     Vec<T> best[vectors] = {filled(Order::start), filled(Order::start), filled(Order::start)};
 
-    T ofChannel(int channels, int channel) const {
+    /// The best of each channel.
+    QORI_INLINE void ofChannels(int channels, T* out) const {
         constexpr int n = Vec<T>::lanes;
-        // Whole pixels of 1 and of 4 channels fill a vector, so that the three are alike.
-        const bool alike = channels != 3;
+        const auto join = [](T a, T b) { return Order::better(b, a) ? b : a; };
         T values[vectors * n];
-        if (alike) store(values, Order::join(Order::join(best[0], best[1]), best[2]));
-        for (int v = 0; v < vectors && !alike; ++v) store(values + v * n, best[v]);
-        T result = values[channel];
-        for (int i = channel + channels; i < (alike ? n : vectors * n); i += channels)
-            if (Order::better(values[i], result)) result = values[i];
-        return result;
+        int count = n;
+        if (channels != 3) {  // Whole pixels of 1 and of 4 channels fill a vector, so that the three are alike.
+            store(values, Order::join(Order::join(best[0], best[1]), best[2]));
+        } else {
+            count = vectors * n;
+            for (int v = 0; v < vectors; ++v) store(values + v * n, best[v]);
+        }
+        for (; count % (2 * channels) == 0; count /= 2)
+            for (int i = 0; i < count / 2; ++i) values[i] = join(values[i], values[count / 2 + i]);
+        for (int c = 0; c < channels; ++c) {
+            out[c] = values[c];
+            for (int i = c + channels; i < count; i += channels) out[c] = join(out[c], values[i]);
+        }
     }
 };
 

@@ -29,18 +29,22 @@ template <class Order, class T>
 QORI_NOINLINE void extremum(QorImageSize roi, int stored, int results, Image<const T> src, T* out) {
     ExtremumLanes<Order> lanes;
     joinRegion(roi, stored, src, lanes);
+    T best[4];
+    lanes.ofChannels(stored, best);
     bool unsure = false;
     for (int c = 0; c < results; ++c) {
-        out[c] = lanes.ofChannel(stored, c);
-        unsure |= out[c] == Order::start;
+        out[c] = best[c];
+        unsure |= best[c] == Order::start;
     }
     if constexpr (std::is_floating_point_v<T>) {
         using Opposite = std::conditional_t<std::is_same_v<Order, Smallest<T>>, Biggest<T>, Smallest<T>>;
         if (!unsure) return;
         ExtremumLanes<Opposite> opposite;
         joinRegion(roi, stored, src, opposite);
+        T worst[4];
+        opposite.ofChannels(stored, worst);
         for (int c = 0; c < results; ++c)
-            if (out[c] == Order::start && opposite.ofChannel(stored, c) == Opposite::start) out[c] = kNan<T>;
+            if (best[c] == Order::start && worst[c] == Opposite::start) out[c] = kNan<T>;
     }
 }
 
@@ -69,10 +73,12 @@ QORI_NOINLINE void bothExtrema(QorImageSize roi, int stored, int results, Image<
     ExtremumLanes<Smallest<T>> smallest;
     ExtremumLanes<Biggest<T>> biggest;
     joinRegion(roi, stored, src, smallest, biggest);
+    T low[4], high[4];
+    smallest.ofChannels(stored, low);
+    biggest.ofChannels(stored, high);
     for (int c = 0; c < results; ++c) {
-        pMin[c] = smallest.ofChannel(stored, c);
-        pMax[c] = biggest.ofChannel(stored, c);
-        if (noNumber(pMin[c], pMax[c])) pMin[c] = pMax[c] = kNan<T>;
+        pMin[c] = noNumber(low[c], high[c]) ? kNan<T> : low[c];
+        pMax[c] = noNumber(low[c], high[c]) ? kNan<T> : high[c];
     }
 }
 
@@ -92,12 +98,13 @@ struct Piece {
     QorImageSize size;
 };
 
-constexpr int32_t kPieceElements = 12'288;
+template <class T>
+constexpr int32_t kPieceElements = 24'576 / static_cast<int32_t>(sizeof(T));
 
 /// Calls use(piece) for each piece, from the top and from the left, until it returns false.
-template <class Use>
+template <class T, class Use>
 void forEachPiece(QorImageSize roi, int channels, Use use) {
-    const int32_t pixels = kPieceElements / channels, width = std::min(roi.width, pixels), height = pixels / width;
+    const int32_t pixels = kPieceElements<T> / channels, width = std::min(roi.width, pixels), height = pixels / width;
     for (int32_t y = 0; y < roi.height;) {
         const int32_t rows = std::min(height, roi.height - y);
         for (int32_t x = 0; x < roi.width;) {
@@ -125,10 +132,11 @@ struct Best {
 /// Keeps the first piece that holds each channel's extremum; false when no later piece can change any.
 template <class Order, class T>
 bool keepBetter(const ExtremumLanes<Order>& lanes, int stored, int results, const Piece& piece, Best<Order>* best) {
+    T values[4];
+    lanes.ofChannels(stored, values);
     bool open = false;
     for (int c = 0; c < results; ++c) {
-        const T value = lanes.ofChannel(stored, c);
-        if (Order::better(value, best[c].value)) best[c] = {value, piece, true};
+        if (Order::better(values[c], best[c].value)) best[c] = {values[c], piece, true};
         open |= best[c].value != Order::limit;
     }
     return open;
@@ -141,7 +149,7 @@ void scanPieces(QorImageSize roi, int stored, int results, Image<const T> src, B
     T values[4] = {Order::start, Order::start, Order::start, results < stored ? Order::limit : Order::start};
     kernels::ChannelVectors<T> bestSoFar;
     bool changed = true;
-    forEachPiece(roi, stored, [&](const Piece& piece) {
+    forEachPiece<T>(roi, stored, [&](const Piece& piece) {
         joinRegion(piece.size, stored, imageOf(src, stored, piece), lanes);
         if (piece.x > 0 || piece.y > 0) {
             if (changed) bestSoFar = kernels::channelVectors(values, stored);
