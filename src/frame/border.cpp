@@ -11,11 +11,26 @@ namespace {
 
 constexpr int32_t kKindMask = 15, kSides = 0xF0;
 
+/// n copies of a pixel of so many bytes.
+template <int bytes>
+void repeatPixel(uint8_t* to, const uint8_t* pixel, ptrdiff_t n) {
+    uint8_t value[bytes];  // `to` may lie in front of it
+    __builtin_memcpy(value, pixel, bytes);
+    for (; n > 0; --n, to += bytes) __builtin_memcpy(to, value, bytes);
+}
+
 /// n copies of a pixel of up to 32 bytes.
 void repeat(uint8_t* to, const uint8_t* pixel, int32_t pixelBytes, ptrdiff_t n) {
-    if (pixelBytes == 1) {
-        for (ptrdiff_t i = 0; i < n; ++i) to[i] = *pixel;
-        return;
+    switch (pixelBytes) {
+        case 1: return repeatPixel<1>(to, pixel, n);
+        case 2: return repeatPixel<2>(to, pixel, n);
+        case 3: return repeatPixel<3>(to, pixel, n);
+        case 4: return repeatPixel<4>(to, pixel, n);
+        case 6: return repeatPixel<6>(to, pixel, n);
+        case 8: return repeatPixel<8>(to, pixel, n);
+        case 12: return repeatPixel<12>(to, pixel, n);
+        case 16: return repeatPixel<16>(to, pixel, n);
+        default: break;
     }
     const Bytes value = loadUpTo(pixel, pixelBytes);
     for (ptrdiff_t i = 0; i < n; ++i) storeUpTo(to + i * pixelBytes, value, pixelBytes);

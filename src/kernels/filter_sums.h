@@ -51,6 +51,27 @@ QORI_INLINE void forEach(const Body& body) {
 }
 #define QORI_LAMBDA __attribute__((always_inline))
 
+/// Whether a tap may be added vector by vector.
+template <class Taps, class Load>
+constexpr bool takesVectors = requires(const Load& load, const typename Taps::Source* p) {
+    load.vector(p);
+};
+
+/// One tap: the coefficients of all rows, then one vector after the other. Sums, coefficients and a vector are as many
+/// as the registers; a vector that is kept waiting would be loaded again for every row.
+template <class Taps, int first, int last, int rows, int wide, class Load>
+QORI_INLINE void addVectors(typename Taps::Partial (&sums)[rows][wide], const typename Taps::Source* p,
+                            const typename Taps::Coefficient* c, ptrdiff_t row, const Load& load) {
+    constexpr int lanes = Taps::Sum::lanes;
+    decltype(Taps::broadcast(c)) k[last - first + 1];
+    forEach<first, last>([&](auto r) QORI_LAMBDA { k[r - first] = Taps::broadcast(c - (r - first) * row); });
+    forEach<0, 2 * wide - 1>([&](auto i) QORI_LAMBDA {
+        auto v = load.vector(p + i * lanes);
+        loadOnce(v.v);
+        forEach<first, last>([&](auto r) QORI_LAMBDA { Taps::add(sums[r][i / 2].v[i % 2], v, k[r - first]); });
+    });
+}
+
 /// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the
 /// first of them sees, and each further one sees the row before. `count` taps, or as many as the kernel has where it is
 /// 0.
@@ -61,12 +82,16 @@ QORI_INLINE void addSourceRow(const PackedKernel<Taps>& kernel, typename Taps::P
     const int taps = count > 0 ? count : kernel.taps();
     const ptrdiff_t row = ptrdiff_t{taps} * Taps::repeats;
     const auto addTap = [&](bool isLast) QORI_LAMBDA {
-        typename Taps::Partial v[wide];
-        forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { load(p + w * Taps::block, isLast, v[w]); });
-        forEach<first, last>([&](auto r) QORI_LAMBDA {
-            const auto k = Taps::broadcast(c - (r - first) * row);
-            forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { Taps::add(sums[r][w], v[w], k); });
-        });
+        if constexpr (takesVectors<Taps, Load>) {
+            addVectors<Taps, first, last>(sums, p, c, row, load);
+        } else {
+            typename Taps::Partial v[wide];
+            forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { load(p + w * Taps::block, isLast, v[w]); });
+            forEach<first, last>([&](auto r) QORI_LAMBDA {
+                const auto k = Taps::broadcast(c - (r - first) * row);
+                forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { Taps::add(sums[r][w], v[w], k); });
+            });
+        }
         p += Taps::pixels * pixel;
         c += Taps::repeats;
     };
@@ -122,9 +147,7 @@ struct SumRows {
 template <class Taps, int rows, int wide, int count>
 QORI_NOINLINE void sumBlocks(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
                              ptrdiff_t pixel, ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
-    const typename Taps::Free free(pixel);
-    const auto load = [&](const typename Taps::Source* at, bool, typename Taps::Partial& v)
-                          QORI_LAMBDA { free(at, v); };
+    const typename Taps::Free load(pixel);
     for (ptrdiff_t b = 0; b + wide <= blocks; b += wide, p += wide * Taps::block) {
         typename Taps::Partial sums[rows][wide];
         sumBlock<Taps, count, rows, wide>(kernel, p, step, pixel, load, sums);

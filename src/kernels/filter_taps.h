@@ -89,7 +89,7 @@ struct PairTaps : TwoVectors<int32_t> {
             }
             index = load(at);
         }
-        QORI_INLINE void operator()(const S* p, Partial& out) const {
+        QORI_INLINE void operator()(const S* p, bool, Partial& out) const {
             if constexpr (sizeof(S) == 1) {
                 out.v[0] = {shuffleHalves(loadTwice(p), index).v};
                 out.v[1] = {shuffleHalves(loadTwice(p + 4), index).v};
@@ -133,7 +133,7 @@ struct ByteTaps {
             for (int i = 0; i < 32; ++i) at[i] = static_cast<uint8_t>(i % 16 / 2 + (i % 2) * static_cast<int>(next));
             index = load(at);
         }
-        QORI_INLINE void operator()(const uint8_t* p, Partial& out) const {
+        QORI_INLINE void operator()(const uint8_t* p, bool, Partial& out) const {
             out.v = shuffleHalves(loadHalves(p, p + 8), index).v;
         }
         Bytes index;
@@ -173,7 +173,7 @@ struct FloatTaps : TwoVectors<float> {
 
     struct Free {
         explicit Free(ptrdiff_t) {}
-        QORI_INLINE void operator()(const S* p, Partial& out) const { loadExactly(p, nullptr, block, out); }
+        QORI_INLINE Sum vector(const S* p) const { return loadWhole(p); }
     };
     static QORI_INLINE Sum convert(__m128i elements) {
         if constexpr (sizeof(S) == 1)
@@ -183,6 +183,14 @@ struct FloatTaps : TwoVectors<float> {
             return {_mm256_cvtepi32_ps(std::is_signed_v<S> ? _mm256_cvtepi16_epi32(elements)
                                                            : _mm256_cvtepu16_epi32(elements))};
     }
+    static QORI_INLINE Sum loadWhole(const S* p) {
+        if constexpr (std::is_same_v<S, float>)
+            return load(p);
+        else if constexpr (sizeof(S) == 1)
+            return convert(_mm_loadl_epi64(reinterpret_cast<const __m128i*>(p)));
+        else
+            return convert(_mm_loadu_si128(reinterpret_cast<const __m128i*>(p)));
+    }
     static QORI_INLINE void loadExactly(const S* p, const S*, ptrdiff_t n, Partial& out) {
         for (int k = 0; k < 2; ++k) {
             const S* const at = p + 8 * k;
@@ -190,15 +198,14 @@ struct FloatTaps : TwoVectors<float> {
                 out.v[k] = loadUpTo(at, n - 8 * k);
             else if (n < block)
                 out.v[k] = convert(_mm256_castsi256_si128(loadUpTo(at, std::min<ptrdiff_t>(n - 8 * k, 8)).v));
-            else if constexpr (sizeof(S) == 1)
-                out.v[k] = convert(_mm_loadl_epi64(reinterpret_cast<const __m128i*>(at)));
             else
-                out.v[k] = convert(_mm_loadu_si128(reinterpret_cast<const __m128i*>(at)));
+                out.v[k] = loadWhole(at);
         }
     }
     static QORI_INLINE __m256 broadcast(const Coefficient* c) { return _mm256_broadcast_ss(c); }
+    static QORI_INLINE void add(Sum& sum, Sum in, __m256 c) { sum.v = _mm256_fmadd_ps(in.v, c, sum.v); }
     static QORI_INLINE void add(Partial& sums, const Partial& in, __m256 c) {
-        for (int k = 0; k < 2; ++k) sums.v[k].v = _mm256_fmadd_ps(in.v[k].v, c, sums.v[k].v);
+        for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
     }
 };
 
@@ -217,7 +224,7 @@ struct DoubleTaps : TwoVectors<double> {
 
     struct Free {
         explicit Free(ptrdiff_t) {}
-        QORI_INLINE void operator()(const S* p, Partial& out) const { loadExactly(p, nullptr, block, out); }
+        QORI_INLINE void operator()(const S* p, bool, Partial& out) const { loadExactly(p, nullptr, block, out); }
     };
     static QORI_INLINE void loadExactly(const S* p, const S*, ptrdiff_t n, Partial& out) {
         if constexpr (sizeof(S) == 8) {
