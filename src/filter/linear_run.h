@@ -12,6 +12,7 @@ namespace qori::filter {
 using kernels::ByteTaps;
 using kernels::DoubleTaps;
 using kernels::FloatTaps;
+using kernels::NeighbourTaps;
 using kernels::PackedKernel;
 using kernels::PairTaps;
 
@@ -78,6 +79,9 @@ void divideSums(const PackedKernel<Taps>& kernel, Division division, Target<S, D
 
 template <class S, class D>
 void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Division division, Target<S, D>& target) {
+    if constexpr (sizeof(S) == 2)
+        if (target.channels == 1)
+            return divideSums(PackedKernel<NeighbourTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
     divideSums(PackedKernel<PairTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
 }
 

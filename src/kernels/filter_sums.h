@@ -54,7 +54,7 @@ QORI_INLINE void forEach(const Body& body) {
 /// Whether a tap may be added vector by vector.
 template <class Taps, class Load>
 constexpr bool takesVectors = requires(const Load& load, const typename Taps::Source* p) {
-    load.vector(p);
+    load.vector(p, 0);
 };
 
 /// One tap: the coefficients of all rows, then one vector after the other. Sums, coefficients and a vector are as many
@@ -62,11 +62,10 @@ constexpr bool takesVectors = requires(const Load& load, const typename Taps::So
 template <class Taps, int first, int last, int rows, int wide, class Load>
 QORI_INLINE void addVectors(typename Taps::Partial (&sums)[rows][wide], const typename Taps::Source* p,
                             const typename Taps::Coefficient* c, ptrdiff_t row, const Load& load) {
-    constexpr int lanes = Taps::Sum::lanes;
     decltype(Taps::broadcast(c)) k[last - first + 1];
     forEach<first, last>([&](auto r) QORI_LAMBDA { k[r - first] = Taps::broadcast(c - (r - first) * row); });
     forEach<0, 2 * wide - 1>([&](auto i) QORI_LAMBDA {
-        auto v = load.vector(p + i * lanes);
+        auto v = load.vector(p, i);
         loadOnce(v.v);
         forEach<first, last>([&](auto r) QORI_LAMBDA { Taps::add(sums[r][i / 2].v[i % 2], v, k[r - first]); });
     });

@@ -89,13 +89,11 @@ struct PairTaps : TwoVectors<int32_t> {
             }
             index = load(at);
         }
-        QORI_INLINE void operator()(const S* p, bool, Partial& out) const {
-            if constexpr (sizeof(S) == 1) {
-                out.v[0] = {shuffleHalves(loadTwice(p), index).v};
-                out.v[1] = {shuffleHalves(loadTwice(p + 4), index).v};
-            } else {
-                pairUp(wide(p, block), wide(p + next, block), out);
-            }
+        QORI_INLINE Sum vector(const S* p, int i) const requires(sizeof(S) == 1) {
+            return {shuffleHalves(loadTwice(p + i / 2 * block + i % 2 * 4), index).v};
+        }
+        QORI_INLINE void operator()(const S* p, bool, Partial& out) const requires(sizeof(S) == 2) {
+            pairUp(wide(p, block), wide(p + next, block), out);
         }
         ptrdiff_t next;
         Bytes index;
@@ -104,11 +102,38 @@ struct PairTaps : TwoVectors<int32_t> {
         pairUp(wide(p, n), second != nullptr ? wide(second, n) : _mm256_setzero_si256(), out);
     }
     static QORI_INLINE __m256i broadcast(const Coefficient* c) { return _mm256_set1_epi32(*c); }
+    static QORI_INLINE void add(Sum& sum, Sum in, __m256i c) {
+        sum.v = _mm256_add_epi32(sum.v, _mm256_madd_epi16(in.v, c));
+        keepOrder(sum.v);
+    }
     static QORI_INLINE void add(Partial& sums, const Partial& in, __m256i c) {
-        for (int k = 0; k < 2; ++k) {
-            sums.v[k].v = _mm256_add_epi32(sums.v[k].v, _mm256_madd_epi16(in.v[k].v, c));
-            keepOrder(sums.v[k].v);
+        for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
+    }
+};
+
+/// Pairs of one channel of 16 bits: pixels that are multiplied together are neighbours in memory, and nothing has to be
+/// brought together. A block's vectors are its even and its odd elements.
+template <class S>
+requires(sizeof(S) == 2) struct NeighbourTaps : PairTaps<S> {
+    using typename PairTaps<S>::Sum;
+    using typename PairTaps<S>::Partial;
+    static constexpr int block = PairTaps<S>::block;
+
+    struct Free {
+        explicit Free(ptrdiff_t) {}
+        QORI_INLINE Sum vector(const S* p, int i) const {
+            return {PairTaps<S>::wide(p + i / 2 * block + i % 2, block)};
         }
+    };
+    static QORI_INLINE void loadExactly(const S* p, const S* second, ptrdiff_t n, Partial& out) {
+        const ptrdiff_t pixels = second != nullptr ? n + 1 : n;
+        out.v[0] = {PairTaps<S>::wide(p, pixels)};
+        out.v[1] = {pixels > 1 ? PairTaps<S>::wide(p + 1, pixels - 1) : _mm256_setzero_si256()};
+    }
+    /// In the order of PairTaps.
+    static QORI_INLINE void end(const Partial& sums, Sum (&out)[2]) {
+        out[0] = {_mm256_unpacklo_epi32(sums.v[0].v, sums.v[1].v)};
+        out[1] = {_mm256_unpackhi_epi32(sums.v[0].v, sums.v[1].v)};
     }
 };
 
@@ -173,7 +198,7 @@ struct FloatTaps : TwoVectors<float> {
 
     struct Free {
         explicit Free(ptrdiff_t) {}
-        QORI_INLINE Sum vector(const S* p) const { return loadWhole(p); }
+        QORI_INLINE Sum vector(const S* p, int i) const { return loadWhole(p + 8 * i); }
     };
     static QORI_INLINE Sum convert(__m128i elements) {
         if constexpr (sizeof(S) == 1)
