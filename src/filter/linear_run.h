@@ -31,8 +31,9 @@ struct Target {
 
 /// Elements of a block in pixels that begin and end with it.
 constexpr PartHints partHints(int channels, int elementBytes) {
-    constexpr int kBlock = 16, kOverread = 8;
-    return {channels == 4 ? kBlock / 4 : kBlock, kOverread * elementBytes};
+    constexpr int kOverread = 8;
+    const int block = elementBytes == 1 ? ByteTaps::block : FloatTaps<float>::block;
+    return {channels == 4 ? block / 4 : block, kOverread * elementBytes};
 }
 
 template <class S, class D>
@@ -64,17 +65,22 @@ struct Division {
     int64_t sumLimit;  ///< No sum's magnitude is larger. From 2^31 on sums are taken modulo 2^32.
 };
 
-/// By the cheapest rule that is exact for all sums.
-template <class Taps, class S, class D>
-void divideSums(const PackedKernel<Taps>& kernel, Division division, Target<S, D>& target) {
+/// Calls use with the cheapest rule that is exact for all sums of 32 bits.
+template <class D, class Use>
+void withDivision(Division division, Use use) {
     using Single = kernels::QuotientInSingle<D>;
     const auto [divisor, mode, sumLimit] = division;
     const Single single(divisor, mode);
-    if (divisor == 1) return filterBy(kernel, kernels::Saturated<D>{}, target);
-    if (sumLimit < Single::kSumLimit && single.isExact()) return filterBy(kernel, single, target);
+    if (divisor == 1) return use(kernels::Saturated<D>{});
+    if (sumLimit < Single::kSumLimit && single.isExact()) return use(single);
     if (divisor > 1 && single.isPowerOfTwo())
-        return filterBy(kernel, kernels::Shifted<D>{std::countr_zero(single.magnitude()), mode}, target);
-    filterBy(kernel, kernels::QuotientInDouble<D>{divisor, mode}, target);
+        return use(kernels::Shifted<D>{std::countr_zero(single.magnitude()), mode});
+    use(kernels::QuotientInDouble<D>{divisor, mode});
+}
+
+template <class Taps, class S, class D>
+void divideSums(const PackedKernel<Taps>& kernel, Division division, Target<S, D>& target) {
+    withDivision<D>(division, [&](const auto& rule) { filterBy(kernel, rule, target); });
 }
 
 template <class S, class D>
@@ -85,9 +91,14 @@ void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Divisi
     divideSums(PackedKernel<PairTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
 }
 
-template <class D>
-void filterBytes(const int32_t* packed, QorImageSize size, Division division, Target<uint8_t, D>& target) {
-    divideSums(PackedKernel<ByteTaps>{packed, size, {_mm256_setzero_si256()}}, division, target);
+inline void filterBytes(const int32_t* packed, QorImageSize size, Division division,
+                        Target<uint8_t, uint8_t>& target) {
+    const PackedKernel<ByteTaps> kernel{packed, size, {_mm256_setzero_si256()}};
+    const kernels::QuotientInWords words{division.divisor, division.mode};
+    if (words.isExact()) return filterBy(kernel, words, target);
+    withDivision<uint8_t>(division, [&]<class Rule>(const Rule& rule) {
+        filterBy(kernel, kernels::Widened<Rule>{rule}, target);
+    });
 }
 
 /// -0 begins a sum that may be a single product: +0 would turn a product of -0.

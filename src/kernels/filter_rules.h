@@ -14,7 +14,7 @@
 #pragma once
 #include <bit>
 
-#include "pack_convert.h"
+#include "filter_taps.h"
 
 namespace qori::kernels {
 
@@ -186,6 +186,67 @@ struct QuotientInDouble {
                     whole[k] = _mm256_set_m128i(quotient(_mm256_extracti128_si256(sums[k].v, 1)),
                                                 quotient(_mm256_castsi256_si128(sums[k].v)));
                 return detail::packPairs<D>(whole[0], whole[1]);
+            });
+        });
+    }
+};
+
+/// Sums of 16 bits to bytes by a small divisor, in 16 bits. Below 0 everything saturates; above, with t = S for
+/// truncation and S + floor(d / 2) for rounding, t < 2^15, the quotient is floor(t / d) = t * m >> (16 + s), where
+/// 2^s < d <= 2^(s + 1) and m is the first integer above 2^(16 + s) / d: m * d exceeds 2^(16 + s) by 2^(s + 1) at most
+/// (Granlund and Montgomery, Division by invariant integers using multiplication, 1994). Where d is even and divides t,
+/// S lies in the middle.
+struct QuotientInWords {
+    using Element = uint8_t;
+    static constexpr bool isCopy = false;
+    static constexpr int64_t kSumLimit = ByteTaps::kSumLimit;
+    static constexpr int32_t kMost = 2 * (INT16_MAX - static_cast<int32_t>(kSumLimit));
+    int32_t divisor, mode;
+
+    bool isExact() const { return divisor > 1 && divisor <= kMost; }
+
+    template <class Use>
+    QORI_INLINE void withRule(Use use) const {
+        const int shift = std::bit_width(static_cast<uint32_t>(divisor - 1)) - 1;
+        const auto factor = static_cast<int16_t>((uint32_t{1} << (16 + shift)) / static_cast<uint32_t>(divisor) + 1);
+        const __m256i m = _mm256_set1_epi16(factor), d = _mm256_set1_epi16(static_cast<int16_t>(divisor));
+        const __m256i half = _mm256_set1_epi16(static_cast<int16_t>(mode == roundTowardZero ? 0 : divisor / 2));
+        const __m128i count = _mm_cvtsi32_si128(shift);
+        const auto quotient = [=](Vec<int16_t> s, bool toEven) {
+            const __m256i t = _mm256_add_epi16(_mm256_max_epi16(s.v, _mm256_setzero_si256()), half);
+            const __m256i q = _mm256_srl_epi16(_mm256_mulhi_epu16(t, m), count);
+            if (!toEven) return q;
+            const __m256i middle = _mm256_cmpeq_epi16(_mm256_mullo_epi16(q, d), t);
+            return _mm256_sub_epi16(q, _mm256_and_si256(_mm256_and_si256(q, middle), _mm256_set1_epi16(1)));
+        };
+        const auto packed = [=](const Vec<int16_t>(&s)[2], bool toEven) -> Elements<uint8_t, 32> {
+            return {{{_mm256_permute4x64_epi64(_mm256_packus_epi16(quotient(s[0], toEven), quotient(s[1], toEven)),
+                                               0xD8)}}};
+        };
+        if (mode == roundNearestEven && divisor % 2 == 0)
+            use([=](const Vec<int16_t>(&s)[2]) { return packed(s, true); });
+        else
+            use([=](const Vec<int16_t>(&s)[2]) { return packed(s, false); });
+    }
+};
+
+/// Sums of 16 bits to bytes by a rule for 32 bits.
+template <class Rule>
+struct Widened {
+    using Element = uint8_t;
+    static constexpr bool isCopy = false;
+    Rule rule;
+
+    template <class Use>
+    QORI_INLINE void withRule(Use use) const {
+        rule.withRule([&](auto convert) {
+            const auto half = [=](__m256i v) {
+                const __m256i sign = _mm256_srai_epi16(v, 15);
+                const Vec<int32_t> wide[2] = {{_mm256_unpacklo_epi16(v, sign)}, {_mm256_unpackhi_epi16(v, sign)}};
+                return _mm256_castsi256_si128(convert(wide).v[0].v);
+            };
+            use([=](const Vec<int16_t>(&s)[2]) -> Elements<uint8_t, 32> {
+                return {{{_mm256_set_m128i(half(s[1].v), half(s[0].v))}}};
             });
         });
     }

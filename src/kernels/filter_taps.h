@@ -139,46 +139,42 @@ requires(sizeof(S) == 2) struct NeighbourTaps : PairTaps<S> {
 
 /// Bytes by coefficients of 8 bits whose sums stay below 2^15, the sum of the positive and that of the negative
 /// coefficients too: every pair of products and every partial sum fits 16 bits. Starts at 0.
-struct ByteTaps {
+struct ByteTaps : TwoVectors<int16_t> {
     using Source = uint8_t;
     using Coefficient = int32_t;  ///< A pair of bytes, the first pixel's first, twice.
-    using Sum = Vec<int32_t>;
-    struct Partial {
-        __m256i v;
-    };
-    static constexpr int block = 16, pixels = 2, repeats = 1, overread = 8;
-    static constexpr int bandRows = kFewRegisters ? 2 : 4, bandBlocks = kFewRegisters ? 1 : 2;
+    using Sum = Vec<int16_t>;
+    using Partial = TwoVectors<int16_t>;
+    static constexpr int block = 32, pixels = 2, repeats = 1, overread = 8;
+    static constexpr int bandRows = kFewRegisters ? 2 : 4, bandBlocks = 1;
     static constexpr bool unrolls = true;
     static constexpr int64_t kSumLimit = int64_t{127} * 255;  ///< Also keeps each coefficient within 8 bits.
 
-    /// Pairs of the elements 0-7 from one half, of 8-15 from the other.
+    /// Pairs of eight elements from one half, of the next eight from the other.
     struct Free {
         explicit Free(ptrdiff_t next) {
             alignas(32) uint8_t at[32];
             for (int i = 0; i < 32; ++i) at[i] = static_cast<uint8_t>(i % 16 / 2 + (i % 2) * static_cast<int>(next));
             index = load(at);
         }
-        QORI_INLINE void operator()(const uint8_t* p, bool, Partial& out) const {
-            out.v = shuffleHalves(loadHalves(p, p + 8), index).v;
+        QORI_INLINE Sum vector(const uint8_t* p, int i) const {
+            return {shuffleHalves(loadHalves(p + 16 * i, p + 16 * i + 8), index).v};
         }
         Bytes index;
     };
     static QORI_INLINE void loadExactly(const uint8_t* p, const uint8_t* second, ptrdiff_t n, Partial& out) {
-        const __m256i none = _mm256_setzero_si256();
-        const __m256i high = second != nullptr ? PairTaps<uint8_t>::wide(second, n) : none;
-        out.v = _mm256_or_si256(PairTaps<uint8_t>::wide(p, n), _mm256_slli_epi16(high, 8));
+        for (int k = 0; k < 2; ++k, n -= 16) {
+            const __m256i none = _mm256_setzero_si256(), low = n > 0 ? PairTaps<uint8_t>::wide(p + 16 * k, n) : none;
+            const __m256i high = n > 0 && second != nullptr ? PairTaps<uint8_t>::wide(second + 16 * k, n) : none;
+            out.v[k] = {_mm256_or_si256(low, _mm256_slli_epi16(high, 8))};
+        }
     }
-    static QORI_INLINE void begin(Partial& sums, Sum) { sums.v = _mm256_setzero_si256(); }
     static QORI_INLINE __m256i broadcast(const Coefficient* c) { return _mm256_set1_epi32(*c); }
-    static QORI_INLINE void add(Partial& sums, const Partial& in, __m256i c) {
-        sums.v = _mm256_add_epi16(sums.v, _mm256_maddubs_epi16(in.v, c));
-        keepOrder(sums.v);
+    static QORI_INLINE void add(Sum& sum, Sum in, __m256i c) {
+        sum.v = _mm256_add_epi16(sum.v, _mm256_maddubs_epi16(in.v, c));
+        keepOrder(sum.v);
     }
-    /// In the order of PairTaps.
-    static QORI_INLINE void end(const Partial& sums, Sum (&out)[2]) {
-        const __m256i sign = _mm256_srai_epi16(sums.v, 15);
-        out[0] = {_mm256_unpacklo_epi16(sums.v, sign)};
-        out[1] = {_mm256_unpackhi_epi16(sums.v, sign)};
+    static QORI_INLINE void add(Partial& sums, const Partial& in, __m256i c) {
+        for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
     }
 };
 
