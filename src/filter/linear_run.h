@@ -12,6 +12,7 @@ namespace qori::filter {
 using kernels::ByteTaps;
 using kernels::DoubleTaps;
 using kernels::FloatTaps;
+using kernels::NeighbourByteTaps;
 using kernels::NeighbourTaps;
 using kernels::PackedKernel;
 using kernels::PairTaps;
@@ -87,18 +88,25 @@ template <class S, class D>
 void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Division division, Target<S, D>& target) {
     if constexpr (sizeof(S) == 2)
         if (target.channels == 1)
-            return divideSums(PackedKernel<NeighbourTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
+            return divideSums(PackedKernel<NeighbourTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division,
+                              target);
     divideSums(PackedKernel<PairTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
 }
 
-inline void filterBytes(const int32_t* packed, QorImageSize size, Division division,
-                        Target<uint8_t, uint8_t>& target) {
-    const PackedKernel<ByteTaps> kernel{packed, size, {_mm256_setzero_si256()}};
+template <class Taps>
+void divideWords(const int32_t* packed, QorImageSize size, Division division, Target<uint8_t, uint8_t>& target) {
+    const PackedKernel<Taps> kernel{packed, size, {_mm256_setzero_si256()}};
     const kernels::QuotientInWords words{division.divisor, division.mode};
     if (words.isExact()) return filterBy(kernel, words, target);
-    withDivision<uint8_t>(division, [&]<class Rule>(const Rule& rule) {
-        filterBy(kernel, kernels::Widened<Rule>{rule}, target);
-    });
+    withDivision<uint8_t>(
+        division, [&]<class Rule>(const Rule& rule) { filterBy(kernel, kernels::Widened<Rule>{rule}, target); });
+}
+
+inline void filterBytes(const int32_t* packed, QorImageSize size, Division division, Target<uint8_t, uint8_t>& target) {
+    if (target.channels == 1)
+        divideWords<NeighbourByteTaps>(packed, size, division, target);
+    else
+        divideWords<ByteTaps>(packed, size, division, target);
 }
 
 /// -0 begins a sum that may be a single product: +0 would turn a product of -0.

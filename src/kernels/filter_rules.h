@@ -191,7 +191,7 @@ struct QuotientInDouble {
     }
 };
 
-/// Sums of 16 bits to bytes by a small divisor, in 16 bits. Below 0 everything saturates; above, with t = S for
+/// Sums of ByteTaps to bytes by a small divisor, in 16 bits. Below 0 everything saturates; above, with t = S for
 /// truncation and S + floor(d / 2) for rounding, t < 2^15, the quotient is floor(t / d) = t * m >> (16 + s), where
 /// 2^s < d <= 2^(s + 1) and m is the first integer above 2^(16 + s) / d: m * d exceeds 2^(16 + s) by 2^(s + 1) at most
 /// (Granlund and Montgomery, Division by invariant integers using multiplication, 1994). Where d is even and divides t,
@@ -220,8 +220,7 @@ struct QuotientInWords {
             return _mm256_sub_epi16(q, _mm256_and_si256(_mm256_and_si256(q, middle), _mm256_set1_epi16(1)));
         };
         const auto packed = [=](const Vec<int16_t>(&s)[2], bool toEven) -> Elements<uint8_t, 32> {
-            return {{{_mm256_permute4x64_epi64(_mm256_packus_epi16(quotient(s[0], toEven), quotient(s[1], toEven)),
-                                               0xD8)}}};
+            return {{{_mm256_packus_epi16(quotient(s[0], toEven), quotient(s[1], toEven))}}};
         };
         if (mode == roundNearestEven && divisor % 2 == 0)
             use([=](const Vec<int16_t>(&s)[2]) { return packed(s, true); });
@@ -230,7 +229,7 @@ struct QuotientInWords {
     }
 };
 
-/// Sums of 16 bits to bytes by a rule for 32 bits.
+/// Sums of ByteTaps to bytes by a rule for 32 bits.
 template <class Rule>
 struct Widened {
     using Element = uint8_t;
@@ -246,7 +245,8 @@ struct Widened {
                 return _mm256_castsi256_si128(convert(wide).v[0].v);
             };
             use([=](const Vec<int16_t>(&s)[2]) -> Elements<uint8_t, 32> {
-                return {{{_mm256_set_m128i(half(s[1].v), half(s[0].v))}}};
+                const __m128i outer = half(s[0].v), inner = half(s[1].v);  // 0-7, 16-23 and 8-15, 24-31
+                return {{{_mm256_set_m128i(_mm_unpackhi_epi64(outer, inner), _mm_unpacklo_epi64(outer, inner))}}};
             });
         });
     }

@@ -138,7 +138,8 @@ requires(sizeof(S) == 2) struct NeighbourTaps : PairTaps<S> {
 };
 
 /// Bytes by coefficients of 8 bits whose sums stay below 2^15, the sum of the positive and that of the negative
-/// coefficients too: every pair of products and every partial sum fits 16 bits. Starts at 0.
+/// coefficients too: every pair of products and every partial sum fits 16 bits. Starts at 0. The lanes of a block's two
+/// vectors are the elements 0-7, 16-23 and 8-15, 24-31, as packing wants them.
 struct ByteTaps : TwoVectors<int16_t> {
     using Source = uint8_t;
     using Coefficient = int32_t;  ///< A pair of bytes, the first pixel's first, twice.
@@ -149,7 +150,7 @@ struct ByteTaps : TwoVectors<int16_t> {
     static constexpr bool unrolls = true;
     static constexpr int64_t kSumLimit = int64_t{127} * 255;  ///< Also keeps each coefficient within 8 bits.
 
-    /// Pairs of eight elements from one half, of the next eight from the other.
+    /// Pairs of eight elements from either half.
     struct Free {
         explicit Free(ptrdiff_t next) {
             alignas(32) uint8_t at[32];
@@ -157,16 +158,20 @@ struct ByteTaps : TwoVectors<int16_t> {
             index = load(at);
         }
         QORI_INLINE Sum vector(const uint8_t* p, int i) const {
-            return {shuffleHalves(loadHalves(p + 16 * i, p + 16 * i + 8), index).v};
+            const uint8_t* const at = p + i / 2 * block + i % 2 * 8;
+            return {shuffleHalves(loadHalves(at, at + 16), index).v};
         }
         Bytes index;
     };
     static QORI_INLINE void loadExactly(const uint8_t* p, const uint8_t* second, ptrdiff_t n, Partial& out) {
+        __m256i pairs[2];
         for (int k = 0; k < 2; ++k, n -= 16) {
             const __m256i none = _mm256_setzero_si256(), low = n > 0 ? PairTaps<uint8_t>::wide(p + 16 * k, n) : none;
             const __m256i high = n > 0 && second != nullptr ? PairTaps<uint8_t>::wide(second + 16 * k, n) : none;
-            out.v[k] = {_mm256_or_si256(low, _mm256_slli_epi16(high, 8))};
+            pairs[k] = _mm256_or_si256(low, _mm256_slli_epi16(high, 8));
         }
+        out.v[0] = {_mm256_permute2x128_si256(pairs[0], pairs[1], 0x20)};
+        out.v[1] = {_mm256_permute2x128_si256(pairs[0], pairs[1], 0x31)};
     }
     static QORI_INLINE __m256i broadcast(const Coefficient* c) { return _mm256_set1_epi32(*c); }
     static QORI_INLINE void add(Sum& sum, Sum in, __m256i c) {
@@ -175,6 +180,23 @@ struct ByteTaps : TwoVectors<int16_t> {
     }
     static QORI_INLINE void add(Partial& sums, const Partial& in, __m256i c) {
         for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
+    }
+};
+
+/// Bytes of one channel, as NeighbourTaps takes them.
+struct NeighbourByteTaps : ByteTaps {
+    struct Free {
+        explicit Free(ptrdiff_t) {}
+        QORI_INLINE Sum vector(const uint8_t* p, int i) const { return {load(p + i / 2 * block + i % 2).v}; }
+    };
+    static QORI_INLINE void loadExactly(const uint8_t* p, const uint8_t* second, ptrdiff_t n, Partial& out) {
+        const ptrdiff_t pixels = second != nullptr ? n + 1 : n;
+        out.v[0] = {loadUpTo(p, pixels).v};
+        out.v[1] = {pixels > 1 ? loadUpTo(p + 1, pixels - 1).v : _mm256_setzero_si256()};
+    }
+    static QORI_INLINE void end(const Partial& sums, Sum (&out)[2]) {
+        out[0] = {_mm256_unpacklo_epi16(sums.v[0].v, sums.v[1].v)};
+        out[1] = {_mm256_unpackhi_epi16(sums.v[0].v, sums.v[1].v)};
     }
 };
 
