@@ -207,7 +207,7 @@ struct QuotientInWords {
 
     template <class Use>
     QORI_INLINE void withRule(Use use) const {
-        const int shift = std::bit_width(static_cast<uint32_t>(divisor - 1)) - 1;
+        const int shift = static_cast<int>(std::bit_width(static_cast<uint32_t>(divisor - 1))) - 1;
         const auto factor = static_cast<int16_t>((uint32_t{1} << (16 + shift)) / static_cast<uint32_t>(divisor) + 1);
         const __m256i m = _mm256_set1_epi16(factor), d = _mm256_set1_epi16(static_cast<int16_t>(divisor));
         const __m256i half = _mm256_set1_epi16(static_cast<int16_t>(mode == roundTowardZero ? 0 : divisor / 2));

@@ -266,6 +266,8 @@ void histogramUniformInit(const char* name, Function function) {
     Prepared narrow(qor8u, counts + 1, 1, [&](QorHistogramSpec* spec) {
         ASSERT_EQ(QOR_WARN_ADJUSTED, call(function, int32_t{qor8u}, lower, &three, counts + 1, 1, spec));
     });
+    const auto narrowRecord = words<int32_t>(narrow.spec, narrow.specSize);
+    EXPECT_EQ((std::vector{0, 0, 1, 2, 3}), std::vector(narrowRecord.begin() + 12, narrowRecord.end()));
     Prepared wide(qor16s, counts, 3, [&](QorHistogramSpec* spec) {
         ASSERT_EQ(QOR_WARN_ADJUSTED,
                   call(function, int32_t{qor16s}, lower, upper, counts, 3, spec));  // channel 2: width 0.2
