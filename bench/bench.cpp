@@ -23,7 +23,8 @@ double now() {
     return static_cast<double>(time.tv_sec) + 1e-9 * static_cast<double>(time.tv_nsec);
 }
 
-/// Contenders run in turn and find the caches as the others leave them: what only the last level could hold is not there.
+/// Contenders run in turn and find the caches as the others leave them: what only the last level could hold is not
+/// there.
 double secondsOf(const std::function<void()>& work, int repeats) {
     const double begin = now();
     for (int i = 0; i < repeats; ++i) {
