@@ -160,6 +160,36 @@ QORI_NOINLINE void sumBlocks(const PackedKernel<Taps>& kernel, const typename Ta
     }
 }
 
+/// Kernels of three rows, three rows at a time: the coefficients stay in registers, which spares the load ports.
+template <class Taps, int count>
+QORI_NOINLINE void sumBlocksOfThree(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step,
+                                    ptrdiff_t pixel, ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
+    const typename Taps::Free load(pixel);
+    decltype(Taps::broadcast(kernel.coefficients)) held[3][count];
+    for (int i = 0; i < 3 * count; ++i)
+        held[i / count][i % count] = Taps::broadcast(kernel.coefficients + ptrdiff_t{i} * Taps::repeats);
+    const auto start = kernel.start;
+    for (ptrdiff_t b = 0; b < blocks; ++b, p += Taps::block) {
+        typename Taps::Partial sums[3];
+        forEach<0, 2>([&](auto r) QORI_LAMBDA { Taps::begin(sums[r], start); });
+        forEach<0, 4>([&](auto s) QORI_LAMBDA {
+            const auto* const row = advance(p, s * step);
+            forEach<0, 2 * count - 1>([&](auto i) QORI_LAMBDA {
+                auto v = load.vector(row + i / 2 * Taps::pixels * pixel, i % 2);
+                loadOnce(v.v);
+                forEach<(s > 2 ? s - 2 : 0), (s < 2 ? s : 2)>([&](auto r) QORI_LAMBDA {
+                    Taps::add(sums[r].v[i % 2], v, held[s - r][i / 2]);
+                });
+            });
+        });
+        forEach<0, 2>([&](auto r) QORI_LAMBDA {
+            typename Taps::Sum whole[2];
+            Taps::end(sums[r], whole);
+            out.put(r, b, whole);
+        });
+    }
+}
+
 /// Common widths are unrolled where a type is worth it.
 template <class Taps, int rows, int wide>
 void sumBlocksOfWidth(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step, ptrdiff_t pixel,
@@ -181,6 +211,11 @@ void sumBlocksOfWidth(const PackedKernel<Taps>& kernel, const typename Taps::Sou
 template <class Taps, int rows>
 void sumBlocksFreely(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step, ptrdiff_t pixel,
                      ptrdiff_t blocks, SumRows<typename Taps::Sum> out) {
+    if constexpr (rows == 3 && takesVectors<Taps, typename Taps::Free>) {
+        constexpr int three = (3 + Taps::pixels - 1) / Taps::pixels;
+        if (kernel.size.height == 3 && kernel.taps() == three)
+            return sumBlocksOfThree<Taps, three>(kernel, p, step, pixel, blocks, out);
+    }
     constexpr int wide = Taps::bandBlocks;
     const ptrdiff_t inWide = blocks - blocks % wide;
     if (inWide > 0) sumBlocksOfWidth<Taps, rows, wide>(kernel, p, step, pixel, inWide, out);
