@@ -177,9 +177,8 @@ QORI_NOINLINE void sumBlocksOfThree(const PackedKernel<Taps>& kernel, const type
             forEach<0, 2 * count - 1>([&](auto i) QORI_LAMBDA {
                 auto v = load.vector(row + i / 2 * Taps::pixels * pixel, i % 2);
                 loadOnce(v.v);
-                forEach<(s > 2 ? s - 2 : 0), (s < 2 ? s : 2)>([&](auto r) QORI_LAMBDA {
-                    Taps::add(sums[r].v[i % 2], v, held[s - r][i / 2]);
-                });
+                forEach<(s > 2 ? s - 2 : 0), (s < 2 ? s : 2)>(
+                    [&](auto r) QORI_LAMBDA { Taps::add(sums[r].v[i % 2], v, held[s - r][i / 2]); });
             });
         });
         forEach<0, 2>([&](auto r) QORI_LAMBDA {
