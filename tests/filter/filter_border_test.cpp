@@ -1,4 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <array>
+
 #include "filter_cases.h"
 
 namespace qori::test {
@@ -331,6 +333,30 @@ TEST(FilterBorder, QueryAndInitialisersCheckInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_CHANNELS, out, qoriFilterBorderInit_32f(f, ok, 13, 0, 3, plan));
     QORI_EXPECT_STATUS(QOR_ERR_ROUND_MODE, out, qoriFilterBorderInit_32f(f, ok, 13, 2, 3, plan));
     EXPECT_EQ(QOR_OK, qoriFilterBorderInit_32f(f, {1, 1}, 13, 2, 2, plan));
+}
+
+TEST(FilterBorder, RecordsBeginWithPathAndSize) {
+    const int16_t integers[6] = {1, 2, 3, 4, 5, 6};
+    const float floats[6] = {};
+    const auto expectRecord = [](const Blocks& blocks, int32_t path) {
+        const auto aligned = (reinterpret_cast<uintptr_t>(blocks.plan) + 63) & ~uintptr_t{63};
+        const auto* record = reinterpret_cast<const int32_t*>(aligned);
+        EXPECT_EQ((std::array{path, 3, 2}), (std::array{record[0], record[1], record[2]}));
+    };
+    const Job job{{3, 2}, {8, 8}, borderReplicate};
+    struct Case {
+        int32_t type, channels, path;
+    };
+    for (const auto& [type, channels, path] : {Case{1, 4, 0}, {7, 1, 1}, {7, 2, 1}, {7, 3, 4}, {5, 1, 5}}) {
+        const Blocks blocks(job, type, kIntegers, channels);
+        EXPECT_EQ(QOR_OK, qoriFilterBorderInit_16s(integers, job.kernel, 3, type, channels, 1, blocks.plan));
+        expectRecord(blocks, path);
+    }
+    for (const auto& [type, channels, path] : {Case{1, 1, 3}, {7, 1, 4}, {5, 3, 5}, {13, 4, 6}}) {
+        const Blocks blocks(job, type, kFloats, channels);
+        EXPECT_EQ(QOR_OK, qoriFilterBorderInit_32f(floats, job.kernel, type, channels, 1, blocks.plan));
+        expectRecord(blocks, path);
+    }
 }
 
 TEST(FilterBorder, OperationsCheckInOrder) {
