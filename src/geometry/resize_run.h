@@ -309,7 +309,7 @@ private:
         }
         for (; i < padded_; ++i) {
             fractions_[i] = fractions_[i - 1];
-            for (int k = 0; k < 2; ++k) places_[k][i] = places_[k][i - 1];
+            for (int32_t* places : places_) places[i] = places[i - 1];
         }
     }
 
@@ -318,7 +318,7 @@ private:
         const auto pick = [from](const int32_t* places) {
             if constexpr (channels == kLanes) return load(reinterpret_cast<const double*>(from + *places)).v;
             double p[kLanes];
-            for (int lane = 0; lane < kLanes; ++lane) __builtin_memcpy(p + lane, from + places[lane], sizeof(double));
+            for (double& element : p) __builtin_memcpy(&element, from + *places++, sizeof(double));
             return _mm256_setr_pd(p[0], p[1], p[2], p[3]);
         };
         for (ptrdiff_t i = 0; i < padded_; i += kLanes) {

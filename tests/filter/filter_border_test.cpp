@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <array>
+#include <bit>
 
 #include "filter_cases.h"
 
@@ -203,7 +204,7 @@ TEST(FilterBorder, OneCoefficientOfOneCopies) {
         ASSERT_EQ(QOR_OK, call(qoriFilterBorderInit_32f, &oneFloat, job.kernel, 13, 1, 0, forFloats.plan));
         runJob(qoriFilterBorder_32f_C1R, floats, forFloats, [](auto pixel, float actual) {
             const float expected = pixel(0, 0);
-            EXPECT_EQ(0, std::memcmp(&expected, &actual, sizeof actual));
+            EXPECT_EQ(std::bit_cast<uint32_t>(expected), std::bit_cast<uint32_t>(actual));
         });
     }
 }

@@ -17,7 +17,9 @@ struct Kernel {
     int width, height;
     std::vector<K> values;
 
-    K at(int i, int j) const { return values[static_cast<size_t>(j * width + i)]; }
+    K at(int i, int j) const {
+        return values[static_cast<size_t>(j) * static_cast<size_t>(width) + static_cast<size_t>(i)];
+    }
 };
 
 /// numerator / denominator to an integer; exact.
