@@ -88,7 +88,8 @@ QORI_INLINE void addSourceRow(const PackedKernel<Taps>& kernel, typename Taps::P
             forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { load(p + w * Taps::block, isLast, v[w]); });
             forEach<first, last>([&](auto r) QORI_LAMBDA {
                 const auto k = Taps::broadcast(c - (r - first) * row);
-                forEach<0, wide - 1>([&](auto w) QORI_LAMBDA { Taps::add(sums[r][w], v[w], k); });
+                forEach<0, 2 * wide - 1>([&](auto i)
+                                             QORI_LAMBDA { Taps::add(sums[r][i / 2].v[i % 2], v[i / 2].v[i % 2], k); });
             });
         }
         p += Taps::pixels * pixel;

@@ -4,17 +4,18 @@
 //
 // Taps offers    Source, Coefficient            element types of the image and of the packed kernel
 //                Sum                            a vector of sums; a block has two
-//                Partial                        a block of sources, and of sums while they are made
+//                Partial                        TwoVectors: a block of sources, or of sums while they are made
 //                block                          elements of a block
 //                pixels                         pixels of a tap
 //                repeats                        copies of a coefficient in the packed kernel, one after the other
 //                overread                       elements that Free may read behind the last pixel of a block's window
 //                bandRows, bandBlocks           rows and blocks that are summed at once, as the registers allow
 //                unrolls                        whether common kernel widths have code of their own
-//                Free                           loads a block at p, a tap's second pixel `next` elements on
+//                Free                           loads blocks whole: vector(p, i), the i-th vector from block p on, or,
+//                                               where a block's vectors are made together, (p, ..., block)
 //                loadExactly(p, second, n, v)   the first n elements of a block and nothing else; second is null where
 //                                               the tap is the single last pixel of an odd row
-//                begin, add, end                sums from their start to what Finish takes
+//                begin, add, end                sums from their start, vector by vector, to what Finish takes
 #pragma once
 #include "pack_convert.h"
 
@@ -106,9 +107,6 @@ struct PairTaps : TwoVectors<int32_t> {
         sum.v = _mm256_add_epi32(sum.v, _mm256_madd_epi16(in.v, c));
         keepOrder(sum.v);
     }
-    static QORI_INLINE void add(Partial& sums, const Partial& in, __m256i c) {
-        for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
-    }
 };
 
 /// Pairs of one channel of 16 bits: pixels that are multiplied together are neighbours in memory, and nothing has to be
@@ -178,9 +176,6 @@ struct ByteTaps : TwoVectors<int16_t> {
         sum.v = _mm256_add_epi16(sum.v, _mm256_maddubs_epi16(in.v, c));
         keepOrder(sum.v);
     }
-    static QORI_INLINE void add(Partial& sums, const Partial& in, __m256i c) {
-        for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
-    }
 };
 
 /// Bytes of one channel, as NeighbourTaps takes them.
@@ -247,9 +242,6 @@ struct FloatTaps : TwoVectors<float> {
     }
     static QORI_INLINE __m256 broadcast(const Coefficient* c) { return _mm256_broadcast_ss(c); }
     static QORI_INLINE void add(Sum& sum, Sum in, __m256 c) { sum.v = _mm256_fmadd_ps(in.v, c, sum.v); }
-    static QORI_INLINE void add(Partial& sums, const Partial& in, __m256 c) {
-        for (int k = 0; k < 2; ++k) add(sums.v[k], in.v[k], c);
-    }
 };
 
 /// As FloatTaps in double precision. Sums of integers are exact while their magnitudes stay below 2^53.
@@ -267,7 +259,15 @@ struct DoubleTaps : TwoVectors<double> {
 
     struct Free {
         explicit Free(ptrdiff_t) {}
-        QORI_INLINE void operator()(const S* p, bool, Partial& out) const { loadExactly(p, nullptr, block, out); }
+        QORI_INLINE Sum vector(const S* p, int i) const requires(sizeof(S) >= 4) {
+            if constexpr (sizeof(S) == 8)
+                return load(p + 4 * i);
+            else
+                return {_mm256_cvtepi32_pd(_mm_loadu_si128(reinterpret_cast<const __m128i*>(p + 4 * i)))};
+        }
+        QORI_INLINE void operator()(const S* p, bool, Partial& out) const requires(sizeof(S) < 4) {
+            loadExactly(p, nullptr, block, out);
+        }
     };
     static QORI_INLINE void loadExactly(const S* p, const S*, ptrdiff_t n, Partial& out) {
         if constexpr (sizeof(S) == 8) {
@@ -283,9 +283,7 @@ struct DoubleTaps : TwoVectors<double> {
         }
     }
     static QORI_INLINE __m256d broadcast(const Coefficient* c) { return _mm256_broadcast_sd(c); }
-    static QORI_INLINE void add(Partial& sums, const Partial& in, __m256d c) {
-        for (int k = 0; k < 2; ++k) sums.v[k].v = _mm256_fmadd_pd(in.v[k].v, c, sums.v[k].v);
-    }
+    static QORI_INLINE void add(Sum& sum, Sum in, __m256d c) { sum.v = _mm256_fmadd_pd(in.v, c, sum.v); }
 };
 
 }  // namespace qori::kernels
