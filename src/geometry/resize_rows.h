@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Filtering the rows of a tile, strip by strip, into rows of floats: three ways that give the same bits. Each is a
 // class that TapsTile is made with:
-//     suits(plan)                     whether it can do the plan
+//     suits(plan)                     whether it can do the plan; TurnedRows does any
 //     Rows(source, buffer)            takes its memory
 //     stripPixels()                   width of a strip
 //     ringRows()                      rows of floats that it needs room for
@@ -105,8 +105,6 @@ private:
 template <class T, int channels>
 class TurnedRows {
 public:
-    static bool suits(const ResizePlan&) { return true; }
-
     TurnedRows(const TileSource<T, channels>& source, WorkBuffer& buffer)
         : source_(source),
           taps_(source, buffer),

@@ -9,8 +9,6 @@ namespace qori::geometry {
 template <class T, int channels, class Rows>
 class TapsTile {
 public:
-    static bool suits(const ResizePlan& plan) { return Rows::suits(plan); }
-
     TapsTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer) : source_{plan, tile}, rows_(source_, buffer) {
         stripPixels_ = tile.width < rows_.stripPixels() ? tile.width : rows_.stripPixels();
         ring_.rows = rows_.ringRows();

@@ -99,12 +99,6 @@ QORI_NOINLINE void linearRowByElements(const Gather& gather, const uint8_t* row,
     }
 }
 
-template <class T>
-bool isSame(const T* a, const T* b) {
-    const __m256i difference = _mm256_xor_si256(load(a).v, load(b).v);
-    return _mm256_testz_si256(difference, difference) != 0;
-}
-
 void findAlike(Gather& gather) {
     const int32_t* bases = gather.bases;
     if (gather.groups < 6) return;

@@ -60,14 +60,11 @@ void filterLineOf(const LineFilter& filter, const float* line, const uint8_t* la
 
 /// Whether a group's tables are those of `cycle` groups before.
 bool repeats(const LineFilter& filter, ptrdiff_t g, ptrdiff_t cycle) {
-    __m256i difference = _mm256_setzero_si256();
-    const auto compare = [&](const auto* a, const auto* b) {
-        difference = _mm256_or_si256(difference, _mm256_xor_si256(toInteger(load(a).v), toInteger(load(b).v)));
-    };
-    compare(filter.order + 8 * g, filter.order + 8 * (g - cycle));
+    bool same = isSame(filter.order + 8 * g, filter.order + 8 * (g - cycle));
     for (int32_t k = 0; k < filter.taps; ++k)
-        compare(filter.weights + 8 * (g * filter.taps + k), filter.weights + 8 * ((g - cycle) * filter.taps + k));
-    return _mm256_testz_si256(difference, difference) != 0;
+        same = same &&
+               isSame(filter.weights + 8 * (g * filter.taps + k), filter.weights + 8 * ((g - cycle) * filter.taps + k));
+    return same;
 }
 
 /// Finds the cycle and which windows serve.

@@ -125,19 +125,15 @@ QORI_NOINLINE void sumWordColumn(const int16_t* const* from, const int16_t* give
 /// Whether a group's masks and weights are those of a cycle before, and its bases a step on.
 bool goesOn(const WordFilter& filter, ptrdiff_t g) {
     const WordGroup *group = filter.list + g, *before = group - filter.cycle;
-    __m256i difference = _mm256_setzero_si256();
-    const auto compare = [&](const auto* a, const auto* b) {
-        difference = _mm256_or_si256(difference, _mm256_xor_si256(load(a).v, load(b).v));
-    };
-    for (int octet = 0; octet < 2; ++octet) compare(group->masks[octet], before->masks[octet]);
+    bool same = true;
+    for (int octet = 0; octet < 2; ++octet) same = same && isSame(group->masks[octet], before->masks[octet]);
     const ptrdiff_t weights = 16 * ptrdiff_t{filter.taps};
     for (ptrdiff_t i = 0; i < weights; i += 16)
-        compare(filter.weights + g * weights + i, filter.weights + (g - filter.cycle) * weights + i);
-    bool same = true;
+        same = same && isSame(filter.weights + g * weights + i, filter.weights + (g - filter.cycle) * weights + i);
     const int32_t step = filter.list[filter.cycle].bases[0][0] - filter.list[0].bases[0][0];
     for (int quad = 0; quad < 4; ++quad)
         same = same && group->bases[quad / 2][quad & 1] - before->bases[quad / 2][quad & 1] == step;
-    return same && _mm256_testz_si256(difference, difference) != 0;
+    return same;
 }
 
 struct Places {

@@ -64,6 +64,13 @@ QORI_INLINE Vec<T> load(const T* p) {
     return fromInteger<T>(_mm256_loadu_si256(reinterpret_cast<const __m256i*>(p)));
 }
 
+/// Whether two whole vectors in memory have the same bits.
+template <class T>
+QORI_INLINE bool isSame(const T* a, const T* b) {
+    const __m256i difference = _mm256_xor_si256(toInteger(load(a).v), toInteger(load(b).v));
+    return _mm256_testz_si256(difference, difference) != 0;
+}
+
 template <class T>
 QORI_INLINE void store(T* p, Vec<T> a) {
     _mm256_storeu_si256(reinterpret_cast<__m256i*>(p), toInteger(a.v));
