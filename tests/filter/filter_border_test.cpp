@@ -235,6 +235,34 @@ TEST(FilterBorder, EveryQuotientIsRoundedExactly) {
     }
 }
 
+TEST(FilterBorder, EverySumOfSmallKernelsIsDividedExactly) {
+    // 126 a + b takes every value that sums of bytes by coefficients of 8 bits can have, upwards and downwards.
+    constexpr int kSums = 127 * 255 + 1;
+    std::vector<uint8_t> src(2 * kSums), dst(2 * kSums);
+    for (int sum = 0; sum < kSums; ++sum) {
+        const int a = std::min(sum / 126, 255);
+        src[static_cast<size_t>(2 * sum)] = static_cast<uint8_t>(a);
+        src[static_cast<size_t>(2 * sum) + 1] = static_cast<uint8_t>(sum - 126 * a);
+    }
+    const Job job{{2, 1}, {2 * kSums, 1}, borderReplicate};
+    const Blocks blocks(job, 1, kIntegers, 1);
+    const uint8_t zero = 0;
+    for (int32_t divisor = 1; divisor <= 800; ++divisor)
+        for (int32_t mode = 0; mode < 3; ++mode) {
+            const int16_t sign = divisor % 50 == 1 ? -1 : 1;
+            const int16_t kernel[2] = {sign, static_cast<int16_t>(126 * sign)};  // turned: 126 meets the first pixel
+            ASSERT_EQ(QOR_OK, qoriFilterBorderInit_16s(kernel, job.kernel, divisor * sign, 1, 1, mode, blocks.plan));
+            ASSERT_EQ(QOR_OK, qoriFilterBorder_8u_C1R(src.data(), 2 * kSums, dst.data(), 2 * kSums, job.roi, 1, &zero,
+                                                      blocks.plan, blocks.buffer));
+            for (int sum = 0; sum < kSums; ++sum) {
+                const auto expected =
+                    reference::clampTo<uint8_t>(reference::divideRounded(sum * sign, divisor * sign, mode));
+                const uint8_t actual = dst[static_cast<size_t>(2 * sum) + 1];
+                if (expected != actual) FAIL() << sum << " / " << divisor << " by mode " << mode << " is " << +actual;
+            }
+        }
+}
+
 TEST(FilterBorder, SumsBeyond32BitsWrap) {
     // Each pair of products is 2^31.
     const std::vector<int16_t> kernel(4, INT16_MIN), src(16, INT16_MIN);

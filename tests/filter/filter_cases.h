@@ -12,11 +12,6 @@ using reference::Kernel;
 
 enum Slot { kSrc, kDst, kPlan, kBuffer, kOther };
 
-/// A block of bytes that ends at a guard page, at whatever alignment that gives.
-inline TestImage block(Slot slot, int bytes, int shift = 0) {
-    return {slot, {.width = bytes, .height = 1, .shift = shift}, 1};
-}
-
 /// How large coefficients are: ties and exact sums, sums beyond every shortcut, the ends of the type.
 enum class Coefficients { small, medium, large };
 
@@ -51,14 +46,6 @@ inline int32_t drawDivisor() {
                                            -1,    7,       25,      100,       6,         255, 300, 16384, 65535, 65536,
                                            65537, 1 << 24, 1 << 30, INT32_MIN, INT32_MAX, -10, 12,  1000};
     return divisors[random().below(static_cast<int>(std::size(divisors)))];
-}
-
-template <class T>
-T drawPixel() {
-    if constexpr (std::is_floating_point_v<T>)
-        return static_cast<T>(static_cast<int32_t>(random().bits())) / T(1 << 20);
-    else
-        return random().value<T>();
 }
 
 /// A sum of floats, or of integers as floats, in elements of `unit` relative rounding. Each of `taps` terms is rounded

@@ -44,11 +44,6 @@ struct Exports<double> {
 
 enum Slot { kSrc, kDst, kPlan, kInit, kBuffer, kTileSrc, kPlanCopy };
 
-/// A block of bytes that ends at a guard page, at whatever alignment that gives.
-inline TestImage block(Slot slot, int bytes, int shift = 0) {
-    return {slot, {.width = bytes, .height = 1, .shift = shift}, 1};
-}
-
 template <class T>
 QorResult initPlan(const Method& m, QorImageSize src, QorImageSize dst, QorResizePlan* plan, uint8_t* init) {
     using E = Exports<T>;

@@ -9,14 +9,6 @@ namespace {
 
 using reference::Tap;
 
-template <class T>
-T drawPixel() {
-    if constexpr (std::is_floating_point_v<T>)
-        return static_cast<T>(static_cast<int32_t>(random().bits())) / T(1 << 20);
-    else
-        return random().value<T>();
-}
-
 /// A source with memory beyond it on the open sides only, as wide as the filter reaches.
 template <class T, int channels>
 struct Source {

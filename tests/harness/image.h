@@ -116,4 +116,9 @@ private:
     int width_, height_, pixelBytes_;
 };
 
+/// A block of bytes that ends at a guard page, at whatever alignment that gives.
+inline TestImage block(int slot, int bytes, int shift = 0) {
+    return {slot, {.width = bytes, .height = 1, .shift = shift}, 1};
+}
+
 }  // namespace qori::test

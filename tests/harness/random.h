@@ -59,4 +59,13 @@ private:
 /// The generator of the running test: seeded per test, so that one test's draw does not depend on another.
 Random& random();
 
+/// Any integer, or a float of moderate size, which a sum of any length does not carry to infinity.
+template <class T>
+T drawPixel() {
+    if constexpr (std::is_floating_point_v<T>)
+        return static_cast<T>(static_cast<int32_t>(random().bits())) / T(1 << 20);
+    else
+        return random().value<T>();
+}
+
 }  // namespace qori::test

@@ -9,15 +9,6 @@ enum class Measure { largest, magnitudes, squares, values, products };
 
 constexpr int resultsOf(Layout layout) { return layout == Layout::AC4 ? 3 : channels(layout); }
 
-/// Floats of moderate size, which a sum of any length does not carry to infinity; integers of any size.
-template <class T>
-T draw() {
-    if constexpr (std::is_floating_point_v<T>)
-        return static_cast<T>(static_cast<int32_t>(random().bits())) / static_cast<T>(1 << 20);
-    else
-        return random().value<T>();
-}
-
 /// Roundings between an element and a float result: the difference or product, the additions of the busiest of `lanes`
 /// partial sums, the pairwise additions of 96 lanes at most, the final conversions. k of them keep a sum of magnitudes
 /// within k u / (1 - k u) (Higham: Accuracy and stability of numerical algorithms, lemma 3.1).
@@ -95,8 +86,8 @@ void runMember(Function function, const Shape& shape, int32_t hint, Check check)
     constexpr int n = channels(layout);
     constexpr bool binary = isBinary<Function, T>;
     TestImage src1(0, shape, n * static_cast<int>(sizeof(T))), src2(1, shape, n * static_cast<int>(sizeof(T)));
-    src1.fill<T>(n, draw<T>);
-    src2.fill<T>(n, draw<T>);
+    src1.fill<T>(n, drawPixel<T>);
+    src2.fill<T>(n, drawPixel<T>);
     const Snapshot before1 = src1.snapshot(), before2 = src2.snapshot();
     double results[5] = {-7, -7, -7, -7, -7};
     QorResult status, expectedStatus = QOR_OK;
@@ -252,9 +243,9 @@ void checkWeightedRows(QorResult(QORI_CALL* function)(const T* const*, const T*,
             T weights[7];
             for (int i = 0; i < count; ++i) {
                 images.emplace_back(i, row, static_cast<int>(sizeof(T)));
-                images.back().template fill<T>(1, draw<T>);
+                images.back().template fill<T>(1, drawPixel<T>);
                 rows.push_back(images.back().template data<T>());
-                weights[i] = draw<T>();
+                weights[i] = drawPixel<T>();
             }
             TestImage dst(7, row, static_cast<int>(sizeof(T)));
             Snapshot expected = dst.snapshot();
