@@ -43,6 +43,7 @@ struct Exports;
     };
 QORI_EXPORTS(uint8_t, 8u, 1)
 QORI_EXPORTS(uint8_t, 8u, 3)
+QORI_EXPORTS(uint8_t, 8u, 4)
 QORI_EXPORTS(uint16_t, 16u, 1)
 QORI_EXPORTS(float, 32f, 1)
 #undef QORI_EXPORTS
@@ -206,6 +207,9 @@ std::vector<Row> rowsOf(QorInterpolationKind kind, bool antialiasing, Best down,
 }
 
 const Rows nearest{rowsOf(interpNearest, false, {9'460, 3'115, 2'508}, {7'825, 2'540, 1'952}, {16'971, 5'362, 4'482})};
+const Rows nearestOfFour{{row<uint8_t, 4>(interpNearest, false, kDown, 0),
+                          row<uint8_t, 4>(interpNearest, false, kHalf, 0),
+                          row<uint8_t, 4>(interpNearest, false, kUp, 0)}};
 const Rows linear{rowsOf(interpLinear, false, {6'077, 755, 1'240}, {5'835, 872, 1'411}, {13'581, 2'049, 4'137})};
 const Rows cubic{rowsOf(interpCubic, false, {2'051, 597, 460}, {1'355, 502, 349}, {3'133, 915, 3'357})};
 const Rows lanczos{rowsOf(interpLanczos, false, {208, 82, 190}, {156, 57, 145}, {2'457, 158, 2'405})};
