@@ -3,7 +3,7 @@
 #include "kernels/histogram.h"
 #include "checks.h"
 #include "driver.h"
-#include "rounding.h"
+#include "float_control.h"
 
 namespace qori::stats {
 namespace {
@@ -259,7 +259,7 @@ QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const
         if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
         if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
     }
-    return underDefaultRounding([&]() -> QorResult {
+    return underDefaultControl([&]() -> QorResult {
         Record* const record = recordOf(pSpec);
         record->begin(dataType, numChannels, 1, nLevels);
         QorResult result = QOR_OK;
@@ -278,7 +278,7 @@ QorResult histogramLevels(const QorHistogramSpec* pSpec, float* const* ppLevels)
     Record* const record = recordOf(pSpec);
     if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
     if (anyNull(ppLevels, record->channels)) return QOR_ERR_NULL_PTR;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         for (int c = 0; c < record->channels; ++c)
             for (int32_t k = 0; k < record->counts[c]; ++k)
                 ppLevels[c][k] = record->dataType == qor32f ? record->levels<float>(c)[k]

@@ -3,9 +3,9 @@
 // precision.
 #include "checks.h"
 #include "driver.h"
+#include "float_control.h"
 #include "kernels/reduce_measures.h"
 #include "kernels/reduce_sequential.h"
-#include "rounding.h"
 
 namespace qori::stats {
 namespace {
@@ -127,7 +127,7 @@ double rooted(double total) {
 template <class T, Layout layout>
 QorResult sum(Image<const T> src, QorImageSize roi, double* pSum, int32_t hint = hintFast) {
     if (QorResult r = firstOf(nullCheck(src, pSum), sizeCheck(roi))) return r;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         const Totals totals = totalsOf<Quantity::values, T, layout>(roi, hint, src);
         for (int c = 0; c < processedChannels(layout); ++c) pSum[c] = totals.of[c];
         return QOR_OK;
@@ -139,7 +139,7 @@ QorResult mean(Image<const T> src, QorImageSize roi, double* pMean, int32_t hint
     if (isNull(pMean)) return QOR_ERR_NULL_PTR;
     double sums[4];
     if (QorResult r = sum<T, layout>(src, roi, sums, hint)) return r;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         const auto product = static_cast<int32_t>(static_cast<uint32_t>(roi.width) * static_cast<uint32_t>(roi.height));
         const double pixels = product;
         if constexpr (layout == Layout::C1) {
@@ -157,7 +157,7 @@ QorResult mean(Image<const T> src, QorImageSize roi, double* pMean, int32_t hint
 template <Quantity quantity, class T, Layout layout, class... Sources>
 QorResult norm(QorImageSize roi, double* pValue, int32_t hint, Sources... sources) {
     if (QorResult r = firstOf(nullCheck(sources..., pValue), sizeCheck(roi), stepCheck(sources...))) return r;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         const Totals totals = totalsOf<quantity, T, layout>(roi, hint, sources...);
         for (int c = 0; c < processedChannels(layout); ++c) pValue[c] = rooted<quantity>(totals.of[c]);
         return QOR_OK;
@@ -196,7 +196,7 @@ QORI_NOINLINE Ratio accumulateRatio(QorImageSize roi, Channels n, int32_t hint, 
 template <Quantity quantity, class T, Layout layout>
 QorResult relativeNorm(QorImageSize roi, double* pValue, int32_t hint, Image<const T> src1, Image<const T> src2) {
     if (QorResult r = firstOf(nullCheck(src1, src2, pValue), sizeCheck(roi), stepCheck(src1, src2))) return r;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         constexpr double kSmallestNormal = 2.2250738585072014e-308;
         const Ratio ratio =
             accumulateRatio<quantity, T, channels(layout) == 1>(roi, channelsOf<layout>, hint, src1, src2);
@@ -331,7 +331,7 @@ QorResult dotProduct(Image<const T> src1, Image<const T> src2, QorImageSize roi,
     constexpr bool refusesZeroSteps = std::is_same_v<T, uint8_t> && layout == Layout::C1;
     if (QorResult r = firstOf(nullCheck(src1, src2, pDp), sizeCheck(roi))) return r;
     if (refusesZeroSteps && (src1.step == 0 || src2.step == 0)) return QOR_ERR_SIZE;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         const Totals totals = dotProductTotals<T, layout>(roi, hint, src1, src2);
         for (int c = 0; c < processedChannels(layout); ++c) pDp[c] = totals.of[c];
         return QOR_OK;
@@ -344,7 +344,7 @@ QorResult sumWeightedRows(const T* const* rows, const T* weights, int32_t count,
     if (length < 1 || count < 1) return QOR_ERR_SIZE;
     for (int32_t i = 0; i < count; ++i)
         if (isNull(rows[i])) return QOR_ERR_NULL_PTR;
-    return underDefaultRounding([&] {
+    return underDefaultControl([&] {
         kernels::weightedRows(dst, length, rows, weights, count);
         return QOR_OK;
     });

@@ -34,10 +34,11 @@ class Listener : public testing::EmptyTestEventListener {
     }
 };
 
-/// A stray access ends the run; say which test it was.
-[[maybe_unused]] void reportFault(int) {
+/// A stray access or a floating-point exception ends the run; say which test it was.
+[[maybe_unused]] void reportFault(int signal) {
     const testing::TestInfo* info = testing::UnitTest::GetInstance()->current_test_info();
-    std::printf("access outside the allowed memory in %s\n", info != nullptr ? info->name() : "no test");
+    std::printf("%s in %s\n", signal == SIGFPE ? "trapped exception" : "access outside the allowed memory",
+                info != nullptr ? info->name() : "no test");
     std::fflush(stdout);
     std::_Exit(3);
 }
@@ -59,6 +60,7 @@ int main(int argc, char** argv) {
 #ifndef __SANITIZE_ADDRESS__
     std::signal(SIGSEGV, reportFault);
 #endif
+    std::signal(SIGFPE, reportFault);
     const int result = RUN_ALL_TESTS();
     if (testing::UnitTest::GetInstance()->test_to_run_count() == 0) {
         std::printf("no test was run\n");
