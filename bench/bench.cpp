@@ -5,6 +5,7 @@
 #include <immintrin.h>
 
 #include <algorithm>
+#include <cstdio>
 #include <cstring>
 #include <ctime>
 
@@ -14,6 +15,11 @@ namespace {
 std::vector<Row>& allRows() {
     static std::vector<Row> rows;
     return rows;
+}
+
+std::vector<Ladder>& allLadders() {
+    static std::vector<Ladder> ladders;
+    return ladders;
 }
 
 /// Time that this thread has had on a processor: other work of a shared machine counts only by the caches it takes.
@@ -129,7 +135,45 @@ void run(benchmark::State& state, const Row& row, Size size) {
     if (best > 0) out["vs_best"] = pixels / seconds / (static_cast<double>(copied) / copy.median()) / best;
 }
 
+/// By how much two neighbours of a ladder are out of proportion; 1 where they are not.
+double stepBetween(const Step& a, double secondsA, const Step& b, double secondsB) {
+    const bool aIsSmaller = a.units <= b.units;
+    const double growth = aIsSmaller ? b.units / a.units : a.units / b.units;
+    const double ratio = aIsSmaller ? secondsB / secondsA : secondsA / secondsB;
+    return std::max({1.0, ratio / growth, 1 / ratio});
+}
+
+void climb(benchmark::State& state, const Ladder& ladder) {
+    const std::vector<Step> steps = ladder.make();
+    std::vector<Timed> all;
+    for (const Step& step : steps) all.push_back(prepare(step.work));
+    for (auto _ : state) {
+        for (Timed& timed : all) timed.seconds.push_back(secondsOf(timed.work, timed.repeats));
+        state.SetIterationTime(all.front().seconds.back());
+    }
+    double largest = 1;
+    std::string where = "none";
+    for (size_t i = 1; i < steps.size(); ++i) {
+        const double size = stepBetween(steps[i - 1], all[i - 1].median(), steps[i], all[i].median());
+        if (size <= largest) continue;
+        largest = size;
+        where = steps[i - 1].name + " to " + steps[i].name;
+    }
+    state.counters["step"] = largest;
+    state.SetLabel(where + (largest > 2 && !ladder.reason.empty() ? "; " + ladder.reason : ""));
+    if (std::getenv("QORI_BENCH_STEPS") == nullptr) return;
+    for (size_t i = 0; i < steps.size(); ++i)
+        std::fprintf(stderr, "%-40s %-24s %12.0f ns %10.4f ns a unit\n", ladder.operation.c_str(),
+                     steps[i].name.c_str(), all[i].median() * 1e9, all[i].median() * 1e9 / steps[i].units);
+}
+
 void registerAll() {
+    for (const Ladder& ladder : allLadders())
+        benchmark::RegisterBenchmark(("ladder " + ladder.operation + "/steps").c_str(),
+                                     [&ladder](benchmark::State& state) { climb(state, ladder); })
+            ->UseManualTime()
+            ->Iterations(15)
+            ->Unit(benchmark::kMicrosecond);
     for (const Row& row : allRows())
         for (Size size : row.sizes)
             benchmark::RegisterBenchmark(
@@ -144,6 +188,10 @@ void registerAll() {
 
 Rows::Rows(std::vector<Row> rows) {
     for (Row& row : rows) allRows().push_back(std::move(row));
+}
+
+Ladders::Ladders(std::vector<Ladder> ladders) {
+    for (Ladder& ladder : ladders) allLadders().push_back(std::move(ladder));
 }
 
 }  // namespace qori::bench

@@ -89,6 +89,32 @@ struct Rows {
     explicit Rows(std::vector<Row> rows);
 };
 
+using Block = std::shared_ptr<uint8_t>;
+
+inline Block allocate(size_t bytes) {
+    return {static_cast<uint8_t*>(std::aligned_alloc(64, (bytes + 63) / 64 * 64)), std::free};
+}
+
+/// One step of a ladder: neighbours differ a little in one parameter.
+struct Step {
+    std::string name;
+    double units;  ///< What the work should grow with.
+    std::function<void()> work;
+};
+
+/// An operation over a range of one parameter. Between neighbours, the one with more units should take no longer than
+/// in proportion, and the one with fewer no longer than the other; by how much they do is the size of the step.
+struct Ladder {
+    std::string operation;
+    std::function<std::vector<Step>()> make;
+    std::string reason = {};  ///< Why a step above 2 has to be.
+};
+
+/// Registers ladders before main.
+struct Ladders {
+    explicit Ladders(std::vector<Ladder> ladders);
+};
+
 /// Plain loops must not turn into memcpy or be moved out of the timing: keeps the compiler from looking through.
 inline void keep(const void* p) { __asm__ volatile("" : : "g"(p) : "memory"); }
 

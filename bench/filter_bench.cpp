@@ -14,12 +14,6 @@
 namespace qori::bench {
 namespace {
 
-using Block = std::shared_ptr<uint8_t>;
-
-Block allocate(int32_t bytes) {
-    return {static_cast<uint8_t*>(std::aligned_alloc(64, (static_cast<size_t>(bytes) + 63) / 64 * 64)), std::free};
-}
-
 template <class T>
 constexpr int32_t kTypeCode = sizeof(T) == 1   ? 1
                               : sizeof(T) == 2 ? 7
@@ -75,7 +69,7 @@ std::function<void()> oursOf(Function function, Image<T> src, Image<T> dst, QorI
     const QorImageSize size{side, side};
     int32_t planBytes, bufferBytes;
     qoriFilterBorderGetSize(size, roi, kTypeCode<T>, isFloat ? 13 : 7, channels, &planBytes, &bufferBytes);
-    const Block plan = allocate(planBytes), buffer = allocate(bufferBytes);
+    const Block plan = allocate(static_cast<size_t>(planBytes)), buffer = allocate(static_cast<size_t>(bufferBytes));
     auto* record = reinterpret_cast<QorLinearFilterPlan*>(plan.get());
     if constexpr (isFloat)
         qoriFilterBorderInit_32f(makeKernel<float>(side).data(), size, 13, channels, roundNearestEven, record);

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Resize of whole images; plans and buffers are made outside the timing. A peer resizes the planes of a packed image
 // one by one and widens all filters but nearest on reductions, so it stands beside the antialiasing forms there.
-#include "bench.h"
+#include "resize_job.h"
 
 #ifdef QORI_BENCH_ZIMG
 #include <zimg.h>
@@ -10,100 +10,7 @@
 namespace qori::bench {
 namespace {
 
-struct Sizes {
-    Size src, dst;
-};
 constexpr Sizes kDown{{1920, 1080}, {1280, 720}}, kHalf{{3840, 2160}, {1920, 1080}}, kUp{{960, 540}, {1920, 1080}};
-
-using Block = std::shared_ptr<uint8_t>;
-
-Block allocate(size_t bytes) {
-    return {static_cast<uint8_t*>(std::aligned_alloc(64, (bytes + 63) / 64 * 64)), std::free};
-}
-
-/// The exports of one element type and layout.
-template <class T, int channels>
-struct Exports;
-#define QORI_EXPORTS(T, t, n)                                                 \
-    template <>                                                               \
-    struct Exports<T, n> {                                                    \
-        static constexpr auto getSize = qoriResizeGetSize_##t;                \
-        static constexpr auto getBufferSize = qoriResizeGetBufferSize_##t;    \
-        static constexpr auto nearestInit = qoriResizeNearestInit_##t;        \
-        static constexpr auto linearInit = qoriResizeLinearInit_##t;          \
-        static constexpr auto cubicInit = qoriResizeCubicInit_##t;            \
-        static constexpr auto lanczosInit = qoriResizeLanczosInit_##t;        \
-        static constexpr auto superInit = qoriResizeSuperInit_##t;            \
-        static constexpr auto nearest = qoriResizeNearest_##t##_C##n##R;      \
-        static constexpr auto linear = qoriResizeLinear_##t##_C##n##R;        \
-        static constexpr auto cubic = qoriResizeCubic_##t##_C##n##R;          \
-        static constexpr auto lanczos = qoriResizeLanczos_##t##_C##n##R;      \
-        static constexpr auto super = qoriResizeSuper_##t##_C##n##R;          \
-        static constexpr auto widened = qoriResizeAntialiasing_##t##_C##n##R; \
-    };
-QORI_EXPORTS(uint8_t, 8u, 1)
-QORI_EXPORTS(uint8_t, 8u, 3)
-QORI_EXPORTS(uint8_t, 8u, 4)
-QORI_EXPORTS(uint16_t, 16u, 1)
-QORI_EXPORTS(float, 32f, 1)
-#undef QORI_EXPORTS
-
-constexpr int kLobes = 3;
-
-template <class T, int channels>
-std::function<void()> oursOf(QorInterpolationKind kind, bool antialiasing, Image<T> src, Image<T> dst, Sizes sizes) {
-    using E = Exports<T, channels>;
-    const QorImageSize from = sizes.src.roi(), to = sizes.dst.roi();
-    int32_t planBytes, initBytes, bufferBytes;
-    E::getSize(from, to, kind, antialiasing, &planBytes, &initBytes);
-    const Block memory = allocate(static_cast<size_t>(planBytes)), init = allocate(static_cast<size_t>(initBytes));
-    auto* plan = reinterpret_cast<QorResizePlan*>(memory.get());
-    uint8_t* scratch = init.get();
-    switch (kind) {
-        case interpNearest: E::nearestInit(from, to, plan); break;
-        case interpSuper: E::superInit(from, to, plan); break;
-        case interpLinear:
-            if (antialiasing)
-                qoriResizeAntialiasingLinearInit(from, to, plan, scratch);
-            else
-                E::linearInit(from, to, plan);
-            break;
-        case interpCubic:
-            if (antialiasing)
-                qoriResizeAntialiasingCubicInit(from, to, 0, 0.5f, plan, scratch);
-            else
-                E::cubicInit(from, to, 0, 0.5f, plan, scratch);
-            break;
-        case interpLanczos:
-            if (antialiasing)
-                qoriResizeAntialiasingLanczosInit(from, to, kLobes, plan, scratch);
-            else
-                E::lanczosInit(from, to, kLobes, plan, scratch);
-            break;
-    }
-    E::getBufferSize(plan, to, channels, &bufferBytes);
-    const Block buffer = allocate(static_cast<size_t>(bufferBytes));
-    const auto inside = [=](auto function) -> std::function<void()> {
-        return [=] {
-            function(src.data(), src.step(), dst.data(), dst.step(), {0, 0}, to,
-                     reinterpret_cast<QorResizePlan*>(memory.get()), buffer.get());
-        };
-    };
-    const auto bordered = [=](auto function) -> std::function<void()> {
-        return [=] {
-            function(src.data(), src.step(), dst.data(), dst.step(), {0, 0}, to, borderReplicate, nullptr,
-                     reinterpret_cast<QorResizePlan*>(memory.get()), buffer.get());
-        };
-    };
-    if (antialiasing) return bordered(E::widened);
-    switch (kind) {
-        case interpNearest: return inside(E::nearest);
-        case interpSuper: return inside(E::super);
-        case interpLinear: return bordered(E::linear);
-        case interpCubic: return bordered(E::cubic);
-        default: return bordered(E::lanczos);
-    }
-}
 
 #ifdef QORI_BENCH_ZIMG
 template <class T>
@@ -167,8 +74,8 @@ template <class T, int channels>
 Row row(QorInterpolationKind kind, bool antialiasing, Sizes sizes, double best) {
     const double ratio = static_cast<double>(sizes.src.pixels()) / static_cast<double>(sizes.dst.pixels());
     const auto make = [=](Size) {
-        Contenders all{oursOf<T, channels>(kind, antialiasing, Image<T>(sizes.src, channels),
-                                           Image<T>(sizes.dst, channels), sizes),
+        Contenders all{resizeJob<T, channels>(kind, antialiasing, Image<T>(sizes.src, channels),
+                                              Image<T>(sizes.dst, channels), sizes),
                        {},
                        {}};
 #ifdef QORI_BENCH_ZIMG

@@ -22,6 +22,14 @@ def load(path):
     return rows
 
 
+def print_ladders(rows):
+    """The largest step between neighbours of each ladder; above 2 it needs a reason."""
+    print(f"{'ladder':<54}{'step':>8}   where; why it has to be")
+    for operation, _, run in rows:
+        mark = "" if run["step"] <= 2 or ";" in run.get("label", "") else "   <-- above 2 without a reason"
+        print(f"{operation.removeprefix('ladder '):<54}{run['step']:>8.2f}   {run.get('label', '')}{mark}")
+
+
 def print_table(rows):
     print(f"{'operation':<34}{'size':>12}" + "".join(f"{title:>11}" for _, title, _ in COLUMNS))
     for operation, size, run in rows:
@@ -66,9 +74,14 @@ def main(arguments):
     if not rows:
         print("bench: no row matched", file=sys.stderr)
         return 1
-    print_table(rows)
-    draw(rows, arguments[1])
-    print(f"picture: {arguments[1]}")
+    ladders = [row for row in rows if "step" in row[2]]
+    rows = [row for row in rows if "step" not in row[2]]
+    if rows:
+        print_table(rows)
+        draw(rows, arguments[1])
+        print(f"picture: {arguments[1]}")
+    if ladders:
+        print_ladders(ladders)
     return 0
 
 
