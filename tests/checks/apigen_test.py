@@ -89,6 +89,19 @@ class Generator(unittest.TestCase):
         self.assertIn("QORI_MEMBER(qoriSum_16sc_AC4IRSfs, sum, QorComplex16s, QorComplex16s, AC4, AC4, IR, Sfs)",
                       apigen.members_list(self.families[0]))
 
+    def test_some_families_or_all(self):
+        self.assertEqual(["sample"], [f.stem for f in apigen.choose(self.families, ["sample"])])
+        self.assertEqual(self.families, apigen.choose(self.families, []))
+        with self.assertRaises(apigen.RegistryError):
+            apigen.choose(self.families, ["sample", "samples"])
+
+    def test_where_finds_function_and_kernels_of_every_group(self):
+        families = apigen.load(ROOT / "api")
+        for group in (g for f in families for g in f.groups):
+            lines = apigen.where(families, group.members[0].name)
+            for word in ("registry", "calls", "function", "kernels"):
+                self.assertTrue(any(line.startswith(word) for line in lines), f"{group.members[0].name}: no {word}")
+
     def test_refuses_what_it_cannot_mean(self):
         for wrong in (FAMILY.replace('"64f"', '"65f"'), FAMILY.replace('"C3P3"', '"C3Q3"'),
                       FAMILY.replace('tail = "scale"', 'tail = "scales"'), FAMILY.replace('op = "Fill"', 'op = "Sum"'

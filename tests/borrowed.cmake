@@ -1,0 +1,18 @@
+# The tests of another build over the sanitized libraries of this one.
+execute_process(COMMAND ${CMAKE_CXX_COMPILER} -print-file-name=libasan.so OUTPUT_VARIABLE sanitizer
+    OUTPUT_STRIP_TRAILING_WHITESPACE)
+file(GLOB sources CONFIGURE_DEPENDS RELATIVE ${CMAKE_CURRENT_SOURCE_DIR} */*_test.cpp)
+set(sanitized "LD_PRELOAD=${sanitizer};LD_LIBRARY_PATH=${bin}:${PROJECT_BINARY_DIR}/bin"
+    "ASAN_OPTIONS=handle_segv=2" "UBSAN_OPTIONS=print_stacktrace=1")
+foreach(source IN LISTS sources)
+    cmake_path(GET source STEM name)
+    add_test(NAME ${name} COMMAND ${QORI_TEST_PROGRAMS}/${name} --gtest_brief=1)
+    set_tests_properties(${name} PROPERTIES TIMEOUT 900 ENVIRONMENT "${sanitized}")
+endforeach()
+add_test(NAME fuzz_briefly COMMAND ${QORI_TEST_PROGRAMS}/fuzz 2000000)
+set_tests_properties(fuzz_briefly PROPERTIES ENVIRONMENT "${sanitized}")
+
+# That the programs do run over the sanitized library: one that is not would find none of its symbols.
+add_test(NAME sanitizer_is_there COMMAND ${CMAKE_COMMAND} -E env ${sanitized} LD_TRACE_LOADED_OBJECTS=1
+    ${QORI_TEST_PROGRAMS}/fuzz)
+set_tests_properties(sanitizer_is_there PROPERTIES PASS_REGULAR_EXPRESSION "${PROJECT_BINARY_DIR}/bin/libqorik5.so")
