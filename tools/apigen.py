@@ -1,8 +1,10 @@
 #!/usr/bin/env python3
 """Derives everything that lists exports from the registry in api/.
 
-    apigen.py header  FILE    the public C header
-    apigen.py build   DIR     entry table and stubs, wrappers, members, export lists, import definitions, reference pages
+    apigen.py header FILE               the public C header
+    apigen.py build DIR [FAMILY...]     entry table and stubs, wrappers, members, export lists, import definitions,
+                                        reference pages; of some families where they are named
+    apigen.py where NAME...             where exports are registered, checked and computed
 
 Files whose content does not change are left alone, so that a build repeats only what the registry changed.
 """
@@ -308,16 +310,69 @@ def build(families, folder):
     write(folder / "exports.txt", "".join(m.name + "\n" for m in members))
 
 
+def choose(families, stems):
+    unknown = set(stems) - {f.stem for f in families}
+    if unknown:
+        raise RegistryError(f"unknown families: {sorted(unknown)}")
+    return [f for f in families if not stems or f.stem in stems]
+
+
+# --- finding one's way ----------------------------------------------------------------------------------------------
+
+def lines_with(path, pattern):
+    """FILE:LINE: TEXT of each line of a file that the pattern matches."""
+    relative = path.relative_to(ROOT)
+    return [f"{relative}:{number}: {text.strip()}" for number, text in enumerate(path.read_text().splitlines(), 1)
+            if re.search(pattern, text)]
+
+
+def includes_of(path):
+    """A source and the files of src/ that it includes, theirs too."""
+    found, waiting = [], [path]
+    while waiting:
+        file = waiting.pop()
+        if file in found:
+            continue
+        found.append(file)
+        for name in re.findall(r'^#include "([^"]+)"', file.read_text(), re.MULTILINE):
+            places = [folder / name for folder in (file.parent, ROOT / "src", ROOT / "src/frame")]
+            waiting += [place for place in places if place.exists()][:1]
+    return found
+
+
+def where(families, name):
+    """The registry's line, the call that the wrapper makes, and the family's function; then the kernels' files."""
+    matches = [(f, g, m) for f in families for g in f.groups for m in g.members if m.name == name]
+    if not matches:
+        raise RegistryError(f"no export is called {name}")
+    family, group, member = matches[0]
+    place = lines_with(ROOT / "api" / f"{family.stem}.toml", rf'^call = "{re.escape(group.keys["call"])}"')
+    lines = [f"{name}({member.prototype})", f"registry   {place[0] if place else f'api/{family.stem}.toml'}",
+             f"calls      {family.namespace}::{member.call}"]
+    sources = [p for p in (ROOT / "src").rglob("*.cpp") if f'"entries/{family.stem}.inc"' in p.read_text()]
+    for file in includes_of(sources[0]):
+        if "kernels" in file.parts:
+            continue
+        lines += [f"function   {found}" for found in lines_with(file, rf"^(?!\s+(?:return|if)\b).*\b{group.id}\b( =|\()")]
+    kernels = sorted(str(f.relative_to(ROOT)) for f in includes_of(sources[0]) if "kernels" in f.parts)
+    return lines + [f"kernels    {', '.join(kernels) or 'none'}"]
+
+
 def main(arguments):
-    if len(arguments) != 2 or arguments[0] not in ("header", "build"):
+    command, *operands = arguments or [""]
+    if not operands or command not in ("header", "build", "where") or (command == "header" and len(operands) > 1):
         print(__doc__, file=sys.stderr)
         return 2
     try:
         families = load(ROOT / "api")
-        if arguments[0] == "header":
-            write(Path(arguments[1]), header(families))
+        if command == "header":
+            write(Path(operands[0]), header(families))
+        elif command == "build":
+            folder, *chosen = operands
+            build(choose(families, chosen), Path(folder))
         else:
-            build(families, Path(arguments[1]))
+            for name in operands:
+                print("\n".join(where(families, name)))
     except (RegistryError, KeyError, tomllib.TOMLDecodeError) as error:
         print(f"apigen: {error!r}", file=sys.stderr)
         return 1
