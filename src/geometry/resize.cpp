@@ -2,6 +2,7 @@
 #include "checks.h"
 #include "frame/control_scope.h"
 #include "resize_half_run.h"
+#include "resize_linear_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
 #include "resize_words_run.h"
