@@ -19,8 +19,8 @@ public:
     QuadRows(const TileSource<T, channels>& source, WorkBuffer& buffer)
         : source_(source),
           taps_(source, buffer),
-          columns_(buffer.take<float>(
-              kernels::quadColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps))) {}
+          columns_(
+              buffer.take<float>(kernels::quadColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps))) {}
 
     /// Such that the filtered rows of a strip stay in the second-level cache.
     int32_t stripPixels() const {

@@ -6,9 +6,9 @@
 namespace qori::kernels {
 namespace {
 
-/// Fine: with a = 64 (p0 - p1), the product a * -2w is 128 w (p1 - p0), below 2^29, and the rounding high multiply gives
-/// (w (p1 - p0) + 128) >> 8. -2w reaches -32768, a never does. Coarse: with w = 128 v, the same is half of
-/// p0 (128 - v) + p1 v, rounded up; that sum is 32640 at most.
+/// Fine: with a = 64 (p0 - p1), the product a * -2w is 128 w (p1 - p0), below 2^29, and the rounding high multiply
+/// gives (w (p1 - p0) + 128) >> 8. -2w reaches -32768, a never does. Coarse: with w = 128 v, the same is half of p0
+/// (128 - v) + p1 v, rounded up; that sum is 32640 at most.
 template <bool coarse>
 QORI_INLINE __m256i interpolatePairs(Bytes pairs, __m256i weights) {
     if constexpr (coarse) return _mm256_avg_epu16(_mm256_maddubs_epi16(pairs.v, weights), _mm256_setzero_si256());
@@ -139,15 +139,15 @@ void linearRow8u(const Gather& gather, LinearRow row, const int16_t* weights, bo
 
 void linearColumn8u(const int16_t* h0, const int16_t* h1, int32_t w, uint8_t* dst, ptrdiff_t elements) {
     const LinearMix mix(w);
-    (mix.nearFirst ? mixRows<false, true, true> : mixRows<false, false, true>)(h0, h1, mix.factor, mix.factor, dst,
-                                                                               dst, elements);
+    (mix.nearFirst ? mixRows<false, true, true> : mixRows<false, false, true>)(h0, h1, mix.factor, mix.factor, dst, dst,
+                                                                               elements);
 }
 
 void linearColumns8u(const int16_t* h0, const int16_t* h1, const int32_t w[2], uint8_t* dst, uint8_t* second,
                      ptrdiff_t elements) {
     const LinearMix mix(w[0]), other(w[1]);
     const auto run = mix.nearFirst     ? other.nearFirst ? mixRows<true, true, true> : mixRows<true, true, false>
-                     : other.nearFirst ? mixRows<true, false, true>
+                         : other.nearFirst ? mixRows<true, false, true>
                                        : mixRows<true, false, false>;
     run(h0, h1, mix.factor, other.factor, dst, second, elements);
 }

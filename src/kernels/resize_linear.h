@@ -14,7 +14,8 @@ struct LinearRow {
 /// what makeCoarse() made of it. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.
 void linearRow8u(const Gather& gather, LinearRow row, const int16_t* weights, bool coarse, int16_t* out);
 
-/// Turns `count` weights, a multiple of 16, into pairs of signed bytes that count 1/128, if all are such; tells whether.
+/// Turns `count` weights, a multiple of 16, into pairs of signed bytes that count 1/128, if all are such; tells
+/// whether.
 bool makeCoarse(int16_t* weights, ptrdiff_t count);
 
 /// The vertical pass: dst = (h0 * (16384 - w) + h1 * w + 0x80000) >> 20. Rows are in the order of linearOrder() and

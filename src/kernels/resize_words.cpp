@@ -207,7 +207,7 @@ void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const
     const ptrdiff_t elements = ptrdiff_t{width} * filter.channels;
     filter.groups = (elements + 15) / 16;
     filter.shared = sharesWindows(filter, pixels, width);
-    filter.cycle = filter.channels == 3 ? 3 : 1;  // sixteen pixels for three channels
+    filter.cycle = wordCycle(filter.channels);
     filter.repeats = true;
     int16_t rounded[kWordTaps] = {};
     int32_t pixel = 0, channel = 0;
