@@ -11,6 +11,7 @@ namespace qori::bench {
 namespace {
 
 constexpr Sizes kDown{{1920, 1080}, {1280, 720}}, kHalf{{3840, 2160}, {1920, 1080}}, kUp{{960, 540}, {1920, 1080}};
+constexpr Sizes kNotSimple{{1920, 1080}, {1366, 768}};  // weights that are no short binary fractions
 
 #ifdef QORI_BENCH_ZIMG
 template <class T>
@@ -117,6 +118,21 @@ const Rows nearest{rowsOf(interpNearest, false, {9'460, 3'115, 2'508}, {7'825, 2
 const Rows nearestOfFour{{row<uint8_t, 4>(interpNearest, false, kDown, 0),
                           row<uint8_t, 4>(interpNearest, false, kHalf, 0),
                           row<uint8_t, 4>(interpNearest, false, kUp, 0)}};
+
+/// Packed pixels that go other ways than one channel does.
+std::vector<Row> packedRows(QorInterpolationKind kind) {
+    std::vector<Row> rows;
+    for (const Sizes& sizes : {kDown, kUp, kNotSimple}) {
+        rows.push_back(row<uint8_t, 4>(kind, false, sizes, 0));
+        rows.push_back(row<uint16_t, 3>(kind, false, sizes, 0));
+        rows.push_back(row<uint16_t, 4>(kind, false, sizes, 0));
+    }
+    rows.push_back(row<uint8_t, 1>(kind, false, kNotSimple, 0));
+    rows.push_back(row<uint8_t, 3>(kind, false, kNotSimple, 0));
+    return rows;
+}
+const Rows packedLinear{packedRows(interpLinear)}, packedCubic{packedRows(interpCubic)};
+
 const Rows linear{rowsOf(interpLinear, false, {6'077, 755, 1'240}, {5'835, 872, 1'411}, {13'581, 2'049, 4'137})};
 const Rows cubic{rowsOf(interpCubic, false, {2'051, 597, 460}, {1'355, 502, 349}, {3'133, 915, 3'357})};
 const Rows lanczos{rowsOf(interpLanczos, false, {208, 82, 190}, {156, 57, 145}, {2'457, 158, 2'405})};

@@ -34,6 +34,8 @@ QORI_EXPORTS(uint8_t, 8u, 1)
 QORI_EXPORTS(uint8_t, 8u, 3)
 QORI_EXPORTS(uint8_t, 8u, 4)
 QORI_EXPORTS(uint16_t, 16u, 1)
+QORI_EXPORTS(uint16_t, 16u, 3)
+QORI_EXPORTS(uint16_t, 16u, 4)
 QORI_EXPORTS(float, 32f, 1)
 #undef QORI_EXPORTS
 

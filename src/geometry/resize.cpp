@@ -2,6 +2,8 @@
 #include "checks.h"
 #include "frame/control_scope.h"
 #include "resize_half_run.h"
+#include "resize_linear_run.h"
+#include "resize_quads_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
 #include "resize_words_run.h"
@@ -101,6 +103,10 @@ auto withWay(const ResizePlan& plan, Visit visit) {
         }
         if constexpr (channels == 1)
             if (PhaseRows<T>::suits(plan)) return visit.template operator()<TapsTile<T, 1, PhaseRows<T>>>();
+        if constexpr (channels > 1) {
+            using Quads = QuadRows<T, channels>;
+            if (Quads::suits(plan)) return visit.template operator()<TapsTile<T, channels, Quads>>();
+        }
         using Lines = LineRows<T, channels>;
         if (Lines::suits(plan)) return visit.template operator()<TapsTile<T, channels, Lines>>();
         return visit.template operator()<TapsTile<T, channels, TurnedRows<T, channels>>>();

@@ -48,16 +48,4 @@ void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, u
 /// Leaves alike only those groups that have the 16 weights of the group two before them, too.
 void compareWeights(Gather& gather, const int16_t* weights);
 
-/// The fixed-point horizontal pass of linear 8u. A group is 16 pairs of neighbours (p0, p1); `weights` holds -2w per
-/// pair, w in 0..16384. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.
-void linearRow8u(const Gather& gather, const uint8_t* row, const int16_t* weights, int16_t* out);
-
-/// The vertical pass: dst = (h0 * (16384 - w) + h1 * w + 0x80000) >> 20. Rows are in the order of linearOrder() and
-/// hold whole blocks of 32 elements.
-void linearColumn8u(const int16_t* h0, const int16_t* h1, int32_t w, uint8_t* dst, ptrdiff_t elements);
-
-/// Place of element i in a row of linearRow8u: within each 32 the second and third eight change places, so that packing
-/// two vectors to bytes puts them in order.
-constexpr ptrdiff_t linearOrder(ptrdiff_t i) { return (i & ~ptrdiff_t{24}) | (i & 8) << 1 | (i & 16) >> 1; }
-
 }  // namespace qori::kernels

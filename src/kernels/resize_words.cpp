@@ -8,27 +8,29 @@ namespace {
 
 constexpr int kOne = 1 << 14, kDropped = 7;  // of a row's sum, between the passes
 
+/// Groups after which elements stand at the same channel: sixteen pixels for three channels.
+constexpr int wordCycle(int channels) { return channels == 3 ? 3 : 1; }
+
 /// Octets of a row from their windows. `taps` 0 is any number.
-template <int taps, bool shared>
+template <int channels, int taps, bool shared>
 QORI_INLINE __m256i sumOctet(const uint8_t* low, const uint8_t* high, Bytes order, const __m256i* weights,
-                             int32_t count, ptrdiff_t twoPixels) {
+                             int32_t count) {
     const int32_t n = taps > 0 ? taps : count;
     __m256i sum = _mm256_set1_epi32((1 << (kDropped - 1)) - 128 * kOne);
 #pragma GCC unroll 8
     for (int32_t k = 0; k < n; k += 2) {
         const Bytes window = shared ? loadTwice(low) : loadHalves(low, high);
         sum = _mm256_add_epi32(sum, _mm256_madd_epi16(shuffleHalves(window, order).v, _mm256_load_si256(weights++)));
-        low += twoPixels;
-        high += twoPixels;
+        low += 2 * channels;
+        high += 2 * channels;
     }
     return _mm256_srai_epi32(sum, kDropped);
 }
 
 /// One group of both rows.
-template <int taps, bool shared>
+template <int channels, int taps, bool shared>
 QORI_INLINE void filterGroup(const WordFilter& filter, const WordLines& lines, const WordGroup& tables,
                              const __m256i* weights, const int32_t bases[2][2], int16_t* out) {
-    const ptrdiff_t twoPixels = 2 * ptrdiff_t{filter.channels};
     const int32_t octet = (taps > 0 ? taps : filter.taps) / 2;
     // A group moves on by 64 bytes at most.
     prefetch(lines.laterFirst + bases[0][0]);
@@ -37,8 +39,8 @@ QORI_INLINE void filterGroup(const WordFilter& filter, const WordLines& lines, c
     __m256i words[2];
     for (int row = 0; row < 2; ++row) {
         const auto sum = [&](int i) {
-            return sumOctet<taps, shared>(rows[row] + bases[i][0], rows[row] + bases[i][1], load(tables.masks[i]),
-                                          weights + i * octet, filter.taps, twoPixels);
+            return sumOctet<channels, taps, shared>(rows[row] + bases[i][0], rows[row] + bases[i][1],
+                                                    load(tables.masks[i]), weights + i * octet, filter.taps);
         };
         words[row] = _mm256_packs_epi32(sum(0), sum(1));
     }
@@ -48,8 +50,9 @@ QORI_INLINE void filterGroup(const WordFilter& filter, const WordLines& lines, c
 
 /// The groups of whole cycles, but the last; returns their number. From copies of the tables, which no store can
 /// change.
-template <int taps, bool shared, int cycle>
+template <int channels, int taps, bool shared>
 QORI_INLINE ptrdiff_t filterCycles(const WordFilter& filter, WordLines lines, int16_t* out) {
+    constexpr int cycle = wordCycle(channels);
     WordGroup groups[cycle];
     __m256i weights[cycle * taps];
     for (int c = 0; c < cycle; ++c) groups[c] = filter.list[c];
@@ -59,29 +62,36 @@ QORI_INLINE ptrdiff_t filterCycles(const WordFilter& filter, WordLines lines, in
     ptrdiff_t g = 0;
     for (; g + cycle < filter.groups; g += cycle) {
         for (int c = 0; c < cycle; ++c, out += 32)
-            filterGroup<taps, shared>(filter, lines, groups[c], weights + c * taps, groups[c].bases, out);
+            filterGroup<channels, taps, shared>(filter, lines, groups[c], weights + c * taps, groups[c].bases, out);
         lines = {lines.first + step, lines.second + step, lines.laterFirst + step, lines.laterSecond + step};
     }
     return g;
 }
 
-template <int taps, bool shared>
+template <int channels, int taps, bool shared>
 QORI_NOINLINE void filterWordsOf(const WordFilter& filter, WordLines lines, int16_t* out) {
     const auto* weights = reinterpret_cast<const __m256i*>(filter.weights);
     ptrdiff_t g = 0;
     if constexpr (taps > 0)
-        if (filter.repeats && filter.groups > 2 * filter.cycle)
-            g = filter.cycle == 1 ? filterCycles<taps, shared, 1>(filter, lines, out)
-                                  : filterCycles<taps, shared, 3>(filter, lines, out);
+        if (filter.repeats && filter.groups > 2 * wordCycle(channels))
+            g = filterCycles<channels, taps, shared>(filter, lines, out);
     for (; g < filter.groups; ++g) {
         const WordGroup& group = filter.list[g];
-        filterGroup<taps, shared>(filter, lines, group, weights + g * filter.taps, group.bases, out + 32 * g);
+        filterGroup<channels, taps, shared>(filter, lines, group, weights + g * filter.taps, group.bases, out + 32 * g);
     }
 }
 
 template <int taps>
 void filterWordsOf(const WordFilter& filter, WordLines lines, int16_t* out) {
-    (filter.shared ? filterWordsOf<taps, true> : filterWordsOf<taps, false>)(filter, lines, out);
+    const auto filterChannels = [&]<int channels>() {
+        (filter.shared ? filterWordsOf<channels, taps, true> : filterWordsOf<channels, taps, false>)(filter, lines,
+                                                                                                     out);
+    };
+    switch (filter.channels) {
+        case 1: return filterChannels.template operator()<1>();
+        case 3: return filterChannels.template operator()<3>();
+        default: return filterChannels.template operator()<4>();
+    }
 }
 
 /// Sixteen elements of 21 fractional bits, rounded but not yet saturated to bytes.
@@ -197,7 +207,7 @@ void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const
     const ptrdiff_t elements = ptrdiff_t{width} * filter.channels;
     filter.groups = (elements + 15) / 16;
     filter.shared = sharesWindows(filter, pixels, width);
-    filter.cycle = filter.channels == 3 ? 3 : 1;  // sixteen pixels for three channels
+    filter.cycle = wordCycle(filter.channels);
     filter.repeats = true;
     int16_t rounded[kWordTaps] = {};
     int32_t pixel = 0, channel = 0;

@@ -1,0 +1,69 @@
+// SPDX-License-Identifier: Apache-2.0
+// Filtering the rows of a tile of three or four channels, four at once: one of the ways of resize_rows.h.
+#pragma once
+#include "kernels/resize_quads.h"
+#include "resize_rows.h"
+
+namespace qori::geometry {
+
+template <class T, int channels>
+class QuadRows {
+public:
+    /// Footprints of super-sampling are padded with zero weights, which must not meet infinities.
+    static bool suits(const ResizePlan& plan) {
+        constexpr bool isFloat = std::is_same_v<T, float>;
+        if (isFloat && plan.interpolation == interpSuper) return false;
+        return kernels::suitsQuads(plan.horizontal.ratio(), plan.columnTaps, channels, isFloat);
+    }
+
+    QuadRows(const TileSource<T, channels>& source, WorkBuffer& buffer)
+        : source_(source),
+          taps_(source, buffer),
+          columns_(
+              buffer.take<float>(kernels::quadColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps))) {}
+
+    /// Such that the filtered rows of a strip stay in the second-level cache.
+    int32_t stripPixels() const {
+        constexpr int32_t kRingFloats = 24576;
+        return wholeChunks(kRingFloats / ringRows() / channels);
+    }
+    int32_t ringRows() const { return rowsOfPairs(source_.plan) + kernels::kQuadRows - 1; }
+
+    void begin() { taps_.list(source_); }
+    void beginStrip(int32_t x, int32_t width) {
+        const ResizePlan& plan = source_.plan;
+        filter_ = {taps_.pixels + x,
+                   taps_.weights,
+                   plan.columnTaps,
+                   width,
+                   source_.columns.first,
+                   source_.columns.last,
+                   kernels::quadGroup(plan.horizontal.ratio()),
+                   columns_};
+        newest_ = INT32_MIN;
+    }
+    /// Where there are fewer than four rows left, the last is done again.
+    void filterNext(RowSequence& sequence, Ring& ring) {
+        const T* rows[kernels::kQuadRows];
+        float* out[kernels::kQuadRows];
+        for (int32_t i = 0; i < kernels::kQuadRows; ++i) {
+            if (!sequence.done()) {
+                newest_ = sequence.next();
+                out[i] = ring.next();
+            } else {
+                out[i] = out[i - 1];
+            }
+            rows[i] = source_.at(newest_, 0);
+        }
+        kernels::filterQuads<T, channels>(filter_, rows, out);
+    }
+
+private:
+    const TileSource<T, channels>& source_;
+    ColumnTaps<T, channels> taps_;
+    float* columns_;
+    kernels::QuadFilter filter_{};
+    int32_t newest_ = 0;
+};
+
+}  // namespace qori::geometry
