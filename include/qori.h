@@ -3137,6 +3137,138 @@ QORI_API QorComplex32f* QORI_CALL qoriMalloc_32fc_AC4(int32_t width, int32_t hei
  */
 QORI_API void QORI_CALL qoriFree(void* ptr);
 
+/* ---- Morphology ----------------------------------------------------------------------------------------------- */
+
+/** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel.
+ *  Shapes    pSrc points at the region's first pixel inside a source: one pixel around the region is read on
+ *            every side.
+ *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
+ *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
+ *  Aliasing  pSrc == pDst with equal steps runs the in-place form with its checks, before any other. Otherwise
+ *            the source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP_TOO_SMALL (srcStep below the bytes of width +
+ *            2 pixels, dstStep below those of width); then nothing is written.
+ *  Example   const uint8_t *inside = frame + frameStep + 1;    // a rim of one pixel around it
+ *            qoriErode3x3_8u_C1R(inside, frameStep, out, outStep, (QorImageSize){width - 2, height - 2});
+ */
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Erosion by the 3 x 3 square in place.
+ *  Shapes    pSrcDst points at the region's first pixel inside an image: one pixel around the region is read on
+ *            every side.
+ *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
+ *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
+ *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
+ *  Notes     Takes two rows of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP_TOO_SMALL (srcDstStep below the bytes of
+ *            width + 2 pixels), QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriErode3x3_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel.
+ *  Shapes    pSrc points at the region's first pixel inside a source: one pixel around the region is read on
+ *            every side.
+ *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
+ *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
+ *  Aliasing  pSrc == pDst with equal steps runs the in-place form with its checks, before any other. Otherwise
+ *            the source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP_TOO_SMALL (srcStep below the bytes of width +
+ *            2 pixels, dstStep below those of width); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+
+/** Dilation by the 3 x 3 square in place.
+ *  Shapes    pSrcDst points at the region's first pixel inside an image: one pixel around the region is read on
+ *            every side.
+ *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
+ *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
+ *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
+ *  Notes     Takes two rows of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP_TOO_SMALL (srcDstStep below the bytes of
+ *            width + 2 pixels), QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriDilate3x3_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
 /* ---- Norms, sums, means and dot products ---------------------------------------------------------------------- */
 
 /** Adds the elements of each channel.
