@@ -60,15 +60,6 @@ void run(const BorderedImage& src, Image<T> dst, uint8_t* memory) {
         [&](const WindowPart& part, int32_t y, int32_t rows) { makeRows<Order, stores, layout>(part, y, rows, dst); });
 }
 
-/// Integers do not read the control register.
-template <class T, class Body>
-QorResult underControl(Body body) {
-    if constexpr (std::is_floating_point_v<T>)
-        return underDefaultControl(body);
-    else
-        return body();
-}
-
 template <class T>
 bool isAligned(Image<T> image) {
     return (reinterpret_cast<uintptr_t>(image.data) | static_cast<uintptr_t>(image.step)) % 32 == 0;
@@ -83,7 +74,7 @@ QorResult extreme3x3InPlace(Image<T> image, QorImageSize roi) {
     const int64_t bytes = RowWindow::bytes(src, needs(Place::inOrder));
     auto* memory = bytes > INT32_MAX ? nullptr : static_cast<uint8_t*>(qorMalloc(static_cast<int32_t>(bytes)));
     if (memory == nullptr) return QOR_ERR_NO_MEMORY;
-    const QorResult result = underControl<T>([&] {
+    const QorResult result = underControlOf<T>([&] {
         run<Order, Stores::delayed, layout>(src, image, memory);
         return QOR_OK;
     });
@@ -99,7 +90,7 @@ QorResult extreme3x3(Image<const T> src, Image<T> dst, QorImageSize roi) {
                                       stepFits<layout, T>(src.step, int64_t{roi.width} + 2 * kReach),
                                       stepFits<layout, T>(dst.step, roi.width));
     if (checked != QOR_OK) return checked;
-    return underControl<T>([&] {
+    return underControlOf<T>([&] {
         const BorderedImage image = around<layout>(src, roi);
         constexpr int kBytesPerPixel = 2 * channels(layout) * elementBytes<T>;
         if constexpr (layout != Layout::AC4)  // which has the destination in the cache, having read it

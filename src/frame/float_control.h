@@ -5,6 +5,8 @@
 #pragma once
 #include <immintrin.h>
 
+#include <type_traits>
+
 #include "qori.h"
 
 namespace qori {
@@ -33,6 +35,16 @@ QorResult underDefaultControl(Body body) {
     const QorResult result = run(&body);
     if (differs) _mm_setcsr(callers);
     return result;
+}
+
+/// As underDefaultControl where elements are floats. For families whose integer members compute with integer
+/// instructions only.
+template <class T, class Body>
+QorResult underControlOf(Body body) {
+    if constexpr (std::is_floating_point_v<T>)
+        return underDefaultControl(body);
+    else
+        return body();
 }
 
 }  // namespace qori
