@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Histograms with levels given in the call or prepared in a record.
+#include <cfloat>
+
 #include "checks.h"
 #include "float_control.h"
 #include "histogram_count.h"
+#include "plan.h"
 
 namespace qori::stats {
 namespace {
@@ -129,18 +132,17 @@ QorResult typeCheck(int32_t type) {
     return type == qor8u || type == qor16u || type == qor16s || type == qor32f ? QOR_OK : QOR_ERR_DATA_TYPE;
 }
 
-/// Truncation towards zero; what does not fit becomes the least integer.
-int32_t truncated(float value) { return _mm_cvttss_si32(_mm_set_ss(value)); }
-int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(value)); }
+/// Truncation towards zero; what 32 bits do not hold, infinity included, becomes the nearest end of their range.
+int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(std::clamp<double>(value, INT32_MIN, INT32_MAX))); }
 
 QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t,
                          int32_t* pSpecSize, int32_t* pBufferSize) {
     if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels)))
         return r;
     if (QorResult r = levelCountCheck(nLevels, numChannels)) return r;
-    uint32_t words = sizeof(Record) / 4;
-    for (int c = 0; c < numChannels; ++c) words += static_cast<uint32_t>(nLevels[c]);
-    *pSpecSize = static_cast<int32_t>(4 * words);
+    int64_t words = sizeof(Record) / 4;
+    for (int c = 0; c < numChannels; ++c) words += nLevels[c];
+    if (QorResult r = reportSize(4 * words, pSpecSize)) return r;
     const int32_t values = dataType == qor8u                          ? kValues<uint8_t>
                            : dataType == qor16u || dataType == qor16s ? kValues<uint16_t>
                                                                       : 0;
@@ -152,36 +154,45 @@ QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int
                         QorHistogramSpec* pSpec) {
     if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelCheck(numChannels)))
         return r;
-    for (int c = 0; c < numChannels; ++c) {
-        if (QorResult r = firstOf(nullCheck(pLevels[c]), levelCountCheck(nLevels + c, 1))) return r;
-        if (!strictlyIncreasing(pLevels[c], nLevels[c])) return QOR_ERR_BAD_RANGE;
-    }
-    Record* const record = recordOf(pSpec);
-    record->begin(dataType, numChannels, 0, nLevels);
-    for (int c = 0; c < numChannels; ++c)
-        for (int32_t k = 0; k < nLevels[c]; ++k) {
-            if (dataType == qor32f)
-                record->levels<float>(c)[k] = pLevels[c][k];
-            else
-                record->levels<int32_t>(c)[k] = truncated(pLevels[c][k]);
+    return underDefaultControl([=]() -> QorResult {
+        for (int c = 0; c < numChannels; ++c) {
+            if (QorResult r = firstOf(nullCheck(pLevels[c]), levelCountCheck(nLevels + c, 1))) return r;
+            if (!strictlyIncreasing(pLevels[c], nLevels[c])) return QOR_ERR_BAD_RANGE;
         }
-    return QOR_OK;
+        Record* const record = recordOf(pSpec);
+        record->begin(dataType, numChannels, 0, nLevels);
+        for (int c = 0; c < numChannels; ++c)
+            for (int32_t k = 0; k < nLevels[c]; ++k) {
+                if (dataType == qor32f)
+                    record->levels<float>(c)[k] = pLevels[c][k];
+                else
+                    record->levels<int32_t>(c)[k] = truncated(double(pLevels[c][k]));
+            }
+        return QOR_OK;
+    });
 }
 
+/// An infinite bound spaces like the largest float.
+double spacingBound(float bound) { return std::clamp<double>(double(bound), -double(FLT_MAX), double(FLT_MAX)); }
+
+/// Level k is k * width + lower, fused in double precision, with a width of single precision, that of a difference that
+/// floats do not hold included: 3 levels or more bring it back.
 void spaceUniformly(float lower, float upper, int32_t count, float* levels) {
-    const float width = (upper - lower) / static_cast<float>(count - 1);
+    const double from = spacingBound(lower), span = spacingBound(upper) - from;
+    const float rounded = static_cast<float>(span), bins = static_cast<float>(count - 1);
+    const double width = rounded > FLT_MAX ? double(static_cast<float>(span / (count - 1))) : double(rounded / bins);
     for (int32_t k = 1; k < count - 1; ++k)
-        levels[k] = static_cast<float>(__builtin_fma(double(k), double(width), double(lower)));
+        levels[k] = static_cast<float>(std::min(__builtin_fma(double(k), width, from), double(FLT_MAX)));
     levels[0] = lower;
     levels[count - 1] = upper;
 }
 
 /// Returns the width of a bin.
 double spaceUniformly(float lower, float upper, int32_t count, int32_t* levels) {
-    const double width = (double(upper) - double(lower)) / (count - 1);
-    for (int32_t k = 1; k < count - 1; ++k) levels[k] = truncated(k * width + double(lower));
-    levels[0] = truncated(lower);
-    levels[count - 1] = truncated(upper);
+    const double from = spacingBound(lower), width = (spacingBound(upper) - from) / (count - 1);
+    for (int32_t k = 1; k < count - 1; ++k) levels[k] = truncated(k * width + from);
+    levels[0] = truncated(double(lower));
+    levels[count - 1] = truncated(double(upper));
     return width;
 }
 
@@ -190,11 +201,11 @@ QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const
     if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLowerLevel, pUpperLevel, nLevels, pSpec),
                               channelCheck(numChannels)))
         return r;
-    for (int c = 0; c < numChannels; ++c) {
-        if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
-        if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
-    }
-    return underDefaultControl([&]() -> QorResult {
+    return underDefaultControl([=]() -> QorResult {
+        for (int c = 0; c < numChannels; ++c) {
+            if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
+            if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
+        }
         Record* const record = recordOf(pSpec);
         record->begin(dataType, numChannels, 1, nLevels);
         QorResult result = QOR_OK;
