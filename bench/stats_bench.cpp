@@ -254,30 +254,38 @@ const Rows extrema{{
                                 plainSum<uint8_t, 1>([](auto a, auto) { return a >= 50 && a <= 180; })),
 }};
 
-/// Noise over the whole type; `flat` makes all pixels equal. plain is one table and one loop.
+/// Noise over the whole type, 0 to 1 for floats; `flat` makes all pixels equal. plain is one table and one loop: a
+/// counter for every value, or 256 between 0 and 1.
 template <class T, int n, class Ours>
-Row histogramRow(std::string name, bool flat, Ours ours, Best best = {}) {
+Row histogramRow(std::string name, bool flat, Ours ours, Best best = {},
+                 std::vector<Size> sizes = {kL1, kL2, kFrame, kNarrow}) {
+    constexpr bool isFloat = std::is_floating_point_v<T>;
     const auto make = [=](Size size) {
         Image<T> image(size, n);
         uint32_t state = 7;
         for (int y = 0; y < size.height; ++y)
-            for (int i = 0; i < image.elements(); ++i)
-                image.row(y)[i] = flat ? T{9} : static_cast<T>((state = state * 1664525u + 1013904223u) >> 12);
-        const auto table = std::make_shared<std::vector<int32_t>>(n << 8 * sizeof(T));
+            for (int i = 0; i < image.elements(); ++i) {
+                state = state * 1664525u + 1013904223u;
+                image.row(y)[i] = flat ? static_cast<T>(isFloat ? 0.3 : 9)
+                                       : static_cast<T>(isFloat ? (state >> 8) / 16'777'216.0 : state >> 12);
+            }
+        const auto table = std::make_shared<std::vector<int32_t>>(n << (isFloat ? 8 : 8 * sizeof(T)));
         return Contenders{
             [=] { ours(image, size.roi()); },
             [=] {
                 for (int y = 0; y < size.height; ++y)
                     for (int x = 0; x < size.width; ++x)
-                        for (int c = 0; c < n; ++c)
-                            ++(*table)[static_cast<size_t>(image.row(y)[x * n + c]) * n + static_cast<size_t>(c)];
+                        for (int c = 0; c < n; ++c) {
+                            const auto value = image.row(y)[x * n + c];
+                            ++(*table)[static_cast<size_t>(isFloat ? value * 256 : value) * n + static_cast<size_t>(c)];
+                        }
                 keep(table->data());
             },
             {}};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = n * sizeof(T),
-            .sizes = {kL1, kL2, kFrame, kNarrow},
+            .sizes = std::move(sizes),
             .make = make,
             .roofline = Roofline::read,
             .bestAtL2 = best.atL2,
@@ -327,14 +335,50 @@ const auto searched = [](const Image<uint16_t>& image, QorImageSize roi) {
     keep(bins);
 };
 
-const Rows histograms{{
-    histogramRow<uint8_t, 1>("histogram 8u C1 256 bins", false, bytes1, {3'325, 3'159}),
-    histogramRow<uint8_t, 1>("histogram 8u C1 256 bins, constant", true, bytes1),
-    histogramRow<uint8_t, 3>("histogram 8u C3 256 bins", false, bytes3, {1'100, 1'021}),
-    histogramRow<uint16_t, 1>("histogram 16u C1 65536 bins", false, words(65'537), {1'493, 1'420}),
-    histogramRow<uint16_t, 1>("histogram 16u C1 65536 bins, constant", true, words(65'537)),
-    histogramRow<uint16_t, 1>("histogram even 16u C1 256 bins", false, searched),
-}};
+/// `count` levels over the whole range, each given `times` times.
+template <class T>
+auto ranged(int32_t count, int32_t times = 1) {
+    using Level = std::conditional_t<std::is_floating_point_v<T>, float, int32_t>;
+    std::vector<Level> levels;
+    for (int32_t k = 0; k < count; ++k) {
+        const double part = double(k / times * times) / (count - 1);
+        levels.push_back(static_cast<Level>(std::is_floating_point_v<T> ? part : part * 65'536));
+    }
+    const auto bins = std::make_shared<std::vector<int32_t>>(count);
+    return [=](const Image<T>& image, QorImageSize roi) {
+        if constexpr (std::is_floating_point_v<T>)
+            qoriHistogramRange_32f_C1R(image.data(), image.step(), roi, bins->data(), levels.data(), count);
+        else
+            qoriHistogramRange_16u_C1R(image.data(), image.step(), roi, bins->data(), levels.data(), count);
+        keep(bins->data());
+    };
+}
+
+std::vector<Row> histogramRows() {
+    std::vector<Row> rows{
+        histogramRow<uint8_t, 1>("histogram 8u C1 256 bins", false, bytes1, {3'325, 3'159}),
+        histogramRow<uint8_t, 1>("histogram 8u C1 256 bins, constant", true, bytes1),
+        histogramRow<uint8_t, 3>("histogram 8u C3 256 bins", false, bytes3, {1'100, 1'021}),
+        histogramRow<uint16_t, 1>("histogram 16u C1 65536 bins", false, words(65'537), {1'493, 1'420}),
+        histogramRow<uint16_t, 1>("histogram 16u C1 65536 bins, constant", true, words(65'537)),
+        histogramRow<uint16_t, 1>("histogram 16u C1 256 bins", false, words(257), {}, {kSmall, kL1, kL2}),
+        histogramRow<uint16_t, 1>("histogram even 16u C1 256 bins", false, searched),
+        histogramRow<uint16_t, 1>("range 16u C1 65536 bins", false, ranged<uint16_t>(65'537), {}, {kSmall, kL2}),
+        histogramRow<uint16_t, 1>("range 16u C1 1100 levels thrice", false, ranged<uint16_t>(3'300, 3), {}, {kL2}),
+        histogramRow<float, 1>("range 32f C1 256 bins, constant", true, ranged<float>(257), {}, {kL2}),
+        histogramRow<float, 1>("range 32f C1 333 levels thrice", false, ranged<float>(999, 3), {}, {kL2}),
+    };
+    // Ladders: what one level more costs.
+    for (int32_t count : {2, 9, 32, 33, 257, 2'049, 2'100, 4'096})
+        rows.push_back(histogramRow<uint16_t, 1>("range 16u C1, levels " + std::to_string(count), false,
+                                                 ranged<uint16_t>(count), {}, {kSmall, kL2}));
+    for (int32_t count : {2, 9, 32, 64, 65, 257, 2'048, 4'096})
+        rows.push_back(histogramRow<float, 1>("range 32f C1, levels " + std::to_string(count), false,
+                                              ranged<float>(count), {}, {kSmall, kL2}));
+    return rows;
+}
+
+const Rows histograms(histogramRows());
 
 }  // namespace
 }  // namespace qori::bench

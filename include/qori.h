@@ -2901,7 +2901,10 @@ QORI_API QorResult QORI_CALL qoriFilterBorder_32f_C4R(const float* pSrc, int32_t
  *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
  *  Notes     A value equal to the last level is not counted. Levels need not ascend: a pixel counts in every
  *            bin that holds it, and a bin whose lower level is not below its upper one stays 0. NaN counts
- *            nowhere.
+ *            nowhere. Levels and pixels are compared as they are: the caller's floating-point modes change no
+ *            count, subnormals count as such and nothing traps. Levels in ascending order, equal ones among
+ *            them, cost the same for all data; more than 64 levels of 32f without order are compared one by
+ *            one.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_HIST_LEVELS (an nLevels below 2); then nothing is
  *            written.
@@ -2995,17 +2998,20 @@ QORI_API QorResult QORI_CALL qoriHistogramEven_16s_AC4R(const int16_t* pSrc, int
  *            do not change the sizes.
  *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
  *  Notes     dataType is a QorDataType. One that is not supported is reported only after the record's size and
- *            a buffer size of 0 have been written.
+ *            a buffer size of 0 have been written. Counts whose record 32 bits cannot measure are refused
+ *            before, with nothing written.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_HIST_LEVELS (an nLevels
- *            below 2), QOR_ERR_DATA_TYPE; then nothing is written.
+ *            below 2), QOR_ERR_SIZE (the record would take 2^31 bytes or more), QOR_ERR_DATA_TYPE; then nothing
+ *            is written.
  */
 QORI_API QorResult QORI_CALL qoriHistogramGetBufferSize(int32_t dataType, QorImageSize roiSize, const int32_t* nLevels,
     int32_t numChannels, int32_t uniform, int32_t* pSpecSize, int32_t* pBufferSize);
 
 /** Prepares a histogram with given levels.
  *  Shapes    pLevels holds one array of float levels per channel, nLevels one count per channel.
- *  Elements  For integer types the levels are truncated towards zero.
+ *  Elements  For integer types the levels are truncated towards zero; those beyond 32 bits, infinite ones
+ *            included, become 2147483647 or -2147483648, which count as the nearest end of the pixels' range.
  *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
  *  Notes     The record points into itself on 32-bit systems: do not move it.
  *  Returns   QOR_OK; in this order QOR_ERR_DATA_TYPE (before anything else), QOR_ERR_NULL_PTR (a pointer is
@@ -3018,8 +3024,11 @@ QORI_API QorResult QORI_CALL qoriHistogramInit(int32_t dataType, const float* co
 
 /** Prepares a histogram with levels spaced uniformly from pLowerLevel to pUpperLevel.
  *  Shapes    One lower and one upper level and one count per channel.
- *  Elements  32f: level k is the fused k * width + lower, in double precision; integer types: k * width +
- *            lower, truncated towards zero.
+ *  Elements  32f: level k is the fused k * width + lower, in double precision, with a width of single
+ *            precision; integer types: k * width + lower, in double precision, truncated towards zero, and
+ *            beyond 32 bits 2147483647 or -2147483648, which count as the nearest end of the pixels' range. No
+ *            level between finite bounds overflows. An infinite bound is the first or last level itself; the
+ *            others are spaced as if it were the largest finite float.
  *  Aliasing  The image is only read. Bins, levels, record and buffer must not overlap it or each other.
  *  Notes     Returns QOR_WARN_ADJUSTED, with the record filled, where the bins of an integer type come out
  *            narrower than 1: some are empty. The record points into itself on 32-bit systems: do not move it.

@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Histogram kernels: counts of every value of small types, sums of counters between levels, and searches of the bin of
-// one element.
+// Histogram kernels for types of few values: counts of every value, and sums of counters between levels.
 #pragma once
 #include <algorithm>
 
@@ -111,105 +110,6 @@ inline void sumBins(const uint32_t* counters, int32_t values, int32_t lowest, co
         const int32_t to = clamped(levels[k + 1]);
         bins[k++] = from < to ? static_cast<int32_t>(detail::sumCounters(counters + from, counters + to)) : 0;
     }
-}
-
-template <class L>
-bool strictlyIncreasing(const L* levels, int32_t count) {
-    for (int32_t k = 1; k < count; ++k)
-        if (!(levels[k - 1] < levels[k])) return false;
-    return true;
-}
-
-/// Counts an element in every bin that holds it: bins of disordered levels overlap.
-template <class L>
-void countInAllBins(L value, const L* levels, int32_t count, int32_t* bins) {
-    for (int32_t k = 0; k < count - 1; ++k) bins[k] += levels[k] <= value && value < levels[k + 1];
-}
-
-/// How many of `count` increasing levels from `first` on are not above the value. The number of steps depends on the
-/// count alone and no step branches on the data.
-template <class L>
-QORI_INLINE int32_t levelsUpTo(L value, const L* first, int32_t count) {
-    const L* at = first;
-    while (count > 0) {
-        const int32_t half = (count + 1) >> 1;
-        at += at[half - 1] <= value ? half : 0;
-        count -= half;
-    }
-    return static_cast<int32_t>(at - first);
-}
-
-/// Counts 16-bit elements among increasing levels. Elements are counted by cells of 32 values, in two tables, so that
-/// equal neighbours do not wait for each other's store. Where levels lie inside a cell, its elements are searched for
-/// one by one.
-class WordBins {
-public:
-    WordBins(const int32_t* levels, int32_t count, int32_t lowest, int32_t* bins)
-        : levels_(levels), last_(count - 1), lowest_(lowest), bins_(bins) {
-        int32_t k = 0, first = lowest;
-        for (int cell = 0; cell < kCells; ++cell) {
-            while (k < count && levels[k] <= first) ++k;
-            below_[cell] = k;
-            first += 1 << kCellBits;
-            while (k < count && levels[k] < first) ++k;
-            inside_[cell] = static_cast<uint8_t>(k - below_[cell]);
-        }
-    }
-    template <class T>
-    QORI_NOINLINE void countRow(const T* src, ptrdiff_t pixels, int step) {
-        const auto countIn = [this](uint32_t* counts, int32_t value) {
-            const int32_t cell = (value - lowest_) >> kCellBits;
-            ++counts[cell];
-            if (inside_[cell] != 0) [[unlikely]]
-                addToBin(below_[cell] + levelsUpTo(value, levels_ + below_[cell], inside_[cell]) - 1, 1);
-        };
-        ptrdiff_t x = 0;
-        for (; x <= pixels - 2; x += 2, src += 2 * step) {
-            countIn(counts_[0], src[0]);
-            countIn(counts_[1], src[step]);
-        }
-        if (x < pixels) countIn(counts_[0], *src);
-    }
-    /// Adds the counts of whole cells to their bins.
-    void finish() {
-        for (int cell = 0; cell < kCells; ++cell)
-            if (inside_[cell] == 0) addToBin(below_[cell] - 1, counts_[0][cell] + counts_[1][cell]);
-    }
-
-private:
-    static constexpr int kCellBits = 5;
-    static constexpr int32_t kCells = 65'536 >> kCellBits;
-
-    void addToBin(int32_t bin, uint32_t count) {
-        if (static_cast<uint32_t>(bin) < static_cast<uint32_t>(last_)) bins_[bin] += static_cast<int32_t>(count);
-    }
-
-    const int32_t* levels_;
-    int32_t last_;
-    int32_t lowest_;  ///< Least value of the element type.
-    int32_t* bins_;
-    int32_t below_[kCells];   ///< Levels that are not above the cell's first value.
-    uint8_t inside_[kCells];  ///< Levels among its other values.
-    uint32_t counts_[2][kCells] = {};
-};
-
-/// Counts one channel of a row of floats among increasing levels; step is the distance of its elements.
-QORI_NOINLINE inline void countFloatsRow(const float* src, ptrdiff_t pixels, int step, const float* levels,
-                                         int32_t count, int32_t* bins) {
-    // Outside 0 .. count - 2 where there is no bin. NaN is above no level.
-    const auto binOf = [=](float value) { return levelsUpTo(value, levels, count) - 1; };
-    const auto countIn = [=](int32_t bin) {
-        if (static_cast<uint32_t>(bin) < static_cast<uint32_t>(count - 1)) ++bins[bin];
-    };
-    ptrdiff_t x = 0;
-    for (; x <= pixels - 4; x += 4, src += 4 * step) {  // four searches at a time hide each other's latency
-        const int32_t a = binOf(src[0]), b = binOf(src[step]), d = binOf(src[2 * step]), e = binOf(src[3 * step]);
-        countIn(a);
-        countIn(b);
-        countIn(d);
-        countIn(e);
-    }
-    for (; x < pixels; ++x, src += step) countIn(binOf(*src));
 }
 
 }  // namespace qori::kernels

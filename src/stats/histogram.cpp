@@ -1,29 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 // Histograms with levels given in the call or prepared in a record.
-#include "kernels/histogram.h"
+#include <cfloat>
+
 #include "checks.h"
-#include "driver.h"
 #include "float_control.h"
+#include "histogram_count.h"
+#include "plan.h"
 
 namespace qori::stats {
 namespace {
-
-template <class T>
-using Level = std::conditional_t<std::is_floating_point_v<T>, float, int32_t>;
-
-template <class T>
-constexpr int32_t kValues = 1 << 8 * sizeof(T);
-
-template <class T>
-constexpr int32_t kLowest = std::is_signed_v<T> ? -kValues<T> / 2 : 0;
-
-/// One channel's levels and bins.
-template <class L>
-struct Channel {
-    const L* levels;
-    int32_t count;
-    int32_t* bins;
-};
 
 /// Whether an array of n pointers or one of its entries is null.
 template <class P>
@@ -40,68 +25,17 @@ QorResult levelCountCheck(const int32_t* counts, int n) {
     return QOR_OK;
 }
 
-// --- counting -------------------------------------------------------------------------------------------------------
-
-/// Bytes: all 256 values are counted, then the levels are looked at.
-template <Layout layout>
-void countBytes(QorImageSize roi, Image<const uint8_t> src, const Channel<int32_t>* out) {
-    constexpr int n = channels(layout), counted = processedChannels(layout);
-    kernels::ByteCounters<n> counters;
-    forEachRow(
-        roi, [&](ptrdiff_t pixels, const uint8_t* row) { kernels::countBytesRow<n, counted>(counters, row, pixels); },
-        walk(src, n));
-    for (int c = 0; c < counted; ++c) {
-        uint32_t table[256];
-        counters.ofChannel(c, table);
-        kernels::sumBins(table, 256, 0, out[c].levels, out[c].count, out[c].bins);
-    }
-}
-
-/// 16 bits with room for a counter of every value.
-template <class T, int n>
-void countWords(QorImageSize roi, Image<const T> src, const Channel<int32_t>* out, uint32_t* table) {
-    for (int32_t i = 0; i < n * kValues<T>; ++i) table[i] = 0;
-    forEachRow(
-        roi,
-        [&](ptrdiff_t pixels, const T* row) {
-            kernels::countWordsRow<n>(table, reinterpret_cast<const uint16_t*>(row), pixels,
-                                      std::is_signed_v<T> ? 0x8000 : 0);
-        },
-        walk(src, n));
-    for (int c = 0; c < n; ++c)
-        kernels::sumBins(table + c * kValues<T>, kValues<T>, kLowest<T>, out[c].levels, out[c].count, out[c].bins);
-}
-
-/// One channel, element by element; src starts at its first one.
-template <class T>
-QORI_NOINLINE void countBySearch(QorImageSize roi, int stored, Image<const T> src, Channel<Level<T>> out) {
-    const auto eachRow = [&](auto count) { forEachRow(roi, count, walk(src, stored)); };
-    for (int32_t k = 0; k < out.count - 1; ++k) out.bins[k] = 0;
-    if (!kernels::strictlyIncreasing(out.levels, out.count)) {
-        eachRow([&](ptrdiff_t pixels, const T* row) {
-            for (ptrdiff_t x = 0; x < pixels; ++x)
-                kernels::countInAllBins<Level<T>>(row[x * stored], out.levels, out.count, out.bins);
-        });
-    } else if constexpr (std::is_floating_point_v<T>) {
-        eachRow([&](ptrdiff_t pixels, const T* row) {
-            kernels::countFloatsRow(row, pixels, stored, out.levels, out.count, out.bins);
-        });
-    } else {
-        kernels::WordBins bins(out.levels, out.count, kLowest<T>, out.bins);
-        eachRow([&](ptrdiff_t pixels, const T* row) { bins.countRow(row, pixels, stored); });
-        bins.finish();
-    }
-}
-
+/// Floats are compared with levels: subnormals count as what they are, and NaN traps nowhere.
 template <class T, Layout layout>
-void countDirectly(QorImageSize roi, Image<const T> src, const Channel<Level<T>>* out) {
-    if constexpr (sizeof(T) == 1) {
-        countBytes<layout>(roi, src, out);
-    } else {
-        // The channels of one image; each starts at its own element.
-        for (int c = 0; c < processedChannels(layout); ++c)
-            countBySearch<T>(roi, channels(layout), {src.data + c, src.step}, out[c]);
-    }
+QorResult countUnderControl(QorImageSize roi, Image<const T> src, const Channel<Level<T>>* out) {
+    const auto count = [=] {
+        countDirectly<T, layout>(roi, src, out);
+        return QOR_OK;
+    };
+    if constexpr (std::is_floating_point_v<T>)
+        return underDefaultControl(count);
+    else
+        return count();
 }
 
 // --- levels with the call -------------------------------------------------------------------------------------------
@@ -120,8 +54,7 @@ QorResult histogramRange(Image<const T> src, QorImageSize roi, int32_t* const* p
     if (QorResult r = directChecks(src, roi, n, pHist, pLevels, nLevels)) return r;
     Channel<Level<T>> out[n];
     for (int c = 0; c < n; ++c) out[c] = {pLevels[c], nLevels[c], pHist[c]};
-    countDirectly<T, layout>(roi, src, out);
-    return QOR_OK;
+    return countUnderControl<T, layout>(roi, src, out);
 }
 
 /// The remainder of the division widens the first bins by one each, in the direction of the levels.
@@ -146,8 +79,7 @@ QorResult histogramEven(Image<const T> src, QorImageSize roi, int32_t* const* pH
         spaceEvenly(lowerLevel[c], upperLevel[c], nLevels[c], pLevels[c]);
         out[c] = {pLevels[c], nLevels[c], pHist[c]};
     }
-    countDirectly<T, layout>(roi, src, out);
-    return QOR_OK;
+    return countUnderControl<T, layout>(roi, src, out);
 }
 
 // --- levels in a record ---------------------------------------------------------------------------------------------
@@ -188,24 +120,29 @@ static_assert(sizeof(Record) == 48);
 Record* recordOf(QorHistogramSpec* pSpec) { return reinterpret_cast<Record*>(pSpec); }
 Record* recordOf(const QorHistogramSpec* pSpec) { return recordOf(const_cast<QorHistogramSpec*>(pSpec)); }
 
+bool strictlyIncreasing(const float* levels, int32_t count) {
+    for (int32_t k = 1; k < count; ++k)
+        if (!(levels[k - 1] < levels[k])) return false;
+    return true;
+}
+
 QorResult channelCheck(int32_t n) { return n == 1 || n == 3 || n == 4 ? QOR_OK : QOR_ERR_CHANNELS_UNSUPPORTED; }
 
 QorResult typeCheck(int32_t type) {
     return type == qor8u || type == qor16u || type == qor16s || type == qor32f ? QOR_OK : QOR_ERR_DATA_TYPE;
 }
 
-/// Truncation towards zero; what does not fit becomes the least integer.
-int32_t truncated(float value) { return _mm_cvttss_si32(_mm_set_ss(value)); }
-int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(value)); }
+/// Truncation towards zero; what 32 bits do not hold, infinity included, becomes the nearest end of their range.
+int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(std::clamp<double>(value, INT32_MIN, INT32_MAX))); }
 
 QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t,
                          int32_t* pSpecSize, int32_t* pBufferSize) {
     if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels)))
         return r;
     if (QorResult r = levelCountCheck(nLevels, numChannels)) return r;
-    uint32_t words = sizeof(Record) / 4;
-    for (int c = 0; c < numChannels; ++c) words += static_cast<uint32_t>(nLevels[c]);
-    *pSpecSize = static_cast<int32_t>(4 * words);
+    int64_t words = sizeof(Record) / 4;
+    for (int c = 0; c < numChannels; ++c) words += nLevels[c];
+    if (QorResult r = reportSize(4 * words, pSpecSize)) return r;
     const int32_t values = dataType == qor8u                          ? kValues<uint8_t>
                            : dataType == qor16u || dataType == qor16s ? kValues<uint16_t>
                                                                       : 0;
@@ -217,36 +154,45 @@ QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int
                         QorHistogramSpec* pSpec) {
     if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelCheck(numChannels)))
         return r;
-    for (int c = 0; c < numChannels; ++c) {
-        if (QorResult r = firstOf(nullCheck(pLevels[c]), levelCountCheck(nLevels + c, 1))) return r;
-        if (!kernels::strictlyIncreasing(pLevels[c], nLevels[c])) return QOR_ERR_BAD_RANGE;
-    }
-    Record* const record = recordOf(pSpec);
-    record->begin(dataType, numChannels, 0, nLevels);
-    for (int c = 0; c < numChannels; ++c)
-        for (int32_t k = 0; k < nLevels[c]; ++k) {
-            if (dataType == qor32f)
-                record->levels<float>(c)[k] = pLevels[c][k];
-            else
-                record->levels<int32_t>(c)[k] = truncated(pLevels[c][k]);
+    return underDefaultControl([=]() -> QorResult {
+        for (int c = 0; c < numChannels; ++c) {
+            if (QorResult r = firstOf(nullCheck(pLevels[c]), levelCountCheck(nLevels + c, 1))) return r;
+            if (!strictlyIncreasing(pLevels[c], nLevels[c])) return QOR_ERR_BAD_RANGE;
         }
-    return QOR_OK;
+        Record* const record = recordOf(pSpec);
+        record->begin(dataType, numChannels, 0, nLevels);
+        for (int c = 0; c < numChannels; ++c)
+            for (int32_t k = 0; k < nLevels[c]; ++k) {
+                if (dataType == qor32f)
+                    record->levels<float>(c)[k] = pLevels[c][k];
+                else
+                    record->levels<int32_t>(c)[k] = truncated(double(pLevels[c][k]));
+            }
+        return QOR_OK;
+    });
 }
 
+/// An infinite bound spaces like the largest float.
+double spacingBound(float bound) { return std::clamp<double>(double(bound), -double(FLT_MAX), double(FLT_MAX)); }
+
+/// Level k is k * width + lower, fused in double precision, with a width of single precision, that of a difference that
+/// floats do not hold included: 3 levels or more bring it back.
 void spaceUniformly(float lower, float upper, int32_t count, float* levels) {
-    const float width = (upper - lower) / static_cast<float>(count - 1);
+    const double from = spacingBound(lower), span = spacingBound(upper) - from;
+    const float rounded = static_cast<float>(span), bins = static_cast<float>(count - 1);
+    const double width = rounded > FLT_MAX ? double(static_cast<float>(span / (count - 1))) : double(rounded / bins);
     for (int32_t k = 1; k < count - 1; ++k)
-        levels[k] = static_cast<float>(__builtin_fma(double(k), double(width), double(lower)));
+        levels[k] = static_cast<float>(std::min(__builtin_fma(double(k), width, from), double(FLT_MAX)));
     levels[0] = lower;
     levels[count - 1] = upper;
 }
 
 /// Returns the width of a bin.
 double spaceUniformly(float lower, float upper, int32_t count, int32_t* levels) {
-    const double width = (double(upper) - double(lower)) / (count - 1);
-    for (int32_t k = 1; k < count - 1; ++k) levels[k] = truncated(k * width + double(lower));
-    levels[0] = truncated(lower);
-    levels[count - 1] = truncated(upper);
+    const double from = spacingBound(lower), width = (spacingBound(upper) - from) / (count - 1);
+    for (int32_t k = 1; k < count - 1; ++k) levels[k] = truncated(k * width + from);
+    levels[0] = truncated(double(lower));
+    levels[count - 1] = truncated(double(upper));
     return width;
 }
 
@@ -255,11 +201,11 @@ QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const
     if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLowerLevel, pUpperLevel, nLevels, pSpec),
                               channelCheck(numChannels)))
         return r;
-    for (int c = 0; c < numChannels; ++c) {
-        if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
-        if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
-    }
-    return underDefaultControl([&]() -> QorResult {
+    return underDefaultControl([=]() -> QorResult {
+        for (int c = 0; c < numChannels; ++c) {
+            if (QorResult r = levelCountCheck(nLevels + c, 1)) return r;
+            if (!(pLowerLevel[c] < pUpperLevel[c])) return QOR_ERR_BAD_RANGE;
+        }
         Record* const record = recordOf(pSpec);
         record->begin(dataType, numChannels, 1, nLevels);
         QorResult result = QOR_OK;
@@ -298,11 +244,13 @@ QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist,
     if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
     Channel<Level<T>> out[n];
     for (int c = 0; c < n; ++c) out[c] = {record->levels<Level<T>>(c), record->counts[c], pHist[c]};
-    if constexpr (sizeof(T) == 2)
-        countWords<T, n>(roi, src, out, reinterpret_cast<uint32_t*>(pBuffer));
-    else
-        countDirectly<T, layout>(roi, src, out);
-    return QOR_OK;
+    if constexpr (sizeof(T) == 2) {
+        if (tablePays(roi, out, n)) {
+            countWords<T, n>(roi, src, out, reinterpret_cast<uint32_t*>(pBuffer));
+            return QOR_OK;
+        }
+    }
+    return countUnderControl<T, layout>(roi, src, out);
 }
 
 }  // namespace

@@ -352,6 +352,88 @@ TEST(Histogram, AllWordsOneByOne) {
     EXPECT_EQ(expected, bins);
 }
 
+TEST(Histogram, FloatsDoNotDependOnTheControlRegister) {
+    const float pixels[8] = {0, 1e-40f, 2e-40f, 0.5f, NAN, 1, INFINITY, -1};
+    std::vector<float> levels = {0, 1.5e-40f, 0.25f, 2};
+    for (int32_t count : {4, 80}) {  // compared with each element, and searched
+        while (static_cast<int32_t>(levels.size()) < count) levels.push_back(levels.back() + 1);
+        std::vector<int32_t> expected(static_cast<size_t>(count) - 1), bins;
+        std::copy_n(std::begin({2, 1, 2}), 3, expected.begin());
+        const float* const pointer[1] = {levels.data()};
+        for (int circumstance = 0; circumstance < 8; ++circumstance) {
+            bins.assign(expected.size(), -7);
+            ASSERT_EQ(QOR_OK, call(qoriHistogramRange_32f_C1R, pixels, 32, QorImageSize{8, 1}, bins.data(),
+                                   static_cast<const float*>(levels.data()), count));
+            EXPECT_EQ(expected, bins);
+            Prepared prepared(qor32f, &count, 1, [&](QorHistogramSpec* spec) {
+                ASSERT_EQ(QOR_OK, call(qoriHistogramInit, int32_t{qor32f}, pointer, &count, 1, spec));
+            });
+            const auto* spec = prepared.spec.data<const QorHistogramSpec>();
+            bins.assign(expected.size(), -7);
+            ASSERT_EQ(QOR_OK, call(qoriHistogram_32f_C1R, pixels, 32, QorImageSize{8, 1}, bins.data(), spec,
+                                   prepared.buffer.data<uint8_t>()));
+            EXPECT_EQ(expected, bins);
+            std::vector<float> read(levels.size());
+            float* const out[1] = {read.data()};
+            ASSERT_EQ(QOR_OK, call(qoriHistogramGetLevels, spec, out));
+            EXPECT_EQ(levels, read);
+        }
+    }
+}
+
+std::vector<float> uniformLevels(int32_t type, float lower, float upper, int32_t count) {
+    std::vector<float> read(static_cast<size_t>(count));
+    Prepared(type, &count, 1, [&](QorHistogramSpec* spec) {
+        EXPECT_EQ(QOR_OK, call(qoriHistogramUniformInit, type, &lower, &upper, &count, 1, spec));
+        float* const out[1] = {read.data()};
+        EXPECT_EQ(QOR_OK, qoriHistogramGetLevels(spec, out));
+    });
+    return read;
+}
+
+TEST(Histogram, LevelsBeyondTheirTypeBecomeItsEnds) {
+    constexpr float far = 2147483648.0f;
+    const float given[5] = {-INFINITY, 0, 128, far, INFINITY};
+    const float* const pointers[1] = {given};
+    const int32_t four = 4;
+    Prepared prepared(qor8u, &four, 1, [&](QorHistogramSpec* spec) {
+        const float* const upper[1] = {given + 1};
+        ASSERT_EQ(QOR_OK, call(qoriHistogramInit, int32_t{qor8u}, upper, &four, 1, spec));
+    });
+    const auto record = words<int32_t>(prepared.spec, prepared.specSize);
+    EXPECT_EQ((std::vector{0, 128, INT32_MAX, INT32_MAX}), std::vector(record.begin() + 12, record.end()));
+    Prepared low(qor8u, &four, 1, [&](QorHistogramSpec* spec) {
+        ASSERT_EQ(QOR_OK, call(qoriHistogramInit, int32_t{qor8u}, pointers, &four, 1, spec));
+    });
+    const uint8_t pixels[4] = {0, 127, 128, 255};
+    int32_t bins[3];
+    ASSERT_EQ(QOR_OK, qoriHistogram_8u_C1R(pixels, 4, {4, 1}, bins, low.spec.data<QorHistogramSpec>(),
+                                           low.buffer.data<uint8_t>()));
+    EXPECT_EQ((std::vector{0, 2, 2}), std::vector(bins, bins + 3));
+    EXPECT_EQ((std::vector{0.0f, far, far}), uniformLevels(qor16u, 0, 8e9f, 3));
+    EXPECT_EQ((std::vector{-far, 0.0f, far}), uniformLevels(qor16s, -INFINITY, INFINITY, 3));
+    // Floats hold the bounds, but not their difference.
+    EXPECT_EQ((std::vector{-3e38f, -1.5e38f, 0.0f, 1.5e38f, 3e38f}), uniformLevels(qor32f, -3e38f, 3e38f, 5));
+    EXPECT_EQ((std::vector{-INFINITY, 0.0f, INFINITY}), uniformLevels(qor32f, -INFINITY, INFINITY, 3));
+    for (int circumstance = 0; circumstance < 8; ++circumstance)
+        EXPECT_NEAR(5e-40, uniformLevels(qor32f, 1e-40f, 9e-40f, 3)[1], 2e-45);
+}
+
+TEST(Histogram, SizesBeyond32BitsAreRefused) {
+    constexpr int32_t most = (INT32_MAX - 48) / 4;
+    int32_t size = -7, buffer = -7;
+    for (int32_t type : {int32_t{qor8u}, int32_t{2}})
+        for (const auto& [counts, n] : {std::pair{std::array{1 << 30, 2, 2}, 1},
+                                        {std::array{most + 1, 2, 2}, 1},
+                                        {std::array{most, 2, 2}, 3},
+                                        {std::array{INT32_MAX, INT32_MAX, INT32_MAX}, 3}}) {
+            EXPECT_EQ(QOR_ERR_SIZE, qoriHistogramGetBufferSize(type, {1, 1}, counts.data(), n, 0, &size, &buffer));
+            EXPECT_EQ(-14, size + buffer);
+        }
+    EXPECT_EQ(QOR_OK, qoriHistogramGetBufferSize(qor8u, {1, 1}, &most, 1, 0, &size, &buffer));
+    EXPECT_EQ(48 + 4 * int64_t{most}, size);
+}
+
 TEST(Histogram, DirectFormsCheckPointersSizesStepsThenLevels) {
     const uint8_t pixels[4] = {};
     const int32_t given[2] = {0, 1}, counts[3] = {2, 2, 1}, bounds[3] = {0, 0, 0};
