@@ -321,7 +321,7 @@ QORI_NOINLINE void countRegion(QorImageSize roi, int stored, int results, Image<
         roi, [&](ptrdiff_t pixels, const T* row) { kernels::countRow(counts, bounds, stored, pixels * stored, row); },
         walk(src, stored));
     counts.finish(stored);
-    for (int c = 0; c < results; ++c) out[c] = static_cast<int32_t>(counts.total(c));
+    for (int c = 0; c < results; ++c) out[c] = counts.total(c).saturated();
 }
 
 template <class T, Layout layout>

@@ -70,20 +70,6 @@ void withMeasure(int32_t hint, Use use) {
     use(chooseMeasure<quantity, T, single>());
 }
 
-/// Rounded once. The words are converted apart, as there is no 64-bit conversion on 32-bit targets.
-double toDouble(uint64_t value) {
-    return static_cast<double>(static_cast<uint32_t>(value >> 32)) * 4'294'967'296.0 +
-           static_cast<double>(static_cast<uint32_t>(value));
-}
-double toDouble(int64_t value) {
-    return static_cast<double>(static_cast<int32_t>(value >> 32)) * 4'294'967'296.0 +
-           static_cast<double>(static_cast<uint32_t>(value));
-}
-template <class T>
-double toDouble(T value) {
-    return static_cast<double>(value);
-}
-
 struct Totals {
     double of[4];
 };
@@ -92,7 +78,7 @@ template <class Accumulators>
 Totals finish(Accumulators& sums, Channels n) {
     sums.finish(n.stored);
     Totals totals{};
-    for (int c = 0; c < n.results; ++c) totals.of[c] = toDouble(sums.total(c));
+    for (int c = 0; c < n.results; ++c) totals.of[c] = kernels::toDouble(sums.total(c));
     return totals;
 }
 

@@ -292,13 +292,17 @@ TEST(Extrema, NeitherTrapNorFlushWhatTheCallerMayHaveAskedFor) {
 }
 
 TEST(CountInRange, CountsPastEveryLane) {
-    const std::vector<uint8_t> row(8'000 * 3 + 40'000, 10);  // rows overlap: 3 * 320,000,000 elements
+    const std::vector<uint8_t> row(100'000, 10);  // rows overlap: 3 * 320,000,000 elements, then 2^31
     int32_t counts[3] = {};
     const uint8_t lower[3] = {10, 11, 0}, upper[3] = {10, 255, 255};
     EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C3R(row.data(), 1, {8'000, 40'000}, counts, lower, upper));
     EXPECT_EQ(320'000'000, counts[0]);
     EXPECT_EQ(0, counts[1]);
     EXPECT_EQ(320'000'000, counts[2]);
+    EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C1R(row.data(), 1, {50'000, 42'949}, counts, 10, 10));
+    EXPECT_EQ(2'147'450'000, counts[0]);
+    EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C1R(row.data(), 1, {50'000, 42'950}, counts, 10, 10));
+    EXPECT_EQ(INT32_MAX, counts[0]);
 }
 
 TEST(Extrema, ChecksPointersThenSizes) {

@@ -286,6 +286,17 @@ TEST(Norms, SumsOfMorePixelsThan32BitsCount) {
     EXPECT_EQ(-255.0, r[0]);
 }
 
+TEST(Norms, SumsOfSquaresPast64Bits) {
+    constexpr int kSide = 65'538;  // 65535^2 a pixel passes 2^64 by seven digits; rows overlap, each one pixel on
+    const std::vector<uint16_t> brightest(2 * kSide, 65'535);
+    double r = 0;
+    ASSERT_EQ(QOR_OK, qoriNorm_L2_16u_C1R(brightest.data(), 2, {kSide, kSide}, &r));
+    EXPECT_EQ(65'535.0 * kSide, r);
+    const std::vector<int16_t> low(2 * kSide, INT16_MIN), high(2 * kSide, INT16_MAX);
+    ASSERT_EQ(QOR_OK, qoriNormDiff_L2_16s_C1R(low.data(), 2, high.data(), 2, {kSide, kSide}, &r));
+    EXPECT_EQ(65'535.0 * kSide, r);
+}
+
 TEST(Norms, DotProductsAddFromLeftToRightBeyond53Bits) {
     constexpr int kPixels = 3'000'000;  // above 2^53 after some two million
     std::vector<uint16_t> a(kPixels * 3), b(kPixels * 3);
