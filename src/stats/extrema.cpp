@@ -5,6 +5,7 @@
 #include "float_control.h"
 #include "kernels/reduce_count.h"
 #include "kernels/reduce_extrema.h"
+#include "kernels/reduce_narrow.h"
 
 namespace qori::stats {
 namespace {
@@ -27,10 +28,10 @@ QorResult controlled(Body body) {
 
 template <class T, class... Orders>
 void joinRegion(QorImageSize roi, int channels, Image<const T> src, ExtremumLanes<Orders>&... lanes) {
-    forEachRow(
-        roi,
+    kernels::forEachRowToReduce(
+        roi, channels,
         [&](ptrdiff_t pixels, const T* row) { kernels::extremaRow<T, Orders...>(pixels * channels, row, lanes...); },
-        walk(src, channels));
+        src);
 }
 
 /// One order's extremum per channel. Where a float channel still stands at its start, it holds that very value or
@@ -317,9 +318,9 @@ QORI_NOINLINE void countRegion(QorImageSize roi, int stored, int results, Image<
     const T high[4] = {upper[0], upper[results > 1], upper[results > 1 ? 2 : 0], T{}};
     const kernels::Bounds<T> bounds{kernels::channelVectors(low, stored), kernels::channelVectors(high, stored)};
     kernels::Counts<T> counts;
-    forEachRow(
-        roi, [&](ptrdiff_t pixels, const T* row) { kernels::countRow(counts, bounds, stored, pixels * stored, row); },
-        walk(src, stored));
+    kernels::forEachRowToReduce(
+        roi, stored,
+        [&](ptrdiff_t pixels, const T* row) { kernels::countRow(counts, bounds, stored, pixels * stored, row); }, src);
     counts.finish(stored);
     for (int c = 0; c < results; ++c) out[c] = counts.total(c).saturated();
 }

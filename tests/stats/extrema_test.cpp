@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "harness/sweep.h"
+#include "narrow_shapes.h"
 #include "reference/stats.h"
 
 namespace qori::test {
@@ -62,13 +63,14 @@ void expectSame(T expected, T actual) {
 template <class T, Layout layout, class Check>
 void sweepImages(const char* name, Check check) {
     for (Fill style : kFills)
-        forShapes(smallShapes(), [&](const Shape& shape) {
-            TestImage src(0, shape, channels(layout) * static_cast<int>(sizeof(T)));
-            fill<T>(src, channels(layout), style);
-            const Snapshot before = src.snapshot();
-            check(src, shape);
-            QORI_EXPECT_UNCHANGED(src, before);
-        });
+        for (const auto& shapes : {smallShapes(), narrowShapes()})
+            forShapes(shapes, [&](const Shape& shape) {
+                TestImage src(0, shape, channels(layout) * static_cast<int>(sizeof(T)));
+                fill<T>(src, channels(layout), style);
+                const Snapshot before = src.snapshot();
+                check(src, shape);
+                QORI_EXPECT_UNCHANGED(src, before);
+            });
     markSwept(name);
 }
 

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "harness/sweep.h"
+#include "narrow_shapes.h"
 #include "reference/stats.h"
 
 namespace qori::test {
@@ -151,6 +152,7 @@ void sweepMember(const char* name, Function function, bool anyStep, Check check)
         });
         if (std::is_integral_v<T>) break;
     }
+    forShapes(narrowShapes(), [&](const Shape& shape) { runMember<T, layout>(function, shape, hintFast, check); });
     if constexpr (std::is_integral_v<T>) runExtremes<T, layout>(function, check);
     markSwept(name);
 }
