@@ -65,6 +65,13 @@ struct Biggest {
 
 namespace detail {
 
+/// Behind the operation that joined `other` to an accumulator of a loop: else compilers may put the new value into a
+/// register of its own, or of the other's that is free now, and copy it back in every round.
+template <class V>
+QORI_INLINE void updateInPlace(V& accumulator, const V& other) {
+    __asm__("" : "+x"(accumulator) : "x"(other));
+}
+
 alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
                                                            255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
                                                            255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
@@ -140,8 +147,10 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
         for (; i <= elements - 3 * n; i += 3 * n)
             for (int v = 0; v < 3; ++v) {
                 Vec<T> a = load(src + i + v * n);
-                if (sizeof...(Orders) > 1) loadOnce(a.v);
+                if constexpr (sizeof...(Orders) > 1) loadOnce(a.v);
                 (join(own.best[v], a, Orders{}), ...);
+                if constexpr (sizeof...(Orders) > 1 && std::is_integral_v<T>)
+                    (detail::updateInPlace(own.best[v].v, a.v), ...);
             }
         ((lanes = own), ...);
     };
