@@ -52,3 +52,12 @@ target_link_libraries(readme_example PRIVATE qorik5_link)
 set_target_properties(readme_example PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 add_test(NAME readme_example COMMAND readme_example)
 set_tests_properties(readme_example PROPERTIES PASS_REGULAR_EXPRESSION "green of pixel \\(9, 9\\): 128")
+
+# The demo ends with a sheet, however small the picture, or with the reason why not.
+if(TARGET demo AND NOT WIN32)
+    find_file(QORI_TYPEFACE DejaVuSans.ttf PATHS /usr/share/fonts/truetype/dejavu NO_CMAKE_FIND_ROOT_PATH)
+    if(NOT QORI_TYPEFACE)
+        message(FATAL_ERROR "DejaVuSans.ttf is missing: install fonts-dejavu-core, or set QORI_TYPEFACE")
+    endif()
+    add_test(NAME demo_pictures COMMAND ${python} ${checks}/demo_pictures.py $<TARGET_FILE:demo> ${QORI_TYPEFACE})
+endif()
