@@ -14,7 +14,7 @@ namespace qori::kernels {
 namespace detail {
 
 /// Bytes up to which a row is worth a copy, and of rows brought together.
-constexpr ptrdiff_t kNarrow = 128, kTogether = 4'096;
+constexpr ptrdiff_t kNarrow = 160, kTogether = 4'096;
 /// Fewer rows cost less than the wait until the buffer can be read.
 constexpr int32_t kFewRows = 8;
 
