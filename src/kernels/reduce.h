@@ -59,7 +59,11 @@ QORI_INLINE void addTotal(typename Lanes::Total& total, typename Lanes::Total ow
 template <class Lanes, int count>
 void joinChannels(typename Lanes::Total* values, int channels, WholeTotal<Lanes>* totals) {
     int n = count;
-    for (; n % (2 * channels) == 0; n /= 2)
+    // Pixels, without a division whose divisor is only known now.
+    for (int pixels = channels == 1   ? count
+                      : channels == 3 ? count / 3
+                                      : count / 4;
+         pixels % 2 == 0; pixels /= 2, n /= 2)
         for (int i = 0; i < n / 2; ++i) values[i] = join<Lanes>(values[i], values[n / 2 + i]);
     for (int c = 0; c < channels; ++c) {
         typename Lanes::Total own = values[c];

@@ -74,9 +74,9 @@ QORI_NOINLINE void forEachRowsTogether(QorImageSize roi, int pixelBytes, Row& ro
 
 /// As forEachRow, for rows that are only read: row(pixels, rows...) may be handed several rows as one.
 template <class Row, class T, class... More>
-void forEachRowToReduce(QorImageSize roi, int channels, Row row, Image<const T> first, More... more) {
+QORI_INLINE void forEachRowToReduce(QorImageSize roi, int channels, Row row, Image<const T> first, More... more) {
     const int pixelBytes = channels * static_cast<int>(sizeof(T));
-    if (roi.height >= detail::kFewRows && roi.width <= detail::kNarrow / pixelBytes &&
+    if (roi.height >= detail::kFewRows && int64_t{roi.width} * pixelBytes <= detail::kNarrow &&
         !isOneRun(roi, walk(first, channels), walk(more, channels)...)) {
         const Image<const T> images[] = {first, more...};
         return detail::forEachRowsTogether(roi, pixelBytes, row, images,
