@@ -254,6 +254,23 @@ const Rows extrema{{
                                 plainSum<uint8_t, 1>([](auto a, auto) { return a >= 50 && a <= 180; })),
 }};
 
+/// Columns of a wider image: what a row costs to begin and to end.
+const std::vector<Size> kColumns = {{1, 4'096}, {3, 4'096}, {8, 4'096}, {24, 4'096}};
+const Rows columns{{
+    reductionRow<uint8_t, 1, 1>("columns: sum 8u C1", unary(qoriSum_8u_C1R), plainValues<uint8_t, 1>, {}, kColumns),
+    reductionRow<uint16_t, 3, 1>("columns: sum 16u C3", unary(qoriSum_16u_C3R), plainValues<uint16_t, 3>, {}, kColumns),
+    reductionRow<float, 1, 1>("columns: sum 32f C1 fast", unary(qoriSum_32f_C1R, hintFast), plainValues<float, 1>, {},
+                              kColumns),
+    reductionRow<uint8_t, 4, 1>("columns: norm L2 8u C4", unary(qoriNorm_L2_8u_C4R), plainSquares<uint8_t, 4>, {},
+                                kColumns),
+    reductionRow<uint8_t, 1, 2>("columns: normdiff L1 8u C1", binary(qoriNormDiff_L1_8u_C1R),
+                                plainSum<uint8_t, 1>(kDistance), {}, kColumns),
+    reductionRow<uint8_t, 1, 1>("columns: minMax 8u C1", bothExtrema<uint8_t>(qoriMinMax_8u_C1R), plainMinMax<uint8_t>,
+                                {}, kColumns),
+    reductionRow<uint8_t, 1, 1>("columns: countInRange 8u C1", inRange8u,
+                                plainSum<uint8_t, 1>([](auto a, auto) { return a >= 50 && a <= 180; }), {}, kColumns),
+}};
+
 /// Noise over the whole type, 0 to 1 for floats; `flat` makes all pixels equal. plain is one table and one loop: a
 /// counter for every value, or 256 between 0 and 1.
 template <class T, int n, class Ours>

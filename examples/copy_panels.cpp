@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
 #include <cmath>
 
 #include "panels.h"
@@ -32,9 +33,8 @@ Picture planes(const Picture& photo) {
     Picture out(photo.size(), 3);
     for (int i = 0; i < 3; ++i) {
         const int begin = photo.width() * i / 3, end = photo.width() * (i + 1) / 3;
-        if (end > begin)
-            require(qoriDup_8u_C1C3R(all[i]->at(begin, 0), all[i]->step(), out.at(begin, 0), out.step(),
-                                     {end - begin, photo.height()}));
+        require(qoriDup_8u_C1C3R(all[i]->at(begin, 0), all[i]->step(), out.at(begin, 0), out.step(),
+                                 {end - begin, photo.height()}));
     }
     return out;
 }
@@ -68,7 +68,7 @@ Picture circle(const Picture& photo) {
 Picture channelBars(const Picture& photo) {
     Picture out = copyOf(photo);
     const int bar = photo.width() / 10;
-    for (int i = 0; bar > 0 && i < 10; i += 2)
+    for (int i = 0; i < 10; i += 2)
         require(qoriSet_8u_C3CR(0, out.at(bar * i, 0) + 2, out.step(), {bar, photo.height()}));
     return out;
 }
@@ -77,7 +77,6 @@ Picture channelBars(const Picture& photo) {
 Picture fringes(const Picture& photo) {
     Picture out = copyOf(photo), plane(photo.size(), 1);
     const int shift = photo.width() / 60, width = photo.width() - shift;
-    if (width < 1) return out;
     const QorImageSize part{width, photo.height()};
     require(qoriCopy_8u_C3C1R(photo.at(shift, 0), photo.step(), plane.data(), plane.step(), part));
     require(qoriCopy_8u_C1C3R(plane.data(), plane.step(), out.data(), out.step(), part));
@@ -88,10 +87,9 @@ Picture fringes(const Picture& photo) {
 /// The lower part mirrors the upper: a negative step walks the source upwards.
 Picture lake(const Picture& photo) {
     Picture out = copyOf(photo);
-    const int shore = photo.height() * 11 / 20, depth = photo.height() - shore;
-    if (shore > 0 && depth <= shore)
-        require(qoriCopy_8u_C3R(photo.at(0, shore - 1), -photo.step(), out.at(0, shore), out.step(),
-                                {photo.width(), depth}));
+    const int shore = std::max(photo.height() * 11 / 20, (photo.height() + 1) / 2), depth = photo.height() - shore;
+    require(
+        qoriCopy_8u_C3R(photo.at(0, shore - 1), -photo.step(), out.at(0, shore), out.step(), {photo.width(), depth}));
     return out;
 }
 
@@ -100,7 +98,6 @@ Picture puzzle(const Picture& photo) {
     Picture out = copyOf(photo);
     constexpr int columns = 6, rows = 4;
     const QorImageSize tile{photo.width() / columns, photo.height() / rows};
-    if (tile.width < 1 || tile.height < 1) return out;
     for (int i = 0; i < columns * rows; ++i) {
         const int j = (i * 7 + 5) % (columns * rows);
         require(qoriCopy_8u_C3R(photo.at(i % columns * tile.width, i / columns * tile.height), photo.step(),
@@ -114,13 +111,12 @@ Picture framed(const Picture& photo) {
     Picture out = copyOf(photo);
     const auto frame = [&](int inset, int thickness, const uint8_t(&colour)[3]) {
         const int w = photo.width() - 2 * inset, h = photo.height() - 2 * inset;
-        if (w <= 2 * thickness || h <= 2 * thickness || thickness < 1) return;
         require(qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {w, thickness}));
         require(qoriSet_8u_C3R(colour, out.at(inset, inset + h - thickness), out.step(), {w, thickness}));
         require(qoriSet_8u_C3R(colour, out.at(inset, inset), out.step(), {thickness, h}));
         require(qoriSet_8u_C3R(colour, out.at(inset + w - thickness, inset), out.step(), {thickness, h}));
     };
-    const int mount = photo.height() / 14;
+    const int mount = std::min(photo.width(), photo.height()) / 14;
     frame(0, mount, {246, 243, 236});
     frame(mount - mount / 6, mount / 6, {60, 52, 40});
     return out;
@@ -128,14 +124,14 @@ Picture framed(const Picture& photo) {
 
 constexpr Panel kPanels[] = {
     {"Photograph", "Copy C3", copyOf},
-    {"Red, green and blue planes", "Copy C3P3, Dup C1C3", planes},
+    {"Red, green and blue planes", "Copy C3P3, Dup C1C3", planes, {3, 1}},
     {"Red and blue exchanged", "Copy C3P3, P3C3", swappedPlanes},
-    {"Masked by a circle", "Set C1, Copy C3C1, C3M, Dup", circle},
-    {"Blue emptied in bars", "Copy C3, Set C3C", channelBars},
-    {"Colour fringes", "Copy C3C1, C1C3, C3C", fringes},
-    {"Mirrored by a negative step", "Copy C3", lake},
-    {"Tiles exchanged", "Copy C3 on regions", puzzle},
-    {"Framed", "Copy C3, Set C3 on regions", framed},
+    {"Masked by a circle", "Set C1, Copy C3C1, C3M, Dup", circle, {3, 3}},
+    {"Blue emptied in bars", "Copy C3, Set C3C", channelBars, {10, 1}},
+    {"Colour fringes", "Copy C3C1, C1C3, C3C", fringes, {60, 1}},
+    {"Mirrored by a negative step", "Copy C3", lake, {1, 2}},
+    {"Tiles exchanged", "Copy C3 on regions", puzzle, {6, 4}},
+    {"Framed", "Copy C3, Set C3 on regions", framed, {84, 84}},
 };
 
 }  // namespace

@@ -39,7 +39,6 @@ Picture underEachBorder(const Picture& photo, const std::vector<int16_t>& kernel
     constexpr int32_t kinds[3] = {borderConstant, borderReplicate, borderReadAll};
     const int margin = side / 2;
     const QorImageSize region{photo.width() / 3 - 2 * margin, photo.height() - 2 * margin};
-    if (region.width < 1 || region.height < 1) return out;
     Filter filter(kernel, {side, side}, divisor, region);
     for (int i = 0; i < 3; ++i) {
         const int x = photo.width() * i / 3 + margin, y = margin;
@@ -67,10 +66,13 @@ Picture mean(const Picture& photo) {
     return underEachBorder(photo, std::vector<int16_t>(static_cast<size_t>(side * side), 1), side, side * side);
 }
 
+/// A pixel a region, with the kernel's reach around it.
+constexpr QorImageSize smallestFor(int side) { return {3 * side, side}; }
+
 constexpr Panel kPanels[] = {
-    {"Unsharp mask, 5 x 5", "FilterBorder C3: constant, nearest, real", unsharp},
-    {"Embossed, 3 x 3", "FilterBorder C3: constant, nearest, real", emboss},
-    {"Mean, 33 x 33", "FilterBorder C3: constant, nearest, real", mean},
+    {"Unsharp mask, 5 x 5", "FilterBorder C3: constant, nearest, real", unsharp, smallestFor(5)},
+    {"Embossed, 3 x 3", "FilterBorder C3: constant, nearest, real", emboss, smallestFor(3)},
+    {"Mean, 33 x 33", "FilterBorder C3: constant, nearest, real", mean, smallestFor(33)},
 };
 
 }  // namespace

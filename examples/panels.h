@@ -11,6 +11,7 @@ struct Panel {
     const char* caption;
     const char* functions;                  ///< The exports that do the work.
     Picture (*make)(const Picture& photo);  ///< Three channels, of the photograph's size.
+    QorImageSize smallest = {1, 1};         ///< Photographs below this in a side leave nothing to show.
 };
 
 std::span<const Panel> copyPanels();

@@ -1,5 +1,4 @@
 // SPDX-License-Identifier: Apache-2.0
-#include <algorithm>
 #include <vector>
 
 #include "panels.h"
@@ -68,7 +67,7 @@ Picture fields(const Picture& photo, const Kind (&kinds)[count], Draw draw) {
         const int column = i % columns, x = photo.width() * column / columns;
         const int row = i / columns, y = photo.height() * row / 2;
         const QorImageSize size{photo.width() * (column + 1) / columns - x, photo.height() * (row + 1) / 2 - y};
-        if (size.width > 0 && size.height > 0) draw(kinds[i], out.at(x, y), out.step(), size);
+        draw(kinds[i], out.at(x, y), out.step(), size);
     }
     return out;
 }
@@ -77,7 +76,7 @@ Picture fields(const Picture& photo, const Kind (&kinds)[count], Draw draw) {
 Picture enlarged(const Picture& photo) {
     constexpr Kind kinds[4] = {Kind::nearest, Kind::linear, Kind::cubic, Kind::lanczos};
     return fields(photo, kinds, [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
-        const QorImageSize from{std::max(size.width / 6, 1), std::max(size.height / 6, 1)};
+        const QorImageSize from{size.width / 6, size.height / 6};
         const uint8_t* detail =
             photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) * 9 / 20);
         Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
@@ -89,8 +88,7 @@ Picture reduced(const Picture& photo) {
     constexpr Kind kinds[6] = {Kind::nearest, Kind::linear, Kind::cubic,
                                Kind::lanczos, Kind::super,  Kind::smoothLanczos};
     return fields(photo, kinds, [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
-        const QorImageSize to{std::max(size.width / 4, 4), std::max(size.height / 4, 4)};
-        const QorImageSize from{std::min(4 * to.width, photo.width()), std::min(4 * to.height, photo.height())};
+        const QorImageSize to{size.width / 4, size.height / 4}, from{4 * to.width, 4 * to.height};
         const Picture small(to, 3);
         const uint8_t* detail = photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) / 2);
         Resizer(from, to, kind).run(detail, photo.step(), small.data(), small.step());
@@ -99,8 +97,14 @@ Picture reduced(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"6 x: nearest, linear, cubic, Lanczos", "ResizeNearest, Linear, Cubic, Lanczos C3", enlarged},
-    {"1/4: nearest, linear, cubic, Lanczos, super, antialiased", "Resize, all interpolations, C3", reduced},
+    {"6 x: nearest, linear, cubic, Lanczos",
+     "ResizeNearest, Linear, Cubic, Lanczos C3",
+     enlarged,
+     {72, 72}},  // Lanczos wants six pixels
+    {"1/4: nearest, linear, cubic, Lanczos, super, antialiased",
+     "Resize, all interpolations, C3",
+     reduced,
+     {48, 32}},  // four pixels a field
 };
 
 }  // namespace

@@ -17,11 +17,13 @@ Picture filled(QorImageSize size, const uint8_t (&colour)[3]) {
 /// The height of a bar is the root of its bin, so that rare values show as well. Each channel raises its own light:
 /// where bars of all three overlap, the plot is white.
 Picture histograms(const Picture& photo) {
-    constexpr int bins = 256;
-    int32_t counts[3][bins], levels[3][bins + 1];
+    constexpr int values = 256;
+    const int bins = std::min(photo.width(), values);
+    int32_t counts[3][values], levels[3][values + 1];
     int32_t *const countsOf[3] = {counts[0], counts[1], counts[2]}, *const levelsOf[3] = {levels[0], levels[1],
                                                                                           levels[2]};
-    constexpr int32_t nLevels[3] = {bins + 1, bins + 1, bins + 1}, lower[3] = {0, 0, 0}, upper[3] = {bins, bins, bins};
+    const int32_t nLevels[3] = {bins + 1, bins + 1, bins + 1};
+    constexpr int32_t lower[3] = {0, 0, 0}, upper[3] = {values, values, values};
     require(
         qoriHistogramEven_8u_C3R(photo.data(), photo.step(), photo.size(), countsOf, levelsOf, nLevels, lower, upper));
 
@@ -32,8 +34,7 @@ Picture histograms(const Picture& photo) {
         for (int k = 0; k < bins; ++k) {
             const int begin = width * k / bins, end = width * (k + 1) / bins;
             const int bar = static_cast<int>(0.95 * height * std::sqrt(counts[c][k] / most));
-            if (end > begin && bar > 0)
-                require(qoriSet_8u_C3CR(235, out.at(begin, height - bar) + c, out.step(), {end - begin, bar}));
+            if (bar > 0) require(qoriSet_8u_C3CR(235, out.at(begin, height - bar) + c, out.step(), {end - begin, bar}));
         }
     }
     return out;
@@ -84,7 +85,7 @@ Picture blockMeans(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Histograms of red, green and blue", "HistogramEven C3, Set C3C", histograms},
+    {"Histograms of red, green and blue", "HistogramEven C3, Set C3C", histograms, {2, 2}},
     {"Minima of 16 x 16 blocks", "Copy C3C1, BlockMinMax C1, Set C3", blockMinima},
     {"Maxima of 16 x 16 blocks", "Copy C3C1, BlockMinMax C1, Set C3", blockMaxima},
     {"Means of 16 x 16 blocks", "Mean C3, Set C3", blockMeans},

@@ -2456,7 +2456,8 @@ QORI_API QorResult QORI_CALL qoriBlockMinMax_32f_C1R(const float* pSrc, int32_t 
  *            at).
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The image is only read. Results must not lie in it.
- *  Notes     NaN is in no range.
+ *  Notes     32f: NaN is in no range, and a bound that is NaN counts nothing. Above 2147483647 pixels the count
+ *            stays at 2147483647.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
  *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_BAD_RANGE (an upperBound below its lowerBound);
  *            then nothing is written.
@@ -3283,9 +3284,10 @@ QORI_API QorResult QORI_CALL qoriDilate3x3_32f_AC4IR(float* pSrcDst, int32_t src
 /** Adds the elements of each channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
@@ -3324,13 +3326,15 @@ QORI_API QorResult QORI_CALL qoriSum_32f_AC4R(const float* pSrc, int32_t srcStep
 /** Averages the elements of each channel: their sum over width * height.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     srcStep in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
- *  Notes     width * height is taken modulo 2^32 as a signed number. C1 divides the sum; the other layouts
- *            multiply it by the reciprocal, which may differ in the last bit.
+ *  Notes     width * height is taken modulo 2^32 as a signed number, so that regions of 2^31 pixels and more
+ *            divide by a negative number, by zero or by too small a number. C1 divides the sum; the other
+ *            layouts multiply it by the reciprocal, which may differ in the last bit.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -3369,9 +3373,10 @@ QORI_API QorResult QORI_CALL qoriMean_32f_AC4R(const float* pSrc, int32_t srcSte
 /** Largest magnitude of each channel: max |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Notes     |-32768| is 32768. NaN elements are ignored; 0 where there is nothing else.
@@ -3416,9 +3421,10 @@ QORI_API QorResult QORI_CALL qoriNorm_Inf_32s_C1R(const int32_t* pSrc, int32_t s
 /** Sum of magnitudes of each channel: sum |src|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
@@ -3460,9 +3466,10 @@ QORI_API QorResult QORI_CALL qoriNorm_L1_32f_AC4R(const float* pSrc, int32_t src
 /** Euclidean norm of each channel: the square root of sum src^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     srcStep in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Notes     32f, fast: squares are summed in single precision, so magnitudes above 1.8e19 overflow to
@@ -3508,9 +3515,10 @@ QORI_API QorResult QORI_CALL qoriNorm_L2_32f_AC4R(const float* pSrc, int32_t src
 /** Largest magnitude of the difference in each channel: max |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Notes     32f: differences in single precision; those that are NaN are ignored.
@@ -3553,9 +3561,10 @@ QORI_API QorResult QORI_CALL qoriNormDiff_Inf_32f_AC4R(const float* pSrc1, int32
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
@@ -3597,9 +3606,10 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L1_32f_AC4R(const float* pSrc1, int32_
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
@@ -3641,9 +3651,10 @@ QORI_API QorResult QORI_CALL qoriNormDiff_L2_32f_AC4R(const float* pSrc1, int32_
 /** Largest magnitude of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Notes     Where the norm of src2 is 0, the result is the norm of the difference and the status
@@ -3687,9 +3698,10 @@ QORI_API QorResult QORI_CALL qoriNormRel_Inf_32f_AC4R(const float* pSrc1, int32_
 /** Sum of magnitudes of the difference over that of src2, per channel.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Notes     Where the norm of src2 is below 2.2250738585072014e-308, the result is the norm of the difference
@@ -3733,9 +3745,10 @@ QORI_API QorResult QORI_CALL qoriNormRel_L1_32f_AC4R(const float* pSrc1, int32_t
 /** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares.
  *  Shapes    Results: one double, or an array of one per channel (three for AC4, whose channel 3 is not looked
  *            at).
- *  Elements  Integer sums and norms are exact for regions of any size and rounded once, to double. 32f with
- *            hintAccurate: double precision from the element on. 32f with any other hint: 48 partial sums in
- *            single precision, added pairwise.
+ *  Elements  Integer sums and norms are exact for every region that the arguments can name, that is up to (2^31
+ *            - 1)^2 pixels (totals are kept in 128 bits, of which 16u squares fill 94), and rounded once, to
+ *            double. 32f with hintAccurate: double precision from the element on. 32f with any other hint: 48
+ *            partial sums in single precision, added pairwise.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  Images are only read and may overlap. Results must not lie in them.
  *  Notes     Where the sum of squares of src2 is below 2.2250738585072014e-308, the result is the norm of the

@@ -73,3 +73,12 @@ if(NOT WIN32)
     # Nothing of the objects is used.
     target_compile_options(headers_alone PRIVATE -O0 -Wno-unused-function)
 endif()
+
+# The demo ends with a sheet, however small the picture, or with the reason why not.
+if(TARGET demo AND NOT WIN32)
+    find_file(QORI_TYPEFACE DejaVuSans.ttf PATHS /usr/share/fonts/truetype/dejavu NO_CMAKE_FIND_ROOT_PATH)
+    if(NOT QORI_TYPEFACE)
+        message(FATAL_ERROR "DejaVuSans.ttf is missing: install fonts-dejavu-core, or set QORI_TYPEFACE")
+    endif()
+    add_test(NAME demo_pictures COMMAND ${python} ${checks}/demo_pictures.py $<TARGET_FILE:demo> ${QORI_TYPEFACE})
+endif()

@@ -9,7 +9,7 @@
 //     Lanes                            accumulators of one vector position, see reduce_lanes.h
 //     static void feed(Lanes&, Vec<T>...)   adds one vector of each source; zeros add nothing
 // Lanes offer
-//     Total                            type of a channel's result
+//     Total                            type of the sum of all lanes between two spills
 //     static constexpr int banks       vectors of a round, in threes: more than 3 where latency would bind
 //     static constexpr ptrdiff_t limit rounds before a lane could overflow
 //     optionally  takesTwo             lanes are fed with TwoVectors, and a round has as many vectors again
@@ -21,30 +21,54 @@
 #include <algorithm>
 
 #include "reduce_lanes.h"
+#include "reduce_totals.h"
 
 namespace qori::kernels {
 
 namespace detail {
 
 template <class Lanes>
+constexpr bool joinsOwnWay = requires(typename Lanes::Total t) {
+    Lanes::join(t, t);
+};
+
+/// Sums of integers may outgrow 64 bits over a region; largest values and floats stay what they are.
+template <class Lanes>
+using WholeTotal = std::conditional_t<std::is_integral_v<typename Lanes::Total> && !joinsOwnWay<Lanes>, WideTotal,
+                                      typename Lanes::Total>;
+
+template <class Lanes>
 constexpr auto join(typename Lanes::Total a, typename Lanes::Total b) {
-    if constexpr (requires { Lanes::join(a, b); })
+    if constexpr (joinsOwnWay<Lanes>)
         return Lanes::join(a, b);
     else
         return static_cast<typename Lanes::Total>(a + b);
 }
 
+template <class Lanes>
+QORI_INLINE void addTotal(WideTotal& total, typename Lanes::Total own) {
+    total.add(own);
+}
+template <class Lanes>
+QORI_INLINE void addTotal(typename Lanes::Total& total, typename Lanes::Total own) {
+    total = join<Lanes>(total, own);
+}
+
 /// Brings the values of each channel together, which alternate: halves onto each other as long as they begin with the
 /// same channel, which compilers turn into vectors and which keeps float rounding to the depth of a tree.
 template <class Lanes, int count>
-void joinChannels(typename Lanes::Total* values, int channels, typename Lanes::Total* totals) {
+void joinChannels(typename Lanes::Total* values, int channels, WholeTotal<Lanes>* totals) {
     int n = count;
-    for (; n % (2 * channels) == 0; n /= 2)
+    // Pixels, without a division whose divisor is only known now.
+    for (int pixels = channels == 1   ? count
+                      : channels == 3 ? count / 3
+                                      : count / 4;
+         pixels % 2 == 0; pixels /= 2, n /= 2)
         for (int i = 0; i < n / 2; ++i) values[i] = join<Lanes>(values[i], values[n / 2 + i]);
     for (int c = 0; c < channels; ++c) {
         typename Lanes::Total own = values[c];
         for (int i = c + channels; i < n; i += channels) own = join<Lanes>(own, values[i]);
-        totals[c] = join<Lanes>(totals[c], own);
+        addTotal<Lanes>(totals[c], own);
     }
 }
 
@@ -79,24 +103,23 @@ QORI_INLINE auto loadRestFor(const T* p, ptrdiff_t n) {
 /// Accumulators of a whole reduction; lives on the family function's stack.
 template <class L, int vectorCount = 3 * L::banks>
 struct Accumulators {
-    using Total = typename L::Total;
     static constexpr int vectors = vectorCount;
 
     L lanes[vectors] = {};
     ptrdiff_t left = L::limit;  ///< Rounds until the lanes must be emptied.
-    Total totals[4] = {};
+    detail::WholeTotal<L> totals[4] = {};
 
     /// Empties the lanes into the totals.
     QORI_NOINLINE void spill(int channels) {
         constexpr int perVector = L::count;
-        Total values[vectors * perVector];
+        typename L::Total values[vectors * perVector];
         for (int v = 0; v < vectors; ++v) lanes[v].values(values + v * perVector);
         detail::joinChannels<L, vectors * perVector>(values, channels, totals);
         for (L& lane : lanes) lane = L{};
         left = L::limit;
     }
     void finish(int channels) { spill(channels); }
-    Total total(int channel) const { return totals[channel]; }
+    auto total(int channel) const { return totals[channel]; }
 };
 
 /// Accumulators that spill into wider ones.

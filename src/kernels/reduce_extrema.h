@@ -65,6 +65,13 @@ struct Biggest {
 
 namespace detail {
 
+/// Behind the operation that joined `other` to an accumulator of a loop: else compilers may put the new value into a
+/// register of its own, or of the other's that is free now, and copy it back in every round.
+template <class V>
+QORI_INLINE void updateInPlace(V& accumulator, const V& other) {
+    __asm__("" : "+x"(accumulator) : "x"(other));
+}
+
 alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
                                                            255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
                                                            255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
@@ -93,6 +100,19 @@ QORI_INLINE __m256i equal(Vec<T> a, Vec<T> b) {
         return _mm256_cmpeq_epi16(a.v, b.v);
 }
 
+/// The best of the elements that lie a multiple of `count` (1 or 4) apart, in the first ones.
+template <class Order, class T>
+QORI_INLINE Vec<T> folded(Vec<T> best, int count) {
+    const auto fold = [&](__m256i moved) { best = Order::join(fromInteger<T>(moved), best); };
+    const int bytes = count * static_cast<int>(sizeof(T));
+    fold(_mm256_permute2x128_si256(toInteger(best.v), toInteger(best.v), 1));
+    if (bytes <= 8) fold(_mm256_srli_si256(toInteger(best.v), 8));
+    if (bytes <= 4) fold(_mm256_srli_si256(toInteger(best.v), 4));
+    if (sizeof(T) <= 2 && bytes <= 2) fold(_mm256_srli_si256(toInteger(best.v), 2));
+    if (sizeof(T) == 1 && bytes <= 1) fold(_mm256_srli_si256(toInteger(best.v), 1));
+    return best;
+}
+
 }  // namespace detail
 
 /// The best so far of each position in a round.
@@ -103,24 +123,19 @@ struct ExtremumLanes {
 
     Vec<T> best[vectors] = {filled(Order::start), filled(Order::start), filled(Order::start)};
 
-    /// The best of each channel.
+    /// The best of each channel, in the first of four elements.
     QORI_INLINE void ofChannels(int channels, T* out) const {
         constexpr int n = Vec<T>::lanes;
-        const auto join = [](T a, T b) { return Order::better(b, a) ? b : a; };
         T values[vectors * n];
-        int count = n;
         if (channels != 3) {  // Whole pixels of 1 and of 4 channels fill a vector, so that the three are alike.
-            store(values, Order::join(Order::join(best[0], best[1]), best[2]));
+            store(values, detail::folded<Order>(Order::join(Order::join(best[0], best[1]), best[2]), channels));
         } else {
-            count = vectors * n;
             for (int v = 0; v < vectors; ++v) store(values + v * n, best[v]);
+            for (int half = vectors * n / 2; half >= 3; half /= 2)
+                for (int i = 0; i < half; ++i)
+                    values[i] = Order::better(values[half + i], values[i]) ? values[half + i] : values[i];
         }
-        for (; count % (2 * channels) == 0; count /= 2)
-            for (int i = 0; i < count / 2; ++i) values[i] = join(values[i], values[count / 2 + i]);
-        for (int c = 0; c < channels; ++c) {
-            out[c] = values[c];
-            for (int i = c + channels; i < count; i += channels) out[c] = join(out[c], values[i]);
-        }
+        __builtin_memcpy(out, values, 4 * sizeof(T));
     }
 };
 
@@ -140,8 +155,10 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
         for (; i <= elements - 3 * n; i += 3 * n)
             for (int v = 0; v < 3; ++v) {
                 Vec<T> a = load(src + i + v * n);
-                if (sizeof...(Orders) > 1) loadOnce(a.v);
+                if constexpr (sizeof...(Orders) > 1) loadOnce(a.v);
                 (join(own.best[v], a, Orders{}), ...);
+                if constexpr (sizeof...(Orders) > 1 && std::is_integral_v<T>)
+                    (detail::updateInPlace(own.best[v].v, a.v), ...);
             }
         ((lanes = own), ...);
     };
@@ -241,12 +258,7 @@ QORI_INLINE T bestOf(const T* buffer, ptrdiff_t count) {
     Vec<T> best = filled(Order::start);
     for (; count >= n; count -= n, buffer += n) best = Order::join(load(buffer), best);
     if (count > 0) best = Order::join(detail::select(load(buffer), Order::start, detail::firstLanes<T>(count)), best);
-    const auto fold = [&](__m256i moved) { best = Order::join(fromInteger<T>(moved), best); };
-    fold(_mm256_permute2x128_si256(toInteger(best.v), toInteger(best.v), 1));
-    fold(_mm256_srli_si256(toInteger(best.v), 8));
-    fold(_mm256_srli_si256(toInteger(best.v), 4));
-    if constexpr (sizeof(T) <= 2) fold(_mm256_srli_si256(toInteger(best.v), 2));
-    if constexpr (sizeof(T) == 1) fold(_mm256_srli_si256(toInteger(best.v), 1));
+    best = detail::folded<Order>(best, 1);
     T lanes[n];
     store(lanes, best);
     return lanes[0];

@@ -130,11 +130,11 @@ struct SumLanes<uint8_t> {
     }
 };
 
-/// Sum of |a - b| of bytes for one channel. A lane grows by at most 8 * 255 a vector and never overflows.
+/// Sum of |a - b| of bytes for one channel. A lane grows by at most 8 * 255 a vector: 2^31 of them stay far below 2^64.
 struct SadLanes {
     using Total = uint64_t;
     static constexpr int banks = 1, count = 4;
-    static constexpr ptrdiff_t limit = detail::kNoLimit;
+    static constexpr ptrdiff_t limit = INT32_MAX;
 
     __m256i sum;
 

@@ -2,8 +2,10 @@
 // Extrema, their positions, extrema of blocks, and counts of elements within bounds.
 #include "checks.h"
 #include "driver.h"
+#include "float_control.h"
 #include "kernels/reduce_count.h"
 #include "kernels/reduce_extrema.h"
+#include "kernels/reduce_narrow.h"
 
 namespace qori::stats {
 namespace {
@@ -15,12 +17,21 @@ using kernels::Smallest;
 template <class T>
 constexpr T kNan = std::is_floating_point_v<T> ? std::numeric_limits<T>::quiet_NaN() : T{};
 
+/// Integers are compared by instructions that do not read the control register.
+template <class T, class Body>
+QorResult controlled(Body body) {
+    if constexpr (std::is_floating_point_v<T>)
+        return underDefaultControl(body);
+    else
+        return body();
+}
+
 template <class T, class... Orders>
 void joinRegion(QorImageSize roi, int channels, Image<const T> src, ExtremumLanes<Orders>&... lanes) {
-    forEachRow(
-        roi,
+    kernels::forEachRowToReduce(
+        roi, channels,
         [&](ptrdiff_t pixels, const T* row) { kernels::extremaRow<T, Orders...>(pixels * channels, row, lanes...); },
-        walk(src, channels));
+        src);
 }
 
 /// One order's extremum per channel. Where a float channel still stands at its start, it holds that very value or
@@ -51,15 +62,19 @@ QORI_NOINLINE void extremum(QorImageSize roi, int stored, int results, Image<con
 template <class T, Layout layout>
 QorResult minimum(Image<const T> src, QorImageSize roi, T* pMin) {
     if (QorResult r = firstOf(nullCheck(src, pMin), sizeCheck(roi))) return r;
-    extremum<Smallest<T>>(roi, channels(layout), processedChannels(layout), src, pMin);
-    return QOR_OK;
+    return controlled<T>([&] {
+        extremum<Smallest<T>>(roi, channels(layout), processedChannels(layout), src, pMin);
+        return QOR_OK;
+    });
 }
 
 template <class T, Layout layout>
 QorResult maximum(Image<const T> src, QorImageSize roi, T* pMax) {
     if (QorResult r = firstOf(nullCheck(src, pMax), sizeCheck(roi))) return r;
-    extremum<Biggest<T>>(roi, channels(layout), processedChannels(layout), src, pMax);
-    return QOR_OK;
+    return controlled<T>([&] {
+        extremum<Biggest<T>>(roi, channels(layout), processedChannels(layout), src, pMax);
+        return QOR_OK;
+    });
 }
 
 /// Without a number in a channel, its lanes stand at their starts: the smallest above the biggest.
@@ -85,8 +100,10 @@ QORI_NOINLINE void bothExtrema(QorImageSize roi, int stored, int results, Image<
 template <class T, Layout layout>
 QorResult minMax(Image<const T> src, QorImageSize roi, T* pMin, T* pMax) {
     if (QorResult r = firstOf(nullCheck(src, pMin, pMax), sizeCheck(roi))) return r;
-    bothExtrema(roi, channels(layout), processedChannels(layout), src, pMin, pMax);
-    return QOR_OK;
+    return controlled<T>([&] {
+        bothExtrema(roi, channels(layout), processedChannels(layout), src, pMin, pMax);
+        return QOR_OK;
+    });
 }
 
 // --- positions ------------------------------------------------------------------------------------------------------
@@ -198,15 +215,19 @@ QORI_NOINLINE void extremumAndPosition(QorImageSize roi, int stored, int results
 template <class T, Layout layout>
 QorResult minimumIndex(Image<const T> src, QorImageSize roi, T* pMin, int32_t* pIndexX, int32_t* pIndexY) {
     if (QorResult r = firstOf(nullCheck(src, pMin, pIndexX, pIndexY), sizeCheck(roi))) return r;
-    extremumAndPosition<Smallest<T>>(roi, channels(layout), processedChannels(layout), src, pMin, pIndexX, pIndexY);
-    return QOR_OK;
+    return controlled<T>([&] {
+        extremumAndPosition<Smallest<T>>(roi, channels(layout), processedChannels(layout), src, pMin, pIndexX, pIndexY);
+        return QOR_OK;
+    });
 }
 
 template <class T, Layout layout>
 QorResult maximumIndex(Image<const T> src, QorImageSize roi, T* pMax, int32_t* pIndexX, int32_t* pIndexY) {
     if (QorResult r = firstOf(nullCheck(src, pMax, pIndexX, pIndexY), sizeCheck(roi))) return r;
-    extremumAndPosition<Biggest<T>>(roi, channels(layout), processedChannels(layout), src, pMax, pIndexX, pIndexY);
-    return QOR_OK;
+    return controlled<T>([&] {
+        extremumAndPosition<Biggest<T>>(roi, channels(layout), processedChannels(layout), src, pMax, pIndexX, pIndexY);
+        return QOR_OK;
+    });
 }
 
 // --- blocks ---------------------------------------------------------------------------------------------------------
@@ -273,16 +294,19 @@ QorResult blockMinMax(Image<const T> src, QorImageSize roi, Image<T> dstMin, Ima
     // Numbers of elements against steps in bytes: the check is that coarse.
     if (roi.width > src.step) return QOR_ERR_STEP;
     if ((!isNull(dstMin) && blocks > dstMin.step) || (!isNull(dstMax) && blocks > dstMax.step)) return QOR_ERR_STEP;
-    MinMax<T> all;
-    for (int32_t y = 0, by = 0; y < roi.height; ++by) {
-        const int32_t rows = std::min(block.height, roi.height - y);
-        all.join(blockRow<T>(src, y, rows, roi.width, block.width,
-                             {isNull(dstMin) ? nullptr : dstMin.row(by), isNull(dstMax) ? nullptr : dstMax.row(by)}));
-        y += rows;
-    }
-    if (pGlobalMin) *pGlobalMin = all.reportedSmallest();
-    if (pGlobalMax) *pGlobalMax = all.reportedBiggest();
-    return QOR_OK;
+    return controlled<T>([&] {
+        MinMax<T> all;
+        for (int32_t y = 0, by = 0; y < roi.height; ++by) {
+            const int32_t rows = std::min(block.height, roi.height - y);
+            all.join(
+                blockRow<T>(src, y, rows, roi.width, block.width,
+                            {isNull(dstMin) ? nullptr : dstMin.row(by), isNull(dstMax) ? nullptr : dstMax.row(by)}));
+            y += rows;
+        }
+        if (pGlobalMin) *pGlobalMin = all.reportedSmallest();
+        if (pGlobalMax) *pGlobalMax = all.reportedBiggest();
+        return QOR_OK;
+    });
 }
 
 // --- counting -------------------------------------------------------------------------------------------------------
@@ -294,21 +318,23 @@ QORI_NOINLINE void countRegion(QorImageSize roi, int stored, int results, Image<
     const T high[4] = {upper[0], upper[results > 1], upper[results > 1 ? 2 : 0], T{}};
     const kernels::Bounds<T> bounds{kernels::channelVectors(low, stored), kernels::channelVectors(high, stored)};
     kernels::Counts<T> counts;
-    forEachRow(
-        roi, [&](ptrdiff_t pixels, const T* row) { kernels::countRow(counts, bounds, stored, pixels * stored, row); },
-        walk(src, stored));
+    kernels::forEachRowToReduce(
+        roi, stored,
+        [&](ptrdiff_t pixels, const T* row) { kernels::countRow(counts, bounds, stored, pixels * stored, row); }, src);
     counts.finish(stored);
-    for (int c = 0; c < results; ++c) out[c] = static_cast<int32_t>(counts.total(c));
+    for (int c = 0; c < results; ++c) out[c] = counts.total(c).saturated();
 }
 
 template <class T, Layout layout>
 QorResult countInRange(Image<const T> src, QorImageSize roi, int32_t* pCounts, const T* lower, const T* upper) {
     constexpr int results = processedChannels(layout);
     if (QorResult r = firstOf(nullCheck(src, pCounts, lower, upper), stepCheck(src), sizeCheck(roi))) return r;
-    for (int c = 0; c < results; ++c)
-        if (upper[c] < lower[c]) return QOR_ERR_BAD_RANGE;
-    countRegion(roi, channels(layout), results, src, pCounts, lower, upper);
-    return QOR_OK;
+    return controlled<T>([&] {
+        for (int c = 0; c < results; ++c)
+            if (upper[c] < lower[c]) return QOR_ERR_BAD_RANGE;
+        countRegion(roi, channels(layout), results, src, pCounts, lower, upper);
+        return QOR_OK;
+    });
 }
 
 }  // namespace

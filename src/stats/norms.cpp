@@ -2,9 +2,9 @@
 // Norms, sums, means and dot products: a quantity is accumulated per channel over the region, then finished in double
 // precision.
 #include "checks.h"
-#include "driver.h"
 #include "float_control.h"
 #include "kernels/reduce_measures.h"
+#include "kernels/reduce_narrow.h"
 #include "kernels/reduce_sequential.h"
 
 namespace qori::stats {
@@ -70,20 +70,6 @@ void withMeasure(int32_t hint, Use use) {
     use(chooseMeasure<quantity, T, single>());
 }
 
-/// Rounded once. The words are converted apart, as there is no 64-bit conversion on 32-bit targets.
-double toDouble(uint64_t value) {
-    return static_cast<double>(static_cast<uint32_t>(value >> 32)) * 4'294'967'296.0 +
-           static_cast<double>(static_cast<uint32_t>(value));
-}
-double toDouble(int64_t value) {
-    return static_cast<double>(static_cast<int32_t>(value >> 32)) * 4'294'967'296.0 +
-           static_cast<double>(static_cast<uint32_t>(value));
-}
-template <class T>
-double toDouble(T value) {
-    return static_cast<double>(value);
-}
-
 struct Totals {
     double of[4];
 };
@@ -92,7 +78,7 @@ template <class Accumulators>
 Totals finish(Accumulators& sums, Channels n) {
     sums.finish(n.stored);
     Totals totals{};
-    for (int c = 0; c < n.results; ++c) totals.of[c] = toDouble(sums.total(c));
+    for (int c = 0; c < n.results; ++c) totals.of[c] = kernels::toDouble(sums.total(c));
     return totals;
 }
 
@@ -101,12 +87,12 @@ QORI_NOINLINE Totals accumulate(QorImageSize roi, Channels n, int32_t hint, Sour
     Totals totals;
     withMeasure<quantity, T, single>(hint, [&]<class Measure>(Type<Measure>) {
         kernels::AccumulatorsOf<Measure> sums;
-        forEachRow(
-            roi,
+        kernels::forEachRowToReduce(
+            roi, n.stored,
             [&](ptrdiff_t pixels, auto... rows) {
                 kernels::reduceRow<Measure>(sums, n.stored, pixels * n.stored, rows...);
             },
-            walk(sources, n.stored)...);
+            sources...);
         totals = finish(sums, n);
     });
     return totals;
@@ -177,8 +163,8 @@ QORI_NOINLINE Ratio accumulateRatio(QorImageSize roi, Channels n, int32_t hint, 
     Ratio ratio;
     withMeasure<quantity, T, single>(hint, [&]<class Measure>(Type<Measure>) {
         kernels::AccumulatorsOf<Measure> differences, references;
-        forEachRow(
-            roi,
+        kernels::forEachRowToReduce(
+            roi, n.stored,
             [&](ptrdiff_t pixels, const T* a, const T* b) {
                 const ptrdiff_t elements = pixels * n.stored;
                 for (ptrdiff_t i = 0; i < elements; i += kPiece) {
@@ -187,7 +173,7 @@ QORI_NOINLINE Ratio accumulateRatio(QorImageSize roi, Channels n, int32_t hint, 
                     kernels::reduceRow<Measure>(references, n.stored, piece, b + i);
                 }
             },
-            walk(src1, n.stored), walk(src2, n.stored));
+            src1, src2);
         ratio = {finish(differences, n), finish(references, n)};
     });
     return ratio;
@@ -311,16 +297,15 @@ Totals dotProductTotals(QorImageSize roi, int32_t hint, Image<const T> src1, Ima
         return totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
     } else if constexpr (sizeof(T) == 4) {
         Totals totals{};
-        forEachRow(
-            roi,
+        kernels::forEachRowToReduce(
+            roi, n,
             [&](ptrdiff_t pixels, const T* a, const T* b) { kernels::sequentialDotRow<n>(totals.of, pixels, a, b); },
-            walk(src1, n), walk(src2, n));
+            src1, src2);
         return totals;
     } else {
         OrderedDotProduct<T, n> sum;
-        forEachRow(
-            roi, [&](ptrdiff_t pixels, const T* a, const T* b) { sum.addRow(pixels, a, b); }, walk(src1, n),
-            walk(src2, n));
+        kernels::forEachRowToReduce(
+            roi, n, [&](ptrdiff_t pixels, const T* a, const T* b) { sum.addRow(pixels, a, b); }, src1, src2);
         sum.settle();
         return sum.totals;
     }

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "harness/sweep.h"
+#include "narrow_shapes.h"
 #include "reference/stats.h"
 
 namespace qori::test {
@@ -62,13 +63,14 @@ void expectSame(T expected, T actual) {
 template <class T, Layout layout, class Check>
 void sweepImages(const char* name, Check check) {
     for (Fill style : kFills)
-        forShapes(smallShapes(), [&](const Shape& shape) {
-            TestImage src(0, shape, channels(layout) * static_cast<int>(sizeof(T)));
-            fill<T>(src, channels(layout), style);
-            const Snapshot before = src.snapshot();
-            check(src, shape);
-            QORI_EXPECT_UNCHANGED(src, before);
-        });
+        for (const auto& shapes : {smallShapes(), narrowShapes()})
+            forShapes(shapes, [&](const Shape& shape) {
+                TestImage src(0, shape, channels(layout) * static_cast<int>(sizeof(T)));
+                fill<T>(src, channels(layout), style);
+                const Snapshot before = src.snapshot();
+                check(src, shape);
+                QORI_EXPECT_UNCHANGED(src, before);
+            });
     markSwept(name);
 }
 
@@ -253,14 +255,56 @@ TEST(Extrema, LowestValuesEverywhereAreFoundAtTheirFirstPixel) {
     EXPECT_TRUE(std::isnan(best));
 }
 
+/// Calls check() often enough for call() to come by every control register.
+template <class Check>
+void underEveryControl(Check check) {
+    for (int i = 0; i < 8; ++i) check();
+}
+
+TEST(Extrema, NeitherTrapNorFlushWhatTheCallerMayHaveAskedFor) {
+    const float nan = std::nanf(""), signalling = std::numeric_limits<float>::signaling_NaN();
+    const float withNan[3] = {1, nan, 2}, tiny[3] = {1e-40f, -1e-40f, 0};
+    const float mixed[8] = {0, 1e-40f, 2e-40f, 0.5f, signalling, 1, std::numeric_limits<float>::infinity(), -1};
+    const QorImageSize three{3, 1}, eight{8, 1};
+    underEveryControl([&] {
+        float low = 7, high = 7;
+        EXPECT_EQ(QOR_OK, call(qoriMinMax_32f_C1R, withNan, 12, three, &low, &high));
+        EXPECT_EQ(1, low);
+        EXPECT_EQ(2, high);
+        EXPECT_EQ(QOR_OK, call(qoriMinMax_32f_C1R, tiny, 12, three, &low, &high));
+        EXPECT_EQ(-1e-40f, low);
+        EXPECT_EQ(1e-40f, high);
+        int32_t x = -7, y = -7;
+        EXPECT_EQ(QOR_OK, call(qoriMinIndx_32f_C1R, tiny, 12, three, &low, &x, &y));
+        EXPECT_EQ(1, x);
+        EXPECT_EQ(QOR_OK, call(qoriMaxIndx_32f_C1R, tiny, 12, three, &high, &x, &y));
+        EXPECT_EQ(0, x);
+        float lows[4] = {}, highs[4] = {};
+        EXPECT_EQ(QOR_OK, call(qoriBlockMinMax_32f_C1R, mixed, 32, eight, lows, 16, highs, 16, QorImageSize{2, 1}, &low,
+                               &high));
+        EXPECT_EQ((std::vector{0.0f, 2e-40f, 1.0f, -1.0f}), std::vector(lows, lows + 4));
+        EXPECT_EQ((std::vector{1e-40f, 0.5f, 1.0f, mixed[6]}), std::vector(highs, highs + 4));
+        int32_t count = -7;
+        EXPECT_EQ(QOR_OK, call(qoriCountInRange_32f_C1R, mixed, 32, eight, &count, 1e-40f, 1.5e-40f));
+        EXPECT_EQ(1, count);
+        EXPECT_EQ(QOR_ERR_BAD_RANGE, call(qoriCountInRange_32f_C1R, mixed, 32, eight, &count, 2e-40f, 1e-40f));
+        EXPECT_EQ(QOR_OK, call(qoriCountInRange_32f_C1R, mixed, 32, eight, &count, nan, 1.0f));
+        EXPECT_EQ(0, count);
+    });
+}
+
 TEST(CountInRange, CountsPastEveryLane) {
-    const std::vector<uint8_t> row(8'000 * 3 + 40'000, 10);  // rows overlap: 3 * 320,000,000 elements
+    const std::vector<uint8_t> row(100'000, 10);  // rows overlap: 3 * 320,000,000 elements, then 2^31
     int32_t counts[3] = {};
     const uint8_t lower[3] = {10, 11, 0}, upper[3] = {10, 255, 255};
     EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C3R(row.data(), 1, {8'000, 40'000}, counts, lower, upper));
     EXPECT_EQ(320'000'000, counts[0]);
     EXPECT_EQ(0, counts[1]);
     EXPECT_EQ(320'000'000, counts[2]);
+    EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C1R(row.data(), 1, {50'000, 42'949}, counts, 10, 10));
+    EXPECT_EQ(2'147'450'000, counts[0]);
+    EXPECT_EQ(QOR_OK, qoriCountInRange_8u_C1R(row.data(), 1, {50'000, 42'950}, counts, 10, 10));
+    EXPECT_EQ(INT32_MAX, counts[0]);
 }
 
 TEST(Extrema, ChecksPointersThenSizes) {

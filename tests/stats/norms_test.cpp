@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "harness/sweep.h"
+#include "narrow_shapes.h"
 #include "reference/stats.h"
 
 namespace qori::test {
@@ -151,6 +152,7 @@ void sweepMember(const char* name, Function function, bool anyStep, Check check)
         });
         if (std::is_integral_v<T>) break;
     }
+    forShapes(narrowShapes(), [&](const Shape& shape) { runMember<T, layout>(function, shape, hintFast, check); });
     if constexpr (std::is_integral_v<T>) runExtremes<T, layout>(function, check);
     markSwept(name);
 }
@@ -284,6 +286,17 @@ TEST(Norms, SumsOfMorePixelsThan32BitsCount) {
     // The number of pixels wraps around: 2^31 reads as -2^31.
     ASSERT_EQ(QOR_OK, qoriMean_8u_C1R(row.data(), 0, {65'536, 32'768}, r));
     EXPECT_EQ(-255.0, r[0]);
+}
+
+TEST(Norms, SumsOfSquaresPast64Bits) {
+    constexpr int kSide = 65'538;  // 65535^2 a pixel passes 2^64 by seven digits; rows overlap, each one pixel on
+    const std::vector<uint16_t> brightest(2 * kSide, 65'535);
+    double r = 0;
+    ASSERT_EQ(QOR_OK, qoriNorm_L2_16u_C1R(brightest.data(), 2, {kSide, kSide}, &r));
+    EXPECT_EQ(65'535.0 * kSide, r);
+    const std::vector<int16_t> low(2 * kSide, INT16_MIN), high(2 * kSide, INT16_MAX);
+    ASSERT_EQ(QOR_OK, qoriNormDiff_L2_16s_C1R(low.data(), 2, high.data(), 2, {kSide, kSide}, &r));
+    EXPECT_EQ(65'535.0 * kSide, r);
 }
 
 TEST(Norms, DotProductsAddFromLeftToRightBeyond53Bits) {
