@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "resize_plan.h"
 
-#include "frame/control_scope.h"
 #include "kernels/resize_words.h"
 #include "lanczos_table.h"
 
@@ -221,7 +220,6 @@ double Filter::operator()(double distance) const {
 }
 
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
-    const ControlScope scope;
     const Builder builder(block, src, dst, interpNearest, false);
     for (const Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
         auto* indices = builder.table<int32_t>(axis->indexTable);
@@ -231,7 +229,6 @@ void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
 }
 
 void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint) {
-    const ControlScope scope;
     const Builder builder(block, src, dst, interpLinear, false);
     builder.setReach(1, 1);
     for (Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
@@ -255,7 +252,6 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
 constexpr double kMostGain = 128;
 
 void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
-    const ControlScope scope;
     const int32_t interpolation = filter.shape == Filter::Shape::linear  ? interpLinear
                                   : filter.shape == Filter::Shape::cubic ? interpCubic
                                                                          : interpLanczos;
@@ -285,7 +281,6 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
 }
 
 void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
-    const ControlScope scope;
     const Builder builder(block, src, dst, interpSuper, false);
     ResizePlan& plan = *builder.plan;
     plan.columnTaps = static_cast<int32_t>(superTaps(plan.horizontal));

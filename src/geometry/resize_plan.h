@@ -86,6 +86,7 @@ struct Filter {
     double operator()(double distance) const;
 };
 
+/// These run under the default control register.
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst);
 /// `fixedPoint` stores the 14-bit weights of the 8u form, else the fraction as a float.
 void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint);
