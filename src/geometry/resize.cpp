@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "checks.h"
 #include "frame/float_control.h"
+#include "resize_columns_run.h"
 #include "resize_half_run.h"
 #include "resize_run.h"
 #include "resize_taps_run.h"
@@ -96,6 +97,8 @@ auto withWay(const ResizePlan& plan, Visit visit) {
                 return visit.template operator()<FixedLinearTile<channels>>();
             if (WordsTile<channels>::suits(plan)) return visit.template operator()<WordsTile<channels>>();
         }
+        if (ColumnsFirstTile<T, channels>::suits(plan))
+            return visit.template operator()<ColumnsFirstTile<T, channels>>();
         if constexpr (channels == 1)
             if (PhaseRows<T>::suits(plan)) return visit.template operator()<TapsTile<T, 1, PhaseRows<T>>>();
         using Lines = LineRows<T, channels>;
