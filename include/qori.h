@@ -4144,8 +4144,11 @@ QORI_API QorResult QORI_CALL qoriResizeNearest_32f_C4R(const float* pSrc, int32_
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
- *  Notes     The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED where dstSize
- *            alone exceeds it.
+ *  Notes     Source pixels that a destination pixel does not cover take no part, finite or not. Sums of more
+ *            than 12 weights along an axis are carried in double precision: constants stay exact in integers
+ *            and within 4 units in the last place in 32f, at any ratio. Elements of 32f above 2^120 in
+ *            magnitude may overflow on the way. The part of a tile beyond the plan's destination is left out;
+ *            QOR_WARN_ADJUSTED where dstSize alone exceeds it.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
  *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
  *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
@@ -4188,7 +4191,8 @@ QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C4R(const float* pSrc, int32_t 
  *  Notes     borderReplicate repeats the source's edge, except on sides whose borderRead flag is set: there,
  *            and with borderReadAll, pixels beyond the source are read from memory. pBorderValue is not used
  *            and may be null. The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED
- *            where dstSize alone exceeds it.
+ *            where dstSize alone exceeds it. A source element that is not finite reaches every result whose 2 x
+ *            2 pixels hold it, those with a weight of 0 included.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
  *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
  *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
@@ -4247,7 +4251,8 @@ QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C4R(const double* pSrc, int32_
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
- *  Notes     A source element that is not finite reaches every result whose 4 x 4 pixels hold it.
+ *  Notes     A source element that is not finite reaches every result whose 4 x 4 pixels hold it, whatever
+ *            their weights.
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
@@ -4296,6 +4301,8 @@ QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C4R(const float* pSrc, int32_t 
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     A source element that is not finite reaches every result whose source pixels hold it, whatever
+ *            their weights.
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
@@ -4345,6 +4352,9 @@ QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C4R(const float* pSrc, int32_
  *  Units     Steps in bytes, any value, not checked: a negative step walks an image upwards. Sizes and offsets
  *            in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     A source element that is not finite reaches every result whose filter spans it, whatever its
+ *            weight. Sums of more than 12 weights along an axis are carried in double precision: constants stay
+ *            exact in integers and within 4 units in the last place in 32f, at any ratio.
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,

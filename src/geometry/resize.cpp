@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "checks.h"
-#include "frame/control_scope.h"
+#include "frame/float_control.h"
+#include "resize_columns_run.h"
 #include "resize_half_run.h"
 #include "resize_linear_run.h"
 #include "resize_quads_run.h"
@@ -10,8 +11,6 @@
 
 namespace qori::geometry {
 namespace {
-
-constexpr int64_t kSizeLimit = int64_t{1} << 31;
 
 const ResizePlan* planOf(const QorResizePlan* block) { return reinterpret_cast<const ResizePlan*>(blockStart(block)); }
 
@@ -81,10 +80,9 @@ QorResult resizeGetSize(QorImageSize src, QorImageSize dst, int32_t interpolatio
     if (QorResult r = kindCheck(interpolation, antialiasing != 0)) return r;
     if (QorResult r = kindSizeCheck(src, dst, interpolation)) return r;
     const PlanLayout layout = planLayout(src, dst, interpolation, antialiasing != 0);
-    if (layout.planBytes >= kSizeLimit || layout.initBytes >= kSizeLimit) return QOR_ERR_SIZE;
-    *pPlanSize = static_cast<int32_t>(layout.planBytes);
-    *pInitBufSize = static_cast<int32_t>(layout.initBytes);
-    return QOR_OK;
+    if (layout.planBytes > INT32_MAX) return QOR_ERR_SIZE;
+    if (QorResult r = reportSize(layout.initBytes, pInitBufSize)) return r;
+    return reportSize(layout.planBytes, pPlanSize);
 }
 
 /// Calls visit with the way to resize T by a plan.
@@ -101,6 +99,8 @@ auto withWay(const ResizePlan& plan, Visit visit) {
                 return visit.template operator()<FixedLinearTile<channels>>();
             if (WordsTile<channels>::suits(plan)) return visit.template operator()<WordsTile<channels>>();
         }
+        if (ColumnsFirstTile<T, channels>::suits(plan))
+            return visit.template operator()<ColumnsFirstTile<T, channels>>();
         if constexpr (channels == 1)
             if (PhaseRows<T>::suits(plan)) return visit.template operator()<TapsTile<T, 1, PhaseRows<T>>>();
         if constexpr (channels > 1) {
@@ -134,10 +134,12 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (QorResult r = tagCheck(&plan)) return r;
     if (numChannels != 1 && numChannels != 3 && numChannels != 4) return QOR_ERR_CHANNELS_UNSUPPORTED;
     if (QorResult r = sizeCheck(dst)) return r;
-    const ControlScope scope;  // as in the operation
-    const int64_t bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
-    if (bytes >= kSizeLimit) return QOR_ERR_SIZE;
-    *pBufSize = static_cast<int32_t>(bytes);
+    int64_t bytes = 0;
+    underDefaultControl([&] {  // as in the operation
+        bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
+        return QOR_OK;
+    });
+    if (QorResult r = reportSize(bytes, pBufSize)) return r;
     return trimWarning(plan, dst);
 }
 
@@ -174,24 +176,34 @@ QorResult resizeGetSrcRoi(const QorResizePlan* pPlan, QorImageRect dst, QorImage
 
 // --- plans ----------------------------------------------------------------------------------------------------------
 
+/// Runs one of the functions that fill a plan.
+template <class Function, class... Arguments>
+QorResult fill(Function function, QorResizePlan* pPlan, Arguments... arguments) {
+    return underDefaultControl([=] {
+        function(reinterpret_cast<ResizePlan*>(pPlan), arguments...);
+        return QOR_OK;
+    });
+}
+
 QorResult resizeNearestInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan) {
     if (QorResult r = initCheck(src, dst, pPlan)) return r;
-    fillNearest(reinterpret_cast<ResizePlan*>(pPlan), src, dst);
-    return QOR_OK;
+    return fill(fillNearest, pPlan, src, dst);
 }
 
 template <class T>
 QorResult resizeLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan), sourceCheck(src, 2))) return r;
-    fillLinear(reinterpret_cast<ResizePlan*>(pPlan), src, dst, std::is_same_v<T, uint8_t>);
-    return QOR_OK;
+    return fill(fillLinear, pPlan, src, dst, std::is_same_v<T, uint8_t>);
 }
 
 QorResult initCubic(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan, uint8_t* pInitBuf,
                     bool antialiasing) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 4))) return r;
-    fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::cubic, 2, b, c}, antialiasing);
-    return QOR_OK;
+    const auto fillCubic = [=](ResizePlan* block) {
+        const Filter filter{Filter::Shape::cubic, 2, static_cast<double>(b), static_cast<double>(c)};
+        fillFiltered(block, src, dst, filter, antialiasing);
+    };
+    return fill(fillCubic, pPlan);
 }
 
 QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorResizePlan* pPlan, uint8_t* pInitBuf,
@@ -200,8 +212,7 @@ QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorRes
     if (lobes != 2 && lobes != 3) return QOR_ERR_UNSUPPORTED_MODE;
     const auto support = static_cast<int32_t>(lobes);
     if (QorResult r = sourceCheck(src, 2 * support)) return r;
-    fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::lanczos, support}, antialiasing);
-    return QOR_OK;
+    return fill(fillFiltered, pPlan, src, dst, Filter{Filter::Shape::lanczos, support}, antialiasing);
 }
 
 QorResult resizeCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
@@ -216,14 +227,12 @@ QorResult resizeLanczosInit(QorImageSize src, QorImageSize dst, uint32_t lobes, 
 
 QorResult resizeSuperInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan), reductionCheck(src, dst))) return r;
-    fillSuper(reinterpret_cast<ResizePlan*>(pPlan), src, dst);
-    return QOR_OK;
+    return fill(fillSuper, pPlan, src, dst);
 }
 
 QorResult resizeAntialiasingLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan, uint8_t* pInitBuf) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 2))) return r;
-    fillFiltered(reinterpret_cast<ResizePlan*>(pPlan), src, dst, {Filter::Shape::linear, 1}, true);
-    return QOR_OK;
+    return fill(fillFiltered, pPlan, src, dst, Filter{Filter::Shape::linear, 1}, true);
 }
 
 QorResult resizeAntialiasingCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
@@ -272,12 +281,13 @@ OpenSides openSides(Border border) {
 template <class T, int channels>
 QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open,
                   const QorResizePlan* pPlan, uint8_t* pBuffer) {
-    const ControlScope scope;
     const ResizePlan& plan = *planOf(pPlan);
-    WorkBuffer buffer(pBuffer);
-    const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);
-    withWay<T, channels>(plan, [&]<class Way>() { Way(plan, tile, buffer).run(src, dst, open); });
-    return trimWarning(plan, size);
+    return underDefaultControl([&] {
+        WorkBuffer buffer(pBuffer);
+        const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);
+        withWay<T, channels>(plan, [&]<class Way>() { Way(plan, tile, buffer).run(src, dst, open); });
+        return trimWarning(plan, size);
+    });
 }
 
 template <class T, int channels, int32_t interpolation>

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "resize_plan.h"
 
-#include "frame/control_scope.h"
 #include "kernels/resize_words.h"
 #include "lanczos_table.h"
 
@@ -177,14 +176,6 @@ bool fitsWords(const ResizePlan& plan) {
 
 }  // namespace
 
-int32_t ResizePlan::lastTap(const Axis& axis, int32_t position) const {
-    if (interpolation == interpSuper) {
-        const int64_t end = (position + int64_t{1}) * axis.sourceReduced;
-        return static_cast<int32_t>((end + axis.targetReduced - 1) / axis.targetReduced) - 1;
-    }
-    return index(axis, position) + half(axis);
-}
-
 PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation, bool antialiasing) {
     constexpr int64_t kCounted = 180, kAlignment = 64;
     const TableBytes rows = tableBytes(makeAxis(src.height, dst.height), interpolation, antialiasing);
@@ -221,7 +212,6 @@ double Filter::operator()(double distance) const {
 }
 
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
-    const ControlScope scope;
     const Builder builder(block, src, dst, interpNearest, false);
     for (const Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
         auto* indices = builder.table<int32_t>(axis->indexTable);
@@ -231,7 +221,6 @@ void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
 }
 
 void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint) {
-    const ControlScope scope;
     const Builder builder(block, src, dst, interpLinear, false);
     builder.setReach(1, 1);
     for (Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
@@ -251,11 +240,37 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
     if (!fixedPoint) builder.plan->columnPeriod = periodOf(*builder.plan, 1);
 }
 
+/// Stores a position's weights and returns the sum of their magnitudes. Where they are to sum to 1, the largest takes
+/// what is left of the others' rounding.
+template <class Weight>
+double storeWeights(int32_t taps, Weight weight, bool normalises, float* out) {
+    constexpr int32_t kKept = 32;  // so many are not evaluated twice
+    double kept[kKept], sum = 0, factor = 1;
+    if (normalises) {
+        for (int32_t k = 0; k < taps; ++k) {
+            const double w = weight(k);
+            if (k < kKept) kept[k] = w;
+            sum += w;
+        }
+        factor = 1 / sum;
+    }
+    double magnitude = 0, rest = 1;
+    int32_t largest = 0;
+    for (int32_t k = 0; k < taps; ++k) {
+        out[k] = static_cast<float>(normalises && k < kKept ? kept[k] * factor : weight(k) * factor);
+        const auto w = static_cast<double>(out[k]);
+        magnitude += __builtin_fabs(w);
+        rest -= w;
+        if (__builtin_fabsf(out[k]) > __builtin_fabsf(out[largest])) largest = k;
+    }
+    if (normalises) out[largest] = static_cast<float>(static_cast<double>(out[largest]) + rest);
+    return magnitude;
+}
+
 /// Two passes of it leave 16-bit elements below 2^30.
 constexpr double kMostGain = 128;
 
 void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
-    const ControlScope scope;
     const int32_t interpolation = filter.shape == Filter::Shape::linear  ? interpLinear
                                   : filter.shape == Filter::Shape::cubic ? interpCubic
                                                                          : interpLanczos;
@@ -270,13 +285,8 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
         auto* weights = builder.table<float>(axis->weightTable);
         builder.forPositions(*axis, [&](int32_t, double fraction) {
             const auto weight = [&](int32_t k) { return filter(scale * (k - (half - 1) - fraction)); };
-            double sum = 0, magnitude = 0;
-            for (int32_t k = 0; k < 2 * half; ++k) sum += weight(k);
-            for (int32_t k = 0; k < 2 * half; ++k) {
-                const double w = normalises ? weight(k) / sum : weight(k);
-                magnitude += __builtin_fabs(w);
-                *weights++ = static_cast<float>(w);
-            }
+            const double magnitude = storeWeights(2 * half, weight, normalises, weights);
+            weights += 2 * half;
             if (!(magnitude <= kMostGain)) plan.bounded = 0;
         });
     }
@@ -285,7 +295,6 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
 }
 
 void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst) {
-    const ControlScope scope;
     const Builder builder(block, src, dst, interpSuper, false);
     ResizePlan& plan = *builder.plan;
     plan.columnTaps = static_cast<int32_t>(superTaps(plan.horizontal));

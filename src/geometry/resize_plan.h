@@ -61,7 +61,21 @@ struct ResizePlan {
         return index(axis, position) - (reach > 0 ? reach - 1 : 0);
     }
     /// The last index that the position's filter has a weight for.
-    int32_t lastTap(const Axis& axis, int32_t position) const;
+    int32_t lastTap(const Axis& axis, int32_t position) const {
+        if (interpolation != interpSuper) return index(axis, position) + half(axis);
+        const int64_t end = (position + int64_t{1}) * axis.sourceReduced;
+        return static_cast<int32_t>((end + axis.targetReduced - 1) / axis.targetReduced) - 1;
+    }
+    /// Taps of a destination row.
+    int32_t tapsOfRow(int32_t position) const {
+        return isPadded(vertical) ? lastTap(vertical, position) - firstTap(vertical, position) + 1 : rowTaps;
+    }
+    /// Whether some footprints of super-sampling have a pixel less than others: their last weight is a filler. Pixels
+    /// outside a footprint take no part, as 0 times infinity is not 0. All other filters name the same number of taps
+    /// everywhere, and those that happen to weigh 0 do take part.
+    bool isPadded(const Axis& axis) const {
+        return interpolation == interpSuper && axis.sourceReduced % axis.targetReduced > 1;
+    }
 };
 
 /// Where a tile's pSrc lies in the source.
@@ -86,6 +100,7 @@ struct Filter {
     double operator()(double distance) const;
 };
 
+/// These run under the default control register.
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst);
 /// `fixedPoint` stores the 14-bit weights of the 8u form, else the fraction as a float.
 void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint);

@@ -25,9 +25,9 @@ public:
     /// Such that the filtered rows of a strip stay in the second-level cache.
     int32_t stripPixels() const {
         constexpr int32_t kRingFloats = 24576;
-        return wholeChunks(kRingFloats / ringRows() / channels);
+        return wholeChunks(kRingFloats / (rowsInUse(source_.plan) + kAtOnce - 1) / channels);
     }
-    int32_t ringRows() const { return rowsOfPairs(source_.plan) + kernels::kQuadRows - 1; }
+    static constexpr int32_t kAtOnce = kernels::kQuadRows;
 
     void begin() { taps_.list(source_); }
     void beginStrip(int32_t x, int32_t width) {

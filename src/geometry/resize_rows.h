@@ -4,7 +4,7 @@
 //     suits(plan)                     whether it can do the plan; TurnedRows does any
 //     Rows(source, buffer)            takes its memory
 //     stripPixels()                   width of a strip
-//     ringRows()                      rows of floats that it needs room for
+//     kAtOnce                         rows that it filters at once
 //     begin()                         the source is open
 //     beginStrip(x, width)            a strip of the tile begins
 //     filterNext(sequence, ring)      filters one or more rows
@@ -14,6 +14,7 @@
 #include "kernels/resize_lines.h"
 #include "kernels/resize_phases.h"
 #include "resize_run.h"
+#include "resize_totals.h"
 
 namespace qori::geometry {
 
@@ -35,8 +36,9 @@ private:
     void enter(int32_t y) {
         y_ = y;
         if (done()) return;
-        const int32_t first = legal_.clamp(plan_.firstTap(plan_.vertical, tile_.y + y));
-        last_ = legal_.clamp(plan_.firstTap(plan_.vertical, tile_.y + y) + plan_.rowTaps - 1);
+        const int32_t position = tile_.y + y, tap = plan_.firstTap(plan_.vertical, position);
+        const int32_t first = legal_.clamp(tap);
+        last_ = legal_.clamp(tap + plan_.tapsOfRow(position) - 1);
         if (y == 0 || first > next_) next_ = first;
     }
 
@@ -46,24 +48,30 @@ private:
     int32_t y_ = 0, next_ = 0, last_ = 0;
 };
 
-/// Filtered rows, the last few of them, counted from the strip's first.
-struct Ring {
-    float* memory;
-    int32_t rows;
-    ptrdiff_t step;
-    int32_t filtered;
-
-    float* row(int32_t place) const { return memory + place % rows * step; }
-    float* next() { return row(filtered++); }
-};
+/// Whether destination rows have more taps than a chain holds. Source rows are added to their totals as they come then.
+inline bool hasLongRows(const ResizePlan& plan) { return plan.rowTaps > kernels::kChainTaps; }
 
 /// Whether two destination rows share source rows, or nearly so, and are made together.
-inline bool makesPairs(const ResizePlan& plan) { return plan.vertical.ratio() <= plan.rowTaps; }
+inline bool makesPairs(const ResizePlan& plan) {
+    const int32_t most = plan.isPadded(plan.vertical) ? kernels::kAscendingTaps : kernels::kChainTaps;
+    return plan.vertical.ratio() <= plan.rowTaps && plan.rowTaps <= most;
+}
 
-/// The source rows that a pair is made of at most, or a single row.
-inline int32_t rowsOfPairs(const ResizePlan& plan) {
+/// The filtered rows that are in use at a time, next to those that are filtered at once: of a block of taps, of a pair
+/// of destination rows, or of a single one.
+inline int32_t rowsInUse(const ResizePlan& plan) {
+    if (hasLongRows(plan)) return kernels::kTapsPerBlock;
     if (!makesPairs(plan)) return plan.rowTaps;
     return plan.rowTaps + static_cast<int32_t>(__builtin_ceil(plan.vertical.ratio()));
+}
+
+/// What brings sums along rows to means: super-sampling weighs whole pixels by 1. Chains leave it to the columns.
+inline double columnScale(const ResizePlan& plan) {
+    return plan.interpolation == interpSuper ? 1 / plan.horizontal.ratio() : 1;
+}
+inline double rowScale(const ResizePlan& plan) {
+    if (plan.interpolation != interpSuper) return 1;
+    return 1 / ((plan.columnTaps > kernels::kChainTaps ? 1 : plan.horizontal.ratio()) * plan.vertical.ratio());
 }
 
 inline int32_t wholeChunks(int32_t pixels) {
@@ -115,9 +123,9 @@ public:
     /// Such that the filtered rows of a strip stay in the second-level cache.
     int32_t stripPixels() const {
         constexpr int32_t kRingFloats = 24576;
-        return wholeChunks(kRingFloats / ringRows() / channels);
+        return wholeChunks(kRingFloats / (rowsInUse(source_.plan) + kAtOnce - 1) / channels);
     }
-    int32_t ringRows() const { return rowsOfPairs(source_.plan) + kernels::kTapRows - 1; }
+    static constexpr int32_t kAtOnce = kernels::kTapRows;
 
     void begin() { taps_.list(source_); }
     void beginStrip(int32_t x, int32_t width) {
@@ -130,6 +138,8 @@ public:
                    source_.columns.last,
                    kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps),
                    plan.columnPeriod,
+                   plan.isPadded(plan.horizontal),
+                   columnScale(plan),
                    columns_,
                    results_};
         newest_ = INT32_MIN;
@@ -183,9 +193,7 @@ public:
         const int64_t pixels = source.tile.width < stripPixels() ? source.tile.width : stripPixels();
         const int64_t elements = roundUp(pixels * channels, kernels::kTapBlock);
         const ResizePlan& plan = source.plan;
-        const int64_t columns =
-            static_cast<int64_t>(double(pixels - 1) * plan.horizontal.ratio()) + 1 + plan.columnTaps;
-        line_ = buffer.take<float>(columns * channels + kernels::LineFilter::kOverrun + 8);
+        line_ = buffer.take<float>(columnsOf(pixels) * channels + kernels::LineFilter::kOverrun + 8);
         filter_.taps = plan.columnTaps;
         filter_.channels = channels;
         filter_.bases = buffer.take<int32_t>(elements / 8);
@@ -193,9 +201,14 @@ public:
         filter_.weights = buffer.take<float>(elements * plan.columnTaps);
     }
 
+    /// Columns that the taps of so many neighbouring pixels reach, at most.
+    int64_t columnsOf(int64_t pixels) const {
+        const ResizePlan& plan = source_.plan;
+        return static_cast<int64_t>(double(pixels - 1) * plan.horizontal.ratio()) + 1 + plan.columnTaps;
+    }
     /// Strips whose tables stay in the second-level cache. Longer ones follow the source better than shorter ones.
     int32_t stripPixels() const { return wholeChunks(2048 / channels); }
-    int32_t ringRows() const { return rowsOfPairs(source_.plan); }
+    static constexpr int32_t kAtOnce = 1;
 
     void begin() { taps_.list(source_); }
     void beginStrip(int32_t x, int32_t width) {
@@ -213,9 +226,20 @@ public:
         if constexpr (std::is_same_v<T, float>) {
             if (isWhole_) line = from;
         }
-        if (line == line_)
-            kernels::expandLine<T, channels>(from, reached_.columns * channels, reached_.left, reached_.right, line_);
+        if (line == line_) expand(row, line_);
         kernels::filterLine(filter_, line, asBytes(source_.at(row + 1, reached_.from)), elementBytes<T>, ring.next());
+    }
+
+    // The same in parts, for lines that are made of several rows.
+
+    void expand(int32_t row, float* line) const {
+        kernels::expandLine<T, channels>(source_.at(row, reached_.from), reached_.columns * channels, reached_.left,
+                                         reached_.right, line);
+        std::fill(line + lineElements(), line + roundUp(lineElements(), 8), 0.0f);  // whole vectors are computed on
+    }
+    ptrdiff_t lineElements() const { return (reached_.left + reached_.columns + reached_.right) * channels; }
+    void filter(const float* line, float* out) const {
+        kernels::filterLine(filter_, line, asBytes(line), elementBytes<float>, out);
     }
 
 private:
@@ -253,7 +277,7 @@ public:
 
     /// Long strips read the source in long runs, which counts for more than filtered rows close at hand.
     static int32_t stripPixels() { return 4096; }
-    int32_t ringRows() const { return rowsOfPairs(source_.plan); }
+    static constexpr int32_t kAtOnce = 1;
 
     void begin() { std::fill_n(line_, lineFloats(), 0.0f); }  // nothing denormal where nothing is written
     void beginStrip(int32_t x, int32_t width) {

@@ -107,7 +107,7 @@ public:
         : source_{plan, tile},
           rows_(buffer),
           rowBytes_(ptrdiff_t{tile.width} * kPixel),
-          tables_(buffer.take<uint8_t>(2 * int64_t{groups()} * kernels::Gather::kLaneBytes)) {}
+          tables_(buffer.take<uint8_t>(2 * ((int64_t{tile.width} * kPixel + 31) / 32) * kernels::Gather::kLaneBytes)) {}
 
     void run(Image<const T> src, Image<T> dst, OpenSides) {
         source_.open(src, {});

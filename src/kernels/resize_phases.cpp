@@ -81,12 +81,24 @@ struct Later {
     }
 };
 
-QORI_INLINE void sumBlock(const PhaseFilter& filter, const float* line, float* out) {
+enum class Order { ascending, chain, any };
+
+template <Order order>
+QORI_NOINLINE void filterOne(const PhaseFilter& filter, const float* line, Later later, ptrdiff_t results, float* out) {
     constexpr int n = PhaseFilter::kVectors;
-    __m256 sum[n];
-    sumOne<n>(
-        filter.taps, [&](int32_t k) { return line + filter.offsets[k]; }, sum);
-    for (int v = 0; v < n; ++v) _mm256_storeu_ps(out + 8 * v, sum[v]);
+    const PairedTaps taps = filter.taps;  // not reloaded after every store
+    for (ptrdiff_t i = 0; i < results; i += PhaseFilter::kBlock) {
+        later.prefetchNext();
+        __m256 sum[n];
+        const auto at = [&](int32_t k) { return line + i + filter.offsets[k]; };
+        if constexpr (order == Order::ascending)
+            sumAscending<n>(taps.first, taps.count, at, sum);
+        else if constexpr (order == Order::chain)
+            sumChain<n>(taps.first, taps.count, at, sum);
+        else
+            sumOne<n>(taps.first, taps.count, at, sum);
+        for (int v = 0; v < n; ++v) _mm256_storeu_ps(out + i + 8 * v, sum[v]);
+    }
 }
 
 /// Results of both phases take turns.
@@ -161,10 +173,10 @@ void filterPhases(const PhaseFilter& filter, const float* line, const uint8_t* l
             else
                 filterBoth<Fixed>(filter, line, ahead, results, out);
         });
-    for (ptrdiff_t i = 0; i < results; i += PhaseFilter::kBlock) {
-        ahead.prefetchNext();
-        sumBlock(filter, line + i, out + i);
-    }
+    const auto filterBy = filter.taps.count <= kAscendingTaps ? filterOne<Order::ascending>
+                          : filter.taps.count <= kChainTaps   ? filterOne<Order::chain>
+                                                              : filterOne<Order::any>;
+    filterBy(filter, line, ahead, results, out);
 }
 
 template void dealOut(const PhaseFilter&, const uint8_t*, const LineEnds&, float*);

@@ -85,70 +85,138 @@ void repeatPixel(const float* pixel, float* out, int32_t count) {
         for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, _mm256_loadu_ps(pixel + 8 * c));
 }
 
-/// Turns the columns first..last of the source, which may lie outside the legal ones.
+/// Turns the columns first..last of the source, some or all of which may lie outside the legal ones.
 template <class T, int channels>
-void turnColumns(const RowFilter& filter, const T* const rows[kTapRows], int32_t first, int32_t last) {
-    const int32_t from = first < filter.legalFirst ? filter.legalFirst : first;
-    const int32_t to = last > filter.legalLast ? filter.legalLast : last;
+QORI_INLINE void turnColumns(const RowFilter& filter, const T* const rows[kTapRows], int32_t first, int32_t last) {
+    const auto clamp = [&](int32_t column) { return std::clamp(column, filter.legalFirst, filter.legalLast); };
+    const int32_t from = clamp(first), to = clamp(last);
+    const int32_t before = std::clamp(from - first, 0, last - first), behind = last - first - before - (to - from);
     constexpr ptrdiff_t pixel = 8 * channels;
-    float* const inside = filter.columns + (from - first) * pixel;
+    float* const inside = filter.columns + before * pixel;
     turnRows(rows, ptrdiff_t{from} * channels, ptrdiff_t{to - from + 1} * channels,
              (ptrdiff_t{filter.legalLast} + 1) * channels, inside);
-    repeatPixel<channels>(inside, filter.columns, from - first);
-    repeatPixel<channels>(inside + (to - from) * pixel, inside + (to - from + 1) * pixel, last - to);
+    repeatPixel<channels>(inside, filter.columns, before);
+    repeatPixel<channels>(inside + (to - from) * pixel, inside + (to - from + 1) * pixel, behind);
 }
 
-/// One pixel of eight rows. `taps` 0 is any number.
+/// One pixel of eight rows. `taps` 0 is any number that a chain holds.
 template <int channels, int taps>
 QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t count, float* out) {
     __m256 sum[channels];
-    const __m256 first = _mm256_broadcast_ss(weights);
-    for (int c = 0; c < channels; ++c) sum[c] = _mm256_mul_ps(first, _mm256_loadu_ps(column + 8 * c));
-    const int32_t n = taps > 0 ? taps : count;
-#pragma GCC unroll 12
-    for (int32_t k = 1; k < n; ++k) {
-        const __m256 weight = _mm256_broadcast_ss(weights + k);
-        column += 8 * channels;
-        for (int c = 0; c < channels; ++c) sum[c] = _mm256_fmadd_ps(weight, _mm256_loadu_ps(column + 8 * c), sum[c]);
-    }
+    sumChain<channels>(
+        weights, taps > 0 ? taps : count, [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); }, sum);
     for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, sum[c]);
 }
 
-/// Pixels whose weights repeat, one phase after the other, so that the weights stay in registers.
+/// Every period-th pixel, whose weights are the same, so that they stay in registers.
+template <int channels, int taps>
+QORI_INLINE void sumPhase(const RowFilter& filter, const PixelTaps* pixels, int32_t phase, int32_t count,
+                          float* results) {
+    const float* weights = filter.weights + pixels[phase].weights;
+    Vec<float> weight[taps];
+    for (int k = 0; k < taps; ++k) weight[k] = {weightOf(weights + k)};
+    for (int32_t i = phase; i < count; i += filter.period) {
+        const float* column = filter.columns + ptrdiff_t{pixels[i].first - pixels[0].first} * (8 * channels);
+        for (int c = 0; c < channels; ++c, column += 8) {
+            __m256 sum;
+            sumChain<1>(
+                weight, taps, [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); }, &sum);
+            _mm256_storeu_ps(results + 8 * (ptrdiff_t{i} * channels + c), sum);
+        }
+    }
+}
+
+/// The taps of a pixel, of which the last may be none.
+QORI_INLINE int32_t tapsOf(const RowFilter& filter, const float* weights) {
+    return filter.taps - (filter.isPadded && weights[filter.taps - 1] == 0);
+}
+
 template <int channels, int taps>
 QORI_NOINLINE void sumPhases(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* results) {
-    const int32_t origin = pixels[0].first;
     for (int32_t phase = 0; phase < filter.period; ++phase) {
-        const float* weights = filter.weights + pixels[phase].weights;
-        __m256 weight[taps];
-        for (int k = 0; k < taps; ++k) weight[k] = _mm256_broadcast_ss(weights + k);
-        for (int32_t i = phase; i < count; i += filter.period) {
-            const float* column = filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels);
-            for (int c = 0; c < channels; ++c, column += 8) {
-                __m256 sum = _mm256_mul_ps(weight[0], _mm256_loadu_ps(column));
-#pragma GCC unroll 12
-                for (int k = 1; k < taps; ++k)
-                    sum = _mm256_fmadd_ps(weight[k], _mm256_loadu_ps(column + 8 * channels * k), sum);
-                _mm256_storeu_ps(results + 8 * (ptrdiff_t{i} * channels + c), sum);
-            }
-        }
+        if (tapsOf(filter, filter.weights + pixels[phase].weights) == taps)
+            sumPhase<channels, taps>(filter, pixels, phase, count, results);
+        else
+            sumPhase<channels, taps - 1>(filter, pixels, phase, count, results);
+    }
+}
+
+/// Pixels whose last tap may be none, of up to kAscendingTaps: there is no branch on it, but nothing is added then, not
+/// even to the sign of a zero.
+template <int channels>
+QORI_NOINLINE void sumPaddedGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
+    alignas(32) float nothing[8 * channels];
+    for (float& element : nothing) element = -0.0f;
+    const int32_t last = filter.taps - 1;
+    for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
+        const float* const weights = filter.weights + pixels[i].weights;
+        const float* const column = filter.columns + ptrdiff_t{pixels[i].first - pixels[0].first} * (8 * channels);
+        const auto at = [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); };
+        __m256 sum[channels];
+        sumAscending<channels>(weights, last, at, sum);
+        addTap<channels>(weights[last] == 0 ? nothing : at(last), weights + last, sum);
+        for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, sum[c]);
     }
 }
 
 template <int channels, int taps>
 QORI_NOINLINE void sumGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
-    if constexpr (taps > 0)
+    if constexpr (taps > 0) {
         if (filter.period > 0 && 2 * filter.period <= count)
             return sumPhases<channels, taps>(filter, pixels, count, out);
+        if (filter.isPadded) return sumGroup<channels, 0>(filter, pixels, count, out);
+    } else if (filter.isPadded && filter.taps <= kAscendingTaps) {
+        return sumPaddedGroup<channels>(filter, pixels, count, out);
+    }
     const int32_t origin = pixels[0].first;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
-        sumTaps<channels, taps>(filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels),
-                                filter.weights + pixels[i].weights, filter.taps, out);
+        const float* const weights = filter.weights + pixels[i].weights;
+        sumTaps<channels, taps>(filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels), weights,
+                                tapsOf(filter, weights), out);
     }
 }
 
 template <int channels>
+void storeTotals(const Totals<channels>& totals, double scale, float* out) {
+    for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, totals.times(scale, c));
+}
+
+/// More taps than a chain has.
+template <int channels>
+QORI_NOINLINE void sumLongGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
+    for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
+        const float* const weights = filter.weights + pixels[i].weights;
+        const float* const columns = filter.columns + ptrdiff_t{pixels[i].first - pixels[0].first} * (8 * channels);
+        Totals<channels> totals;
+        totals.clear();
+        totals.addBlocks(weights, tapsOf(filter, weights),
+                         [=](int32_t k) { return columns + ptrdiff_t{k} * (8 * channels); });
+        storeTotals(totals, filter.scale, out);
+    }
+}
+
+/// Columns that are turned together where one pixel has more taps than are worth keeping turned; whole blocks of taps.
+constexpr int32_t kPieceColumns = 128;
+
+/// One pixel of very many taps, a piece of them at a time.
+template <class T, int channels>
+QORI_NOINLINE void sumPieces(const RowFilter& filter, const T* const rows[kTapRows], const PixelTaps& pixel,
+                             float* out) {
+    const float* const weights = filter.weights + pixel.weights;
+    const int32_t count = tapsOf(filter, weights);
+    Totals<channels> totals;
+    totals.clear();
+    for (int32_t k = 0; k < count; k += kPieceColumns) {
+        const int32_t rest = count - k, taps = rest < kPieceColumns ? rest : kPieceColumns;
+        turnColumns<T, channels>(filter, rows, pixel.first + k, pixel.first + k + taps - 1);
+        totals.addBlocks(weights + k, taps, [&](int32_t i) { return filter.columns + ptrdiff_t{i} * (8 * channels); });
+    }
+    storeTotals(totals, filter.scale, out);
+}
+
+template <int channels>
 auto chooseSum(int32_t taps) {
+    if (taps > kChainTaps) return sumLongGroup<channels>;
     switch (taps) {
         case 2: return sumGroup<channels, 2>;
         case 4: return sumGroup<channels, 4>;
@@ -158,99 +226,6 @@ auto chooseSum(int32_t taps) {
         case 12: return sumGroup<channels, 12>;
         default: return sumGroup<channels, 0>;
     }
-}
-
-enum class Finish { plain, scaled, limited };
-
-/// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; where sums
-/// may be so large, those above are cut where they saturate anyway.
-template <Finish finish>
-QORI_INLINE __m256i toIntegers(__m256 sum) {
-    return _mm256_cvtps_epi32(finish == Finish::limited ? _mm256_min_ps(sum, _mm256_set1_ps(0x1p30f)) : sum);
-}
-
-/// Rounds and saturates the n (at most kTapBlock) elements of four sums.
-template <Finish finish, class T>
-QORI_INLINE void storeSums(T* dst, const __m256 sum[4], ptrdiff_t n) {
-    if constexpr (std::is_same_v<T, float>) {
-        for (int j = 0; j < 4; ++j) storeUpTo(dst + 8 * j, Vec<float>{sum[j]}, n - 8 * j);
-    } else {
-        __m256i whole[4];
-        for (int j = 0; j < 4; ++j) whole[j] = toIntegers<finish>(sum[j]);
-        if constexpr (sizeof(T) == 1) {
-            const __m256i packed =
-                _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
-            storeUpTo(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))}, n);
-        } else {
-            for (int j = 0; j < 4; j += 2) {
-                const __m256i packed = std::is_signed_v<T> ? _mm256_packs_epi32(whole[j], whole[j + 1])
-                                                           : _mm256_packus_epi32(whole[j], whole[j + 1]);
-                storeUpTo(dst + 8 * j, Vec<T>{_mm256_permute4x64_epi64(packed, 0xD8)}, n - 8 * j);
-            }
-        }
-    }
-}
-
-template <Finish finish, class T>
-QORI_INLINE void finishSums(T* dst, __m256 sum[4], float scale, ptrdiff_t n) {
-    if constexpr (finish == Finish::scaled)
-        for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
-    storeSums<finish>(dst, sum, n);
-}
-
-template <Finish finish, class T>
-QORI_NOINLINE void sumColumn(const float* const* rows, const PairedTaps& given, float scale, T* dst,
-                             ptrdiff_t elements) {
-    const PairedTaps taps = given;  // not reloaded after every store
-    for (ptrdiff_t i = 0; i < elements; i += kTapBlock) {
-        __m256 sums[4];
-        for (int j = 0; j < 4; j += kPairVectors)
-            sumOne<kPairVectors>(
-                taps, [&](int32_t k) { return rows[k] + i + 8 * j; }, sums + j);
-        finishSums<finish>(dst + i, sums, scale, elements - i);
-    }
-}
-
-template <Finish finish, class Fixed, class T>
-QORI_INLINE void sumBlockPair(const float* const* rows, const PairedTaps& taps, float scale, ptrdiff_t at, T* dst,
-                              T* second, ptrdiff_t n) {
-    __m256 sums[4], others[4];
-    for (int j = 0; j < 4; j += kPairVectors)
-        sumPair<kPairVectors>(
-            taps, Fixed{}, [&](int32_t k) { return rows[k] + at + 8 * j; }, sums + j, others + j);
-    finishSums<finish>(dst + at, sums, scale, n);
-    finishSums<finish>(second + at, others, scale, n);
-}
-
-template <Finish finish, class Fixed, class T>
-QORI_NOINLINE void sumColumnPair(const float* const* rows, const PairedTaps& given, float scale, T* dst, T* second,
-                                 ptrdiff_t elements) {
-    const PairedTaps taps = given;
-    const float* own[Fixed::count + Fixed::shift + 1];
-    for (int k = 0; k < Fixed::count + Fixed::shift; ++k) own[k] = rows[k];
-    const float* const* const from = Fixed::count > 0 ? own : rows;
-    // Whole blocks first: with partial ones in the same loop, registers do not suffice.
-    ptrdiff_t i = 0;
-    for (; i + kTapBlock <= elements; i += kTapBlock) {
-        if constexpr (sizeof(T) < 4) {
-            prefetchAhead(dst + i);
-            prefetchAhead(second + i);
-        }
-        sumBlockPair<finish, Fixed>(from, taps, scale, i, dst, second, kTapBlock);
-    }
-    if (i < elements) sumBlockPair<finish, Fixed>(from, taps, scale, i, dst, second, elements - i);
-}
-
-template <Finish finish, class T>
-void sumColumns(const float* const* rows, const PairedTaps& taps, float scale, T* dst, T* second, ptrdiff_t elements) {
-    if (second == nullptr) return sumColumn<finish>(rows, taps, scale, dst, elements);
-    const auto sum = [&]<class Fixed>(Fixed) {
-        sumColumnPair<finish, Fixed>(rows, taps, scale, dst, second, elements);
-    };
-    if constexpr (finish == Finish::plain)
-        withFixedTaps(taps, sum);
-    else
-        sum(AnyTaps{});
 }
 
 /// Source columns that a group may span before it is made smaller.
@@ -265,34 +240,35 @@ int32_t tapGroup(double ratio, int32_t taps) {
 }
 
 int64_t tapColumnFloats(double ratio, int32_t taps, int channels) {
+    const int32_t group = tapGroup(ratio, taps), atOnce = group > 1 || taps < kPieceColumns ? taps : kPieceColumns;
     // One column for the rounding of the span, eight elements that the last turn writes beyond it.
-    const auto columns = static_cast<int64_t>((tapGroup(ratio, taps) - 1) * ratio) + taps + 1;
+    const auto columns = static_cast<int64_t>((group - 1) * ratio) + atOnce + 1;
     return 8 * (columns * channels + 8);
 }
 
 template <class T, int channels>
 void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* const out[kTapRows]) {
     const auto sum = chooseSum<channels>(filter.taps);
+    const bool inPieces = filter.group == 1 && filter.taps > kPieceColumns;
+    constexpr ptrdiff_t pixel = 8 * channels;
     for (int32_t x = 0; x < filter.width; x += kTapChunk) {
         const int32_t end = x + kTapChunk < filter.width ? x + kTapChunk : filter.width;
         for (int32_t i = x; i < end; i += filter.group) {
             const int32_t count = filter.group < end - i ? filter.group : end - i;
             const PixelTaps* pixels = filter.pixels + i;
+            float* const results = filter.results + (i - x) * pixel;
+            if (inPieces) {
+                sumPieces<T, channels>(filter, rows, pixels[0], results);
+                continue;
+            }
             turnColumns<T, channels>(filter, rows, pixels[0].first, pixels[count - 1].first + filter.taps - 1);
-            sum(filter, pixels, count, filter.results + ptrdiff_t{i - x} * (8 * channels));
+            sum(filter, pixels, count, results);
         }
-        for (ptrdiff_t e = 0; e < ptrdiff_t{end - x} * channels; e += 8)
-            turnOut(filter.results + 8 * e, out, ptrdiff_t{x} * channels + e);
+        const ptrdiff_t elements = ptrdiff_t{end - x} * channels;
+        // Whoever sums the rows up computes on whole vectors.
+        for (ptrdiff_t e = elements; e % 8 != 0; ++e) _mm256_storeu_ps(filter.results + 8 * e, _mm256_setzero_ps());
+        for (ptrdiff_t e = 0; e < elements; e += 8) turnOut(filter.results + 8 * e, out, ptrdiff_t{x} * channels + e);
     }
-}
-
-template <class T>
-void filterColumn(const float* const* rows, const PairedTaps& taps, ColumnFinish finish, T* dst, T* second,
-                  ptrdiff_t elements) {
-    if (finish.scale != 1) return sumColumns<Finish::scaled>(rows, taps, finish.scale, dst, second, elements);
-    if (finish.isBounded || std::is_same_v<T, float>)
-        return sumColumns<Finish::plain>(rows, taps, 1, dst, second, elements);
-    if constexpr (!std::is_same_v<T, float>) sumColumns<Finish::limited>(rows, taps, 1, dst, second, elements);
 }
 
 #define QORI_TAPS(T)                                                                                    \
@@ -304,9 +280,5 @@ QORI_TAPS(uint16_t)
 QORI_TAPS(int16_t)
 QORI_TAPS(float)
 #undef QORI_TAPS
-template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, uint8_t*, uint8_t*, ptrdiff_t);
-template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, uint16_t*, uint16_t*, ptrdiff_t);
-template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, int16_t*, int16_t*, ptrdiff_t);
-template void filterColumn(const float* const*, const PairedTaps&, ColumnFinish, float*, float*, ptrdiff_t);
 
 }  // namespace qori::kernels

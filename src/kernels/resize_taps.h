@@ -27,6 +27,8 @@ struct RowFilter {
     int32_t legalFirst, legalLast;  ///< Source columns that may be read.
     int32_t group;                  ///< Destination pixels, at most kTapChunk, whose columns are turned together.
     int32_t period;                 ///< Pixels after which the weights repeat, or 0.
+    bool isPadded;                  ///< A last weight of 0 stands for no tap: there may be no such pixel.
+    double scale;                   ///< Factor of the results that have more taps than a chain.
     float* columns;                 ///< Room for the turned columns of a group: tapColumnFloats().
     float* results;                 ///< kTapChunk pixels of eight rows.
 };
@@ -36,18 +38,9 @@ int32_t tapGroup(double ratio, int32_t taps);
 /// Floats of RowFilter::columns.
 int64_t tapColumnFloats(double ratio, int32_t taps, int channels);
 
-/// Filters eight rows, each given by the address of source column 0, into rows of floats that hold whole blocks.
+/// Filters eight rows, each given by the address of source column 0, into rows of floats that hold whole blocks. The
+/// last vector is filled up with zeros.
 template <class T, int channels>
 void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* const out[kTapRows]);
-
-struct ColumnFinish {
-    float scale;     ///< Factor of the sums.
-    bool isBounded;  ///< Sums stay below 2^31.
-};
-
-/// dst, and `second` unless it is null, become sums of rows, scaled; integers are rounded and saturated.
-template <class T>
-void filterColumn(const float* const* rows, const PairedTaps& taps, ColumnFinish finish, T* dst, T* second,
-                  ptrdiff_t elements);
 
 }  // namespace qori::kernels

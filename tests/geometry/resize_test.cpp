@@ -419,6 +419,12 @@ TEST(Resize, RefusesWorkBuffersBeyond32Bits) {
     EXPECT_EQ(7, bytes);
     EXPECT_EQ(QOR_OK, qoriResizeGetBufferSize_32f(plan, dst, 3, &bytes));
     EXPECT_LT(1'500'000'000, bytes);
+    // So wide that the bytes of a row wrap in 32 bits. The tables would take 1 GB; the record alone is changed.
+    constexpr int32_t kWide = 1 << 28;
+    auto* record = reinterpret_cast<int32_t*>((reinterpret_cast<uintptr_t>(plan) + 63) & ~uintptr_t{63});
+    std::replace(record, record + 40, dst.width, kWide);
+    EXPECT_EQ(QOR_ERR_SIZE, qoriResizeGetBufferSize_32f(plan, {kWide, 1}, 4, &bytes));
+    EXPECT_EQ(QOR_ERR_SIZE, qoriResizeGetBufferSize_32f(plan, {kWide, 1}, 1, &bytes));
 }
 
 TYPED_TEST(ResizeQueries, BordersAreTheReachOfTheFilter) {
