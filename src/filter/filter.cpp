@@ -72,9 +72,8 @@ bool fitsPairs(Kernel<K> kernel) {
 
 /// In 32 bits where no sum leaves them, else in double precision.
 template <Layout layout, class S, class K>
-void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
+void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
                  int32_t divisor, int32_t mode, const WorkArea& area) {
-    const ControlScope scope;
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
     if constexpr (std::is_same_v<S, uint8_t>)
@@ -100,9 +99,8 @@ void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
 
 /// In single precision, or in double where the elements have more digits.
 template <Layout layout, class S, class D, class K>
-void runFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor, int32_t mode,
+void sumFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor, int32_t mode,
                const WorkArea& area) {
-    const ControlScope scope;
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     constexpr bool isDouble = std::is_same_v<S, double> || std::is_same_v<S, int32_t>;
     if constexpr (isDouble) {
@@ -116,6 +114,22 @@ void runFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> ker
     }
 }
 
+template <Layout layout, class... Arguments>
+QorResult runIntegers(const Arguments&... arguments) {
+    return underDefaultControl([&] {
+        sumIntegers<layout>(arguments...);
+        return QOR_OK;
+    });
+}
+
+template <Layout layout, class... Arguments>
+QorResult runFloats(const Arguments&... arguments) {
+    return underDefaultControl([&] {
+        sumFloats<layout>(arguments...);
+        return QOR_OK;
+    });
+}
+
 template <class T, Layout layout>
 QorResult filterIntegers(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<int32_t> kernel, QorPoint2D anchor,
                          int32_t divisor) {
@@ -124,8 +138,7 @@ QorResult filterIntegers(Image<const T> src, Image<T> dst, QorImageSize roi, Ker
         return r;
     const WorkArea area(packedBytes(kernel.size));
     if (area.isMissing()) return QOR_ERR_NO_MEMORY;
-    runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundNearestEven, area);
-    return QOR_OK;
+    return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundNearestEven, area);
 }
 
 template <class S, class D, Layout layout, class K>
@@ -135,8 +148,7 @@ QorResult filterAllocating(Image<const S> src, Image<D> dst, QorImageSize roi, K
         return r;
     const WorkArea area(packedBytes(kernel.size));
     if (area.isMissing()) return QOR_ERR_NO_MEMORY;
-    runFloats<layout>(src, dst, roi, kernel, anchor, roundNearestEven, area);
-    return QOR_OK;
+    return runFloats<layout>(src, dst, roi, kernel, anchor, roundNearestEven, area);
 }
 
 template <class T, Layout layout>
@@ -151,8 +163,7 @@ QorResult filterRound(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel
             firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size), divisorCheck(divisor),
                     stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
-    runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
-    return QOR_OK;
+    return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
 }
 
 template <class T, Layout layout>
@@ -162,8 +173,7 @@ QorResult filterRoundFloats(Image<const T> src, Image<T> dst, QorImageSize roi, 
             firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
                     stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
-    runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
-    return QOR_OK;
+    return runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
 }
 
 QorResult rowBufferCheck(QorImageSize kernelSize, int32_t roiWidth, const int32_t* pBufferSize) {

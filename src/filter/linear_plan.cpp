@@ -3,7 +3,6 @@
 
 #include <bit>
 
-#include "frame/control_scope.h"
 #include "frame/plan.h"
 #include "kernels/filter_taps.h"
 #include "packing.h"
@@ -89,7 +88,6 @@ int64_t workBytes(QorImageSize kernel, int32_t roiWidth, int32_t dataType, int32
 
 void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
               int32_t roundMode) {
-    const ControlScope scope;
     const bool is8u = dataType == k8u;
     LinearPlan& plan =
         startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t), roundMode);
@@ -116,7 +114,6 @@ void fillPlan(QorLinearFilterPlan* block, const float* kernel, QorImageSize size
 
 void fillConvertedPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor,
                        int32_t dataType, int32_t channels, int32_t roundMode) {
-    const ControlScope scope;
     const double factor = 1.0 / divisor;
     fillFloats(block, size, dataType, channels, roundMode,
                [=](ptrdiff_t i) { return static_cast<float>(kernel[i] * factor); });

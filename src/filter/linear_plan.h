@@ -51,11 +51,13 @@ int64_t workBytes(QorImageSize kernel, int32_t width, int32_t dataType, int32_t 
 /// Whether these sizes' products stay so small that the formulas above cannot leave 64 bits.
 constexpr bool isModest(QorImageSize kernel) { return int64_t{kernel.width} * kernel.height <= INT32_MAX; }
 
+/// The plan of an integer kernel; under default control, for its reciprocals.
 void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
               int32_t roundMode);
+/// The plan of a float kernel, whose coefficients are moved and never computed with.
 void fillPlan(QorLinearFilterPlan* block, const float* kernel, QorImageSize size, int32_t dataType, int32_t channels,
               int32_t roundMode);
-/// The float plan of an integer kernel.
+/// The float plan of an integer kernel; under default control.
 void fillConvertedPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor,
                        int32_t dataType, int32_t channels, int32_t roundMode);
 

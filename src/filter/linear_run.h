@@ -2,7 +2,7 @@
 // Packed kernels and rounding rules meet images: the run of every general linear filter.
 #pragma once
 #include "frame/checks.h"
-#include "frame/control_scope.h"
+#include "frame/float_control.h"
 #include "kernels/filter_rules.h"
 #include "kernels/filter_sums.h"
 #include "packing.h"
