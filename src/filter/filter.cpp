@@ -76,12 +76,16 @@ void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
                  int32_t divisor, int32_t mode, const WorkArea& area) {
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
-    if constexpr (std::is_same_v<S, uint8_t>)
-        if (division.sumLimit <= ByteTaps::kSumLimit) {
+    if constexpr (std::is_same_v<S, uint8_t>) {
+        const bool inWords = division.sumLimit <= ByteTaps::kSumLimit;
+        const bool inGroups = !inWords && division.sumLimit <= INT32_MAX;
+        const ByteGroups groups = inGroups ? byteGroups(kernel.data, kernel.size) : ByteGroups{};
+        if (inWords || groups.count > 0) {
             auto* packed = area.begin<int32_t>();
             packBytes(kernel.data, kernel.size, packed);
-            return filterBytes(packed, kernel.size, division, target);
+            return filterBytes(packed, kernel.size, groups, division, target);
         }
+    }
     if (division.sumLimit <= INT32_MAX && fitsPairs(kernel)) {
         auto* packed = area.begin<int32_t>();
         packPairs<PairTaps<S>::repeats>(kernel.data, kernel.size, packed);

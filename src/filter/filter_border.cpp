@@ -69,7 +69,8 @@ template <class T>
 void filterIntegers(const LinearPlan& plan, QorImageSize size, Target<T, T>& target) {
     const Division division{plan.divisor, plan.roundMode, plan.sumLimit};
     if constexpr (std::is_same_v<T, uint8_t>)
-        if (plan.bytesOffset != 0) return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, division, target);
+        if (plan.bytesOffset != 0)
+            return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, plan.groups, division, target);
     filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, division, target);
 }
 

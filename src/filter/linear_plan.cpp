@@ -4,8 +4,6 @@
 #include <bit>
 
 #include "frame/plan.h"
-#include "kernels/filter_taps.h"
-#include "packing.h"
 
 namespace qori::filter {
 namespace {
@@ -97,7 +95,8 @@ void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize si
     packPairs<kCopies>(copy, size, plan.table<int32_t>(plan.packedOffset));
     const int64_t limit = is8u ? largestSum<uint8_t>(copy, size) : largestSum<int16_t>(copy, size);
     plan.sumLimit = static_cast<int32_t>(std::min<int64_t>(limit, INT32_MAX));
-    if (is8u && limit <= kernels::ByteTaps::kSumLimit) {
+    if (is8u && limit > kernels::ByteTaps::kSumLimit) plan.groups = byteGroups(copy, size);
+    if (is8u && (limit <= kernels::ByteTaps::kSumLimit || plan.groups.count > 0)) {
         // Half of the packed kernel's region is free.
         const int32_t pairs = (size.width + 1) / 2 * size.height;
         plan.bytesOffset = plan.packedOffset + kCopies * int32_t{sizeof(int32_t)} * pairs;

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The plan of a general linear filter: a record in the caller's block, the kernel as given and as the sums want it.
 #pragma once
-#include "frame/image.h"
+#include "packing.h"
 
 namespace qori::filter {
 
@@ -25,6 +25,7 @@ struct LinearPlan {
     int32_t kernelOffset, packedOffset;  ///< Bytes from the start of the record.
     int32_t fitsPairs;    ///< Every coefficient lies in -32767 to 32766: no pair of products leaves 32 bits.
     int32_t bytesOffset;  ///< The kernel in bytes, behind the packed one, where its sums allow for them; else 0.
+    ByteGroups groups;    ///< Of the kernel in bytes, where its sums leave 16 bits.
     int32_t sumLimit;     ///< No sum's magnitude is larger; INT32_MAX also where one may be.
 
     template <class T>
