@@ -20,7 +20,13 @@
  * that keeps a channel may rewrite it with its own value.
  *
  * Threads. The library has no state and starts no threads: any call may run beside any other, on distinct destinations.
- * The caller's floating-point rounding mode changes no result and is never left changed.
+ * The caller's floating-point control (rounding, flushing of subnormals, exceptions that trap) changes no result, and it
+ * is left as it was. Subnormal floats are computed with like any others, as slowly as the processor does it.
+ *
+ * Plans. Some operations are prepared once: an initialiser fills a record in the caller's memory, a plan, and calls read
+ * it. A plan is trusted memory: only its initialiser writes it. It holds sizes and offsets that calls follow without
+ * checking them, so that a changed bit, or a record of other pixels, leads to reads and writes out of bounds. Plans of
+ * unknown origin, from files or other processes, must not be used; make them anew.
  */
 #ifndef QORI_H
 #define QORI_H
@@ -213,10 +219,11 @@ typedef struct QorBorderExtent {
 
 /** Tables of a resize, in the caller's memory: as many bytes as qoriResizeGetSize reports, at any address. The plan
  *  begins at the next multiple of 64 and may be copied to a block whose address is equal modulo 64. Once filled it is
- *  only read: any number of threads may use it at once. */
+ *  only read: any number of threads may use it at once. It is trusted memory: see Plans above. */
 typedef struct QorResizePlan QorResizePlan;
 
-/** Levels of a prepared histogram: a block of the size that qoriHistogramGetBufferSize reports, aligned to 4 bytes. */
+/** Levels of a prepared histogram: a block of the size that qoriHistogramGetBufferSize reports, aligned to 4 bytes. It is
+ *  trusted memory: see Plans above. */
 typedef struct QorHistogramSpec QorHistogramSpec;
 
 /** Version record of the library. */
@@ -233,7 +240,7 @@ typedef struct QorLibraryVersion {
 
 /** A kernel prepared for filtering, in the caller's memory: as many bytes as qoriFilterBorderGetSize reports, at any
  *  address. It may be copied to a block whose address is equal modulo 64. Once filled it is only read: any number of
- *  threads may use it at once. */
+ *  threads may use it at once. It is trusted memory: see Plans above. */
 typedef struct QorLinearFilterPlan QorLinearFilterPlan;
 
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
@@ -1157,10 +1164,12 @@ QORI_API QorResult QORI_CALL qoriMulCScale_16u_AC4IR(const uint16_t value[3], ui
  *  Elements  Integers: the exact quotient is rounded once; complex (c + di) / (a + bi) = ((ca + db) + (da -
  *            cb)i) / (a^2 + b^2), by part. 32f: with r the processor's approximate reciprocal of src1 and e = 1
  *            - src1 * r, fused, src2 * r * (1 + e + e^2); this is not the correctly rounded quotient, and its
- *            last bits depend on the processor. 32fc: in double precision, rounded to single. A zero divisor
- *            gives integers the type's maximum, or for a negative numerator the minimum, and 0 for 0 (complex:
- *            each part by its own numerator part). Floats get an infinity with the sign of the quotient (32fc:
- *            of the numerator part), and the NaN 0x7FBFFFFF where the numerator is 0 or NaN.
+ *            last bits depend on the processor. By this formula a subnormal src1 gives a NaN (r is infinite),
+ *            an infinite one too, and |src1| from about 2^126 on gives 0. 32fc: in double precision, rounded to
+ *            single. A zero divisor gives integers the type's maximum, or for a negative numerator the minimum,
+ *            and 0 for 0 (complex: each part by its own numerator part). Floats get an infinity with the sign
+ *            of the quotient (32fc: of the numerator part), and the NaN 0x7FBFFFFF where the numerator is 0 or
+ *            NaN.
  *  Units     Steps in bytes; roiSize in pixels; scaleFactor any int32: quotients are multiplied by
  *            2^-scaleFactor.
  *  Aliasing  The destination may be either source (same pointer and step); other overlaps are undefined.
@@ -1857,9 +1866,11 @@ QORI_API QorResult QORI_CALL qoriConvert_32f16s_AC4R(const float* pSrc, int32_t 
  *            other than 0 and 1 mean roundHalfAway. scaleFactor is any integer.
  *  Aliasing  Images may be the same (same pointer and step) when the element types have one size; otherwise
  *            they must not overlap.
- *  Notes     A NaN gives the destination type's minimum; for 32u it gives 4294967295. 32u with scaleFactor
- *            below -159: every positive value gives 4294967295, however small, and everything else, NaN too,
- *            gives 0. The in-place form reads the elements as float and leaves 32-bit unsigned integers.
+ *  Notes     Infinities saturate by their sign. A NaN gives the destination type's minimum; for 32u it gives
+ *            4294967295. 32u with scaleFactor below -159: every positive value gives 4294967295, however small,
+ *            and everything else, NaN too, gives 0. 32u with scaleFactor above 128: everything gives 0,
+ *            infinity too, but a NaN still 4294967295. The in-place form reads the elements as float and leaves
+ *            32-bit unsigned integers.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -4431,6 +4442,9 @@ QORI_API QorResult QORI_CALL qoriScale_8u32s_AC4R(const uint8_t* pSrc, int32_t s
 
 /** Maps 0..255 linearly onto vMin..vMax: dst = vMin + x * k, k = (vMax - vMin) / 255, in 32-bit float.
  *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
+ *  Elements  The difference, the quotient, the product and the sum are rounded one by one, so that 255 may miss
+ *            vMax by the rounding. A range wider than the largest float makes k infinite: infinities, and a NaN
+ *            for 0.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The images must not overlap.
  *  Returns   QOR_OK; in this order QOR_ERR_SCALE_RANGE (vMax - vMin at or below 0), QOR_ERR_NULL_PTR (a pointer
@@ -4448,7 +4462,9 @@ QORI_API QorResult QORI_CALL qoriScale_8u32f_AC4R(const uint8_t* pSrc, int32_t s
 
 /** Maps vMin..vMax linearly onto 0..255: dst = saturate(round(x * k - vMin * k)), k = 255 / (vMax - vMin).
  *  Shapes    AC4 converts channels 0 to 2; the destination keeps its channel 3.
- *  Elements  One fused multiply-add in 32-bit float, then round to nearest, ties to even. A NaN gives 0.
+ *  Elements  One fused multiply-add in 32-bit float, then round to nearest, ties to even. A NaN gives 0. A
+ *            range wider than the largest float makes k 0, one narrower than about 7.5e-37 makes it infinite;
+ *            then results say nothing, and are 0 where vMin is 0.
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The images must not overlap.
  *  Returns   QOR_OK; in this order QOR_ERR_SCALE_RANGE (vMax - vMin at or below 0), QOR_ERR_NULL_PTR (a pointer

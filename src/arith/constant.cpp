@@ -39,7 +39,6 @@ kernels::ChannelVectors<T> constantsOf(const T* value) {
 /// dst = operation(src), per element, where the operation has the constants.
 template <Layout layout, class T, class Operation>
 void runUnary(Operation operation, Image<const T> src, Image<T> dst, QorImageSize roi) {
-    [[maybe_unused]] const FloatControl<T> control;
     const bool streaming = streamsTo<layout>(dst, roi, src);
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, src);
 }
@@ -68,9 +67,11 @@ void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
 
 template <class Op, Layout layout, class T>
 QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale) {
-    const auto run = [&](auto operation) { runConstant<layout>(operation, value, src, dst, roi); };
-    if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
-    return QOR_OK;
+    return underControlOf<T>([&] {
+        const auto run = [&](auto operation) { runConstant<layout>(operation, value, src, dst, roi); };
+        if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
+        return QOR_OK;
+    });
 }
 
 template <class T, Layout layout, Kind kind>
@@ -124,9 +125,8 @@ QorResult multiplyConstant(Image<const T> src, const T* value, Image<T> dst, Qor
     return combine<kernels::Product<T>, layout>(value, src, dst, roi, scale);
 }
 
-template <class T, Layout layout>
-QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    if (QorResult r = check<false>(src, value, dst, roi)) return r;
+template <Layout layout, class T>
+QorResult runDivision(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale) {
     if (!allValues<layout>(value, [](T v) { return !isZeroValue(v); })) return QOR_ERR_DIV_BY_ZERO;
     if constexpr (std::is_integral_v<T>) {
         // Up to 2^(scale-1): at most a half, which goes to 0.
@@ -148,6 +148,12 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
         kernels::withDivision<T>(scale, run);
     }
     return QOR_OK;
+}
+
+template <class T, Layout layout>
+QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    if (QorResult r = check<false>(src, value, dst, roi)) return r;
+    return underDefaultControl([&] { return runDivision<layout>(src, value, dst, roi, scale); });
 }
 
 template <class T, Layout layout>

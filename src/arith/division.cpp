@@ -16,24 +16,28 @@ QorResult runDivision(Divide divide, Image<const T> src1, Image<const T> src2, I
 template <class T, Layout layout>
 QorResult divide(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi), stepCheck(src1, src2, dst))) return r;
-    QorResult result = QOR_OK;
-    const auto run = [&](auto division) { result = runDivision<layout>(division, src1, src2, dst, roi); };
-    kernels::withDivision<T>(scale, run);
-    return result;
+    return underDefaultControl([&] {
+        QorResult result = QOR_OK;
+        const auto run = [&](auto division) { result = runDivision<layout>(division, src1, src2, dst, roi); };
+        kernels::withDivision<T>(scale, run);
+        return result;
+    });
 }
 
 template <class T, Layout layout>
 QorResult divideRounded(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t mode,
                         int32_t scale) {
     if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi), stepCheck(src1, src2, dst))) return r;
-    QorResult result = QOR_OK;
-    const auto run = [&](auto division) { result = runDivision<layout>(division, src1, src2, dst, roi); };
-    switch (mode) {
-        case roundTowardZero: kernels::withRoundedDivision<T, roundTowardZero>(scale, run); return result;
-        case roundNearestEven: kernels::withRoundedDivision<T, roundNearestEven>(scale, run); return result;
-        case roundHalfAway: kernels::withRoundedDivision<T, roundHalfAway>(scale, run); return result;
-    }
-    return QOR_ERR_ROUND_MODE;
+    return underDefaultControl([&] {
+        QorResult result = QOR_ERR_ROUND_MODE;
+        const auto run = [&](auto division) { result = runDivision<layout>(division, src1, src2, dst, roi); };
+        switch (mode) {
+            case roundTowardZero: kernels::withRoundedDivision<T, roundTowardZero>(scale, run); break;
+            case roundNearestEven: kernels::withRoundedDivision<T, roundNearestEven>(scale, run); break;
+            case roundHalfAway: kernels::withRoundedDivision<T, roundHalfAway>(scale, run); break;
+        }
+        return result;
+    });
 }
 
 }  // namespace

@@ -2,19 +2,21 @@
 // How the arithmetic families run a row operation: over two images, or over one image and constants.
 #pragma once
 #include "frame/checks.h"
-#include "frame/control_scope.h"
+#include "frame/float_control.h"
 #include "frame/streaming.h"
 #include "kernels/arith.h"
 
 namespace qori::arith {
 
-/// Nothing, for integer elements.
-struct NoFloatControl {
-    NoFloatControl() {}  // user-provided, so that an unused variable is no warning
-};
-
-template <class T>
-using FloatControl = std::conditional_t<kernels::isFloat<T>, ControlScope, NoFloatControl>;
+/// Runs body under default control where elements are floats. Sums, differences, products and scaling of integers are
+/// made of integer instructions.
+template <class T, class Body>
+QorResult underControlOf(Body body) {
+    if constexpr (kernels::isFloat<T>)
+        return underDefaultControl(body);
+    else
+        return body();
+}
 
 /// Stores past the cache once the images fill half of it: the destination is then not read before it is written. In
 /// place it has been read anyway.
@@ -31,7 +33,6 @@ constexpr bool keepsAlpha = layout == Layout::AC4;
 /// dst = operation(first, second), per element.
 template <Layout layout, class Operation, class T>
 void runBinary(Operation&& operation, Image<const T> first, Image<const T> second, Image<T> dst, QorImageSize roi) {
-    [[maybe_unused]] const FloatControl<T> control;
     const bool streaming = streamsTo<layout>(dst, roi, first, second);
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, first, second);
 }

@@ -206,7 +206,6 @@ struct ScaledLogarithm {
 
 template <Layout layout, class T, class Op>
 QorResult runUnary(Op&& op, Image<const T> src, Image<T> dst, QorImageSize roi) {
-    const ControlScope scope;
     mapImage<keepsAlpha<layout>>(roi, channels(layout), op, streamsTo<layout>(dst, roi, src), dst, src);
     return QOR_OK;
 }
@@ -224,6 +223,7 @@ QorResult check(Image<const T> src, Image<T> dst, QorImageSize roi) {
 /// 2^-scale, at bounds beyond which every integer result is 0 or saturated.
 int boundedExponent(int32_t scale) { return scale > 100 ? -100 : scale < -100 ? 100 : -scale; }
 
+/// Bitwise for floats and in integers for the others: nothing here reads the control register.
 template <class T, Layout layout>
 QorResult absolute(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = check(src, dst, roi)) return r;
@@ -239,48 +239,55 @@ QorResult absolute(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T, Layout layout>
 QorResult square(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = check(src, dst, roi)) return r;
-    const auto run = [&](auto operation) { runBinary<layout>(operation, src, src, dst, roi); };
-    if (!withScaledOperation<Product<T>, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
-    return QOR_OK;
+    return underControlOf<T>([&] {
+        const auto run = [&](auto operation) { runBinary<layout>(operation, src, src, dst, roi); };
+        if (!withScaledOperation<Product<T>, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
+        return QOR_OK;
+    });
 }
 
 template <class T, Layout layout>
 QorResult squareRoot(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = check(src, dst, roi)) return r;
-    if constexpr (std::is_same_v<T, float>) {
-        return runFloats<layout>([](__m256 v) { return _mm256_sqrt_ps(v); }, src, dst, roi);
-    } else {
-        const int exponent = boundedExponent(scale);
-        if (sizeof(T) == 1 || exponent <= 2)
-            return runUnary<layout>(FloatRoot<T>{std::ldexp(1.0f, exponent)}, src, dst, roi);
-        return runUnary<layout>(DoubleRoot<T>{powerOfTwo(exponent)}, src, dst, roi);
-    }
+    return underDefaultControl([&] {
+        if constexpr (std::is_same_v<T, float>) {
+            return runFloats<layout>([](__m256 v) { return _mm256_sqrt_ps(v); }, src, dst, roi);
+        } else {
+            const int exponent = boundedExponent(scale);
+            if (sizeof(T) == 1 || exponent <= 2)
+                return runUnary<layout>(FloatRoot<T>{std::ldexp(1.0f, exponent)}, src, dst, roi);
+            return runUnary<layout>(DoubleRoot<T>{powerOfTwo(exponent)}, src, dst, roi);
+        }
+    });
 }
 
 template <class T, Layout layout>
 QorResult exponential(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = check(src, dst, roi)) return r;
-    if constexpr (std::is_same_v<T, float>) {
-        return runFloats<layout>([](__m256 v) { return kernels::exponential(v); }, src, dst, roi);
-    } else {
-        return runUnary<layout>(Exponential<T>{{scale, std::numeric_limits<T>::max()}}, src, dst, roi);
-    }
+    return underDefaultControl([&] {
+        if constexpr (std::is_same_v<T, float>)
+            return runFloats<layout>([](__m256 v) { return kernels::exponential(v); }, src, dst, roi);
+        else
+            return runUnary<layout>(Exponential<T>{{scale, std::numeric_limits<T>::max()}}, src, dst, roi);
+    });
 }
 
 template <class T, Layout layout>
 QorResult logarithm(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = check(src, dst, roi)) return r;
-    if constexpr (std::is_same_v<T, float>) {
-        return runFloats<layout>([](__m256 v) { return kernels::logarithm(v); }, src, dst, roi);
-    } else {
-        const auto run = [&]<class Rule>(Rule rule) {
-            Logarithm<T, Rule> op{rule};
-            runUnary<layout>(op, src, dst, roi);
-            return op.warning;
-        };
-        if (scale >= 0) return run(CountSteps<T>{scale});
-        return run(ScaledLogarithm<T>{powerOfTwo(boundedExponent(scale))});
-    }
+    return underDefaultControl([&] {
+        if constexpr (std::is_same_v<T, float>) {
+            return runFloats<layout>([](__m256 v) { return kernels::logarithm(v); }, src, dst, roi);
+        } else {
+            const auto run = [&]<class Rule>(Rule rule) {
+                Logarithm<T, Rule> op{rule};
+                runUnary<layout>(op, src, dst, roi);
+                return op.warning;
+            };
+            if (scale >= 0) return run(CountSteps<T>{scale});
+            return run(ScaledLogarithm<T>{powerOfTwo(boundedExponent(scale))});
+        }
+    });
 }
 
 }  // namespace

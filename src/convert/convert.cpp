@@ -2,7 +2,7 @@
 #include <bit>
 
 #include "checks.h"
-#include "control_scope.h"
+#include "float_control.h"
 #include "kernels/bits.h"
 #include "kernels/pack_convert.h"
 #include "kernels/scale_integers.h"
@@ -91,16 +91,19 @@ struct ScaleFloats {
     }
 };
 
-/// Positive values give the maximum, all others 0.
-struct PositiveToMaximum {
+/// Lanes of all ones, which is the maximum, where a comparison with 0 holds; else 0.
+template <int comparison>
+struct MaximumWhere {
     template <int n>
     QORI_INLINE Pack<uint32_t, n> operator()(int, Pack<float, n> a) const {
         Pack<uint32_t, n> out;
         for (int i = 0; i < Pack<float, n>::vectors; ++i)
-            out.v[i] = {_mm256_castps_si256(_mm256_cmp_ps(a.v[i].v, _mm256_setzero_ps(), _CMP_GT_OQ))};
+            out.v[i] = {_mm256_castps_si256(_mm256_cmp_ps(a.v[i].v, _mm256_setzero_ps(), comparison))};
         return out;
     }
 };
+using PositiveToMaximum = MaximumWhere<_CMP_GT_OQ>;
+using NanToMaximum = MaximumWhere<_CMP_UNORD_Q>;
 
 template <Layout layout, class Op, class S, class D>
 QorResult mapLayout(Image<const S> src, Image<D> dst, QorImageSize roi, Op op) {
@@ -112,11 +115,15 @@ QorResult mapLayout(Image<const S> src, Image<D> dst, QorImageSize roi, Op op) {
     return QOR_OK;
 }
 
+/// Only rounding to float reads the control register: integers below 2^24 are exact, and all else is integers.
 template <template <class, class> class Op, class S, class D, Layout layout>
 QorResult convert(Image<const S> src, Image<D> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    const ControlScope scope;
-    return mapLayout<layout>(src, dst, roi, Op<S, D>{});
+    const auto body = [&] { return mapLayout<layout>(src, dst, roi, Op<S, D>{}); };
+    if constexpr (std::is_same_v<D, float> && sizeof(S) == 4)
+        return underDefaultControl(body);
+    else
+        return body();
 }
 
 template <template <class, class> class Op, class S, class D, Layout layout>
@@ -145,25 +152,31 @@ QorResult scaleIntegers(Image<const S> src, Image<D> dst, QorImageSize roi, int3
 template <class D, Layout layout>
 QorResult roundFloats(Image<const float> src, Image<D> dst, QorImageSize roi, int32_t roundMode) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
-    const ControlScope scope;
-    return withRounding(roundMode,
-                        [&](auto mode) { return mapLayout<layout>(src, dst, roi, RoundFloats<decltype(mode), D>{}); });
+    return underDefaultControl([&] {
+        return withRounding(
+            roundMode, [&](auto mode) { return mapLayout<layout>(src, dst, roi, RoundFloats<decltype(mode), D>{}); });
+    });
+}
+
+template <class D>
+QorResult runScaled(Image<const float> src, Image<D> dst, QorImageSize roi, int32_t roundMode, int32_t scaleFactor) {
+    if constexpr (std::is_same_v<D, uint32_t>) {
+        if (scaleFactor < -159) return mapLayout<Layout::C1>(src, dst, roi, PositiveToMaximum{});
+        if (scaleFactor > 128) return mapLayout<Layout::C1>(src, dst, roi, NanToMaximum{});
+    }
+    // Beyond 2^252 either way every result is 0 or saturated.
+    const int exponent = scaleFactor < -252 ? 252 : scaleFactor > 252 ? -252 : -scaleFactor;
+    const auto power = [](int e) { return std::bit_cast<float>(static_cast<uint32_t>(e + 127) << 23); };
+    return withRounding(roundMode, [&](auto mode) {
+        const ScaleFloats<decltype(mode), D> op{power(exponent / 2), power(exponent - exponent / 2)};
+        return mapLayout<Layout::C1>(src, dst, roi, op);
+    });
 }
 
 template <class D>
 QorResult scaleFloats(Image<const float> src, Image<D> dst, QorImageSize roi, int32_t roundMode, int32_t scaleFactor) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    if (std::is_same_v<D, uint32_t> && scaleFactor < -159) {
-        if constexpr (std::is_same_v<D, uint32_t>) return mapLayout<Layout::C1>(src, dst, roi, PositiveToMaximum{});
-    }
-    // Beyond 2^252 either way every result is 0 or saturated.
-    const int exponent = scaleFactor < -252 ? 252 : scaleFactor > 252 ? -252 : -scaleFactor;
-    const auto power = [](int e) { return std::bit_cast<float>(static_cast<uint32_t>(e + 127) << 23); };
-    const ControlScope scope;
-    return withRounding(roundMode, [&](auto mode) {
-        const ScaleFloats<decltype(mode), D> op{power(exponent / 2), power(exponent - exponent / 2)};
-        return mapLayout<Layout::C1>(src, dst, roi, op);
-    });
+    return underDefaultControl([&] { return runScaled(src, dst, roi, roundMode, scaleFactor); });
 }
 
 QorResult unpackBits(Image<const uint8_t> src, int32_t srcBitOffset, Image<uint8_t> dst, QorImageSize roi) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "checks.h"
-#include "control_scope.h"
+#include "float_control.h"
 #include "kernels/pack_convert.h"
 #include "streaming.h"
 
@@ -137,20 +137,22 @@ QorResult rangeCheck(float vMin, float vMax) { return vMax - vMin <= 0 ? QOR_ERR
 
 template <Layout layout>
 QorResult scaleToFloat(Image<const uint8_t> src, Image<float> dst, QorImageSize roi, float vMin, float vMax) {
-    const ControlScope scope;
-    if (QorResult r = firstOf(rangeCheck(vMin, vMax), nullCheck(src, dst), sizeCheck(roi), stepCheck(src, dst)))
-        return r;
-    return mapLayout<layout>(src, dst, roi, ToRange{vMin, (vMax - vMin) / 255}, streamsFrom(kTo32Bits, roi));
+    return underDefaultControl([&] {
+        if (QorResult r = firstOf(rangeCheck(vMin, vMax), nullCheck(src, dst), sizeCheck(roi), stepCheck(src, dst)))
+            return r;
+        return mapLayout<layout>(src, dst, roi, ToRange{vMin, (vMax - vMin) / 255}, streamsFrom(kTo32Bits, roi));
+    });
 }
 
 template <Layout layout>
 QorResult scaleFromFloat(Image<const float> src, Image<uint8_t> dst, QorImageSize roi, float vMin, float vMax) {
-    const ControlScope scope;
-    if (QorResult r = firstOf(rangeCheck(vMin, vMax), nullCheck(src, dst), sizeCheck(roi), stepCheck(src, dst)))
-        return r;
-    const float factor = 255 / (vMax - vMin);
-    return mapLayout<layout>(src, dst, roi, FromRange{factor, vMin * factor},
-                             streams(streamRules::copy, traffic(roi, channels(layout) * 5)));
+    return underDefaultControl([&] {
+        if (QorResult r = firstOf(rangeCheck(vMin, vMax), nullCheck(src, dst), sizeCheck(roi), stepCheck(src, dst)))
+            return r;
+        const float factor = 255 / (vMax - vMin);
+        return mapLayout<layout>(src, dst, roi, FromRange{factor, vMin * factor},
+                                 streams(streamRules::copy, traffic(roi, channels(layout) * 5)));
+    });
 }
 
 template <class S, Layout layout>
@@ -158,8 +160,7 @@ QorResult scaleDown(Image<const S> src, Image<uint8_t> dst, QorImageSize roi, in
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi), stepCheck(src, dst))) return r;
     const bool streaming = streamsFrom(kTo16Bits, roi);
     if (hint != hintAccurate) return mapLayout<layout>(src, dst, roi, TakeTopByte<S>{}, sizeof(S) == 2 && streaming);
-    const ControlScope scope;
-    return mapLayout<layout>(src, dst, roi, ScaleExactly<S>{}, streaming);
+    return underDefaultControl([&] { return mapLayout<layout>(src, dst, roi, ScaleExactly<S>{}, streaming); });
 }
 
 }  // namespace

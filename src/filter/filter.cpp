@@ -72,17 +72,20 @@ bool fitsPairs(Kernel<K> kernel) {
 
 /// In 32 bits where no sum leaves them, else in double precision.
 template <Layout layout, class S, class K>
-void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
+void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
                  int32_t divisor, int32_t mode, const WorkArea& area) {
-    const ControlScope scope;
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
-    if constexpr (std::is_same_v<S, uint8_t>)
-        if (division.sumLimit <= ByteTaps::kSumLimit) {
+    if constexpr (std::is_same_v<S, uint8_t>) {
+        const bool inWords = division.sumLimit <= ByteTaps::kSumLimit;
+        const bool inGroups = !inWords && division.sumLimit <= INT32_MAX;
+        const ByteGroups groups = inGroups ? byteGroups(kernel.data, kernel.size) : ByteGroups{};
+        if (inWords || groups.count > 0) {
             auto* packed = area.begin<int32_t>();
             packBytes(kernel.data, kernel.size, packed);
-            return filterBytes(packed, kernel.size, division, target);
+            return filterBytes(packed, kernel.size, groups, division, target);
         }
+    }
     if (division.sumLimit <= INT32_MAX && fitsPairs(kernel)) {
         auto* packed = area.begin<int32_t>();
         packPairs<PairTaps<S>::repeats>(kernel.data, kernel.size, packed);
@@ -100,9 +103,8 @@ void runIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
 
 /// In single precision, or in double where the elements have more digits.
 template <Layout layout, class S, class D, class K>
-void runFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor, int32_t mode,
+void sumFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor, int32_t mode,
                const WorkArea& area) {
-    const ControlScope scope;
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     constexpr bool isDouble = std::is_same_v<S, double> || std::is_same_v<S, int32_t>;
     if constexpr (isDouble) {
@@ -116,6 +118,22 @@ void runFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> ker
     }
 }
 
+template <Layout layout, class... Arguments>
+QorResult runIntegers(const Arguments&... arguments) {
+    return underDefaultControl([&] {
+        sumIntegers<layout>(arguments...);
+        return QOR_OK;
+    });
+}
+
+template <Layout layout, class... Arguments>
+QorResult runFloats(const Arguments&... arguments) {
+    return underDefaultControl([&] {
+        sumFloats<layout>(arguments...);
+        return QOR_OK;
+    });
+}
+
 template <class T, Layout layout>
 QorResult filterIntegers(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel<int32_t> kernel, QorPoint2D anchor,
                          int32_t divisor) {
@@ -124,8 +142,7 @@ QorResult filterIntegers(Image<const T> src, Image<T> dst, QorImageSize roi, Ker
         return r;
     const WorkArea area(packedBytes(kernel.size));
     if (area.isMissing()) return QOR_ERR_NO_MEMORY;
-    runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundNearestEven, area);
-    return QOR_OK;
+    return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundNearestEven, area);
 }
 
 template <class S, class D, Layout layout, class K>
@@ -135,8 +152,7 @@ QorResult filterAllocating(Image<const S> src, Image<D> dst, QorImageSize roi, K
         return r;
     const WorkArea area(packedBytes(kernel.size));
     if (area.isMissing()) return QOR_ERR_NO_MEMORY;
-    runFloats<layout>(src, dst, roi, kernel, anchor, roundNearestEven, area);
-    return QOR_OK;
+    return runFloats<layout>(src, dst, roi, kernel, anchor, roundNearestEven, area);
 }
 
 template <class T, Layout layout>
@@ -151,8 +167,7 @@ QorResult filterRound(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel
             firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size), divisorCheck(divisor),
                     stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
-    runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
-    return QOR_OK;
+    return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
 }
 
 template <class T, Layout layout>
@@ -162,8 +177,7 @@ QorResult filterRoundFloats(Image<const T> src, Image<T> dst, QorImageSize roi, 
             firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
                     stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
-    runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
-    return QOR_OK;
+    return runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
 }
 
 QorResult rowBufferCheck(QorImageSize kernelSize, int32_t roiWidth, const int32_t* pBufferSize) {

@@ -40,11 +40,13 @@ QorResult filterBorderInit16s(const int16_t* pKernel, QorImageSize size, int32_t
                               channelsCheck(numChannels), roundModeCheck(roundMode)))
         return r;
     if (divisor == 0) return QOR_ERR_DIVISOR;
-    if (isConverted(dataType, numChannels))
-        fillConvertedPlan(pSpec, pKernel, size, divisor, dataType, numChannels, roundMode);
-    else
-        fillPlan(pSpec, pKernel, size, divisor, dataType, roundMode);
-    return QOR_OK;
+    return underDefaultControl([&] {
+        if (isConverted(dataType, numChannels))
+            fillConvertedPlan(pSpec, pKernel, size, divisor, dataType, numChannels, roundMode);
+        else
+            fillPlan(pSpec, pKernel, size, divisor, dataType, roundMode);
+        return QOR_OK;
+    });
 }
 
 QorResult filterBorderInit32f(const float* pKernel, QorImageSize size, int32_t dataType, int32_t numChannels,
@@ -67,24 +69,17 @@ template <class T>
 void filterIntegers(const LinearPlan& plan, QorImageSize size, Target<T, T>& target) {
     const Division division{plan.divisor, plan.roundMode, plan.sumLimit};
     if constexpr (std::is_same_v<T, uint8_t>)
-        if (plan.bytesOffset != 0) return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, division, target);
+        if (plan.bytesOffset != 0)
+            return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, plan.groups, division, target);
     filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, division, target);
 }
 
 template <class T, int channels>
-QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t border, const T* borderValue,
-                       const QorLinearFilterPlan* pSpec, uint8_t* pBuffer) {
-    constexpr int32_t pixelBytes = channels * elementBytes<T>;
-    if (QorResult r =
-            firstOf(nullCheck(src, dst, borderValue, pSpec, pBuffer), sizeCheck(roi),
-                    filterStepCheck(src.step, dst.step, int64_t{roi.width} * pixelBytes), borderCheck(border)))
-        return r;
-    const ControlScope scope;
-    const auto& plan = *reinterpret_cast<const LinearPlan*>(blockStart(pSpec));
+QorResult runPlan(Image<const T> src, Image<T> dst, QorImageSize roi, const BorderRule& rule, const LinearPlan& plan,
+                  uint8_t* buffer) {
     const QorImageSize size{plan.kernelWidth, plan.kernelHeight};
     constexpr Layout layout = channels == 1 ? Layout::C1 : channels == 3 ? Layout::C3 : Layout::C4;
-    auto target = makeTarget(src, dst, roi, layout, Reach::ofKernel(size), BorderRule::of(border, borderValue),
-                             blockStart(pBuffer));
+    auto target = makeTarget(src, dst, roi, layout, Reach::ofKernel(size), rule, buffer);
     constexpr int32_t integerPath = std::is_same_v<T, uint8_t>   ? int32_t{LinearPlan::integer8u}
                                     : std::is_same_v<T, int16_t> ? int32_t{LinearPlan::integer16s}
                                                                  : -1;
@@ -96,6 +91,20 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
     }
     filterSingle(plan.table<float>(plan.packedOffset), size, plan.roundMode, target);
     return QOR_OK;
+}
+
+template <class T, int channels>
+QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t border, const T* borderValue,
+                       const QorLinearFilterPlan* pSpec, uint8_t* pBuffer) {
+    constexpr int32_t pixelBytes = channels * elementBytes<T>;
+    if (QorResult r =
+            firstOf(nullCheck(src, dst, borderValue, pSpec, pBuffer), sizeCheck(roi),
+                    filterStepCheck(src.step, dst.step, int64_t{roi.width} * pixelBytes), borderCheck(border)))
+        return r;
+    const auto& plan = *reinterpret_cast<const LinearPlan*>(blockStart(pSpec));
+    return underDefaultControl([&] {
+        return runPlan<T, channels>(src, dst, roi, BorderRule::of(border, borderValue), plan, blockStart(pBuffer));
+    });
 }
 
 }  // namespace

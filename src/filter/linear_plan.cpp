@@ -3,10 +3,7 @@
 
 #include <bit>
 
-#include "frame/control_scope.h"
 #include "frame/plan.h"
-#include "kernels/filter_taps.h"
-#include "packing.h"
 
 namespace qori::filter {
 namespace {
@@ -89,7 +86,6 @@ int64_t workBytes(QorImageSize kernel, int32_t roiWidth, int32_t dataType, int32
 
 void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
               int32_t roundMode) {
-    const ControlScope scope;
     const bool is8u = dataType == k8u;
     LinearPlan& plan =
         startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t), roundMode);
@@ -99,7 +95,8 @@ void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize si
     packPairs<kCopies>(copy, size, plan.table<int32_t>(plan.packedOffset));
     const int64_t limit = is8u ? largestSum<uint8_t>(copy, size) : largestSum<int16_t>(copy, size);
     plan.sumLimit = static_cast<int32_t>(std::min<int64_t>(limit, INT32_MAX));
-    if (is8u && limit <= kernels::ByteTaps::kSumLimit) {
+    if (is8u && limit > kernels::ByteTaps::kSumLimit) plan.groups = byteGroups(copy, size);
+    if (is8u && (limit <= kernels::ByteTaps::kSumLimit || plan.groups.count > 0)) {
         // Half of the packed kernel's region is free.
         const int32_t pairs = (size.width + 1) / 2 * size.height;
         plan.bytesOffset = plan.packedOffset + kCopies * int32_t{sizeof(int32_t)} * pairs;
@@ -116,7 +113,6 @@ void fillPlan(QorLinearFilterPlan* block, const float* kernel, QorImageSize size
 
 void fillConvertedPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor,
                        int32_t dataType, int32_t channels, int32_t roundMode) {
-    const ControlScope scope;
     const double factor = 1.0 / divisor;
     fillFloats(block, size, dataType, channels, roundMode,
                [=](ptrdiff_t i) { return static_cast<float>(kernel[i] * factor); });

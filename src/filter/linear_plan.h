@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The plan of a general linear filter: a record in the caller's block, the kernel as given and as the sums want it.
 #pragma once
-#include "frame/image.h"
+#include "packing.h"
 
 namespace qori::filter {
 
@@ -25,6 +25,7 @@ struct LinearPlan {
     int32_t kernelOffset, packedOffset;  ///< Bytes from the start of the record.
     int32_t fitsPairs;    ///< Every coefficient lies in -32767 to 32766: no pair of products leaves 32 bits.
     int32_t bytesOffset;  ///< The kernel in bytes, behind the packed one, where its sums allow for them; else 0.
+    ByteGroups groups;    ///< Of the kernel in bytes, where its sums leave 16 bits.
     int32_t sumLimit;     ///< No sum's magnitude is larger; INT32_MAX also where one may be.
 
     template <class T>
@@ -51,11 +52,13 @@ int64_t workBytes(QorImageSize kernel, int32_t width, int32_t dataType, int32_t 
 /// Whether these sizes' products stay so small that the formulas above cannot leave 64 bits.
 constexpr bool isModest(QorImageSize kernel) { return int64_t{kernel.width} * kernel.height <= INT32_MAX; }
 
+/// The plan of an integer kernel; under default control, for its reciprocals.
 void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
               int32_t roundMode);
+/// The plan of a float kernel, whose coefficients are moved and never computed with.
 void fillPlan(QorLinearFilterPlan* block, const float* kernel, QorImageSize size, int32_t dataType, int32_t channels,
               int32_t roundMode);
-/// The float plan of an integer kernel.
+/// The float plan of an integer kernel; under default control.
 void fillConvertedPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor,
                        int32_t dataType, int32_t channels, int32_t roundMode);
 

@@ -2,7 +2,7 @@
 // Packed kernels and rounding rules meet images: the run of every general linear filter.
 #pragma once
 #include "frame/checks.h"
-#include "frame/control_scope.h"
+#include "frame/float_control.h"
 #include "kernels/filter_rules.h"
 #include "kernels/filter_sums.h"
 #include "packing.h"
@@ -47,7 +47,7 @@ Target<S, D> makeTarget(Image<const S> src, Image<D> dst, QorImageSize roi, Layo
 
 template <class Taps, class Rule, class S, class D>
 void filterBy(const PackedKernel<Taps>& kernel, const Rule& rule, Target<S, D>& target) {
-    using Sum = typename Taps::Sum;
+    using Sum = typename Taps::Total;
     const kernels::Finish<Sum> finish{
         target.keepAlpha ? kernels::finishRow<Rule, true, Sum> : kernels::finishRow<Rule, false, Sum>, &rule,
         Rule::isCopy && !target.keepAlpha};
@@ -98,15 +98,35 @@ void divideWords(const int32_t* packed, QorImageSize size, Division division, Ta
     const PackedKernel<Taps> kernel{packed, size, {_mm256_setzero_si256()}};
     const kernels::QuotientInWords words{division.divisor, division.mode};
     if (words.isExact()) return filterBy(kernel, words, target);
-    withDivision<uint8_t>(
-        division, [&]<class Rule>(const Rule& rule) { filterBy(kernel, kernels::Widened<Rule>{rule}, target); });
+    withDivision<uint8_t>(division, [&]<class Rule>(const Rule& rule) {
+        filterBy(kernel, kernels::Widened<Rule, typename Taps::Total>{rule}, target);
+    });
 }
 
-inline void filterBytes(const int32_t* packed, QorImageSize size, Division division, Target<uint8_t, uint8_t>& target) {
+template <class Taps>
+void divideGroups(const int32_t* packed, QorImageSize size, ByteGroups groups, Division division,
+                  Target<uint8_t, uint8_t>& target) {
+    using Grouped = kernels::InGroups<Taps>;
+    const __m256i start = _mm256_set1_epi16(static_cast<int16_t>(groups.start));
+    const PackedKernel<Grouped> kernel{packed, size, {start}, groups.count};
+    withDivision<uint8_t>(division, [&]<class Rule>(const Rule& rule) {
+        filterBy(kernel, kernels::Widened<Rule, kernels::WideSum>{rule}, target);
+    });
+}
+
+/// In groups where there are any, else at once.
+inline void filterBytes(const int32_t* packed, QorImageSize size, ByteGroups groups, Division division,
+                        Target<uint8_t, uint8_t>& target) {
+    const auto by = [&]<class Taps>(const Taps*) {
+        if (groups.count > 0)
+            divideGroups<Taps>(packed, size, groups, division, target);
+        else
+            divideWords<Taps>(packed, size, division, target);
+    };
     if (target.channels == 1)
-        divideWords<NeighbourByteTaps>(packed, size, division, target);
+        by(static_cast<const NeighbourByteTaps*>(nullptr));
     else
-        divideWords<ByteTaps>(packed, size, division, target);
+        by(static_cast<const ByteTaps*>(nullptr));
 }
 
 /// -0 begins a sum that may be a single product: +0 would turn a product of -0.

@@ -249,12 +249,15 @@ private:
     double factor;
 };
 
-/// One quotient in integers, for which no float is wide enough.
+/// One quotient in integers.
 QorComplex32s divideExactly(QorComplex32s divisor, QorComplex32s numerator, int32_t scale);
 
-/// In double precision, with a bound of its error; elements that come too near to a half are divided exactly. With
-/// A = |ca| + |db| the sum ca + db is off by at most 2 u A, u = 2^-52 for any rounding mode; factor / norm by 3 u of
-/// itself; their product q by u more: together by less than 8 u A factor / norm.
+/// In double precision, with a bound of its error. With A = |ca| + |db| the sum ca + db is off by at most 2 u A,
+/// u = 2^-52 for any rounding mode; factor / norm by 3 u of itself; their product q by u more: together by less than
+/// 8 u A factor / norm. Where q comes too near to k + 1/2, k = floor(q), the sign of
+///     D = 2 (ca + db) 2^-scale - (2 k + 1) norm        (the power on the other side where scale is above 0)
+/// decides. While q is off by less than 1/4, |D| is below norm <= 2^63, or below 2^16 for scales above 0: arithmetic
+/// modulo 2^64 gives it exactly. What is less certain and may not saturate is divided in integers.
 struct DivideComplex32 {
     explicit DivideComplex32(int32_t scaleFactor)
         : scale(scaleFactor), factor(powerOfTwo(-std::clamp(scale, -100, 100))) {}
@@ -263,15 +266,26 @@ struct DivideComplex32 {
         return _mm256_cmpeq_epi64(first.v, _mm256_setzero_si256());
     }
     QORI_INLINE Vec<QorComplex32s> operator()(Vec<QorComplex32s> first, Vec<QorComplex32s> second) const {
-        __m256i unsure = zeroDivisors(first);
+        __m256d unsure = _mm256_setzero_pd();
         const __m128i low = two(_mm256_castsi256_si128(first.v), _mm256_castsi256_si128(second.v), unsure);
         const __m128i high = two(_mm256_extracti128_si256(first.v, 1), _mm256_extracti128_si256(second.v, 1), unsure);
+        if (!_mm256_testz_pd(unsure, unsure)) [[unlikely]]
+            return exactly(first, second);
         const Vec<QorComplex32s> quotients{_mm256_set_m128i(high, low)};
-        return _mm256_testz_si256(unsure, unsure) ? quotients : exactly(first, second);
+        const __m256i none = zeroDivisors(first);
+        return _mm256_testz_si256(none, none) ? quotients : withLimits(quotients, second, none);
     }
 
 private:
-    QORI_INLINE __m128i two(__m128i first, __m128i second, __m256i& unsure) const {
+    /// Quotients over zero by the sign of the numerator's part, and 0 for 0.
+    static QORI_INLINE Vec<QorComplex32s> withLimits(Vec<QorComplex32s> quotients, Vec<QorComplex32s> second,
+                                                     __m256i none) {
+        const __m256i x = second.v;
+        const __m256i limit = _mm256_xor_si256(_mm256_srai_epi32(x, 31), _mm256_set1_epi32(INT32_MAX));
+        const __m256i overZero = _mm256_andnot_si256(_mm256_cmpeq_epi32(x, _mm256_setzero_si256()), limit);
+        return {_mm256_blendv_epi8(quotients.v, overZero, none)};
+    }
+    QORI_INLINE __m128i two(__m128i first, __m128i second, __m256d& unsure) const {
         const __m256d y = _mm256_cvtepi32_pd(first), x = _mm256_cvtepi32_pd(second), sign = _mm256_set1_pd(-0.);
         const __m256d squares = _mm256_mul_pd(y, y), norm = _mm256_add_pd(squares, _mm256_permute_pd(squares, 0x5));
         const __m256d inverse = _mm256_div_pd(_mm256_set1_pd(factor), _mm256_max_pd(norm, _mm256_set1_pd(1)));
@@ -281,11 +295,61 @@ private:
         const __m256d size = _mm256_add_pd(_mm256_andnot_pd(sign, byReal), _mm256_andnot_pd(sign, byImaginary));
         const __m256d q = _mm256_mul_pd(sum, inverse);
         const __m256d error = _mm256_mul_pd(_mm256_mul_pd(size, inverse), _mm256_set1_pd(0x1p-49));
-        const __m256d whole = roundToEven(Vec<double>{q}).v, off = _mm256_andnot_pd(sign, _mm256_sub_pd(q, whole));
+        __m256d whole = roundToEven(Vec<double>{q}).v;
+        const __m256d off = _mm256_andnot_pd(sign, _mm256_sub_pd(q, whole));
         const __m256d isNear = _mm256_cmp_pd(_mm256_add_pd(off, error), _mm256_set1_pd(.5), _CMP_NLT_UQ);
-        unsure = _mm256_or_si256(unsure, _mm256_castpd_si256(isNear));
+        if (!_mm256_testz_pd(isNear, isNear)) {
+            const __m256d tooLarge = _mm256_cmp_pd(_mm256_max_pd(size, norm), _mm256_set1_pd(0x1p53), _CMP_GT_OQ);
+            const __m256d beside =
+                _mm256_testz_pd(isNear, tooLarge) ? besideHalf(sum, norm, q) : besideHalf(first, second, q);
+            whole = _mm256_blendv_pd(whole, beside, isNear);
+            const __m256d vague = _mm256_cmp_pd(error, _mm256_set1_pd(.25), _CMP_GE_OQ);
+            const __m256d surely = _mm256_sub_pd(_mm256_andnot_pd(sign, q), error);  // |q| is at least that
+            const __m256d mayFit = _mm256_cmp_pd(surely, _mm256_set1_pd(0x1p32), _CMP_NGT_UQ);
+            unsure = _mm256_or_pd(unsure, _mm256_and_pd(vague, mayFit));
+        }
         const __m256d least = _mm256_set1_pd(INT32_MIN), most = _mm256_set1_pd(INT32_MAX);
         return _mm256_cvttpd_epi32(_mm256_min_pd(_mm256_max_pd(whole, least), most));
+    }
+
+    /// k or k + 1, as D says, which is computed halved here. With sum and norm exact, up to 2^53, it is one fused step
+    /// and has the right sign. Where q is beyond 2^51 D is not D, and both saturate.
+    QORI_INLINE __m256d besideHalf(__m256d sum, __m256d norm, __m256d q) const {
+        const __m256d half = _mm256_add_pd(_mm256_floor_pd(q), _mm256_set1_pd(.5)), zero = _mm256_setzero_pd();
+        const __m256d d = _mm256_fnmadd_pd(half, norm, _mm256_mul_pd(sum, _mm256_set1_pd(factor)));
+        const __m256d up = _mm256_ceil_pd(half), even = roundToEven(Vec<double>{half}).v;
+        const __m256d decided = _mm256_blendv_pd(up, _mm256_floor_pd(half), d);  // by its sign
+        return _mm256_blendv_pd(decided, even, _mm256_cmp_pd(d, zero, _CMP_EQ_OQ));
+    }
+    /// The same for any sum.
+    QORI_NOINLINE __m256d besideHalf(__m128i first, __m128i second, __m256d q) const {
+        const __m256i y = _mm256_cvtepi32_epi64(first), x = _mm256_cvtepi32_epi64(second);
+        const __m256i minus = _mm256_setr_epi64x(0, -1, 0, -1), one = _mm256_set1_epi64x(1);
+        const __m256i byReal = _mm256_mul_epi32(x, _mm256_shuffle_epi32(y, 0x44));  // ca, da
+        const __m256i byImaginary = _mm256_mul_epi32(_mm256_shuffle_epi32(x, 0x4E), _mm256_shuffle_epi32(y, 0xEE));
+        const __m256i sum = _mm256_add_epi64(byReal, _mm256_sub_epi64(_mm256_xor_si256(byImaginary, minus), minus));
+        const __m256i squares = _mm256_mul_epi32(y, y),
+                      norm = _mm256_add_epi64(squares, _mm256_shuffle_epi32(squares, 0x4E));
+        const __m256d below = _mm256_floor_pd(q), shift = _mm256_set1_pd(0x1.8p52);
+        const __m256i k =
+            _mm256_sub_epi64(_mm256_castpd_si256(_mm256_add_pd(below, shift)), _mm256_castpd_si256(shift));
+        const __m256i odd = _mm256_add_epi64(_mm256_add_epi64(k, k), one);
+        // A shift by 64 or more gives 0, which is right modulo 2^64.
+        const __m256i twice = _mm256_sll_epi64(sum, _mm_cvtsi32_si128(1 + std::clamp(-scale, 0, 100)));
+        const __m256i half = _mm256_sll_epi64(product(odd, norm), _mm_cvtsi32_si128(std::clamp(scale, 0, 100)));
+        const __m256i d = _mm256_sub_epi64(twice, half), zero = _mm256_setzero_si256();
+        // One more where D > 0, and where D = 0 for an odd k.
+        const __m256i isOdd = _mm256_cmpeq_epi64(_mm256_and_si256(k, one), one);
+        const __m256i up =
+            _mm256_or_si256(_mm256_cmpgt_epi64(d, zero), _mm256_and_si256(_mm256_cmpeq_epi64(d, zero), isOdd));
+        return _mm256_add_pd(below, _mm256_and_pd(_mm256_castsi256_pd(up), _mm256_set1_pd(1)));
+    }
+    /// Modulo 2^64.
+    static QORI_INLINE __m256i product(__m256i a, __m256i b) {
+        const __m256i crossed = _mm256_mullo_epi32(a, _mm256_shuffle_epi32(b, 0xB1));
+        const __m256i high = _mm256_add_epi32(_mm256_slli_epi64(crossed, 32), crossed);
+        const __m256i top = _mm256_and_si256(high, _mm256_set1_epi64x(static_cast<int64_t>(0xFFFFFFFF00000000u)));
+        return _mm256_add_epi64(_mm256_mul_epu32(a, b), top);
     }
     QORI_NOINLINE Vec<QorComplex32s> exactly(Vec<QorComplex32s> first, Vec<QorComplex32s> second) const {
         QorComplex32s y[4], x[4];

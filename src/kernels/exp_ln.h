@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Exponential and logarithm of vectors. The float forms stay within 1 ulp of the rounded result (checked over all
 // floats), the double forms within 1e-14 relative, which decides every rounding of an integer result. They want the
-// default control register (ControlScope).
+// default control register.
 #pragma once
 #include <cmath>
 

@@ -229,8 +229,8 @@ struct QuotientInWords {
     }
 };
 
-/// Sums of ByteTaps to bytes by a rule for 32 bits.
-template <class Rule>
+/// Sums of ByteTaps, or their totals by groups, to bytes by a rule for 32 bits.
+template <class Rule, class Sum>
 struct Widened {
     using Element = uint8_t;
     static constexpr bool isCopy = false;
@@ -239,13 +239,9 @@ struct Widened {
     template <class Use>
     QORI_INLINE void withRule(Use use) const {
         rule.withRule([&](auto convert) {
-            const auto half = [=](__m256i v) {
-                const __m256i sign = _mm256_srai_epi16(v, 15);
-                const Vec<int32_t> wide[2] = {{_mm256_unpacklo_epi16(v, sign)}, {_mm256_unpackhi_epi16(v, sign)}};
-                return _mm256_castsi256_si128(convert(wide).v[0].v);
-            };
-            use([=](const Vec<int16_t>(&s)[2]) -> Elements<uint8_t, 32> {
-                const __m128i outer = half(s[0].v), inner = half(s[1].v);  // 0-7, 16-23 and 8-15, 24-31
+            const auto half = [=](const Sum& s) { return _mm256_castsi256_si128(convert(WideSum::of(s).v).v[0].v); };
+            use([=](const Sum(&s)[2]) -> Elements<uint8_t, 32> {
+                const __m128i outer = half(s[0]), inner = half(s[1]);  // 0-7, 16-23 and 8-15, 24-31
                 return {{{_mm256_set_m128i(_mm_unpackhi_epi64(outer, inner), _mm_unpacklo_epi64(outer, inner))}}};
             });
         });

@@ -14,6 +14,10 @@ struct PackedKernel {
     const typename Taps::Coefficient* coefficients;
     QorImageSize size;
     typename Taps::Sum start;  ///< What a sum begins with.
+    int32_t groups = 1;        ///< Parts of about as many rows each, that InGroups sums apart.
+
+    /// The rows that are summed at once.
+    int32_t leastRows() const { return size.height / groups; }
 
     int taps() const { return (size.width + Taps::pixels - 1) / Taps::pixels; }
     bool endsAlone() const { return size.width % Taps::pixels != 0; }
@@ -28,6 +32,10 @@ template <class Taps>
 struct ChunkSums {
     static constexpr int slots = kChunk / Taps::block + 1;
     typename Taps::Sum row[Taps::bandRows][slots][2];
+};
+template <class Taps>
+struct ChunkSums<InGroups<Taps>> : ChunkSums<Taps> {
+    WideSum total[Taps::bandRows][ChunkSums<Taps>::slots][2];
 };
 
 /// Turns the sums of a row into `elements` of dst. The last slot holds the sums of the last whole block of the row, or
@@ -237,27 +245,32 @@ QORI_NOINLINE void sumBlockExactly(const PackedKernel<Taps>& kernel, const typen
 }
 
 /// A piece of a band: the same rows, `elements` wide; blocks that end within `readable` elements may be loaded freely.
-template <class Taps>
+template <class Source, int block>
 struct Chunk {
-    const typename Taps::Source* window;
+    const Source* window;
     ptrdiff_t step, pixel, elements, readable;
     uint8_t* dst;
     ptrdiff_t dstStep, dstElementBytes;
-};
 
+    /// One for each block and for the rest.
+    ptrdiff_t slots() const { return (elements + block - 1) / block; }
+};
+template <class Taps>
+using ChunkOf = Chunk<typename Taps::Source, Taps::block>;
+
+/// The sums of a chunk, by slots; where `toDst`, those of its first blocks go there instead. Returns how many did.
 template <class Taps, int rows>
-void filterChunk(const PackedKernel<Taps>& kernel, const Chunk<Taps>& chunk, Finish<typename Taps::Sum> finish,
-                 ChunkSums<Taps>& sums) {
+ptrdiff_t sumChunk(const PackedKernel<Taps>& kernel, const ChunkOf<Taps>& chunk, bool toDst, ChunkSums<Taps>& sums) {
     constexpr ptrdiff_t block = Taps::block;
     const auto [p, step, pixel, elements, readable, dst, dstStep, dstElementBytes] = chunk;
-    const ptrdiff_t whole = elements / block, all = whole + (elements % block > 0);
+    const ptrdiff_t whole = elements / block, all = chunk.slots();
     const ptrdiff_t freely = std::min(whole, readable > 0 ? readable / block : 0);
     const auto slots = [&](ptrdiff_t slot) {
         return SumRows<typename Taps::Sum>{reinterpret_cast<uint8_t*>(sums.row[0][slot]), sizeof sums.row[0]};
     };
     if (freely > 0)
         sumBlocksFreely<Taps, rows>(kernel, p, step, pixel, freely,
-                                    finish.isCopy ? SumRows<typename Taps::Sum>{dst, dstStep} : slots(0));
+                                    toDst ? SumRows<typename Taps::Sum>{dst, dstStep} : slots(0));
     for (ptrdiff_t slot = freely; slot < all; ++slot) {
         const ptrdiff_t at = slot < whole ? slot * block : std::max<ptrdiff_t>(elements - block, 0);
         if (at + block <= readable) {
@@ -268,16 +281,61 @@ void filterChunk(const PackedKernel<Taps>& kernel, const Chunk<Taps>& chunk, Fin
             sumBlockExactly(kernel, advance(p + at, r * step), step, pixel, std::min(block, elements - at),
                             sums.row[r][slot]);
     }
-    // Where the sums are the elements, whole blocks lie in dst already, and a last one may reach back over them.
-    const ptrdiff_t first = finish.isCopy ? std::min(freely * block, std::max<ptrdiff_t>(elements - block, 0)) : 0;
-    if (finish.isCopy && freely == all) return;
-    for (int r = 0; r < rows; ++r)
-        finish.row(finish.rule, sums.row[r] + (finish.isCopy ? freely : 0), dst + r * dstStep + first * dstElementBytes,
-                   elements - first);
+    return toDst ? freely : 0;
 }
 
 template <class Taps, int rows>
-void filterBand(const PackedKernel<Taps>& kernel, Chunk<Taps> band, Finish<typename Taps::Sum> finish,
+void filterChunk(const PackedKernel<Taps>& kernel, const ChunkOf<Taps>& chunk, Finish<typename Taps::Sum> finish,
+                 ChunkSums<Taps>& sums) {
+    const ptrdiff_t done = sumChunk<Taps, rows>(kernel, chunk, finish.isCopy, sums);
+    // Where the sums are the elements, whole blocks lie in dst already, and a last one may reach back over them.
+    if (finish.isCopy && done == chunk.slots()) return;
+    const ptrdiff_t first =
+        finish.isCopy ? std::min(done * Taps::block, std::max<ptrdiff_t>(chunk.elements - Taps::block, 0)) : 0;
+    for (int r = 0; r < rows; ++r)
+        finish.row(finish.rule, sums.row[r] + done, chunk.dst + r * chunk.dstStep + first * chunk.dstElementBytes,
+                   chunk.elements - first);
+}
+
+/// The sums of one group of rows to those of the groups before it; `start` is the total's, for the first.
+template <int rows, class Taps>
+QORI_NOINLINE void addGroup(ChunkSums<InGroups<Taps>>& sums, ptrdiff_t slots, bool isFirst, int32_t start) {
+    const WideSum initial{{{_mm256_set1_epi32(start)}, {_mm256_set1_epi32(start)}}};
+    for (int r = 0; r < rows; ++r)
+        for (ptrdiff_t slot = 0; slot < slots; ++slot)
+            for (int k = 0; k < 2; ++k) {
+                const WideSum add = WideSum::of(sums.row[r][slot][k]);
+                WideSum& total = sums.total[r][slot][k];
+                const WideSum before = isFirst ? initial : total;
+                for (int i = 0; i < 2; ++i) total.v[i].v = _mm256_add_epi32(before.v[i].v, add.v[i].v);
+            }
+}
+
+template <class Grouped, int rows>
+requires(!std::is_same_v<typename Grouped::Sum, typename Grouped::Total>)  //
+    void filterChunk(const PackedKernel<Grouped>& kernel, const ChunkOf<Grouped>& chunk, Finish<WideSum> finish,
+                     ChunkSums<Grouped>& sums) {
+    using Taps = typename Grouped::Ungrouped;
+    // Every group starts at the same 16 bits, which the total makes good, modulo 2^32 as all sums.
+    const auto each = static_cast<int16_t>(_mm256_extract_epi16(kernel.start.v, 0));
+    const auto start = static_cast<int32_t>(0u - static_cast<uint32_t>(kernel.groups) * static_cast<uint32_t>(each));
+    int32_t y = 0;
+    for (int32_t group = 0; group < kernel.groups; ++group) {
+        const auto end = static_cast<int32_t>(int64_t{kernel.size.height} * (group + 1) / kernel.groups);
+        const PackedKernel<Taps> part{
+            kernel.coefficients + y * kernel.rowCoefficients(), {kernel.size.width, end - y}, kernel.start};
+        ChunkOf<Taps> below = chunk;
+        below.window = advance(chunk.window, y * chunk.step);
+        sumChunk<Taps, rows>(part, below, false, sums);
+        addGroup<rows>(sums, chunk.slots(), group == 0, start);
+        y = end;
+    }
+    for (int r = 0; r < rows; ++r)
+        finish.row(finish.rule, sums.total[r], chunk.dst + r * chunk.dstStep, chunk.elements);
+}
+
+template <class Taps, int rows>
+void filterBand(const PackedKernel<Taps>& kernel, ChunkOf<Taps> band, Finish<typename Taps::Total> finish,
                 ChunkSums<Taps>& sums) {
     for (ptrdiff_t rest = band.elements; rest > 0;) {
         band.elements = rest < kChunk + Taps::block ? rest : kChunk;
@@ -294,14 +352,14 @@ void filterBand(const PackedKernel<Taps>& kernel, Chunk<Taps> band, Finish<typen
 /// Filters rows of elements whose windows begin at p; slack elements may be read behind the last window of a row.
 template <class Taps>
 void filterRows(const PackedKernel<Taps>& kernel, const typename Taps::Source* p, ptrdiff_t step, int channels,
-                ptrdiff_t elements, ptrdiff_t rows, ptrdiff_t slack, Finish<typename Taps::Sum> finish, uint8_t* dst,
+                ptrdiff_t elements, ptrdiff_t rows, ptrdiff_t slack, Finish<typename Taps::Total> finish, uint8_t* dst,
                 ptrdiff_t dstStep, ptrdiff_t dstElementBytes) {
     ChunkSums<Taps> sums;
     // A block whose window and overread end within reach may be loaded freely; the last may hold elements in vain.
-    detail::Chunk<Taps> band{p,   step,    channels,       elements, elements + slack - Taps::overread,
-                             dst, dstStep, dstElementBytes};
+    detail::ChunkOf<Taps> band{p,   step,    channels,       elements, elements + slack - Taps::overread,
+                               dst, dstStep, dstElementBytes};
     const auto bandsOf = [&]<int n>() {
-        for (; rows >= n && kernel.size.height >= n; rows -= n) {
+        for (; rows >= n && kernel.leastRows() >= n; rows -= n) {
             detail::filterBand<Taps, n>(kernel, band, finish, sums);
             band.window = advance(band.window, n * step);
             band.dst += n * dstStep;

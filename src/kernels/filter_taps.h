@@ -4,6 +4,7 @@
 //
 // Taps offers    Source, Coefficient            element types of the image and of the packed kernel
 //                Sum                            a vector of sums; a block has two
+//                Total                          what Finish takes two of for a block: Sum, or WideSum for InGroups
 //                Partial                        TwoVectors: a block of sources, or of sums while they are made
 //                block                          elements of a block
 //                pixels                         pixels of a tap
@@ -33,6 +34,7 @@ QORI_INLINE void keepOrder(__m256i& sum) { __asm__("" : "+x"(sum)); }
 /// Two vectors: of sources, or of sums.
 template <class T>
 struct TwoVectors {
+    using Total = Vec<T>;
     Vec<T> v[2];
 
     static QORI_INLINE void begin(TwoVectors& sums, Vec<T> start) { sums.v[0] = sums.v[1] = start; }
@@ -193,6 +195,28 @@ struct NeighbourByteTaps : ByteTaps {
         out[0] = {_mm256_unpacklo_epi16(sums.v[0].v, sums.v[1].v)};
         out[1] = {_mm256_unpackhi_epi16(sums.v[0].v, sums.v[1].v)};
     }
+};
+
+/// A vector of ByteTaps' sums in 32 bits.
+struct WideSum {
+    Vec<int32_t> v[2];  ///< The lower four lanes of either half, then the upper four.
+
+    static QORI_INLINE WideSum of(Vec<int16_t> sum) {
+        const __m256i sign = _mm256_srai_epi16(sum.v, 15);
+        return {{{_mm256_unpacklo_epi16(sum.v, sign)}, {_mm256_unpackhi_epi16(sum.v, sign)}}};
+    }
+    static QORI_INLINE WideSum of(WideSum sum) { return sum; }
+};
+
+/// ByteTaps for larger sums: a few rows of the kernel at a time in 16 bits, which are then added up in 32. Within a
+/// group of rows the magnitudes of the coefficients come to at most kMost, so that all its sums lie within 2^16 of each
+/// other; a start below zero brings them into the signed range, and partial sums may wrap. Of each pair the positive
+/// and the negative coefficients come to at most kMostInPair, which no sum of two products saturates for.
+template <class Taps>
+struct InGroups : Taps {
+    using Ungrouped = Taps;
+    using Total = WideSum;
+    static constexpr int kMost = 65535 / 255, kMostInPair = 32767 / 255;
 };
 
 /// Any type in single precision, fused: the sum of an output is the chain of fused multiply-adds over the kernel's rows

@@ -99,8 +99,8 @@ QORI_INLINE Pack<float, n> toFloat(Pack<S, n> a) {
     return out;
 }
 
-/// Rounding of float lanes to integral values, by mode: as floats, and as 32-bit integers where they fit. None depends
-/// on the caller's control register; NearestEven wants a ControlScope.
+/// Rounding of float lanes to integral values, by mode: as floats, and as 32-bit integers where they fit. None but
+/// toInt32 of NearestEven depends on the rounding of the control register; all want subnormals and masked exceptions.
 struct TowardZero {
     static QORI_INLINE __m256 round(__m256 x) { return _mm256_round_ps(x, _MM_FROUND_TO_ZERO | _MM_FROUND_NO_EXC); }
     static QORI_INLINE __m256i toInt32(__m256 x) { return _mm256_cvttps_epi32(x); }

@@ -193,6 +193,22 @@ TEST(ConstantArithmetic, Streaming) {
     });
 }
 
+/// A control register that flushes subnormals makes no zero of them.
+TEST(ConstantArithmetic, SubnormalDivisors) {
+    const float src[4] = {1e-40f, -4e-40f, 1e-20f, INFINITY}, divisor = 2e-40f;
+    const QorComplex32f complexSource = {1e-40f, 0}, complexDivisor = {0, 2e-40f};
+    for (int circumstance = 0; circumstance < 8; ++circumstance) {
+        float dst[4];
+        QorComplex32f complexDst;
+        ASSERT_EQ(QOR_OK, call(qoriDivC_32f_C1R, src, 16, divisor, dst, 16, QorImageSize{4, 1}));
+        for (size_t i = 0; i < 4; ++i) EXPECT_EQ(src[i] / divisor, dst[i]);
+        ASSERT_EQ(QOR_OK,
+                  call(qoriDivC_32fc_C1R, &complexSource, 8, complexDivisor, &complexDst, 8, QorImageSize{1, 1}));
+        EXPECT_EQ(0, complexDst.re);
+        EXPECT_NEAR(-0.5, complexDst.im, 1e-4);
+    }
+}
+
 /// Results known beforehand come without a look at the source, which may then be smaller than the region.
 TEST(ConstantArithmetic, DoesNotReadTheSourceWithoutNeed) {
     const Shape shape{.width = 1, .height = 1};

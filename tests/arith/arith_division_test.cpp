@@ -143,6 +143,34 @@ TEST(Division, WidestComplexNumbers) {
     }
 }
 
+/// Quotients that are halves, or as near to them as can be, from small sums to those of 63 bits.
+TEST(Division, HalvesOfComplexNumbers) {
+    constexpr int count = 5;
+    const QorImageSize roi{count, 1};
+    for (int n = 0; n < 30'000; ++n) {
+        const int bits = random().below(31), other = std::max(30 - bits, 1);
+        const int scale = random().oneIn(3) ? random().below(67) - 33 : 0;
+        const auto drawn = [](int b) { return random().below(1 << b) - (1 << b) / 2; };
+        QorComplex32s a[count], b[count], d[count];
+        for (int i = 0; i < count; ++i) {
+            a[i] = {drawn(bits), drawn(bits)};
+            // a (p + qi) / 2 for odd p and q; with a scale factor that is somewhere on the grid.
+            const int64_t p = 2 * (drawn(other) / 4) + 1, q = 2 * (drawn(other) / 4) + 1;
+            const int nudge = random().below(3) - 1;
+            b[i] = {static_cast<int32_t>((a[i].re * p - a[i].im * q) / 2 + nudge),
+                    static_cast<int32_t>((a[i].re * q + a[i].im * p) / 2)};
+            if (random().oneIn(8)) a[i] = {};
+        }
+        call(qoriDiv_32sc_C1RSfs, a, 8 * count, b, 8 * count, d, 8 * count, roi, scale);
+        for (int i = 0; i < count; ++i) {
+            const QorComplex32s wanted = reference::divide(a[i], b[i], scale);
+            ASSERT_TRUE(wanted.re == d[i].re && wanted.im == d[i].im)
+                << "(" << b[i].re << " + " << b[i].im << "i) / (" << a[i].re << " + " << a[i].im << "i), scale "
+                << scale;
+        }
+    }
+}
+
 TEST(Division, FloatsOverZero) {
     const float inf = std::numeric_limits<float>::infinity(), nan = std::numeric_limits<float>::quiet_NaN();
     const float divisors[] = {0.f, 0.f, 0.f, 0.f, -0.f, -0.f, 0.f, 2.f, 0.f};

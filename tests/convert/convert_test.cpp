@@ -14,12 +14,12 @@ constexpr int kModes[] = {0, 1, 2, 7, -1};
 struct TellingFloat {
     float operator()() const {
         static constexpr float special[] = {
-            0.0f,          -0.0f,          0.5f,           -0.5f,         1.5f,          2.5f,
-            3.5f,          -1.5f,          -2.5f,          0.49999997f,   -0.49999997f,  254.5f,
-            255.5f,        256.0f,         127.5f,         -128.5f,       -129.0f,       32767.5f,
-            -32768.5f,     65534.5f,       65535.5f,       8388607.5f,    16777216.0f,   2147483520.0f,
-            2147483648.0f, -2147483648.0f, -2147483904.0f, 4294967040.0f, 4294967296.0f, 1e30f,
-            -1e30f,        1e-40f,         -1e-45f,        INFINITY,      -INFINITY,     NAN};
+            0.0f,          -0.0f,       0.5f,          -0.5f,          1.5f,           2.5f,           3.5f,
+            -1.5f,         -2.5f,       0.49999997f,   -0.49999997f,   254.5f,         255.5f,         256.0f,
+            127.5f,        -128.5f,     -129.0f,       32767.5f,       -32768.5f,      65534.5f,       65535.5f,
+            8388607.5f,    16777216.0f, 2147483520.0f, 2147483648.0f,  -2147483648.0f, -2147483904.0f, 4294967040.0f,
+            4294967296.0f, 1e30f,       -1e30f,        1e-40f,         -1e-45f,        INFINITY,       -INFINITY,
+            NAN,           -NAN,        3.4028235e38f, -3.4028235e38f, 1.1754942e-38f};
         const int choice = random().below(4);
         if (choice == 0) return special[random().below(static_cast<int>(std::size(special)))];
         if (choice == 1) return static_cast<float>(random().below(140'000) - 70'000) * 0.5f;
@@ -128,7 +128,17 @@ void scaleFloats(const char* name, Function function) {
     for (int mode : {0, 1, 2}) sweep(smallShapes(), mode, 1 - mode);
     for (int mode : {0, 1, 2, 9})
         for (int factor = -175; factor <= 145; ++factor) sweep(fewShapes(), mode, factor);
-    for (int factor : {INT32_MIN, -253, -252, 252, 253, INT32_MAX}) sweep(fewShapes(), 1, factor);
+    for (int mode : {0, 1, 2})
+        for (int factor : {INT32_MIN,  INT32_MIN + 1, INT32_MIN + 127,
+                           -1'000'000, -379,          -378,
+                           -278,       -277,          -276,
+                           -255,       -254,          -253,
+                           -252,       252,           253,
+                           254,        255,           276,
+                           277,        278,           378,
+                           379,        1'000'000,     INT32_MAX - 127,
+                           INT32_MAX})
+            sweep(fewShapes(), mode, factor);
     markSwept(name);
 }
 

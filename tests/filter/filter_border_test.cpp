@@ -124,8 +124,8 @@ Job drawJob(QorImageSize kernel) {
 }
 
 template <class T, int channels, class Function>
-void checkIntegers(Function function, const Kernel<int16_t>& kernel, int32_t divisor, int32_t mode) {
-    const Source<T, channels> source(drawJob({kernel.width, kernel.height}));
+void checkIntegers(Function function, const Source<T, channels>& source, const Kernel<int16_t>& kernel, int32_t divisor,
+                   int32_t mode) {
     const Blocks blocks(source.job, kTypeCode<T>, kIntegers, channels);
     ASSERT_EQ(QOR_OK, call(qoriFilterBorderInit_16s, kernel.values.data(), source.job.kernel, divisor, kTypeCode<T>,
                            channels, mode, blocks.plan));
@@ -135,6 +135,12 @@ void checkIntegers(Function function, const Kernel<int16_t>& kernel, int32_t div
         const auto expected = reference::clampTo<T>(reference::divideRounded(sum, divisor, mode));
         EXPECT_EQ(expected, actual) << "sum " << sum << ", divisor " << divisor << ", mode " << mode;
     });
+}
+
+template <class T, int channels, class Function>
+void checkIntegers(Function function, const Kernel<int16_t>& kernel, int32_t divisor, int32_t mode) {
+    checkIntegers<T, channels>(function, Source<T, channels>(drawJob({kernel.width, kernel.height})), kernel, divisor,
+                               mode);
 }
 
 /// `integers` stand for the same kernel where it is made from them.
@@ -261,6 +267,56 @@ TEST(FilterBorder, EverySumOfSmallKernelsIsDividedExactly) {
                 if (expected != actual) FAIL() << sum << " / " << divisor << " by mode " << mode << " is " << +actual;
             }
         }
+}
+
+/// A kernel of bytes whose magnitudes come to about `most` in its heaviest row, or in all where `inAll`.
+Kernel<int16_t> drawByteKernel(int most, bool inAll) {
+    Kernel<int16_t> kernel{1 + random().below(18), 1 + random().below(24), {}};
+    const auto area = static_cast<size_t>(kernel.width * kernel.height);
+    kernel.values.assign(area, 0);
+    const int signs = random().below(3);  // all positive, all negative, any
+    const size_t heaviest = random().oneIn(2) ? 1 : 127;
+    for (int left = most; left > 0;) {
+        const auto at = static_cast<size_t>(random().below(inAll ? static_cast<int>(area) : kernel.width));
+        const int k = std::min(left, 1 + random().below(static_cast<int>(heaviest)));
+        const bool negative =
+            kernel.values[at] < 0 || (kernel.values[at] == 0 && (signs == 2 ? random().oneIn(2) : signs == 1));
+        const int sum = kernel.values[at] + (negative ? -k : k);
+        if (sum >= -128 && sum <= 128) kernel.values[at] = static_cast<int16_t>(sum);
+        left -= k;
+    }
+    if (!inAll)
+        for (size_t i = static_cast<size_t>(kernel.width); i < area; ++i)
+            kernel.values[i] = kernel.values[i % static_cast<size_t>(kernel.width)];
+    return kernel;
+}
+
+/// Sums that leave 16 bits are made of parts that do not; pixel (0, 0) meets the largest or the least sum.
+template <int channels, class Function>
+void checkLargestByteSums(Function function) {
+    for (int n = 0; n < 150 && !testing::Test::HasFailure(); ++n) {
+        const bool inAll = random().oneIn(2);
+        const Kernel<int16_t> kernel = drawByteKernel(inAll ? 250 + random().below(10) : 3 + random().below(90), inAll);
+        Job job = drawJob({kernel.width, kernel.height});
+        job.border = borderReadAll;
+        Source<uint8_t, channels> source(job);
+        const bool least = random().oneIn(2);
+        for (int j = 0; j < kernel.height; ++j)
+            for (int i = 0; i < kernel.width; ++i)
+                for (int c = 0; c < channels; ++c) {
+                    const bool positive = kernel.values[static_cast<size_t>(j * kernel.width + i)] > 0;
+                    source.image.template view<uint8_t>(channels).set(kernel.width - 1 - i, kernel.height - 1 - j, c,
+                                                                      positive != least ? 255 : 0);
+                }
+        const int32_t divisor = (random().oneIn(2) ? 1 : -1) * (1 + random().below(600));
+        checkIntegers<uint8_t, channels>(function, source, kernel, divisor, n % 3);
+    }
+}
+
+TEST(FilterBorder, LargestByteSums) {
+    checkLargestByteSums<1>(qoriFilterBorder_8u_C1R);
+    checkLargestByteSums<3>(qoriFilterBorder_8u_C3R);
+    checkLargestByteSums<4>(qoriFilterBorder_8u_C4R);
 }
 
 TEST(FilterBorder, SumsBeyond32BitsWrap) {

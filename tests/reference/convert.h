@@ -62,6 +62,7 @@ D convertFloat(float x, int roundMode, int scaleFactor) {
     constexpr bool isUnsigned32 = std::is_same_v<D, uint32_t>;
     if (isUnsigned32 && scaleFactor < -159) return x > 0 ? Limits::max() : 0;
     if (std::isnan(x)) return isUnsigned32 ? Limits::max() : Limits::min();
+    if (isUnsigned32 && scaleFactor > 128) return 0;
     const int factor = scaleFactor > 800 ? 800 : scaleFactor < -800 ? -800 : scaleFactor;
     const double value = std::ldexp(static_cast<double>(x), -factor);
     if (value >= 1e10) return Limits::max();
