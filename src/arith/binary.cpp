@@ -9,7 +9,7 @@ template <class Op, bool anyStep, Layout layout, class T>
 QorResult combine(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi, int32_t scale) {
     if (QorResult r = firstOf(nullCheck(src1, src2, dst), sizeCheck(roi))) return r;
     if (QorResult r = anyStep ? QOR_OK : stepCheck(src1, src2, dst)) return r;
-    return underControlOf<T>([&] {
+    return underControlOf<kernels::Component<T>>([&] {
         const auto run = [&](auto operation) { runBinary<layout>(operation, src1, src2, dst, roi); };
         if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
         return QOR_OK;

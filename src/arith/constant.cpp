@@ -67,7 +67,7 @@ void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
 
 template <class Op, Layout layout, class T>
 QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale) {
-    return underControlOf<T>([&] {
+    return underControlOf<kernels::Component<T>>([&] {
         const auto run = [&](auto operation) { runConstant<layout>(operation, value, src, dst, roi); };
         if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
         return QOR_OK;
@@ -130,7 +130,7 @@ QorResult runDivision(Image<const T> src, const T* value, Image<T> dst, QorImage
     if (!allValues<layout>(value, [](T v) { return !isZeroValue(v); })) return QOR_ERR_DIV_BY_ZERO;
     if constexpr (std::is_integral_v<T>) {
         // Up to 2^(scale-1): at most a half, which goes to 0.
-        if (scale > static_cast<int>(std::bit_width(kernels::magnitude<T> - 1))) {
+        if (scale > static_cast<int>(std::bit_width(kernels::largestMagnitude<T> - 1))) {
             fillConstant<layout>(dst, roi, T{});
             return QOR_OK;
         }

@@ -8,16 +8,6 @@
 
 namespace qori::arith {
 
-/// Runs body under default control where elements are floats. Sums, differences, products and scaling of integers are
-/// made of integer instructions.
-template <class T, class Body>
-QorResult underControlOf(Body body) {
-    if constexpr (kernels::isFloat<T>)
-        return underDefaultControl(body);
-    else
-        return body();
-}
-
 /// Stores past the cache once the images fill half of it: the destination is then not read before it is written. In
 /// place it has been read anyway.
 template <Layout layout, class T, class... Sources>

@@ -239,7 +239,7 @@ QorResult absolute(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T, Layout layout>
 QorResult square(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = check(src, dst, roi)) return r;
-    return underControlOf<T>([&] {
+    return underControlOf<kernels::Component<T>>([&] {
         const auto run = [&](auto operation) { runBinary<layout>(operation, src, src, dst, roi); };
         if (!withScaledOperation<Product<T>, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
         return QOR_OK;

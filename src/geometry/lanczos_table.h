@@ -2,6 +2,7 @@
 // The Lanczos kernel L(t) = a sin(pi t) sin(pi t / a) / (pi t)^2 for |t| < a, sampled at compile time.
 #pragma once
 #include <array>
+#include <cstddef>
 #include <cstdint>
 #include <numbers>
 

@@ -74,15 +74,15 @@ QORI_INLINE Vec<int16_t> swapParts(Vec<int16_t> a) {
 
 /// The largest magnitude of an integer component, and the lanes of twice its width.
 template <class C>
-constexpr uint64_t magnitude = 0;
+constexpr uint64_t largestMagnitude = 0;
 template <>
-inline constexpr uint64_t magnitude<uint8_t> = 255;
+inline constexpr uint64_t largestMagnitude<uint8_t> = 255;
 template <>
-inline constexpr uint64_t magnitude<uint16_t> = 65535;
+inline constexpr uint64_t largestMagnitude<uint16_t> = 65535;
 template <>
-inline constexpr uint64_t magnitude<int16_t> = 32768;
+inline constexpr uint64_t largestMagnitude<int16_t> = 32768;
 template <>
-inline constexpr uint64_t magnitude<int32_t> = uint64_t{1} << 31;
+inline constexpr uint64_t largestMagnitude<int32_t> = uint64_t{1} << 31;
 template <class C>
 using SignedLane = std::conditional_t<sizeof(C) == 1, int16_t, std::conditional_t<sizeof(C) == 2, int32_t, int64_t>>;
 
@@ -91,7 +91,7 @@ struct Sum {
     using C = Component<T>;
     using W = SignedLane<C>;
     static constexpr bool hasExact = true;
-    static constexpr uint64_t limit = 2 * magnitude<C>;  // at most 2^32, in lanes of 64 bits
+    static constexpr uint64_t limit = 2 * largestMagnitude<C>;  // at most 2^32, in lanes of 64 bits
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const Vec<C> a = components(first), b = components(second);
@@ -127,7 +127,7 @@ struct Difference {
     using C = Component<T>;
     using W = SignedLane<C>;
     static constexpr bool hasExact = true;
-    static constexpr uint64_t limit = std::is_signed_v<C> ? 2 * magnitude<C> - 1 : magnitude<C>;
+    static constexpr uint64_t limit = std::is_signed_v<C> ? 2 * largestMagnitude<C> - 1 : largestMagnitude<C>;
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const Vec<C> a = components(first), b = components(second);
@@ -171,7 +171,8 @@ struct Product {
     static constexpr bool hasExact = isFloat<T>;
     // 8u: 65,025. 16u: 65,535^2. 16s: 2^30. Complex parts reach 2^31 and 2^63, which the lane does not
     // hold and mendMinimum() lowers by 256.
-    static constexpr uint64_t square = magnitude<C> * magnitude<C>, limit = isComplex<T> ? 2 * square - 256 : square;
+    static constexpr uint64_t square = largestMagnitude<C> * largestMagnitude<C>,
+                              limit = isComplex<T> ? 2 * square - 256 : square;
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const __m256 a = components(first).v, b = components(second).v;

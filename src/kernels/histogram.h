@@ -38,7 +38,7 @@ QORI_NOINLINE void countBytesRow(ByteCounters<channels>& counters, const uint8_t
     ptrdiff_t elements = pixels * channels;
     for (; elements >= Counters::group; elements -= Counters::group, src += Counters::group) {
         uint32_t word[words];
-        for (int w = 0; w < words; ++w) word[w] = detail::loadWord<uint32_t>(src + 4 * w);
+        for (int w = 0; w < words; ++w) word[w] = qori::detail::loadWord<uint32_t>(src + 4 * w);
         for (int w = 0; w < words; ++w)
             for (int i = 0; i < 4; ++i) count(word[w] >> (8 * i) & 255u, 4 * w + i);
     }

@@ -12,7 +12,7 @@
 //     Total                            type of the sum of all lanes between two spills
 //     static constexpr int banks       vectors of a round, in threes: more than 3 where latency would bind
 //     static constexpr ptrdiff_t limit rounds before a lane could overflow
-//     optionally  takesTwo             lanes are fed with TwoVectors, and a round has as many vectors again
+//     optionally  takesTwo             lanes are fed with VectorPair, and a round has as many vectors again
 //     optionally  loadVector(p) and loadRest(p, n)   where vectors are not simply loaded; n may reach a vector
 //     and either  values(Total*)       one value per element position
 //     or          Next, spillTo(Next&) wider accumulators that take over before the limit
@@ -82,7 +82,7 @@ QORI_INLINE auto loadFor(const T* p) {
     if constexpr (requires { Lanes::loadVector(p); })
         return Lanes::loadVector(p);
     else if constexpr (takesTwo<Lanes>)
-        return TwoVectors<T>{load(p), load(p + 3 * Vec<T>::lanes)};
+        return VectorPair<T>{load(p), load(p + 3 * Vec<T>::lanes)};
     else
         return load(p);
 }
@@ -93,7 +93,7 @@ QORI_INLINE auto loadRestFor(const T* p, ptrdiff_t n) {
     if constexpr (requires { Lanes::loadRest(p, n); })
         return Lanes::loadRest(p, n);
     else if constexpr (takesTwo<Lanes>)
-        return TwoVectors<T>{loadUpTo(p, n), zero<T>()};
+        return VectorPair<T>{loadUpTo(p, n), zero<T>()};
     else
         return loadUpTo(p, n);
 }

@@ -43,7 +43,7 @@ QORI_INLINE __m256i oddBytes(Vec<T> a) {
 
 /// A vector and the one at its place in the next round.
 template <class T>
-struct TwoVectors {
+struct VectorPair {
     Vec<T> first, second;
 };
 
@@ -167,7 +167,7 @@ requires(sizeof(T) == 1) struct ProductLanes<T> {
     };
     Sums low, high;  ///< Of the lower and the upper 8 bytes of each half.
 
-    QORI_INLINE void add(TwoVectors<T> a, TwoVectors<T> b) {
+    QORI_INLINE void add(VectorPair<T> a, VectorPair<T> b) {
         low.add({_mm256_unpacklo_epi16(a.first.v, a.second.v)}, {_mm256_unpacklo_epi16(b.first.v, b.second.v)});
         high.add({_mm256_unpackhi_epi16(a.first.v, a.second.v)}, {_mm256_unpackhi_epi16(b.first.v, b.second.v)});
     }

@@ -46,8 +46,8 @@ QORI_INLINE Vec<float> magnitude(Vec<float> a, Vec<float> b) { return magnitude(
 QORI_INLINE Doubles magnitude(Doubles a, Doubles b) { return magnitude(a - b); }
 
 template <class T, class... Other>
-QORI_INLINE auto magnitude(TwoVectors<T> a, Other... b) {
-    return TwoVectors<Magnitude<T>>{magnitude(a.first, b.first...), magnitude(a.second, b.second...)};
+QORI_INLINE auto magnitude(VectorPair<T> a, Other... b) {
+    return VectorPair<Magnitude<T>>{magnitude(a.first, b.first...), magnitude(a.second, b.second...)};
 }
 
 /// What is squared: integers by their magnitude, which has no sign to care for, floats as they are.

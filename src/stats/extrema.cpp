@@ -17,15 +17,6 @@ using kernels::Smallest;
 template <class T>
 constexpr T kNan = std::is_floating_point_v<T> ? std::numeric_limits<T>::quiet_NaN() : T{};
 
-/// Integers are compared by instructions that do not read the control register.
-template <class T, class Body>
-QorResult controlled(Body body) {
-    if constexpr (std::is_floating_point_v<T>)
-        return underDefaultControl(body);
-    else
-        return body();
-}
-
 template <class T, class... Orders>
 void joinRegion(QorImageSize roi, int channels, Image<const T> src, ExtremumLanes<Orders>&... lanes) {
     kernels::forEachRowToReduce(
@@ -62,7 +53,7 @@ QORI_NOINLINE void extremum(QorImageSize roi, int stored, int results, Image<con
 template <class T, Layout layout>
 QorResult minimum(Image<const T> src, QorImageSize roi, T* pMin) {
     if (QorResult r = firstOf(nullCheck(src, pMin), sizeCheck(roi))) return r;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         extremum<Smallest<T>>(roi, channels(layout), processedChannels(layout), src, pMin);
         return QOR_OK;
     });
@@ -71,7 +62,7 @@ QorResult minimum(Image<const T> src, QorImageSize roi, T* pMin) {
 template <class T, Layout layout>
 QorResult maximum(Image<const T> src, QorImageSize roi, T* pMax) {
     if (QorResult r = firstOf(nullCheck(src, pMax), sizeCheck(roi))) return r;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         extremum<Biggest<T>>(roi, channels(layout), processedChannels(layout), src, pMax);
         return QOR_OK;
     });
@@ -100,7 +91,7 @@ QORI_NOINLINE void bothExtrema(QorImageSize roi, int stored, int results, Image<
 template <class T, Layout layout>
 QorResult minMax(Image<const T> src, QorImageSize roi, T* pMin, T* pMax) {
     if (QorResult r = firstOf(nullCheck(src, pMin, pMax), sizeCheck(roi))) return r;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         bothExtrema(roi, channels(layout), processedChannels(layout), src, pMin, pMax);
         return QOR_OK;
     });
@@ -215,7 +206,7 @@ QORI_NOINLINE void extremumAndPosition(QorImageSize roi, int stored, int results
 template <class T, Layout layout>
 QorResult minimumIndex(Image<const T> src, QorImageSize roi, T* pMin, int32_t* pIndexX, int32_t* pIndexY) {
     if (QorResult r = firstOf(nullCheck(src, pMin, pIndexX, pIndexY), sizeCheck(roi))) return r;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         extremumAndPosition<Smallest<T>>(roi, channels(layout), processedChannels(layout), src, pMin, pIndexX, pIndexY);
         return QOR_OK;
     });
@@ -224,7 +215,7 @@ QorResult minimumIndex(Image<const T> src, QorImageSize roi, T* pMin, int32_t* p
 template <class T, Layout layout>
 QorResult maximumIndex(Image<const T> src, QorImageSize roi, T* pMax, int32_t* pIndexX, int32_t* pIndexY) {
     if (QorResult r = firstOf(nullCheck(src, pMax, pIndexX, pIndexY), sizeCheck(roi))) return r;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         extremumAndPosition<Biggest<T>>(roi, channels(layout), processedChannels(layout), src, pMax, pIndexX, pIndexY);
         return QOR_OK;
     });
@@ -294,7 +285,7 @@ QorResult blockMinMax(Image<const T> src, QorImageSize roi, Image<T> dstMin, Ima
     // Numbers of elements against steps in bytes: the check is that coarse.
     if (roi.width > src.step) return QOR_ERR_STEP;
     if ((!isNull(dstMin) && blocks > dstMin.step) || (!isNull(dstMax) && blocks > dstMax.step)) return QOR_ERR_STEP;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         MinMax<T> all;
         for (int32_t y = 0, by = 0; y < roi.height; ++by) {
             const int32_t rows = std::min(block.height, roi.height - y);
@@ -329,7 +320,7 @@ template <class T, Layout layout>
 QorResult countInRange(Image<const T> src, QorImageSize roi, int32_t* pCounts, const T* lower, const T* upper) {
     constexpr int results = processedChannels(layout);
     if (QorResult r = firstOf(nullCheck(src, pCounts, lower, upper), stepCheck(src), sizeCheck(roi))) return r;
-    return controlled<T>([&] {
+    return underControlOf<T>([&] {
         for (int c = 0; c < results; ++c)
             if (upper[c] < lower[c]) return QOR_ERR_BAD_RANGE;
         countRegion(roi, channels(layout), results, src, pCounts, lower, upper);

@@ -32,10 +32,7 @@ QorResult countUnderControl(QorImageSize roi, Image<const T> src, const Channel<
         countDirectly<T, layout>(roi, src, out);
         return QOR_OK;
     };
-    if constexpr (std::is_floating_point_v<T>)
-        return underDefaultControl(count);
-    else
-        return count();
+    return underControlOf<T>(count);
 }
 
 // --- levels with the call -------------------------------------------------------------------------------------------

@@ -56,7 +56,7 @@ struct Contract {
 
 template <class... T>
 Contract contractOf(const char* name, const char* parameters, const char* checks,
-                              QorResult(QORI_CALL* function)(T...)) {
+                    QorResult(QORI_CALL* function)(T...)) {
     const auto invoke = [](Function f, const Argument* arguments) {
         return [&]<size_t... i>(std::index_sequence<i...>) {
             return call(reinterpret_cast<QorResult(QORI_CALL*)(T...)>(f), arguments[i].template as<T>()...);
