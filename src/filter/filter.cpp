@@ -23,31 +23,8 @@ QorResult stepsCheck(Image<const S> src, Image<D> dst, QorImageSize roi, QorImag
     return seen > src.step || made > dst.step ? QOR_ERR_STEP : QOR_OK;
 }
 
-/// Memory of the caller, or of the allocator for the duration of a call.
-class WorkArea {
-public:
-    explicit WorkArea(uint8_t* callers) : memory_(callers) {}
-    explicit WorkArea(int64_t bytes)
-        : memory_(bytes > INT32_MAX ? nullptr : qorMalloc(static_cast<int32_t>(bytes))), isOwned_(true) {}
-    ~WorkArea() {
-        if (isOwned_) qorFree(memory_);
-    }
-    WorkArea(const WorkArea&) = delete;
-    WorkArea& operator=(const WorkArea&) = delete;
-
-    bool isMissing() const { return memory_ == nullptr; }
-    /// From the next multiple of 16 on, which every reported size allows for.
-    template <class T>
-    T* begin() const {
-        constexpr uintptr_t kAlignment = 16;
-        const auto beyond = reinterpret_cast<uintptr_t>(memory_) % kAlignment;
-        return reinterpret_cast<T*>(static_cast<uint8_t*>(memory_) + (kAlignment - beyond) % kAlignment);
-    }
-
-private:
-    void* memory_;
-    bool isOwned_ = false;
-};
+/// Packed kernels begin on the next multiple of 16, which every reported size allows for.
+constexpr uintptr_t kPackedAlignment = 16;
 
 /// Bytes of any packed kernel: four copies of a word of 4 bytes, or one of 8, per coefficient.
 int64_t packedBytes(QorImageSize kernel) {
@@ -73,7 +50,7 @@ bool fitsPairs(Kernel<K> kernel) {
 /// In 32 bits where no sum leaves them, else in double precision.
 template <Layout layout, class S, class K>
 void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor,
-                 int32_t divisor, int32_t mode, const WorkArea& area) {
+                 int32_t divisor, int32_t mode, const WorkMemory& area) {
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     const Division division{divisor, mode, largestSum<S>(kernel.data, kernel.size)};
     if constexpr (std::is_same_v<S, uint8_t>) {
@@ -81,13 +58,13 @@ void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
         const bool inGroups = !inWords && division.sumLimit <= INT32_MAX;
         const ByteGroups groups = inGroups ? byteGroups(kernel.data, kernel.size) : ByteGroups{};
         if (inWords || groups.count > 0) {
-            auto* packed = area.begin<int32_t>();
+            auto* packed = area.begin<int32_t>(kPackedAlignment);
             packBytes(kernel.data, kernel.size, packed);
             return filterBytes(packed, kernel.size, groups, division, target);
         }
     }
     if (division.sumLimit <= INT32_MAX && fitsPairs(kernel)) {
-        auto* packed = area.begin<int32_t>();
+        auto* packed = area.begin<int32_t>(kPackedAlignment);
         packPairs<PairTaps<S>::repeats>(kernel.data, kernel.size, packed);
         // Unsigned 16-bit pixels are taken less 32768.
         uint32_t start = 0;
@@ -96,7 +73,7 @@ void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
                 start += static_cast<uint32_t>(kernel.data[i]) << 15;
         return filterPairs(packed, kernel.size, static_cast<int32_t>(start), division, target);
     }
-    auto* packed = area.begin<double>();
+    auto* packed = area.begin<double>(kPackedAlignment);
     packTurned<DoubleTaps<S>::repeats>(kernel.data, kernel.size, packed);
     filterDouble(packed, kernel.size, division, target);
 }
@@ -104,15 +81,15 @@ void sumIntegers(Image<const S> src, Image<S> dst, QorImageSize roi, Kernel<K> k
 /// In single precision, or in double where the elements have more digits.
 template <Layout layout, class S, class D, class K>
 void sumFloats(Image<const S> src, Image<D> dst, QorImageSize roi, Kernel<K> kernel, QorPoint2D anchor, int32_t mode,
-               const WorkArea& area) {
+               const WorkMemory& area) {
     auto target = openTarget<layout>(src, dst, roi, kernel.size, anchor);
     constexpr bool isDouble = std::is_same_v<S, double> || std::is_same_v<S, int32_t>;
     if constexpr (isDouble) {
-        auto* packed = area.begin<double>();
+        auto* packed = area.begin<double>(kPackedAlignment);
         packTurned<DoubleTaps<S>::repeats>(kernel.data, kernel.size, packed);
         filterDouble(packed, kernel.size, {1, mode, 0}, target);
     } else {
-        auto* packed = area.begin<float>();
+        auto* packed = area.begin<float>(kPackedAlignment);
         packTurned<FloatTaps<S>::repeats>(kernel.data, kernel.size, packed);
         filterSingle(packed, kernel.size, mode, target);
     }
@@ -140,8 +117,8 @@ QorResult filterIntegers(Image<const T> src, Image<T> dst, QorImageSize roi, Ker
     if (QorResult r = firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
                               divisorCheck(divisor), stepsCheck<layout>(src, dst, roi, kernel.size)))
         return r;
-    const WorkArea area(packedBytes(kernel.size));
-    if (area.isMissing()) return QOR_ERR_NO_MEMORY;
+    const WorkMemory area(packedBytes(kernel.size));
+    if (QorResult r = area.check()) return r;
     return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundNearestEven, area);
 }
 
@@ -150,8 +127,8 @@ QorResult filterAllocating(Image<const S> src, Image<D> dst, QorImageSize roi, K
     if (QorResult r = firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
                               stepsCheck<layout>(src, dst, roi, kernel.size)))
         return r;
-    const WorkArea area(packedBytes(kernel.size));
-    if (area.isMissing()) return QOR_ERR_NO_MEMORY;
+    const WorkMemory area(packedBytes(kernel.size));
+    if (QorResult r = area.check()) return r;
     return runFloats<layout>(src, dst, roi, kernel, anchor, roundNearestEven, area);
 }
 
@@ -167,7 +144,7 @@ QorResult filterRound(Image<const T> src, Image<T> dst, QorImageSize roi, Kernel
             firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size), divisorCheck(divisor),
                     stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
-    return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkArea(pBuffer));
+    return runIntegers<layout>(src, dst, roi, kernel, anchor, divisor, roundMode, WorkMemory(pBuffer));
 }
 
 template <class T, Layout layout>
@@ -177,7 +154,7 @@ QorResult filterRoundFloats(Image<const T> src, Image<T> dst, QorImageSize roi, 
             firstOf(nullCheck(src, dst, kernel.data), sizeCheck(roi), sizeCheck(kernel.size),
                     stepsCheck<layout>(src, dst, roi, kernel.size), roundModeCheck(roundMode), nullCheck(pBuffer)))
         return r;
-    return runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkArea(pBuffer));
+    return runFloats<layout>(src, dst, roi, kernel, anchor, roundMode, WorkMemory(pBuffer));
 }
 
 QorResult rowBufferCheck(QorImageSize kernelSize, int32_t roiWidth, const int32_t* pBufferSize) {

@@ -70,8 +70,8 @@ void filterIntegers(const LinearPlan& plan, QorImageSize size, Target<T, T>& tar
     const Division division{plan.divisor, plan.roundMode, plan.sumLimit};
     if constexpr (std::is_same_v<T, uint8_t>)
         if (plan.bytesOffset != 0)
-            return filterBytes(plan.table<int32_t>(plan.bytesOffset), size, plan.groups, division, target);
-    filterPairs(plan.table<int32_t>(plan.packedOffset), size, 0, division, target);
+            return filterBytes(tableOf<int32_t>(&plan, plan.bytesOffset), size, plan.groups, division, target);
+    filterPairs(tableOf<int32_t>(&plan, plan.packedOffset), size, 0, division, target);
 }
 
 template <class T, int channels>
@@ -89,7 +89,7 @@ QorResult runPlan(Image<const T> src, Image<T> dst, QorImageSize roi, const Bord
             return QOR_OK;
         }
     }
-    filterSingle(plan.table<float>(plan.packedOffset), size, plan.roundMode, target);
+    filterSingle(tableOf<float>(&plan, plan.packedOffset), size, plan.roundMode, target);
     return QOR_OK;
 }
 
@@ -101,7 +101,7 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
             firstOf(nullCheck(src, dst, borderValue, pSpec, pBuffer), sizeCheck(roi),
                     filterStepCheck(src.step, dst.step, int64_t{roi.width} * pixelBytes), borderCheck(border)))
         return r;
-    const auto& plan = *reinterpret_cast<const LinearPlan*>(blockStart(pSpec));
+    const LinearPlan& plan = *recordIn<LinearPlan>(pSpec);
     return underDefaultControl([&] {
         return runPlan<T, channels>(src, dst, roi, BorderRule::of(border, borderValue), plan, blockStart(pBuffer));
     });

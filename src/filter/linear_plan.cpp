@@ -3,8 +3,6 @@
 
 #include <bit>
 
-#include "frame/plan.h"
-
 namespace qori::filter {
 namespace {
 
@@ -14,17 +12,33 @@ static_assert(sizeof(LinearPlan) <= kRecordBytes);
 constexpr int kCopies = 4;  ///< Of each packed coefficient.
 static_assert(kCopies == kernels::PairTaps<uint8_t>::repeats && kCopies == kernels::FloatTaps<float>::repeats);
 
+/// Where the kernel as given and the packed one lie.
+struct Places {
+    int64_t kernel, packed, bytes;
+
+    Places(QorImageSize size, int64_t coefficientBytes) {
+        BlockLayout layout;
+        layout.add(kRecordBytes);
+        kernel = layout.add(int64_t{size.width} * size.height * coefficientBytes);
+        packed = layout.add(kPairBytes * ((int64_t{size.width} + 1) / 2) * size.height);
+        bytes = layout.bytes();
+    }
+
+private:
+    static constexpr int64_t kPairBytes = 2 * kCopies * sizeof(float);  ///< Pairs of words take half of it.
+};
+
 LinearPlan& startPlan(QorLinearFilterPlan* block, int32_t pathKind, QorImageSize size, int32_t coefficientBytes,
                       int32_t roundMode) {
-    auto& plan = *reinterpret_cast<LinearPlan*>(blockStart(block));
+    LinearPlan& plan = *recordIn<LinearPlan>(block);
     plan = {};
     plan.pathKind = pathKind;
     plan.kernelWidth = size.width;
     plan.kernelHeight = size.height;
     plan.roundMode = roundMode;
-    plan.kernelOffset = kRecordBytes;
-    const int64_t kernelBytes = int64_t{size.width} * size.height * coefficientBytes;
-    plan.packedOffset = kRecordBytes + static_cast<int32_t>(roundUpToBlock(kernelBytes));
+    const Places places(size, coefficientBytes);
+    plan.kernelOffset = static_cast<int32_t>(places.kernel);
+    plan.packedOffset = static_cast<int32_t>(places.packed);
     return plan;
 }
 
@@ -55,17 +69,15 @@ template <class Coefficient>
 void fillFloats(QorLinearFilterPlan* block, QorImageSize size, int32_t dataType, int32_t channels, int32_t roundMode,
                 Coefficient coefficient) {
     LinearPlan& plan = startPlan(block, floatPath(dataType), size, sizeof(float), roundMode);
-    auto* copy = plan.table<float>(plan.kernelOffset);
+    auto* copy = tableOf<float>(&plan, plan.kernelOffset);
     for (ptrdiff_t i = 0; i < ptrdiff_t{size.width} * size.height; ++i) copy[i] = coefficient(i);
-    if (channels != 2) packTurned<kCopies>(copy, size, plan.table<float>(plan.packedOffset));
+    if (channels != 2) packTurned<kCopies>(copy, size, tableOf<float>(&plan, plan.packedOffset));
 }
 
 }  // namespace
 
 int64_t planBytes(QorImageSize kernel, int32_t kernelType) {
-    const int64_t pairs = (int64_t{kernel.width} + 1) / 2 * kernel.height;
-    const int64_t coefficients = int64_t{kernel.width} * kernel.height * (kernelType == k16s ? 2 : 4);
-    return roundUpToBlock(32 * pairs) + roundUpToBlock(coefficients) + kRecordBytes + kBlockAlignment - 1;
+    return Places(kernel, kernelType == k16s ? 2 : 4).bytes + kBlockAlignment - 1;
 }
 
 int64_t workBytes(QorImageSize kernel, int32_t roiWidth, int32_t dataType, int32_t kernelType, int32_t channels) {
@@ -90,9 +102,9 @@ void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize si
     LinearPlan& plan =
         startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t), roundMode);
     classifyDivisor(plan, divisor);
-    auto* copy = plan.table<int16_t>(plan.kernelOffset);
+    auto* copy = tableOf<int16_t>(&plan, plan.kernelOffset);
     std::copy_n(kernel, ptrdiff_t{size.width} * size.height, copy);
-    packPairs<kCopies>(copy, size, plan.table<int32_t>(plan.packedOffset));
+    packPairs<kCopies>(copy, size, tableOf<int32_t>(&plan, plan.packedOffset));
     const int64_t limit = is8u ? largestSum<uint8_t>(copy, size) : largestSum<int16_t>(copy, size);
     plan.sumLimit = static_cast<int32_t>(std::min<int64_t>(limit, INT32_MAX));
     if (is8u && limit > kernels::ByteTaps::kSumLimit) plan.groups = byteGroups(copy, size);
@@ -100,7 +112,7 @@ void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize si
         // Half of the packed kernel's region is free.
         const int32_t pairs = (size.width + 1) / 2 * size.height;
         plan.bytesOffset = plan.packedOffset + kCopies * int32_t{sizeof(int32_t)} * pairs;
-        packBytes(copy, size, plan.table<int32_t>(plan.bytesOffset));
+        packBytes(copy, size, tableOf<int32_t>(&plan, plan.bytesOffset));
     }
     plan.fitsPairs = std::all_of(copy, copy + ptrdiff_t{size.width} * size.height,
                                  [](int16_t k) { return k != INT16_MIN && k != INT16_MAX; });

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // The plan of a general linear filter: a record in the caller's block, the kernel as given and as the sums want it.
 #pragma once
+#include "frame/plan.h"
 #include "packing.h"
 
 namespace qori::filter {
@@ -27,15 +28,6 @@ struct LinearPlan {
     int32_t bytesOffset;  ///< The kernel in bytes, behind the packed one, where its sums allow for them; else 0.
     ByteGroups groups;    ///< Of the kernel in bytes, where its sums leave 16 bits.
     int32_t sumLimit;     ///< No sum's magnitude is larger; INT32_MAX also where one may be.
-
-    template <class T>
-    T* table(int32_t offset) {
-        return reinterpret_cast<T*>(reinterpret_cast<uint8_t*>(this) + offset);
-    }
-    template <class T>
-    const T* table(int32_t offset) const {
-        return reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(this) + offset);
-    }
 };
 
 /// Whether such pixels take an integer kernel as floats.

@@ -2,10 +2,10 @@
 // Erosion and dilation by the 3 x 3 square, whose neighbours are read from memory.
 #include "frame/checks.h"
 #include "frame/float_control.h"
+#include "frame/plan.h"
 #include "frame/row_window.h"
 #include "frame/streaming.h"
 #include "kernels/morphology.h"
-#include "qorcore.h"
 
 namespace qori::filter {
 namespace {
@@ -71,15 +71,12 @@ QorResult extreme3x3InPlace(Image<T> image, QorImageSize roi) {
                                       stepFits<layout, T>(image.step, int64_t{roi.width} + 2 * kReach));
     if (checked != QOR_OK) return checked;
     const BorderedImage src = around<layout>(image, roi);
-    const int64_t bytes = RowWindow::bytes(src, needs(Place::inOrder));
-    auto* memory = bytes > INT32_MAX ? nullptr : static_cast<uint8_t*>(qorMalloc(static_cast<int32_t>(bytes)));
-    if (memory == nullptr) return QOR_ERR_NO_MEMORY;
-    const QorResult result = underControlOf<T>([&] {
-        run<Order, Stores::delayed, layout>(src, image, memory);
+    const WorkMemory memory(RowWindow::bytes(src, needs(Place::inOrder)));
+    if (QorResult r = memory.check()) return r;
+    return underControlOf<T>([&] {
+        run<Order, Stores::delayed, layout>(src, image, memory.begin<uint8_t>());
         return QOR_OK;
     });
-    qorFree(memory);
-    return result;
 }
 
 /// Equal images with equal steps are the in-place form's, and its checks are theirs.

@@ -74,8 +74,8 @@ void BorderedImage::gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) con
 }
 
 int64_t borderBytes(QorImageSize region, Reach reach, int32_t pixelBytes) {
-    const int64_t bandRow = roundUpToBlock((int64_t{region.width} + reach.columns()) * pixelBytes);
-    const int64_t stripRow = roundUpToBlock((3 * int64_t{reach.columns()} + 1) * pixelBytes);
+    const int64_t bandRow = roundUp((int64_t{region.width} + reach.columns()) * pixelBytes, kBlockAlignment);
+    const int64_t stripRow = roundUp((3 * int64_t{reach.columns()} + 1) * pixelBytes, kBlockAlignment);
     return std::max(product(2 * int64_t{reach.rows()}, bandRow), product(region.height, stripRow));
 }
 
@@ -125,7 +125,7 @@ void BorderParts::addColumns(int32_t y, int32_t height) {
 
 ptrdiff_t BorderParts::rowBytes(int32_t width, ptrdiff_t slackBytes) const {
     const int64_t pixels = int64_t{width} + reach_.columns();
-    return static_cast<ptrdiff_t>(roundUpToBlock(pixels * image_.pixelBytes + slackBytes));
+    return static_cast<ptrdiff_t>(roundUp(pixels * image_.pixelBytes + slackBytes, kBlockAlignment));
 }
 
 bool BorderParts::fits(int32_t width, ptrdiff_t slackBytes) const {

@@ -12,9 +12,7 @@
 namespace qori::geometry {
 namespace {
 
-const ResizePlan* planOf(const QorResizePlan* block) { return reinterpret_cast<const ResizePlan*>(blockStart(block)); }
-
-QorResult tagCheck(const ResizePlan* plan) { return plan->tag == ResizePlan::kTag ? QOR_OK : QOR_ERR_CONTEXT; }
+const ResizePlan* planOf(const QorResizePlan* block) { return recordIn<ResizePlan>(block); }
 
 QorResult emptyCheck(QorImageSize size) {
     return size.width == 0 || size.height == 0 ? QOR_WARN_NOTHING_TO_DO : QOR_OK;

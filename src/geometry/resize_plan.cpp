@@ -72,7 +72,7 @@ struct Builder {
     ResizePlan* plan;
 
     Builder(ResizePlan* block, QorImageSize src, QorImageSize dst, int32_t interpolation, bool antialiasing)
-        : plan(reinterpret_cast<ResizePlan*>(blockStart(block))) {
+        : plan(recordIn<ResizePlan>(block)) {
         const PlanLayout layout = planLayout(src, dst, interpolation, antialiasing);
         *plan = {};
         plan->tag = ResizePlan::kTag;
@@ -90,7 +90,7 @@ struct Builder {
 
     template <class T>
     T* table(int32_t offset) const {
-        return reinterpret_cast<T*>(reinterpret_cast<uint8_t*>(plan) + offset);
+        return tableOf<T>(plan, offset);
     }
 
     void setReach(int32_t halfWidth, int32_t halfHeight) const {
@@ -183,17 +183,16 @@ PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation,
     const int64_t positions = roundUp(dst.width, 32) + roundUp(dst.height, 32);
     const bool weighs = interpolation == interpCubic || interpolation == interpLanczos;
     PlanLayout layout;
-    int64_t at = kRecordBytes;
+    BlockLayout block(32);
+    block.add(kRecordBytes);
     const auto place = [&](int64_t bytes) {
-        const int64_t start = at;
-        at += bytes;
-        return static_cast<int32_t>(start);  // wraps only where planBytes is refused
+        return static_cast<int32_t>(block.add(bytes));  // wraps only where planBytes is refused
     };
     layout.verticalIndices = place(rows.indices);
     layout.horizontalIndices = place(columns.indices);
     layout.verticalWeights = place(rows.weights);
     layout.horizontalWeights = place(columns.weights);
-    layout.planBytes = at - kRecordBytes + kCounted + kAlignment;
+    layout.planBytes = block.bytes() - kRecordBytes + kCounted + kAlignment;
     layout.initBytes = (antialiasing ? 8 * positions : weighs ? 4 * positions : 0) + kAlignment;
     return layout;
 }

@@ -5,8 +5,6 @@
 
 namespace qori::geometry {
 
-constexpr int64_t roundUp(int64_t n, int64_t multiple) { return (n + multiple - 1) / multiple * multiple; }
-
 /// One direction. A position is a pixel of the destination, an index one of the source.
 struct Axis {
     int32_t sourceLength, targetLength;
@@ -32,7 +30,7 @@ struct ResizePlan {
 
     template <class T>
     const T* table(int32_t offset) const {
-        return reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(this) + offset);
+        return tableOf<T>(this, offset);
     }
     /// Source index of a position: its first pixel for super, the pixel at or before its centre else.
     int32_t index(const Axis& axis, int32_t position) const {

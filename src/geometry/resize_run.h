@@ -8,27 +8,6 @@
 
 namespace qori::geometry {
 
-/// Hands out pieces of a work buffer, each on a 64-byte boundary; without a buffer it only counts.
-class WorkBuffer {
-public:
-    explicit WorkBuffer(uint8_t* block) : next_(block == nullptr ? nullptr : blockStart(block)) {}
-
-    template <class T>
-    T* take(int64_t count) {
-        const int64_t bytes = roundUp(count * static_cast<int64_t>(sizeof(T)), 64);
-        auto* piece = reinterpret_cast<T*>(next_);
-        if (next_ != nullptr) next_ += bytes;
-        used_ += bytes;
-        return piece;
-    }
-    /// With the slack for the alignment of the caller's block.
-    int64_t bytes() const { return used_ + 64; }
-
-private:
-    uint8_t* next_;
-    int64_t used_ = 0;
-};
-
 /// The part of a tile inside the destination, in destination pixels.
 struct Tile {
     int32_t x, y, width, height;

@@ -93,18 +93,26 @@ struct Record {
     /// Where the arrays lie: addresses where 32 bits hold them, else offsets from the record.
     uint32_t places[4];
 
+    /// Bytes from the record's beginning to a channel's levels; those of the channel behind the last measure it.
+    static int64_t offset(const int32_t* counts, int channel) {
+        BlockLayout layout(4);
+        layout.add(sizeof(Record));
+        for (int c = 0; c < channel; ++c) layout.add(int64_t{counts[c]} * 4);
+        return layout.bytes();
+    }
     template <class L>
     L* levels(int channel) {
-        uint8_t* at = reinterpret_cast<uint8_t*>(this + 1);
-        for (int c = 0; c < channel; ++c) at += ptrdiff_t{counts[c]} * 4;
-        return reinterpret_cast<L*>(at);
+        return tableOf<L>(this, offset(counts, channel));
     }
-    uint32_t place(int channel) {
-        const uint8_t* const at = levels<uint8_t>(channel);
+    template <class L>
+    const L* levels(int channel) const {
+        return tableOf<L>(this, offset(counts, channel));
+    }
+    uint32_t place(int channel) const {
         if constexpr (sizeof(void*) == 4)
-            return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(at));
+            return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(levels<uint8_t>(channel)));
         else
-            return static_cast<uint32_t>(at - reinterpret_cast<const uint8_t*>(this));
+            return static_cast<uint32_t>(offset(counts, channel));
     }
     void begin(int32_t type, int32_t n, int32_t isUniform, const int32_t* nLevels) {
         *this = {type, n, isUniform, kIdentifier, {}, {}};
@@ -115,7 +123,7 @@ struct Record {
 static_assert(sizeof(Record) == 48);
 
 Record* recordOf(QorHistogramSpec* pSpec) { return reinterpret_cast<Record*>(pSpec); }
-Record* recordOf(const QorHistogramSpec* pSpec) { return recordOf(const_cast<QorHistogramSpec*>(pSpec)); }
+const Record* recordOf(const QorHistogramSpec* pSpec) { return reinterpret_cast<const Record*>(pSpec); }
 
 bool strictlyIncreasing(const float* levels, int32_t count) {
     for (int32_t k = 1; k < count; ++k)
@@ -137,9 +145,7 @@ QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLev
     if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels)))
         return r;
     if (QorResult r = levelCountCheck(nLevels, numChannels)) return r;
-    int64_t words = sizeof(Record) / 4;
-    for (int c = 0; c < numChannels; ++c) words += nLevels[c];
-    if (QorResult r = reportSize(4 * words, pSpecSize)) return r;
+    if (QorResult r = reportSize(Record::offset(nLevels, numChannels), pSpecSize)) return r;
     const int32_t values = dataType == qor8u                          ? kValues<uint8_t>
                            : dataType == qor16u || dataType == qor16s ? kValues<uint16_t>
                                                                       : 0;
@@ -218,7 +224,7 @@ QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const
 
 QorResult histogramLevels(const QorHistogramSpec* pSpec, float* const* ppLevels) {
     if (QorResult r = nullCheck(pSpec, ppLevels)) return r;
-    Record* const record = recordOf(pSpec);
+    const Record* const record = recordOf(pSpec);
     if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
     if (anyNull(ppLevels, record->channels)) return QOR_ERR_NULL_PTR;
     return underDefaultControl([&] {
@@ -237,7 +243,7 @@ QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist,
     if (isNull(src) || anyNull(pHist, n) || pSpec == nullptr || pBuffer == nullptr) return QOR_ERR_NULL_PTR;
     if (QorResult r = firstOf(sizeCheck(roi), stepCheck(src))) return r;
     if (src.step < int64_t{roi.width} * n * elementBytes<T>) return QOR_ERR_STEP;
-    Record* const record = recordOf(pSpec);
+    const Record* const record = recordOf(pSpec);
     if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
     Channel<Level<T>> out[n];
     for (int c = 0; c < n; ++c) out[c] = {record->levels<Level<T>>(c), record->counts[c], pHist[c]};

@@ -392,8 +392,8 @@ std::vector<float> uniformLevels(int32_t type, float lower, float upper, int32_t
 }
 
 TEST(Histogram, LevelsBeyondTheirTypeBecomeItsEnds) {
-    constexpr float far = 2147483648.0f;
-    const float given[5] = {-INFINITY, 0, 128, far, INFINITY};
+    constexpr float beyond = 2147483648.0f;
+    const float given[5] = {-INFINITY, 0, 128, beyond, INFINITY};
     const float* const pointers[1] = {given};
     const int32_t four = 4;
     Prepared prepared(qor8u, &four, 1, [&](QorHistogramSpec* spec) {
@@ -410,8 +410,8 @@ TEST(Histogram, LevelsBeyondTheirTypeBecomeItsEnds) {
     ASSERT_EQ(QOR_OK, qoriHistogram_8u_C1R(pixels, 4, {4, 1}, bins, low.spec.data<QorHistogramSpec>(),
                                            low.buffer.data<uint8_t>()));
     EXPECT_EQ((std::vector{0, 2, 2}), std::vector(bins, bins + 3));
-    EXPECT_EQ((std::vector{0.0f, far, far}), uniformLevels(qor16u, 0, 8e9f, 3));
-    EXPECT_EQ((std::vector{-far, 0.0f, far}), uniformLevels(qor16s, -INFINITY, INFINITY, 3));
+    EXPECT_EQ((std::vector{0.0f, beyond, beyond}), uniformLevels(qor16u, 0, 8e9f, 3));
+    EXPECT_EQ((std::vector{-beyond, 0.0f, beyond}), uniformLevels(qor16s, -INFINITY, INFINITY, 3));
     // Floats hold the bounds, but not their difference.
     EXPECT_EQ((std::vector{-3e38f, -1.5e38f, 0.0f, 1.5e38f, 3e38f}), uniformLevels(qor32f, -3e38f, 3e38f, 5));
     EXPECT_EQ((std::vector{-INFINITY, 0.0f, INFINITY}), uniformLevels(qor32f, -INFINITY, INFINITY, 3));
