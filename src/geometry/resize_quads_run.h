@@ -42,12 +42,12 @@ public:
                    columns_};
         newest_ = INT32_MIN;
     }
-    /// Where there are fewer than four rows left, the last is done again.
+    /// There is a row left. Where there are fewer than four, the last is done again.
     void filterNext(RowSequence& sequence, Ring& ring) {
         const T* rows[kernels::kQuadRows];
         float* out[kernels::kQuadRows];
         for (int32_t i = 0; i < kernels::kQuadRows; ++i) {
-            if (!sequence.done()) {
+            if (i == 0 || !sequence.done()) {
                 newest_ = sequence.next();
                 out[i] = ring.next();
             } else {

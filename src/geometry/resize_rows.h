@@ -144,12 +144,12 @@ public:
                    results_};
         newest_ = INT32_MIN;
     }
-    /// Where there are fewer than eight rows left, the last is done again.
+    /// There is a row left. Where there are fewer than eight, the last is done again.
     void filterNext(RowSequence& sequence, Ring& ring) {
         const T* rows[kernels::kTapRows];
         float* out[kernels::kTapRows];
         for (int32_t i = 0; i < kernels::kTapRows; ++i) {
-            if (!sequence.done()) {
+            if (i == 0 || !sequence.done()) {
                 newest_ = sequence.next();
                 out[i] = ring.next();
             } else {
