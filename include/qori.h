@@ -4204,11 +4204,11 @@ QORI_API QorResult QORI_CALL qoriResizeSuper_32f_C4R(const float* pSrc, int32_t 
  *            and may be null. The part of a tile beyond the plan's destination is left out; QOR_WARN_ADJUSTED
  *            where dstSize alone exceeds it. A source element that is not finite reaches every result whose 2 x
  *            2 pixels hold it, those with a weight of 0 included.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
- *            height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative length), QOR_ERR_OUT_OF_RANGE
- *            (dstOffset is negative or outside the plan's destination), QOR_ERR_UNSUPPORTED_MODE (a plan of
- *            another interpolation), QOR_ERR_BORDER (bits outside 0xF7), QOR_ERR_UNSUPPORTED_MODE (neither
- *            borderReplicate nor borderReadAll); then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst, pPlan or pBuffer is null),
+ *            QOR_WARN_NOTHING_TO_DO (width or height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative
+ *            length), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination),
+ *            QOR_ERR_UNSUPPORTED_MODE (a plan of another interpolation), QOR_ERR_BORDER (bits outside 0xF7),
+ *            QOR_ERR_UNSUPPORTED_MODE (neither borderReplicate nor borderReadAll); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeLinear_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
@@ -4264,7 +4264,11 @@ QORI_API QorResult QORI_CALL qoriResizeLinear_64f_C4R(const double* pSrc, int32_
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
  *  Notes     A source element that is not finite reaches every result whose 4 x 4 pixels hold it, whatever
  *            their weights.
- *  Returns   QOR_OK; in this order ; then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst, pPlan or pBuffer is null),
+ *            QOR_WARN_NOTHING_TO_DO (width or height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative
+ *            length), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination),
+ *            QOR_ERR_UNSUPPORTED_MODE (a plan of another interpolation), QOR_ERR_BORDER (bits outside 0xF7),
+ *            QOR_ERR_UNSUPPORTED_MODE (neither borderReplicate nor borderReadAll); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeCubic_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
@@ -4314,7 +4318,11 @@ QORI_API QorResult QORI_CALL qoriResizeCubic_32f_C4R(const float* pSrc, int32_t 
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
  *  Notes     A source element that is not finite reaches every result whose source pixels hold it, whatever
  *            their weights.
- *  Returns   QOR_OK; in this order ; then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst, pPlan or pBuffer is null),
+ *            QOR_WARN_NOTHING_TO_DO (width or height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative
+ *            length), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination),
+ *            QOR_ERR_UNSUPPORTED_MODE (a plan of another interpolation), QOR_ERR_BORDER (bits outside 0xF7),
+ *            QOR_ERR_UNSUPPORTED_MODE (neither borderReplicate nor borderReadAll); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeLanczos_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,
@@ -4366,7 +4374,11 @@ QORI_API QorResult QORI_CALL qoriResizeLanczos_32f_C4R(const float* pSrc, int32_
  *  Notes     A source element that is not finite reaches every result whose filter spans it, whatever its
  *            weight. Sums of more than 12 weights along an axis are carried in double precision: constants stay
  *            exact in integers and within 4 units in the last place in 32f, at any ratio.
- *  Returns   QOR_OK; in this order ; then nothing is written.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst, pPlan or pBuffer is null),
+ *            QOR_WARN_NOTHING_TO_DO (width or height is 0), QOR_ERR_CONTEXT (no plan), QOR_ERR_SIZE (a negative
+ *            length), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination),
+ *            QOR_ERR_UNSUPPORTED_MODE (a plan of another interpolation), QOR_ERR_BORDER (bits outside 0xF7),
+ *            QOR_ERR_UNSUPPORTED_MODE (neither borderReplicate nor borderReadAll); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriResizeAntialiasing_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, int32_t borderType, const uint8_t* pBorderValue,

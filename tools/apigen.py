@@ -18,11 +18,6 @@ from pathlib import Path
 
 ROOT = Path(__file__).resolve().parent.parent
 LAYOUT = re.compile(r"^(?P<src>AC4|AC1|[CP][1-4]|AP4)(?P<dst>C3C|C4C|AC4|A0C4|[CP][1-4]|AP4|C)?$")
-CHECK_TEXT = {
-    "null": "QOR_ERR_NULL_PTR (a pointer is null)",
-    "size": "QOR_ERR_SIZE (width or height below 1)",
-    "step": "QOR_ERR_STEP (a step below 1)",
-}
 DOC_FIELDS = [("shapes", "Shapes"), ("elements", "Elements"), ("units", "Units"), ("aliasing", "Aliasing"),
               ("notes", "Notes"), ("returns", "Returns"), ("example", "Example")]
 
@@ -177,6 +172,7 @@ def load(folder):
         if path.name == "forms.toml":
             continue
         data = tomllib.loads(path.read_text())
+        data["texts"] = forms["texts"] | data.get("texts", {})
         family = Family(path.stem, data.pop("title"), data.pop("namespace"))
         for keys in data.pop("group"):
             family.groups.append(expand_group(family, data | keys, forms))
@@ -197,8 +193,12 @@ def all_members(families):
 # --- header and reference pages -------------------------------------------------------------------------------------
 
 def checks_of(keys):
-    """The statuses of errors in their order, each with its cause."""
-    return [CHECK_TEXT.get(c, c) for c in keys.get("checks", [])]
+    """The statuses of errors in their order, each with its cause. A list and its entries may be names: of the family's
+    checklists, of its texts and of those of forms.toml."""
+    checks = keys.get("checks", [])
+    if isinstance(checks, str):
+        checks = keys["checklists"][checks]
+    return [keys["texts"].get(c, c) for c in checks]
 
 
 def documentation(group):
