@@ -11,6 +11,7 @@ namespace {
 struct RowSource {
     const uint8_t* row;
 
+    QORI_INLINE const uint8_t* bytes(ptrdiff_t offset) const { return row + offset; }
     QORI_INLINE Bytes at(ptrdiff_t offset) const { return load(row + offset); }
     QORI_INLINE Bytes upTo(ptrdiff_t offset, ptrdiff_t bytes) const { return loadUpTo(row + offset, bytes); }
 };
@@ -18,6 +19,8 @@ struct RowSource {
 struct PatternSource {
     const Pattern& pattern;
 
+    /// Below the period.
+    QORI_INLINE const uint8_t* bytes(ptrdiff_t offset) const { return pattern.bytes + offset; }
     QORI_INLINE Bytes at(ptrdiff_t offset) const { return load(pattern.bytes + offset % Pattern::period); }
     QORI_INLINE Bytes upTo(ptrdiff_t offset, ptrdiff_t) const { return at(offset); }
 };
@@ -40,10 +43,12 @@ QORI_INLINE void selectBytes(uint8_t* dst, Source source, ptrdiff_t pixels) {
     }
 }
 
-/// 32 pixels, one vector of mask. A mask without a hole or without a pixel skips the blend.
+/// 32 pixels, one vector of mask. A mask without a hole or without a pixel skips the blend. Vectors without a selected
+/// byte are not stored, and where what is selected comes in 4-byte words, nothing but selected words is.
 template <int pixelBytes, int selectedBytes>
 struct Masked {
     static constexpr bool wholePixel = selectedBytes == pixelBytes;
+    static constexpr bool inWords = pixelBytes % 4 == 0 && selectedBytes % 4 == 0;
 
     template <class Source>
     static QORI_INLINE void group(uint8_t* dst, Source source, ptrdiff_t offset, const uint8_t* mask) {
@@ -56,22 +61,40 @@ struct Masked {
         }
         alignas(32) uint8_t keptBytes[32];
         if constexpr (pixelBytes > 1) store(keptBytes, kept);
-        for (int k = 0; k < pixelBytes; ++k)
-            store(dst + 32 * k, blend(source.at(offset + 32 * k), load(dst + 32 * k), keep(keptBytes, kept, k)));
+        for (int k = 0; k < pixelBytes; ++k) {
+            const Bytes keeps = keep(keptBytes, kept, k);
+            if constexpr (inWords)
+                storeWords(dst + 32 * k, source.at(offset + 32 * k), isZero(keeps));
+            else if (topBits(keeps) != ~0u)
+                store(dst + 32 * k, blend(source.at(offset + 32 * k), load(dst + 32 * k), keeps));
+        }
     }
 
     /// The last pixels of a row, fewer than 32.
     template <class Source>
     static QORI_INLINE void tail(uint8_t* dst, Source source, ptrdiff_t offset, const uint8_t* mask, ptrdiff_t pixels) {
+        // Zeros behind the mask keep what is behind the row.
         const Bytes kept = isZero(loadPartial(mask, pixels));
         alignas(32) uint8_t keptBytes[32];
         if constexpr (pixelBytes > 1) store(keptBytes, kept);
         const ptrdiff_t bytes = pixels * pixelBytes;
         for (int k = 0; 32 * k < bytes; ++k) {
             const ptrdiff_t rest = bytes - 32 * k;
-            const Bytes old = loadUpTo(dst + 32 * k, rest);
-            storeUpTo(dst + 32 * k, blend(source.upTo(offset + 32 * k, rest), old, keep(keptBytes, kept, k)), rest);
+            const Bytes keeps = keep(keptBytes, kept, k);
+            if constexpr (inWords) {
+                storeWords(dst + 32 * k, source.upTo(offset + 32 * k, rest), isZero(keeps));
+            } else if (topBits(keeps) != ~0u) {
+                const Bytes old = loadUpTo(dst + 32 * k, rest);
+                storeUpTo(dst + 32 * k, blend(source.upTo(offset + 32 * k, rest), old, keeps), rest);
+            }
         }
+    }
+
+    /// So few pixels that looking at each is cheaper.
+    template <class Source>
+    static QORI_INLINE void eachPixel(uint8_t* dst, Source source, const uint8_t* mask, int pixels) {
+        for (int i = 0; i < pixels; ++i)
+            if (mask[i] != 0) __builtin_memcpy(dst + i * pixelBytes, source.bytes(i * pixelBytes), selectedBytes);
     }
 
     /// The kept bytes of the group's vector k.
@@ -93,6 +116,7 @@ struct Masked {
 template <int pixelBytes, int selectedBytes, class Source>
 QORI_INLINE void maskBytes(uint8_t* dst, Source source, const uint8_t* mask, ptrdiff_t pixels) {
     using Group = Masked<pixelBytes, selectedBytes>;
+    if (pixels <= 4) return Group::eachPixel(dst, source, mask, static_cast<int>(pixels));
     ptrdiff_t done = 0;
     for (; done <= pixels - 32; done += 32)
         Group::group(dst + done * pixelBytes, source, done * pixelBytes, mask + done);

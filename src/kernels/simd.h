@@ -223,6 +223,11 @@ QORI_INLINE void storeUpTo(T* p, Vec<T> a, ptrdiff_t n) {
         storePartial(p, a, n);
 }
 
+/// The 4-byte words of a whose mask has its top bit set; the others are neither written nor looked at.
+QORI_INLINE void storeWords(uint8_t* p, Bytes a, Bytes mask) {
+    _mm256_maskstore_epi32(reinterpret_cast<int*>(p), mask.v, a.v);
+}
+
 // --- bytes ----------------------------------------------------------------------------------------------------------
 
 /// Per byte: where the mask's top bit is set b, else a.
