@@ -68,6 +68,31 @@ QORI_INLINE void copyAligned(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) 
         if (bytes - done > rest - kVector) store(dst + bytes - rest, load(src + bytes - rest));
 }
 
+/// `bytes` from src by two moves of `size` bytes that overlap.
+template <int size>
+QORI_INLINE void copyEnds(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    const ptrdiff_t last = bytes - size;
+    if constexpr (size == 32) {
+        const Bytes a = load(src), b = load(src + last);
+        store(dst, a);
+        store(dst + last, b);
+    } else if constexpr (size == 16) {
+        storeHalves(dst, dst + last, loadHalves(src, src + last));
+    } else {
+        using Word = std::conditional_t<
+            size == 8, uint64_t,
+            std::conditional_t<size == 4, uint32_t, std::conditional_t<size == 2, uint16_t, uint8_t>>>;
+        const auto a = detail::loadWord<Word>(src), b = detail::loadWord<Word>(src + last);
+        detail::storeWord(dst, a);
+        detail::storeWord(dst + last, b);
+    }
+}
+
+template <int size>
+void copyRowsByEnds(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, int bytes, int rows) {
+    for (; rows > 0; --rows, dst += dstStep, src += srcStep) copyEnds<size>(dst, src, bytes);
+}
+
 /// Vectors of the pattern at a phase below 96.
 QORI_INLINE Bytes patternAt(const Pattern& pattern, ptrdiff_t offset) {
     return load(pattern.bytes + offset % Pattern::period);
@@ -101,6 +126,16 @@ QORI_INLINE void fillAligned(uint8_t* dst, const Pattern& pattern, ptrdiff_t byt
 
 void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<false>(dst, src, bytes); }
 void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<true>(dst, src, bytes); }
+
+void copyNarrowRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, int bytes, int rows) {
+    const auto copy = bytes >= 32   ? copyRowsByEnds<32>
+                      : bytes >= 16 ? copyRowsByEnds<16>
+                      : bytes >= 8  ? copyRowsByEnds<8>
+                      : bytes >= 4  ? copyRowsByEnds<4>
+                      : bytes >= 2  ? copyRowsByEnds<2>
+                                    : copyRowsByEnds<1>;
+    copy(dst, dstStep, src, srcStep, bytes, rows);
+}
 
 void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool streamStores) {
     constexpr ptrdiff_t block = 64;

@@ -11,6 +11,10 @@ void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
 /// Stores past the cache from the first 32-byte boundary of the destination on.
 void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
 
+/// Rows of 1 to kNarrowRow bytes, one after the other.
+inline constexpr int kNarrowRow = 64;
+void copyNarrowRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, int bytes, int rows);
+
 /// As copyRow, reading the source with non-temporal loads from its first 64-byte boundary on.
 void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool streamStores);
 
