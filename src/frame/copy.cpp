@@ -23,13 +23,15 @@ template <class T, int n>
 QorResult copyPixels(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     constexpr int pixel = n * elementBytes<T>;
-    const bool streaming = streams(streamRules::copy, traffic(roi, 2 * pixel));
+    const bool streaming = streams(streamRules::copy, wholeTraffic(roi, 2 * pixel));
     if (roi.width <= kernels::kNarrowRow / pixel && !isOneRun(roi, walk(src, n), walk(dst, n))) {
         kernels::copyNarrowRows(asBytes(dst.data), dst.step, asBytes(src.data), src.step, roi.width * pixel,
                                 roi.height);
         return QOR_OK;
     }
-    const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
+    const auto copy = streaming                 ? kernels::copyRowStreaming
+                      : usesStrings(roi, pixel) ? kernels::copyRowString
+                                                : kernels::copyRow;
     forEachRow(
         roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); }, walk(src, n),
         walk(dst, n));
@@ -103,7 +105,7 @@ QorResult copyChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T>
 QorResult dropAlpha(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    const bool streaming = streams(streamRules::copy, traffic(roi, 7 * elementBytes<T>));
+    const bool streaming = streams(streamRules::copy, wholeTraffic(roi, 7 * elementBytes<T>));
     forEachRow(
         roi,
         [&](ptrdiff_t pixels, const T* s, T* d) {
