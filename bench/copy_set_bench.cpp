@@ -9,6 +9,13 @@ namespace {
 template <class T>
 using Unary = QorResult(QORI_CALL*)(const T*, int32_t, T*, int32_t, QorImageSize);
 
+/// Columns in padded rows, where the cost of a row shows.
+std::vector<Size> withColumns() {
+    std::vector<Size> sizes = kSizes;
+    for (int width : {1, 3, 8}) sizes.push_back({width, 4096});
+    return sizes;
+}
+
 /// Copies between packed images; plain(src, dst, pixels) is the loop over one row.
 template <class T, class Plain>
 Row copyRow(std::string name, Unary<T> function, int from, int to, int bytesRead, int bytesWritten, Plain plain,
@@ -126,7 +133,7 @@ Row maskedRow(std::string name,
     // Source and destination are read, the destination is written.
     return {.operation = std::move(name),
             .bytesPerPixel = 3.0 * n * sizeof(T) + 1,
-            .sizes = kSizes,
+            .sizes = withColumns(),
             .make = make,
             .bestAtL2 = bestAtL2,
             .bestAtFrame = bestAtFrame};
@@ -169,11 +176,19 @@ std::vector<Size> withSmall() {
     return sizes;
 }
 
+/// Packed 8u C1 from 256 KiB to 256 MiB in steps of two: from the second-level cache to where stores stream.
+std::vector<Size> ladder() {
+    std::vector<Size> sizes = kContiguous;
+    for (int width = 512, height = 512; height <= 8192; height < width ? height *= 2 : width *= 2)
+        if (width != 2048 || height != 2048) sizes.push_back({width, height});
+    return sizes;
+}
+
 const Rows rows{{
     copyRow<uint8_t>("copy 8u C1", qoriCopy_8u_C1R, 1, 1, 1, 1, plainCopy<1, uint8_t>, withSmall(), 52'604, 15'345),
     copyRow<uint8_t>("copy 8u C3", qoriCopy_8u_C3R, 3, 3, 3, 3, plainCopy<3, uint8_t>, withSmall(), 14'798, 4'770),
-    copyRow<uint8_t>("copy 8u C4", qoriCopy_8u_C4R, 4, 4, 4, 4, plainCopy<4, uint8_t>, kSizes, 7'484, 3'516),
-    copyRow<uint8_t>("copy packed 8u C1", qoriCopy_8u_C1R, 1, 1, 1, 1, plainCopy<1, uint8_t>, kContiguous, 0, 0, true),
+    copyRow<uint8_t>("copy 8u C4", qoriCopy_8u_C4R, 4, 4, 4, 4, plainCopy<4, uint8_t>, withColumns(), 7'484, 3'516),
+    copyRow<uint8_t>("copy packed 8u C1", qoriCopy_8u_C1R, 1, 1, 1, 1, plainCopy<1, uint8_t>, ladder(), 0, 0, true),
     copyRow<float>("copy 32f C3", qoriCopy_32f_C3R, 3, 3, 12, 12, plainCopy<3, float>),
     copyRow<uint8_t>("copy 8u AC4", qoriCopy_8u_AC4R, 4, 4, 4, 8, plainChannels<4, 4, 3, uint8_t>, withSmall()),
     copyRow<float>("copy 32f AC4", qoriCopy_32f_AC4R, 4, 4, 16, 32, plainChannels<4, 4, 3, float>),
@@ -202,7 +217,7 @@ const Rows rows{{
     mergeRow<float, 4>("merge 32f P4C4", qoriCopy_32f_P4C4R),
     fillRow<uint8_t, 1>("set 8u C1", qoriSet_8u_C1R, withSmall(), 58'424, 26'894),
     fillRow<uint8_t, 3>("set 8u C3", qoriSet_8u_C3R, withSmall(), 19'138, 8'463),
-    fillRow<uint8_t, 1>("set packed 8u C1", qoriSet_8u_C1R, kContiguous, 0, 0, true),
+    fillRow<uint8_t, 1>("set packed 8u C1", qoriSet_8u_C1R, ladder(), 0, 0, true),
     fillRow<float, 3>("set 32f C3", qoriSet_32f_C3R),
     fillRow<float, 4>("set 32f C4", qoriSet_32f_C4R),
 }};

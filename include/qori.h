@@ -16,8 +16,8 @@
  * Results. Functions return a status: 0 done, negative an error (nothing was written), positive a warning. Arguments
  * are checked in one order: pointers, sizes, steps, then the operation's own parameters; the first fault returns.
  *
- * Memory. No function reads or writes a byte outside the pixels of the ROI. Within a pixel that it writes, a function
- * that keeps a channel may rewrite it with its own value.
+ * Memory. No function reads or writes a byte outside the pixels of the ROI. Functions that keep channels or pixels may
+ * rewrite those beside what they write with their own values; their first lines say so.
  *
  * Threads. The library has no state and starts no threads: any call may run beside any other, on distinct destinations.
  * The caller's floating-point control (rounding, flushing of subnormals, exceptions that trap) changes no result, and it
@@ -1943,11 +1943,12 @@ QORI_API QorResult QORI_CALL qoriCopy_32f_C3R(const float* pSrc, int32_t srcStep
 QORI_API QorResult QORI_CALL qoriCopy_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
-/** Copies channels 0 to 2 of four-channel pixels; the destination keeps its channel 3.
+/** Copies channels 0 to 2 of four-channel pixels; the destination keeps its channel 3. Another thread must not
+ *  write it meanwhile: it may be rewritten with its own value.
  *  Units     Steps in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
  *            overlap.
- *  Notes     Channel 3 may be rewritten with its own value: do not let another thread write it during the call.
+ *  Notes     Elements are moved bit for bit: NaN payloads and signed zeros survive.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -1962,13 +1963,15 @@ QORI_API QorResult QORI_CALL qoriCopy_32s_AC4R(const int32_t* pSrc, int32_t srcS
 QORI_API QorResult QORI_CALL qoriCopy_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
-/** Copies the pixels whose mask element is not zero; all others keep their value.
+/** Copies the pixels whose mask element is not zero; all others keep their value. Other threads must not write
+ *  them meanwhile: kept elements less than 32 bytes from a copied one may be rewritten with their own value.
  *  Shapes    The mask has one 8u element per pixel. AC4 copies channels 0 to 2.
  *  Units     Steps in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  Source and destination may be the same image (same pointer and step); otherwise they must not
  *            overlap.
- *  Notes     Kept elements may be rewritten with their own value: do not let another thread write them during
- *            the call.
+ *  Notes     The rewriting concerns 8u and 16-bit C1, C3 and AC4. In C4 forms and those of 32-bit elements
+ *            nothing is written but selected pixels: there, threads may work on one image through masks that
+ *            exclude each other.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -2044,11 +2047,11 @@ QORI_API QorResult QORI_CALL qoriCopy_32f_C4C1R(const float* pSrc, int32_t srcSt
     QorImageSize roiSize);
 
 /** Copies a single-channel image into one channel of a packed image; its other channels keep their values.
+ *  Other threads must not write those meanwhile: they may be rewritten with their own values.
  *  Shapes    pDst points at the chosen channel's element of the first pixel.
  *  Units     Steps in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  The images must not overlap.
- *  Notes     The other channels may be rewritten with their own values: do not let another thread write them
- *            during the call.
+ *  Notes     Elements are moved bit for bit: NaN payloads and signed zeros survive.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -2073,12 +2076,12 @@ QORI_API QorResult QORI_CALL qoriCopy_32f_C1C3R(const float* pSrc, int32_t srcSt
 QORI_API QorResult QORI_CALL qoriCopy_32f_C1C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
-/** Copies one channel between packed images; the destination's other channels keep their values.
+/** Copies one channel between packed images; the destination's other channels keep their values. Other threads
+ *  must not write those meanwhile: they may be rewritten with their own values.
  *  Shapes    Both pointers point at an element of the first pixel; the channels may differ.
  *  Units     Steps in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  The images may be the same only with the same pointer; otherwise they must not overlap.
- *  Notes     The other channels may be rewritten with their own values: do not let another thread write them
- *            during the call.
+ *  Notes     Elements are moved bit for bit: NaN payloads and signed zeros survive.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -2121,10 +2124,11 @@ QORI_API QorResult QORI_CALL qoriCopy_32s_AC4C3R(const int32_t* pSrc, int32_t sr
 QORI_API QorResult QORI_CALL qoriCopy_32f_AC4C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
-/** Copies three-channel pixels into channels 0 to 2 of four-channel pixels; channel 3 keeps its value.
+/** Copies three-channel pixels into channels 0 to 2 of four-channel pixels; channel 3 keeps its value. Another
+ *  thread must not write it meanwhile: it may be rewritten with its own value.
  *  Units     Steps in bytes, any value including zero and negative ones, not checked; roiSize in pixels.
  *  Aliasing  The images must not overlap.
- *  Notes     Channel 3 may be rewritten with its own value: do not let another thread write it during the call.
+ *  Notes     Elements are moved bit for bit: NaN payloads and signed zeros survive.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -4561,9 +4565,9 @@ QORI_API QorResult QORI_CALL qoriSet_32f_C1R(float value, float* pDst, int32_t d
 QORI_API QorResult QORI_CALL qoriSet_32f_C3R(const float value[3], float* pDst, int32_t dstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriSet_32f_C4R(const float value[4], float* pDst, int32_t dstStep, QorImageSize roiSize);
 
-/** Fills channels 0 to 2 of four-channel pixels with constants; channel 3 keeps its value.
+/** Fills channels 0 to 2 of four-channel pixels with constants; channel 3 keeps its value. Another thread must
+ *  not write it meanwhile: it may be rewritten with its own value.
  *  Units     dstStep in bytes, any value, not checked; roiSize in pixels. Values are stored bit for bit.
- *  Notes     Channel 3 may be rewritten with its own value: do not let another thread write it during the call.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -4577,11 +4581,13 @@ QORI_API QorResult QORI_CALL qoriSet_32s_AC4R(const int32_t value[3], int32_t* p
     QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriSet_32f_AC4R(const float value[3], float* pDst, int32_t dstStep, QorImageSize roiSize);
 
-/** Fills the pixels whose mask element is not zero; all others keep their value.
+/** Fills the pixels whose mask element is not zero; all others keep their value. Other threads must not write
+ *  them meanwhile: kept elements less than 32 bytes from a filled one may be rewritten with their own value.
  *  Shapes    The mask has one 8u element per pixel. AC4 takes three values and fills channels 0 to 2.
  *  Units     dstStep in bytes, any value, not checked; roiSize in pixels. Values are stored bit for bit.
- *  Notes     Kept elements may be rewritten with their own value: do not let another thread write them during
- *            the call.
+ *  Notes     The rewriting concerns 8u and 16-bit C1, C3 and AC4. In C4 forms and those of 32-bit elements
+ *            nothing is written but selected pixels: there, threads may work on one image through masks that
+ *            exclude each other.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */
@@ -4626,11 +4632,10 @@ QORI_API QorResult QORI_CALL qoriSet_32f_C4MR(const float value[4], float* pDst,
 QORI_API QorResult QORI_CALL qoriSet_32f_AC4MR(const float value[3], float* pDst, int32_t dstStep, QorImageSize roiSize,
     const uint8_t* pMask, int32_t maskStep);
 
-/** Fills one channel of a packed image; the other channels keep their values.
+/** Fills one channel of a packed image; the other channels keep their values. Other threads must not write
+ *  those meanwhile: they may be rewritten with their own values.
  *  Shapes    pDst points at the chosen channel's element of the first pixel.
  *  Units     dstStep in bytes, any value, not checked; roiSize in pixels. Values are stored bit for bit.
- *  Notes     The other channels may be rewritten with their own values: do not let another thread write them
- *            during the call.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  */

@@ -22,11 +22,19 @@ bool streamsChannels(QorImageSize roi, int channelsRead, int channelsWritten) {
 template <class T, int n>
 QorResult copyPixels(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    const bool streaming = streams(streamRules::copy, traffic(roi, 2 * n * elementBytes<T>));
-    const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
+    constexpr int pixel = n * elementBytes<T>;
+    const bool streaming = streams(streamRules::copy, wholeTraffic(roi, 2 * pixel));
+    if (roi.width <= kernels::kNarrowRow / pixel && !isOneRun(roi, walk(src, n), walk(dst, n))) {
+        kernels::copyNarrowRows(asBytes(dst.data), dst.step, asBytes(src.data), src.step, roi.width * pixel,
+                                roi.height);
+        return QOR_OK;
+    }
+    const auto copy = streaming                 ? kernels::copyRowStreaming
+                      : usesStrings(roi, pixel) ? kernels::copyRowString
+                                                : kernels::copyRow;
     forEachRow(
-        roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * n * elementBytes<T>); },
-        walk(src, n), walk(dst, n));
+        roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); }, walk(src, n),
+        walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
 }
@@ -97,7 +105,7 @@ QorResult copyChannel(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T>
 QorResult dropAlpha(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
-    const bool streaming = streams(streamRules::copy, traffic(roi, 7 * elementBytes<T>));
+    const bool streaming = streams(streamRules::copy, wholeTraffic(roi, 7 * elementBytes<T>));
     forEachRow(
         roi,
         [&](ptrdiff_t pixels, const T* s, T* d) {

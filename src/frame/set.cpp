@@ -12,11 +12,14 @@ template <class T, int n>
 QorResult setPixels(const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(value, dst), sizeCheck(roi))) return r;
     constexpr StreamRule rule = sizeof(T) == 4 ? streamRules::widening : streamRules::constantFill;
-    const bool streaming = streams(rule, traffic(roi, n * elementBytes<T>));
-    const auto fill = streaming ? kernels::fillRowStreaming : kernels::fillRow;
+    constexpr int pixel = n * elementBytes<T>;
+    const bool streaming = streams(rule, traffic(roi, pixel));
     const kernels::Pattern pattern = kernels::patternOf<n>(value);
+    const auto fill = streaming                                                   ? kernels::fillRowStreaming
+                      : usesStrings(roi, pixel) && kernels::repeatsWords(pattern) ? kernels::fillRowString
+                                                                                  : kernels::fillRow;
     forEachRow(
-        roi, [&](ptrdiff_t pixels, T* d) { fill(asBytes(d), pattern, pixels * n * elementBytes<T>); }, walk(dst, n));
+        roi, [&](ptrdiff_t pixels, T* d) { fill(asBytes(d), pattern, pixels * pixel); }, walk(dst, n));
     if (streaming) streamFence();
     return QOR_OK;
 }

@@ -5,6 +5,13 @@
 
 namespace qori {
 
+bool hasFastStrings() {
+    constexpr unsigned wideState = 0xE0;
+    unsigned low = 0, high = 0;
+    __asm__ volatile("xgetbv" : "=a"(low), "=d"(high) : "c"(0));
+    return (low & wideState) == wideState;
+}
+
 bool streams(StreamRule rule, int32_t trafficBytes) {
     if (trafficBytes <= rule.queryAbove) return false;
     int32_t cache = 0;

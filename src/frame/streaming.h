@@ -35,7 +35,24 @@ constexpr int32_t traffic(QorImageSize roi, int bytesPerPixel) {
                                 static_cast<uint32_t>(roi.height));
 }
 
+/// The same count where it does not wrap: copies that are too large to count stream as other large ones do.
+constexpr int32_t wholeTraffic(QorImageSize roi, int bytesPerPixel) {
+    return int64_t{roi.width} * roi.height > INT32_MAX / bytesPerPixel ? INT32_MAX : traffic(roi, bytesPerPixel);
+}
+
 /// Asks the companion for the cache size on every call above the rule's bound; false when it cannot tell.
 bool streams(StreamRule rule, int32_t trafficBytes);
+
+/// Whether the processor moves long rows fast by its string instructions. The state that the operating system enables
+/// tells in some ten cycles what cpuid tells in microseconds where a hypervisor catches it, and nothing needs to be
+/// kept from earlier calls: whatever has 512-bit registers (state bits 5 to 7) has enhanced string moves.
+bool hasFastStrings();
+
+/// Whether a call that does not stream moves or fills long rows by string instructions: from half a megabyte written
+/// on, as vectors are as fast in the second-level cache.
+inline bool usesStrings(QorImageSize roi, int pixelBytes) {
+    constexpr int smallest = 524'288;
+    return int64_t{roi.width} * roi.height >= smallest / pixelBytes && hasFastStrings();
+}
 
 }  // namespace qori

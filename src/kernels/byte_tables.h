@@ -69,10 +69,10 @@ constexpr ByteTable interleaveWords() {
     return table;
 }
 
-/// Where vector k of a row with pixels of `pixelBytes` finds the mask of each of its bytes: a 16-byte window of the
-/// mask of 32 pixels and an index into it.
-struct Window {
-    int begin;
+/// Where vector k of a row with pixels of `pixelBytes` finds the mask of each of its bytes: four words of the mask of
+/// 32 pixels, for both halves, and an index into their bytes.
+struct alignas(32) Window {
+    int32_t words[8];
     ByteTable index;
 };
 
@@ -81,10 +81,9 @@ constexpr auto maskWindows() {
     std::array<Window, pixelBytes> all{};
     for (int k = 0; k < pixelBytes; ++k) {
         Window& window = all[static_cast<size_t>(k)];
-        const int first = 32 * k / pixelBytes;
-        window.begin = first > 16 ? 16 : first;
-        for (int i = 0; i < 32; ++i)
-            window.index.at[i] = static_cast<uint8_t>((32 * k + i) / pixelBytes - window.begin);
+        const int first = 32 * k / pixelBytes / 4, begin = first > 4 ? 4 : first;
+        for (int i = 0; i < 8; ++i) window.words[i] = begin + i % 4;
+        for (int i = 0; i < 32; ++i) window.index.at[i] = static_cast<uint8_t>((32 * k + i) / pixelBytes - 4 * begin);
     }
     return all;
 }

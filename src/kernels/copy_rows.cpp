@@ -4,7 +4,8 @@
 namespace qori::kernels {
 namespace {
 
-constexpr ptrdiff_t kVector = 32;
+constexpr ptrdiff_t kVector = 32, kLine = 64;
+constexpr ptrdiff_t kStringRow = 8192;  // in rows of 2 to 6 KiB string moves gain nothing and fills lose up to 40 %
 
 /// Bytes from p to the next multiple of `boundary`, a power of two.
 QORI_INLINE ptrdiff_t toBoundary(const void* p, uintptr_t boundary) {
@@ -68,6 +69,31 @@ QORI_INLINE void copyAligned(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) 
         if (bytes - done > rest - kVector) store(dst + bytes - rest, load(src + bytes - rest));
 }
 
+/// `bytes` from src by two moves of `size` bytes that overlap.
+template <int size>
+QORI_INLINE void copyEnds(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    const ptrdiff_t last = bytes - size;
+    if constexpr (size == 32) {
+        const Bytes a = load(src), b = load(src + last);
+        store(dst, a);
+        store(dst + last, b);
+    } else if constexpr (size == 16) {
+        storeHalves(dst, dst + last, loadHalves(src, src + last));
+    } else {
+        using Word = std::conditional_t<
+            size == 8, uint64_t,
+            std::conditional_t<size == 4, uint32_t, std::conditional_t<size == 2, uint16_t, uint8_t>>>;
+        const auto a = detail::loadWord<Word>(src), b = detail::loadWord<Word>(src + last);
+        detail::storeWord(dst, a);
+        detail::storeWord(dst + last, b);
+    }
+}
+
+template <int size>
+void copyRowsByEnds(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, int bytes, int rows) {
+    for (; rows > 0; --rows, dst += dstStep, src += srcStep) copyEnds<size>(dst, src, bytes);
+}
+
 /// Vectors of the pattern at a phase below 96.
 QORI_INLINE Bytes patternAt(const Pattern& pattern, ptrdiff_t offset) {
     return load(pattern.bytes + offset % Pattern::period);
@@ -102,6 +128,27 @@ QORI_INLINE void fillAligned(uint8_t* dst, const Pattern& pattern, ptrdiff_t byt
 void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<false>(dst, src, bytes); }
 void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<true>(dst, src, bytes); }
 
+void copyRowString(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    // A string move onto its own source goes byte by byte.
+    if (dst == src || bytes < kStringRow) return copyRow(dst, src, bytes);
+    const ptrdiff_t head = toBoundary(dst, kLine);
+    copyShort(dst, src, head);
+    dst += head;
+    src += head;
+    bytes -= head;
+    __asm__ volatile("rep movsb" : "+D"(dst), "+S"(src), "+c"(bytes) : : "memory");
+}
+
+void copyNarrowRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, int bytes, int rows) {
+    const auto copy = bytes >= 32   ? copyRowsByEnds<32>
+                      : bytes >= 16 ? copyRowsByEnds<16>
+                      : bytes >= 8  ? copyRowsByEnds<8>
+                      : bytes >= 4  ? copyRowsByEnds<4>
+                      : bytes >= 2  ? copyRowsByEnds<2>
+                                    : copyRowsByEnds<1>;
+    copy(dst, dstStep, src, srcStep, bytes, rows);
+}
+
 void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool streamStores) {
     constexpr ptrdiff_t block = 64;
     const ptrdiff_t head = toBoundary(src, block);
@@ -125,5 +172,18 @@ void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool s
 
 void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) { fillAligned<false>(dst, pattern, bytes); }
 void fillRowStreaming(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) { fillAligned<true>(dst, pattern, bytes); }
+
+bool repeatsWords(const Pattern& pattern) { return isSame(pattern.bytes, pattern.bytes + 4); }
+
+void fillRowString(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
+    if (bytes < kStringRow) return fillRow(dst, pattern, bytes);
+    fillRow(dst, pattern, kLine);
+    store(dst + bytes - kVector, patternAt(pattern, bytes - kVector));
+    const ptrdiff_t head = toBoundary(dst, kLine);
+    const auto word = detail::loadWord<uint32_t>(pattern.bytes + head % 4);
+    uint8_t* begin = dst + head;
+    ptrdiff_t words = (bytes - head) / 4;
+    __asm__ volatile("rep stosl" : "+D"(begin), "+c"(words) : "a"(word) : "memory");
+}
 
 }  // namespace qori::kernels

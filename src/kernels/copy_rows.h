@@ -11,6 +11,14 @@ void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
 /// Stores past the cache from the first 32-byte boundary of the destination on.
 void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
 
+/// Rows of 8 KiB and more by the processor's string move, which need not fetch a cache line that it overwrites whole:
+/// for images that do not stay in the second-level cache, on processors with fast strings.
+void copyRowString(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
+
+/// Rows of 1 to kNarrowRow bytes, one after the other.
+inline constexpr int kNarrowRow = 64;
+void copyNarrowRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, int bytes, int rows);
+
 /// As copyRow, reading the source with non-temporal loads from its first 64-byte boundary on.
 void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool streamStores);
 
@@ -43,5 +51,9 @@ Pattern patternOf(const T* pixel) {
 
 void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes);
 void fillRowStreaming(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes);
+
+/// As copyRowString, for patterns that repeat every four bytes.
+bool repeatsWords(const Pattern& pattern);
+void fillRowString(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes);
 
 }  // namespace qori::kernels

@@ -2,6 +2,9 @@
 // Element-wise row kernels: one loop for every operation, type and layout. A block is as many elements as one vector of
 // the smallest element type holds, so that each image contributes whole vectors to it.
 //
+// Rows that do not fill a block are gathered into blocks, many at a time: an operation costs the same for one element
+// as for all of a vector.
+//
 // An operation is a callable: Pack<D, n> op(int phase, Pack<S, n>... sources), where phase runs 0, 1, 2, 0, ... over
 // the blocks of a row: with 1, 3 or 4 channels, constants per channel repeat after three blocks. It may keep state (a
 // warning seen) and may offer
@@ -10,7 +13,10 @@
 //     static constexpr bool mayStream = true                               to be compiled with streaming stores too.
 #pragma once
 #include <algorithm>
+#include <cstdlib>
+#include <utility>
 
+#include "copy_rows.h"
 #include "frame/driver.h"
 #include "simd.h"
 
@@ -125,9 +131,51 @@ QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, co
     detail::mapBlocks<keepAlpha, false, n>(op, elements, dst, src...);
 }
 
+namespace detail {
+
+/// Whether rows are gathered: several, shorter than a block, and apart from each other in every image, so that a row
+/// that is read ahead of the one before it being written is the same row.
+template <class... T>
+bool gathersRows(QorImageSize roi, int channels, Image<T>... images) {
+    constexpr int least = 4;
+    const int64_t elements = int64_t{roi.width} * channels;
+    if (elements >= blockOf<T...> || roi.height < least) return false;
+    return ((elements * elementBytes<T> <= kNarrowRow &&
+             std::abs(int64_t{images.step}) >= elements * elementBytes<T>)&&...);
+}
+
+/// mapRow over rows of fewer elements than a block, with buffers of 12 blocks for each image.
+template <bool keepAlpha, class Op, class D, class... S>
+QORI_NOINLINE void mapGathered(Op& op, int elements, int32_t rows, Image<D> dst, Image<const S>... src) {
+    constexpr int n = blockOf<D, S...>, room = 12 * n;
+    alignas(32) D result[room];
+    alignas(32) uint8_t sources[sizeof...(S) + 1][room * std::max({sizeof(D), sizeof(S)...})];
+    const auto gather = [=](auto* to, auto from, int32_t y, int count) {
+        const int bytes = elements * static_cast<int>(sizeof(*from.data));
+        copyNarrowRows(asBytes(to), bytes, asBytes(from.row(y)), from.step, bytes, count);
+    };
+    const int most = room / elements;
+    for (int32_t y = 0, count; y < rows; y += count) {
+        count = std::min(most, rows - y);
+        if constexpr (keepAlpha) gather(result, dst, y, count);
+        [&]<size_t... i>(std::index_sequence<i...>) {
+            (gather(sources[i], src, y, count), ...);
+            mapRow<keepAlpha>(op, ptrdiff_t{elements} * count, false, result,
+                              reinterpret_cast<const S*>(sources[i])...);
+        }
+        (std::index_sequence_for<S...>{});
+        const int bytes = elements * elementBytes<D>;
+        copyNarrowRows(asBytes(dst.row(y)), dst.step, asBytes(result), bytes, bytes, count);
+    }
+}
+
+}  // namespace detail
+
 /// mapRow over a region of `channels` interleaved channels.
 template <bool keepAlpha = false, class Op, class D, class... S>
 void mapImage(QorImageSize roi, int channels, Op&& op, bool streaming, Image<D> dst, Image<const S>... src) {
+    if (detail::gathersRows(roi, channels, dst, src...) && !isOneRun(roi, walk(dst, channels), walk(src, channels)...))
+        return detail::mapGathered<keepAlpha>(op, roi.width * channels, roi.height, dst, src...);
     forEachRow(
         roi,
         [&](ptrdiff_t pixels, D* d, const S*... s) { mapRow<keepAlpha>(op, pixels * channels, streaming, d, s...); },

@@ -11,6 +11,7 @@ namespace {
 struct RowSource {
     const uint8_t* row;
 
+    QORI_INLINE const uint8_t* bytes() const { return row; }
     QORI_INLINE Bytes at(ptrdiff_t offset) const { return load(row + offset); }
     QORI_INLINE Bytes upTo(ptrdiff_t offset, ptrdiff_t bytes) const { return loadUpTo(row + offset, bytes); }
 };
@@ -18,6 +19,7 @@ struct RowSource {
 struct PatternSource {
     const Pattern& pattern;
 
+    QORI_INLINE const uint8_t* bytes() const { return pattern.bytes; }
     QORI_INLINE Bytes at(ptrdiff_t offset) const { return load(pattern.bytes + offset % Pattern::period); }
     QORI_INLINE Bytes upTo(ptrdiff_t offset, ptrdiff_t) const { return at(offset); }
 };
@@ -40,10 +42,12 @@ QORI_INLINE void selectBytes(uint8_t* dst, Source source, ptrdiff_t pixels) {
     }
 }
 
-/// 32 pixels, one vector of mask. A mask without a hole or without a pixel skips the blend.
+/// 32 pixels, one vector of mask. A mask without a hole or without a pixel skips the blend. Vectors without a selected
+/// byte are not stored, and where what is selected comes in 4-byte words, nothing but selected words is.
 template <int pixelBytes, int selectedBytes>
 struct Masked {
     static constexpr bool wholePixel = selectedBytes == pixelBytes;
+    static constexpr bool inWords = pixelBytes % 4 == 0 && selectedBytes % 4 == 0;
 
     template <class Source>
     static QORI_INLINE void group(uint8_t* dst, Source source, ptrdiff_t offset, const uint8_t* mask) {
@@ -54,45 +58,79 @@ struct Masked {
             for (int k = 0; k < pixelBytes; ++k) store(dst + 32 * k, source.at(offset + 32 * k));
             return;
         }
-        alignas(32) uint8_t keptBytes[32];
-        if constexpr (pixelBytes > 1) store(keptBytes, kept);
-        for (int k = 0; k < pixelBytes; ++k)
-            store(dst + 32 * k, blend(source.at(offset + 32 * k), load(dst + 32 * k), keep(keptBytes, kept, k)));
+        for (int k = 0; k < pixelBytes; ++k) {
+            if constexpr (inWords) {
+                storeWords(dst + 32 * k, source.at(offset + 32 * k), selectedWords(isZero(kept), k));
+            } else {
+                const Bytes bytes = keptBytes(kept, k);
+                if (pixelBytes > 1 && topBits(bytes) == ~0u) continue;
+                store(dst + 32 * k, blend(source.at(offset + 32 * k), load(dst + 32 * k), bytes));
+            }
+        }
     }
 
     /// The last pixels of a row, fewer than 32.
     template <class Source>
     static QORI_INLINE void tail(uint8_t* dst, Source source, ptrdiff_t offset, const uint8_t* mask, ptrdiff_t pixels) {
         const Bytes kept = isZero(loadPartial(mask, pixels));
-        alignas(32) uint8_t keptBytes[32];
-        if constexpr (pixelBytes > 1) store(keptBytes, kept);
-        const ptrdiff_t bytes = pixels * pixelBytes;
-        for (int k = 0; 32 * k < bytes; ++k) {
-            const ptrdiff_t rest = bytes - 32 * k;
-            const Bytes old = loadUpTo(dst + 32 * k, rest);
-            storeUpTo(dst + 32 * k, blend(source.upTo(offset + 32 * k, rest), old, keep(keptBytes, kept, k)), rest);
+        if (topBits(kept) == ~0u) return;
+        const ptrdiff_t count = pixels * pixelBytes;
+        if (count <= 32) return storeRest(dst, dst, source, offset, kept, 0, count);
+        for (int k = 0; 32 * k < count; ++k) {
+            uint8_t* const at = dst + 32 * k;
+            // Whether a few pixels hold a selected one is hard to predict: the store is led elsewhere, not jumped.
+            uint8_t nowhere[32];
+            uint8_t* const to = inWords || topBits(keptBytes(kept, k)) != ~0u ? at : nowhere;
+            storeRest(to, at, source, offset + 32 * k, kept, k, count - 32 * k);
         }
     }
 
-    /// The kept bytes of the group's vector k.
-    static QORI_INLINE Bytes keep(const uint8_t* keptBytes, Bytes kept, int k) {
-        if constexpr (pixelBytes == 1) return kept;
-        static constexpr auto spread = maskWindows<pixelBytes>();
-        const Window& window = spread[static_cast<size_t>(k)];
-        const Bytes expanded = shuffleHalves(loadTwice(keptBytes + window.begin), load(window.index.at));
-        if constexpr (wholePixel) return expanded;
+    /// Up to `rest` bytes of the group's vector k, which lies at dst.
+    template <class Source>
+    static QORI_INLINE void storeRest(uint8_t* to, const uint8_t* dst, Source source, ptrdiff_t offset, Bytes kept,
+                                      int k, ptrdiff_t rest) {
+        const Bytes value = source.upTo(offset, rest);
+        if constexpr (inWords)
+            storeWords(to, value, selectedWords(isZero(kept), k));  // none behind the row
+        else
+            storeUpTo(to, blend(value, loadUpTo(dst, rest), keptBytes(kept, k)), rest);
+    }
+
+    template <class Source>
+    static QORI_INLINE void onePixel(uint8_t* dst, Source source, const uint8_t* mask) {
+        if (*mask != 0) __builtin_memcpy(dst, source.bytes(), selectedBytes);
+    }
+
+    /// The flags of the group's pixels at each byte of its vector k.
+    static QORI_INLINE Bytes spread(Bytes flags, int k) {
+        if constexpr (pixelBytes == 1) return flags;
+        static constexpr auto windows = maskWindows<pixelBytes>();
+        const Window& window = windows[static_cast<size_t>(k)];
+        const __m256i words = _mm256_load_si256(reinterpret_cast<const __m256i*>(window.words));
+        return shuffleHalves({_mm256_permutevar8x32_epi32(flags.v, words)}, load(window.index.at));
+    }
+
+    static QORI_INLINE Bytes selectedWords(Bytes selected, int k) {
+        if constexpr (wholePixel) return spread(selected, k);
+        alignas(32) static constexpr auto colour = selectWithinPixel<pixelBytes>(selectedBytes);
+        return spread(selected, k) & load(colour.data());
+    }
+
+    static QORI_INLINE Bytes keptBytes(Bytes kept, int k) {
+        if constexpr (wholePixel) return spread(kept, k);
         alignas(32) static constexpr auto alpha = [] {
             auto select = selectWithinPixel<pixelBytes>(selectedBytes);
             for (uint8_t& byte : select) byte = static_cast<uint8_t>(~byte);
             return select;
         }();
-        return expanded | load(alpha.data());
+        return spread(kept, k) | load(alpha.data());
     }
 };
 
 template <int pixelBytes, int selectedBytes, class Source>
 QORI_INLINE void maskBytes(uint8_t* dst, Source source, const uint8_t* mask, ptrdiff_t pixels) {
     using Group = Masked<pixelBytes, selectedBytes>;
+    if (pixels == 1) return Group::onePixel(dst, source, mask);
     ptrdiff_t done = 0;
     for (; done <= pixels - 32; done += 32)
         Group::group(dst + done * pixelBytes, source, done * pixelBytes, mask + done);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Rows of which only selected bytes are replaced, by another row's bytes or by a constant pixel: alpha kept, one
-// channel of interest, masks. Kept bytes inside a written vector are rewritten with their own value.
+// channel of interest, masks. Kept bytes inside a written vector are rewritten with their own value; masked rows leave
+// vectors without a selected byte alone, and pixels whose selected bytes are 4-byte words to the word.
 #pragma once
 #include "copy_rows.h"
 

@@ -162,11 +162,23 @@ QORI_INLINE void storeBelow16(uint8_t* p, __m128i a, int n) {
     if (n & 1) p[n & 2] = static_cast<uint8_t>(n & 2 ? rest >> 16 : rest);
 }
 
+/// Selects the first n of eight 4-byte words. Masked moves neither touch nor fault on the others.
+QORI_INLINE __m256i firstWords(ptrdiff_t n) {
+    return _mm256_cmpgt_epi32(_mm256_set1_epi32(static_cast<int32_t>(n)), _mm256_setr_epi32(0, 1, 2, 3, 4, 5, 6, 7));
+}
+
+/// 4-byte words of one element, where masked moves can carry it.
+template <class T>
+constexpr int wordsOf = static_cast<int>(sizeof(T) / 4);
+
 }  // namespace detail
 
 /// The first n elements at p (0 <= n < lanes), zeros behind them.
 template <class T>
 QORI_INLINE Vec<T> loadPartial(const T* p, ptrdiff_t n) {
+    if constexpr (detail::wordsOf < T >> 0)
+        return fromInteger<T>(
+            _mm256_maskload_epi32(reinterpret_cast<const int*>(p), detail::firstWords(n * detail::wordsOf<T>)));
     const auto* bytes = reinterpret_cast<const uint8_t*>(p);
     const int count = static_cast<int>(n) * static_cast<int>(sizeof(T));
     if (count >= 16) {
@@ -181,6 +193,9 @@ QORI_INLINE Vec<T> loadPartial(const T* p, ptrdiff_t n) {
 /// Stores the first n elements (0 <= n < lanes).
 template <class T>
 QORI_INLINE void storePartial(T* p, Vec<T> a, ptrdiff_t n) {
+    if constexpr (detail::wordsOf < T >> 0)
+        return _mm256_maskstore_epi32(reinterpret_cast<int*>(p), detail::firstWords(n * detail::wordsOf<T>),
+                                      toInteger(a.v));
     auto* bytes = reinterpret_cast<uint8_t*>(p);
     int count = static_cast<int>(n) * static_cast<int>(sizeof(T));
     __m128i half = _mm256_castsi256_si128(toInteger(a.v));
@@ -206,6 +221,11 @@ QORI_INLINE void storeUpTo(T* p, Vec<T> a, ptrdiff_t n) {
         store(p, a);
     else if (n > 0)
         storePartial(p, a, n);
+}
+
+/// The 4-byte words of a whose mask has its top bit set; the others are neither written nor looked at.
+QORI_INLINE void storeWords(uint8_t* p, Bytes a, Bytes mask) {
+    _mm256_maskstore_epi32(reinterpret_cast<int*>(p), mask.v, a.v);
 }
 
 // --- bytes ----------------------------------------------------------------------------------------------------------

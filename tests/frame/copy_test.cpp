@@ -146,6 +146,30 @@ void copyManaged(const char* name, Function function) {
 #include "members/copy.inc"
 #undef QORI_MEMBER
 
+/// Images too large for the second-level cache, in rows about the length from which other moves are taken.
+constexpr int kLongRows[] = {8191, 8192, 8193, 12301};
+constexpr int kManyRows = 65;
+
+TEST(Copy, LongRowsArriveWhateverTheirAlignment) {
+    for (int width : kLongRows) {
+        for (int shift : {0, 1, 33}) {
+            const Shape from{.width = width, .height = kManyRows, .padding = 7, .shift = shift};
+            const Shape to{.width = width, .height = kManyRows, .padding = 64 - shift, .flipped = shift == 1};
+            SCOPED_TRACE(describe(from));
+            TestImage src(kSrcSlot, from, 1), dst(kDstSlot, to, 1);
+            src.fill<uint8_t>(1, [] { return random().value<uint8_t>(); });
+            Snapshot expected = dst.snapshot();
+            reference::copy(src.view<uint8_t>(1), expected.view<uint8_t>(1), from.roi(), {{0, 0}}, nullptr);
+            EXPECT_EQ(QOR_OK,
+                      qoriCopy_8u_C1R(src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(), from.roi()));
+            QORI_EXPECT_UNCHANGED(dst, expected);
+            EXPECT_EQ(QOR_OK,
+                      qoriCopy_8u_C1R(dst.data<uint8_t>(), dst.step(), dst.data<uint8_t>(), dst.step(), from.roi()));
+            QORI_EXPECT_UNCHANGED(dst, expected);
+        }
+    }
+}
+
 TEST(Copy, SameImageAsSourceAndDestinationIsUntouched) {
     for (const Shape& shape : {Shape{.width = 77, .height = 3}, Shape{.width = 200, .height = 2, .padding = 5}}) {
         TestImage image(kDstSlot, shape, 4);

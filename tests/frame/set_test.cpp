@@ -53,6 +53,24 @@ void sweep(const char* name, Function function) {
 #include "members/set.inc"
 #undef QORI_MEMBER
 
+TEST(Set, LongRowsAreFilledWhateverTheirAlignment) {
+    const uint8_t values[4] = {1, 2, 3, 4}, same[4] = {5, 5, 5, 5};
+    for (int width : {2047, 2048, 2049, 3075}) {
+        for (int shift : {0, 1, 33, 62}) {
+            const Shape shape{
+                .width = width, .height = 65, .padding = 64 + shift, .flipped = shift == 1, .shift = shift};
+            SCOPED_TRACE(describe(shape));
+            TestImage dst(kDstSlot, shape, 4);
+            Snapshot expected = dst.snapshot();
+            for (const uint8_t* value : {values, same}) {
+                reference::set(value, 4, expected.view<uint8_t>(4), shape.roi(), nullptr);
+                EXPECT_EQ(QOR_OK, qoriSet_8u_C4R(value, dst.data<uint8_t>(), dst.step(), shape.roi()));
+                QORI_EXPECT_UNCHANGED(dst, expected);
+            }
+        }
+    }
+}
+
 TEST(Set, AsksForTheCacheOnlyAboveEachBound) {
     std::vector<uint8_t> memory((3 << 20) + 64);
     const auto queriesOf = [](auto set) {

@@ -32,6 +32,9 @@ std::vector<Shape> makeSmallShapes() {
         shapes.push_back({.width = w, .height = h, .padding = 1 + w % 7, .atBegin = w % 2 == 0, .shift = w % 4});
         shapes.push_back({.width = w, .height = h, .padding = 32, .flipped = true, .atBegin = w % 2 == 1, .shift = 16});
     }
+    // Columns of so many rows that gathering them takes several rounds.
+    shapes.push_back({.width = 3, .height = 401, .padding = 5, .shift = 1});
+    shapes.push_back({.width = 7, .height = 131, .padding = 50, .flipped = true, .atBegin = true});
     return shapes;
 }
 
