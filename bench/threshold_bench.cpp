@@ -42,7 +42,8 @@ Row threshold(std::string name, int channels, double bestAtL2, double bestAtFram
         bestAtFrame));
 }
 
-constexpr uint8_t kLow8[4] = {50, 50, 50, 50}, kHigh8[4] = {200, 200, 200, 200}, kBlack8[4] = {}, kWhite8[4] = {255, 255, 255, 255};
+constexpr uint8_t kLow8[4] = {50, 50, 50, 50}, kHigh8[4] = {200, 200, 200, 200}, kBlack8[4] = {},
+                  kWhite8[4] = {255, 255, 255, 255};
 constexpr uint16_t kHigh16[4] = {200, 200, 200, 200}, kBlack16[4] = {};
 
 Row otsuRow() {

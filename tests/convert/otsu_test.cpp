@@ -82,9 +82,7 @@ TEST(Otsu, SidesOfTooFewElements) {
 
 TEST(Otsu, WidthBeyondTheStep) {
     const TestImage src(1, {.width = 4, .height = 2}, 1), result = block(0, 1);
-    const auto status = [&](int32_t step) {
-        return otsu(src.data<uint8_t>(), step, {4, 2}, result.data<uint8_t>());
-    };
+    const auto status = [&](int32_t step) { return otsu(src.data<uint8_t>(), step, {4, 2}, result.data<uint8_t>()); };
     for (int32_t step : {3, 0, -4, INT32_MIN}) QORI_EXPECT_STATUS(QOR_ERR_STEP, result, status(step));
     EXPECT_EQ(QOR_OK, status(4));
 }

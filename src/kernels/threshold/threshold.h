@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Thresholds of one element each, as operations of the row map. Comparisons are strict and no comparison with NaN holds:
-// what is not selected passes bit for bit.
+// Thresholds of one element each, as operations of the row map. Comparisons are strict and no comparison with NaN
+// holds: what is not selected passes bit for bit.
 #pragma once
 #include "kernels/map.h"
 #include "kernels/vector_math.h"
