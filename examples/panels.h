@@ -19,5 +19,6 @@ std::span<const Panel> arithPanels();
 std::span<const Panel> filterPanels();
 std::span<const Panel> resizePanels();
 std::span<const Panel> statsPanels();
+std::span<const Panel> thresholdPanels();
 
 }  // namespace demo

@@ -183,6 +183,12 @@ typedef enum QorAccuracyHint {
     hintAccurate = 2
 } QorAccuracyHint;
 
+/** Which elements a threshold selects. */
+typedef enum QorCompareOp {
+    cmpLess = 0,   /**< Those less than it. */
+    cmpGreater = 4 /**< Those greater than it. */
+} QorCompareOp;
+
 /** Flags of qoriCopyManaged; they combine. */
 typedef enum QorCopyFlags {
     copyStreamStore = 1, /**< Stores bypass the cache. */
@@ -3886,6 +3892,28 @@ QORI_API QorResult QORI_CALL qoriDotProdCol_32f_L2(const float* const* ppSrcRows
 QORI_API QorResult QORI_CALL qoriDotProdCol_64f_L2(const double* const* ppSrcRows, const double* pWeights,
     int32_t nRows, double* pDst, int32_t len);
 
+/* ---- Otsu's threshold ----------------------------------------------------------------------------------------- */
+
+/** The threshold by Otsu's method: the level that sets the elements up to it and those above it furthest apart.
+ *  Shapes    pThreshold points to the result, a level from 0 to 254.
+ *  Elements  The level i that makes the variance between the two classes, w0 w1 (mu0 - mu1)^2, largest: w0 and
+ *            w1 are the shares of the elements up to i and above it, mu0 and mu1 their means. In double
+ *            precision; the lowest of equal maxima; levels that leave less than 2^-23 of the elements on one
+ *            side are passed over. 0 where no level is left, as for an image of one value. Source: N. Otsu, A
+ *            threshold selection method from gray-level histograms, IEEE Transactions on Systems, Man, and
+ *            Cybernetics 9 (1979).
+ *  Units     srcStep in bytes; roiSize in pixels.
+ *  Aliasing  The image is only read. The result must not lie in it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (width greater than srcStep); then nothing is written.
+ *  Example   uint8_t level;
+ *            qoriComputeThreshold_Otsu_8u_C1R(src, srcStep, roi, &level);
+ *            qoriThreshold_GTVal_8u_C1R(src, srcStep, mask, maskStep, roi, level, 255);   // above it 255 ...
+ *            qoriThreshold_LTVal_8u_C1IR(mask, maskStep, roi, 255, 0);                    // ... and 0 elsewhere
+ */
+QORI_API QorResult QORI_CALL qoriComputeThreshold_Otsu_8u_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize roiSize, uint8_t* pThreshold);
+
 /* ---- Resize --------------------------------------------------------------------------------------------------- */
 
 /** Reports how many bytes a plan and the buffer for its initialisation take.
@@ -4649,6 +4677,491 @@ QORI_API QorResult QORI_CALL qoriSet_32s_C3CR(int32_t value, int32_t* pDst, int3
 QORI_API QorResult QORI_CALL qoriSet_32s_C4CR(int32_t value, int32_t* pDst, int32_t dstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriSet_32f_C3CR(float value, float* pDst, int32_t dstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriSet_32f_C4CR(float value, float* pDst, int32_t dstStep, QorImageSize roiSize);
+
+/* ---- Fixed thresholds ----------------------------------------------------------------------------------------- */
+
+/** Clips to a threshold: dst = max(src, threshold) with cmpLess, min(src, threshold) with cmpGreater.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null),
+ *            QOR_ERR_UNSUPPORTED_MODE (cmpOp is neither cmpLess nor cmpGreater); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, uint8_t threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint8_t threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int16_t threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int16_t threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint16_t threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float threshold, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], int32_t cmpOp);
+
+/** Clips above a threshold: dst = src > threshold ? threshold : src.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null); then nothing is
+ *            written.
+ *  Example   const uint8_t broadcastWhite[3] = {235, 235, 235};
+ *            qoriThreshold_GT_8u_C3IR(picture, step, (QorImageSize){640, 480}, broadcastWhite);
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_GT_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint8_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3]);
+
+/** Clips below a threshold: dst = src < threshold ? threshold : src.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null); then nothing is
+ *            written.
+ *  Example   qoriThreshold_LT_16u_C1R(raw, rawStep, dst, dstStep, roi, blackLevel);
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_LT_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint8_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint16_t threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float threshold);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3]);
+
+/** Replaces what is less (cmpLess) or greater (cmpGreater) than a threshold by a value.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     cmpOp is looked at before all else. AC4 may rewrite channel 3 with its own value: do not let
+ *            another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_UNSUPPORTED_MODE (cmpOp is neither cmpLess nor cmpGreater),
+ *            QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step
+ *            below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t threshold, uint8_t value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint8_t threshold, uint8_t value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3], const uint8_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], const uint8_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3], const uint8_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], const uint8_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int16_t threshold, int16_t value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int16_t threshold, int16_t value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], const int16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], const int16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], const int16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], const int16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t threshold, uint16_t value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint16_t threshold, uint16_t value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], const uint16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], const uint16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], const uint16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], const uint16_t value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, float threshold, float value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float threshold, float value, int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float threshold[3], const float value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], const float value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[3], const float value[3], int32_t cmpOp);
+QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], const float value[3], int32_t cmpOp);
+
+/** Replaces what exceeds a threshold: dst = src > threshold ? value : src.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then
+ *            nothing is written.
+ *  Example   qoriThreshold_GTVal_8u_C1R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, 100, 0);   // keeps 100
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t threshold, uint8_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint8_t threshold, uint8_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[4], const uint8_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[4], const uint8_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int16_t threshold, int16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int16_t threshold, int16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[4], const int16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[4], const int16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t threshold, uint16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint16_t threshold, uint16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[4], const uint16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[4], const uint16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, float threshold, float value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float threshold, float value);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[3], const float value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], const float value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[4], const float value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[4], const float value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[3], const float value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], const float value[3]);
+
+/** Replaces what falls below a threshold: dst = src < threshold ? value : src.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then
+ *            nothing is written.
+ *  Example   qoriThreshold_LTVal_32f_C1IR(score, scoreStep, roi, 0.5f, 0.0f);
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t threshold, uint8_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint8_t threshold, uint8_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[4], const uint8_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[4], const uint8_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t threshold[3], const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int16_t threshold, int16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int16_t threshold, int16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[4], const int16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[4], const int16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int16_t threshold[3], const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t threshold, uint16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    uint16_t threshold, uint16_t value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[4], const uint16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[4], const uint16_t value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint16_t threshold[3], const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, float threshold, float value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float threshold, float value);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[3], const float value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], const float value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[4], const float value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[4], const float value[4]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float threshold[3], const float value[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float threshold[3], const float value[3]);
+
+/** Replaces on both sides: dst = src < thresholdLT ? valueLT : src > thresholdGT ? valueGT : src.
+ *  Shapes    Thresholds and values are elements (C1) or arrays of one per processed channel: 3, 4, or 3 for
+ *            AC4, which keeps channel 3 of the destination. Each channel is compared by itself.
+ *  Elements  Comparisons are strict: an element equal to its threshold stays. 32f: a NaN element stays, and a
+ *            NaN threshold selects nothing; -0 equals 0, and an element that stays keeps its sign.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array thresholdLT, valueLT, thresholdGT
+ *            or valueGT is null), QOR_ERR_THRESHOLD (a channel's thresholdGT below its thresholdLT; equal is
+ *            allowed); then nothing is written.
+ *  Example   qoriThreshold_LTValGTVal_8u_C1IR(depth, step, roi, 50, 0, 200, 255);
+ */
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t thresholdLT, uint8_t valueLT, uint8_t thresholdGT, uint8_t valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, uint8_t thresholdLT, uint8_t valueLT, uint8_t thresholdGT, uint8_t valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t thresholdLT[3], const uint8_t valueLT[3],
+    const uint8_t thresholdGT[3], const uint8_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const uint8_t thresholdLT[3], const uint8_t valueLT[3], const uint8_t thresholdGT[3],
+    const uint8_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t thresholdLT[3], const uint8_t valueLT[3],
+    const uint8_t thresholdGT[3], const uint8_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const uint8_t thresholdLT[3], const uint8_t valueLT[3], const uint8_t thresholdGT[3],
+    const uint8_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int16_t thresholdLT, int16_t valueLT, int16_t thresholdGT, int16_t valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, int16_t thresholdLT, int16_t valueLT, int16_t thresholdGT, int16_t valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t thresholdLT[3], const int16_t valueLT[3],
+    const int16_t thresholdGT[3], const int16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const int16_t thresholdLT[3], const int16_t valueLT[3], const int16_t thresholdGT[3],
+    const int16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int16_t thresholdLT[3], const int16_t valueLT[3],
+    const int16_t thresholdGT[3], const int16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const int16_t thresholdLT[3], const int16_t valueLT[3], const int16_t thresholdGT[3],
+    const int16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint16_t thresholdLT, uint16_t valueLT, uint16_t thresholdGT,
+    uint16_t valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, uint16_t thresholdLT, uint16_t valueLT, uint16_t thresholdGT, uint16_t valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t thresholdLT[3], const uint16_t valueLT[3],
+    const uint16_t thresholdGT[3], const uint16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const uint16_t thresholdLT[3], const uint16_t valueLT[3], const uint16_t thresholdGT[3],
+    const uint16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t thresholdLT[3], const uint16_t valueLT[3],
+    const uint16_t thresholdGT[3], const uint16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const uint16_t thresholdLT[3], const uint16_t valueLT[3], const uint16_t thresholdGT[3],
+    const uint16_t valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, float thresholdLT, float valueLT, float thresholdGT, float valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    float thresholdLT, float valueLT, float thresholdGT, float valueGT);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float thresholdLT[3], const float valueLT[3],
+    const float thresholdGT[3], const float valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float thresholdLT[3], const float valueLT[3], const float thresholdGT[3], const float valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, const float thresholdLT[3], const float valueLT[3],
+    const float thresholdGT[3], const float valueGT[3]);
+QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_AC4IR(float* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, const float thresholdLT[3], const float valueLT[3], const float thresholdGT[3],
+    const float valueGT[3]);
 
 /* ---- Version -------------------------------------------------------------------------------------------------- */
 

@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "panels.h"
+
+namespace demo {
+namespace {
+
+/// 255 where the green channel is above its Otsu threshold, 0 elsewhere.
+Picture otsuMask(const Picture& photo) {
+    const QorImageSize size = photo.size();
+    Picture mask(size, 1);
+    require(qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), mask.data(), mask.step(), size));
+    uint8_t level;
+    require(qoriComputeThreshold_Otsu_8u_C1R(mask.data(), mask.step(), size, &level));
+    require(qoriThreshold_GTVal_8u_C1IR(mask.data(), mask.step(), size, level, 255));
+    require(qoriThreshold_LTVal_8u_C1IR(mask.data(), mask.step(), size, 255, 0));
+    return mask;
+}
+
+/// The mask, and under it the photograph.
+Picture brightParts(const Picture& photo) {
+    const QorImageSize size = photo.size();
+    const Picture mask = otsuMask(photo);
+    Picture out(size, 3);
+    require(qoriDup_8u_C1C3R(mask.data(), mask.step(), out.data(), out.step(), size));
+    const QorImageSize half{size.width / 2, size.height};
+    if (half.width > 0)
+        require(qoriCopy_8u_C3MR(photo.data(), photo.step(), out.data(), out.step(), half, mask.data(), mask.step()));
+    return out;
+}
+
+/// Shadows below 64 and lights above 192 in colours of their own, channel by channel between them.
+Picture zebra(const Picture& photo) {
+    const uint8_t dark[3] = {64, 64, 64}, light[3] = {192, 192, 192};
+    const uint8_t shadow[3] = {0, 0, 96}, glare[3] = {255, 208, 128};
+    Picture out(photo.size(), 3);
+    require(qoriThreshold_LTValGTVal_8u_C3R(photo.data(), photo.step(), out.data(), out.step(), photo.size(), dark,
+                                            shadow, light, glare));
+    return out;
+}
+
+constexpr Panel kPanels[] = {
+    {"Otsu mask, the photograph in its left half", "ComputeThreshold_Otsu C1, Threshold_GTVal, _LTVal C1, Copy C3M",
+     brightParts},
+    {"Channels below 64 and above 192 replaced", "Threshold_LTValGTVal C3", zebra},
+};
+
+}  // namespace
+
+std::span<const Panel> thresholdPanels() { return kPanels; }
+
+}  // namespace demo
