@@ -206,6 +206,15 @@ typedef enum QorBorderMode {
     borderReadRight = 0x80    /**< Flag: columns to the right are read from memory. */
 } QorBorderMode;
 
+/** The line about which an image is reflected; width and height are the source's. */
+typedef enum QorFlipAxis {
+    flipHorizontalAxis = 0, /**< Rows reversed: destination row y is source row height - 1 - y. */
+    flipVerticalAxis = 1,   /**< Columns reversed: destination pixel x is source pixel width - 1 - x. */
+    flipBothAxes = 2,       /**< Both at once, a rotation by 180 degrees. */
+    flipDiagonal = 3,       /**< Source pixel (x, y) becomes (y, x). */
+    flipAntiDiagonal = 4    /**< Source pixel (x, y) becomes (height - 1 - y, width - 1 - x). */
+} QorFlipAxis;
+
 /** How a resized pixel is made. */
 typedef enum QorInterpolationKind {
     interpNearest = 1, /**< The nearest pixel. */
@@ -1604,6 +1613,217 @@ QORI_API QorResult QORI_CALL qoriLn_32f_C1IR(float* pSrcDst, int32_t srcDstStep,
 QORI_API QorResult QORI_CALL qoriLn_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriLn_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/* ---- Border copies -------------------------------------------------------------------------------------------- */
+
+/** Copies an image into a larger one and fills the frame around it with a constant pixel.
+ *  Shapes    The source's first pixel becomes pixel (leftBorderWidth, topBorderHeight) of the destination of
+ *            dstRoiSize; the frame is what is left on the four sides, none on a side where nothing is left.
+ *            value is the element (C1) or an array of one value per channel, three for AC4.
+ *  Elements  Elements are moved bit for bit: NaN payloads and signed zeros survive. AC4 keeps channel 3
+ *            everywhere, in the frame too.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes, topBorderHeight and leftBorderWidth in
+ *            pixels, the latter two 0 or more.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc or pDst is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (a width or height below 1, a negative border, a destination smaller than the source
+ *            behind its borders), QOR_ERR_NULL_PTR (value is null); then nothing is written.
+ *  Example   const uint8_t black[3] = {0, 0, 0};
+ *            // 8 pixels on every side.
+ *            qoriCopyConstBorder_8u_C3R(src, srcStep, (QorImageSize){640, 480}, dst, dstStep, (QorImageSize){656, 496},
+ *                                       8, 8, black);
+ */
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    uint8_t value);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_8u_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_8u_C4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const uint8_t value[4]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const uint8_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16u_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    uint16_t value);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16u_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16u_C4R(const uint16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const uint16_t value[4]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16u_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth, const uint16_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16s_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    int16_t value);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16s_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16s_C4R(const int16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const int16_t value[4]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_16s_AC4R(const int16_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const int16_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32s_C1R(const int32_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    int32_t value);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32s_C3R(const int32_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const int32_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32s_C4R(const int32_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const int32_t value[4]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32s_AC4R(const int32_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const int32_t value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    float value);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const float value[3]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const float value[4]);
+QORI_API QorResult QORI_CALL qoriCopyConstBorder_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth,
+    const float value[3]);
+
+/** Copies an image into a larger one and repeats its outermost pixels in the frame around it.
+ *  Shapes    The source's first pixel becomes pixel (leftBorderWidth, topBorderHeight) of the destination of
+ *            dstRoiSize; every pixel of the frame takes the nearest pixel of the source.
+ *  Elements  Elements are moved bit for bit: NaN payloads and signed zeros survive. AC4 keeps channel 3
+ *            everywhere, in the frame too.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes, topBorderHeight and leftBorderWidth in
+ *            pixels, the latter two 0 or more.
+ *  Aliasing  pSrc == pDst runs the in-place form with srcStep, before any check: the pointer then names the
+ *            source's first pixel, and the frame is written around it. Otherwise the images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc or pDst is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (a width or height below 1, a negative border, a destination smaller than the source
+ *            behind its borders); then nothing is written.
+ *  Example   // A rim of one pixel on every side, for filters that look at neighbours.
+ *            qoriCopyReplicateBorder_8u_C1R(src, srcStep, (QorImageSize){640, 480}, dst, dstStep, (QorImageSize){642, 482},
+ *                                           1, 1);
+ */
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, uint16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_C1R(const int16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_C3R(const int16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_C4R(const int16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_AC4R(const int16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int16_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_C1R(const int32_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_C3R(const int32_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_C4R(const int32_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_AC4R(const int32_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, int32_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C1R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C3R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, float* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t topBorderHeight,
+    int32_t leftBorderWidth);
+
+/** Repeats the outermost pixels of an image in the frame around it, inside a larger image.
+ *  Shapes    pSrcDst points at the source's first pixel. The frame begins topBorderHeight rows above it and
+ *            leftBorderWidth pixels to its left and makes the source one of dstRoiSize; the larger image must
+ *            have that room.
+ *  Elements  Elements are moved bit for bit: NaN payloads and signed zeros survive. AC4 keeps channel 3
+ *            everywhere, in the frame too.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes, topBorderHeight and leftBorderWidth in
+ *            pixels, the latter two 0 or more.
+ *  Aliasing  The source's pixels are only read.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (a width or height below 1, a negative border, a destination smaller than the source
+ *            behind its borders); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_C1IR(int32_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_C3IR(int32_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_C4IR(int32_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32s_AC4IR(int32_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C1IR(float* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C3IR(float* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C4IR(float* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
+QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_AC4IR(float* pSrcDst, int32_t srcDstStep,
+    QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
 
 /* ---- Convert -------------------------------------------------------------------------------------------------- */
 
@@ -3167,6 +3387,121 @@ QORI_API QorComplex32f* QORI_CALL qoriMalloc_32fc_AC4(int32_t width, int32_t hei
  *  Returns   QOR_OK; in this order ; then nothing is written.
  */
 QORI_API void QORI_CALL qoriFree(void* ptr);
+
+/* ---- Mirror --------------------------------------------------------------------------------------------------- */
+
+/** Reflects an image about its horizontal or vertical axis, both, or a diagonal.
+ *  Shapes    flipAxis is a QorFlipAxis. roiSize is the source's size; about a diagonal the destination is
+ *            roiSize.height pixels wide and roiSize.width high.
+ *  Elements  Pixels are moved bit for bit: NaN payloads and signed zeros survive. AC4 moves channels 0 to 2;
+ *            the destination keeps its channel 3.
+ *  Units     Steps in bytes, of any alignment: any value, not checked, for axes 0 to 2; at least 1 for the
+ *            diagonals. roiSize in pixels.
+ *  Aliasing  Axes 0 to 2: pSrc == pDst with equal steps runs the in-place form, with the same checks; otherwise
+ *            the images must not overlap. Diagonals: images whose bytes, from the first to the last of each,
+ *            have one in common are refused.
+ *  Notes     A single row cannot be reflected about the horizontal axis, nor a single column about the vertical
+ *            one.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (diagonals: steps below
+ *            1), QOR_ERR_SIZE (width or height below 1), QOR_ERR_FLIP_AXIS (flipAxis is no QorFlipAxis),
+ *            QOR_ERR_SIZE (height below 2 for axes 0 and 2, width below 2 for axes 1 and 2),
+ *            QOR_ERR_UNSUPPORTED_MODE (diagonals: the images overlap); then nothing is written.
+ *  Example   // A quarter turn: reflect about the diagonal, then reverse the columns.
+ *            qoriMirror_8u_C3R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, flipDiagonal);
+ *            qoriMirror_8u_C3IR(dst, dstStep, (QorImageSize){480, 640}, flipVerticalAxis);
+ */
+QORI_API QorResult QORI_CALL qoriMirror_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_C1R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_C3R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_C4R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_AC4R(const int32_t* pSrc, int32_t srcStep, int32_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t flipAxis);
+
+/** Reflects an image about its horizontal or vertical axis, or both, in place.
+ *  Shapes    flipAxis is flipHorizontalAxis, flipVerticalAxis or flipBothAxes.
+ *  Elements  Pixels are moved bit for bit: NaN payloads and signed zeros survive. AC4 moves channels 0 to 2;
+ *            the destination keeps its channel 3.
+ *  Units     srcDstStep in bytes, any value, not checked; roiSize in pixels.
+ *  Aliasing  Rows must not overlap each other.
+ *  Notes     Takes no memory. The middle row or column of an odd number stays where it is.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_FLIP_AXIS (flipAxis not 0, 1 or 2), QOR_ERR_SIZE (height below 2 for axes 0 and 2,
+ *            width below 2 for axes 1 and 2); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMirror_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_C1IR(int32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_C3IR(int32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_C4IR(int32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32s_AC4IR(int32_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
+QORI_API QorResult QORI_CALL qoriMirror_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    int32_t flipAxis);
 
 /* ---- Morphology ----------------------------------------------------------------------------------------------- */
 

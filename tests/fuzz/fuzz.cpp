@@ -191,6 +191,7 @@ T argument(Input& in) {
         return isStep                        ? in.take<int16_t>() % kMostStep
                : in.countsBits               ? in.take<int16_t>()
                : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
+               : in.take<uint8_t>() % 2 == 0 ? in.upTo(5)  // codes and widths of frames
                                              : in.take<int8_t>();
     } else {
         return in.take<T>();

@@ -1,0 +1,238 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "reverse_rows.h"
+
+#include <array>
+
+#include "kernels/byte_tables.h"
+
+namespace qori::kernels {
+namespace {
+
+constexpr int kVector = 32, kHalf = 16;
+
+/// Where a half of a reversed group finds its bytes: two windows of 16 that together hold them all, and an index into
+/// each, kNone where the other has the byte.
+struct HalfSource {
+    int first, second;
+    std::array<uint8_t, kHalf> fromFirst, fromSecond;
+};
+
+/// Half `half` of a group of so many bytes, which is made of the source's pixels low to high: 24 bytes at most.
+template <int pixelBytes>
+constexpr HalfSource halfSource(int groupBytes, int half) {
+    const int pixels = groupBytes / pixelBytes;
+    const int high = pixels - 1 - half * kHalf / pixelBytes, low = pixels - 1 - (half * kHalf + kHalf - 1) / pixelBytes;
+    const int begin = low * pixelBytes, end = (high + 1) * pixelBytes;
+    HalfSource source{begin, end - kHalf, {}, {}};
+    for (int i = 0; i < kHalf; ++i) {
+        const int at = half * kHalf + i, from = (pixels - 1 - at / pixelBytes) * pixelBytes + at % pixelBytes;
+        const bool isFirst = from < begin + kHalf;
+        source.fromFirst[static_cast<size_t>(i)] = isFirst ? static_cast<uint8_t>(from - source.first) : kNone;
+        source.fromSecond[static_cast<size_t>(i)] = isFirst ? kNone : static_cast<uint8_t>(from - source.second);
+    }
+    return source;
+}
+
+/// The vector of a reversed group that begins with an even half.
+struct VectorSource {
+    int first[2], second[2];
+    ByteTable fromFirst, fromSecond;
+};
+
+template <int pixelBytes>
+constexpr auto vectorSources() {
+    constexpr int vectors = pixelBytes % 3 == 0 ? 3 : 1;
+    std::array<VectorSource, vectors> all{};
+    for (int k = 0; k < vectors; ++k)
+        for (int h = 0; h < 2; ++h) {
+            const HalfSource half = halfSource<pixelBytes>(vectors * kVector, 2 * k + h);
+            VectorSource& vector = all[static_cast<size_t>(k)];
+            vector.first[h] = half.first;
+            vector.second[h] = half.second;
+            for (int i = 0; i < kHalf; ++i) {
+                vector.fromFirst.at[kHalf * h + i] = half.fromFirst[static_cast<size_t>(i)];
+                vector.fromSecond.at[kHalf * h + i] = half.fromSecond[static_cast<size_t>(i)];
+            }
+        }
+    return all;
+}
+
+/// Whole pixels in the fewest whole vectors: 32 bytes, or 96 for pixels of 3, 6 and 12.
+template <int pixelBytes>
+struct Group {
+    static constexpr bool even = kHalf % pixelBytes == 0;  ///< Halves hold whole pixels.
+    static constexpr int vectors = even ? 1 : 3, bytes = vectors * kVector;
+
+    Bytes at[vectors];
+
+    /// The group of pixels at p, the last one first.
+    static QORI_INLINE Group reversed(const uint8_t* p) {
+        static constexpr auto sources = vectorSources<pixelBytes>();
+        Group group;
+        for (int k = 0; k < vectors; ++k) {
+            const VectorSource& source = sources[static_cast<size_t>(k)];
+            group.at[k] = loadHalves(p + source.first[0], p + source.first[1]);
+            if constexpr (pixelBytes < kHalf) group.at[k] = shuffleHalves(group.at[k], load(source.fromFirst.at));
+            if constexpr (!even) {
+                const Bytes others = loadHalves(p + source.second[0], p + source.second[1]);
+                group.at[k] = group.at[k] | shuffleHalves(others, load(source.fromSecond.at));
+            }
+        }
+        return group;
+    }
+
+    template <bool streaming>
+    QORI_INLINE void put(uint8_t* p) const {
+        for (int k = 0; k < vectors; ++k) storeAs<streaming>(p + k * kVector, at[k]);
+    }
+};
+
+/// The bytes of `fresh`, with the last quarter of each pixel from `old` where it is kept.
+template <int pixelBytes, bool keepAlpha>
+QORI_INLINE Bytes merged(Bytes fresh, Bytes old) {
+    if constexpr (!keepAlpha) return fresh;
+    alignas(32) static constexpr auto select = selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
+    return blend(old, fresh, load(select.data()));
+}
+
+/// Whole pixels within 16 bytes.
+template <int pixelBytes>
+constexpr int kHalfBytes = kHalf / pixelBytes* pixelBytes;
+
+/// The pixels in the first n bytes of a vector, n <= kHalfBytes, the last one first and zeros behind them.
+template <int pixelBytes>
+QORI_INLINE Bytes reversedPart(Bytes a, ptrdiff_t n) {
+    static constexpr auto order = [] {
+        std::array<uint8_t, 2 * kHalf> index{};
+        for (int i = 0; i < 2 * kHalf; ++i)
+            index[static_cast<size_t>(i)] = i < kHalfBytes<pixelBytes>
+                                                ? static_cast<uint8_t>(kHalfBytes<pixelBytes> - pixelBytes -
+                                                                       i / pixelBytes * pixelBytes + i % pixelBytes)
+                                                : kNone;
+        return index;
+    }();
+    return shuffleHalves(a, loadTwice(order.data() + kHalfBytes<pixelBytes> - n));
+}
+
+template <int pixelBytes, bool keepAlpha>
+QORI_INLINE void reversePart(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    const Bytes fresh = reversedPart<pixelBytes>(loadPartial(src, bytes), bytes);
+    if constexpr (keepAlpha)
+        storePartial(dst, merged<pixelBytes, true>(fresh, loadPartial(dst, bytes)), bytes);
+    else
+        storePartial(dst, fresh, bytes);
+}
+
+/// Rows shorter than a group.
+template <int pixelBytes, bool keepAlpha>
+QORI_INLINE void reverseShort(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    constexpr int part = kHalfBytes<pixelBytes>;
+    for (; bytes >= part; bytes -= part, dst += part) reversePart<pixelBytes, keepAlpha>(dst, src + bytes - part, part);
+    if (bytes > 0) reversePart<pixelBytes, keepAlpha>(dst, src, bytes);
+}
+
+/// Bytes until some pixel of a row lies on a 32-byte boundary, or -1 where none does.
+template <int pixelBytes>
+QORI_INLINE ptrdiff_t bytesToAlignment(const uint8_t* p) {
+    const auto ahead = static_cast<int>(-reinterpret_cast<uintptr_t>(p) & (kVector - 1));
+    if constexpr (Group<pixelBytes>::even) {
+        return ahead % pixelBytes == 0 ? ahead : -1;
+    } else {
+        constexpr int unit = pixelBytes / 3, inverseOf3 = 11;  // 3 * 11 = 33, modulo 32 and less
+        return ahead % unit == 0 ? (ahead / unit * inverseOf3 & (kVector / unit - 1)) * pixelBytes : -1;
+    }
+}
+
+/// The groups of a row, the destination's ascending; the first and the last may overlap their neighbours.
+template <int pixelBytes, bool keepAlpha, bool streaming>
+QORI_INLINE void reverseGroups(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, ptrdiff_t head) {
+    using G = Group<pixelBytes>;
+    constexpr int unroll = G::even ? 4 : 1;
+    const uint8_t* const end = src + bytes - G::bytes;
+    const auto group = [=](ptrdiff_t at) __attribute__((always_inline)) {
+        G fresh = G::reversed(end - at);
+        if constexpr (keepAlpha) fresh.at[0] = merged<pixelBytes, true>(fresh.at[0], load(dst + at));
+        return fresh;
+    };
+    ptrdiff_t done = 0;
+    if (head > 0) {
+        group(0).template put<false>(dst);
+        done = head;
+    }
+    for (; done <= bytes - unroll * G::bytes; done += unroll * G::bytes)
+        for (int k = 0; k < unroll; ++k) group(done + k * G::bytes).template put<streaming>(dst + done + k * G::bytes);
+    for (; done <= bytes - G::bytes; done += G::bytes) group(done).template put<false>(dst + done);
+    if (done < bytes) group(bytes - G::bytes).template put<false>(dst + bytes - G::bytes);
+}
+
+}  // namespace
+
+template <int pixelBytes, bool keepAlpha>
+void reverseRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
+    const ptrdiff_t bytes = pixels * pixelBytes;
+    if (bytes < Group<pixelBytes>::bytes) return reverseShort<pixelBytes, keepAlpha>(dst, src, bytes);
+    const ptrdiff_t head = bytesToAlignment<pixelBytes>(dst);
+    if constexpr (!keepAlpha)
+        if (streaming && head >= 0) return reverseGroups<pixelBytes, false, true>(dst, src, bytes, head);
+    reverseGroups<pixelBytes, keepAlpha, false>(dst, src, bytes, head);
+}
+
+template <int pixelBytes, bool keepAlpha>
+void swapReversed(uint8_t* left, uint8_t* rightEnd, ptrdiff_t pixels) {
+    using G = Group<pixelBytes>;
+    ptrdiff_t bytes = pixels * pixelBytes;
+    for (; bytes >= G::bytes; bytes -= G::bytes, left += G::bytes) {
+        rightEnd -= G::bytes;
+        G toLeft = G::reversed(rightEnd), toRight = G::reversed(left);
+        if constexpr (keepAlpha) {
+            toLeft.at[0] = merged<pixelBytes, true>(toLeft.at[0], load(left));
+            toRight.at[0] = merged<pixelBytes, true>(toRight.at[0], load(rightEnd));
+        }
+        toLeft.template put<false>(left);
+        toRight.template put<false>(rightEnd);
+    }
+    while (bytes > 0) {
+        constexpr ptrdiff_t most = kHalfBytes<pixelBytes>;
+        const ptrdiff_t part = bytes < most ? bytes : most;
+        rightEnd -= part;
+        const Bytes l = loadPartial(left, part), r = loadPartial(rightEnd, part);
+        storePartial(left, merged<pixelBytes, keepAlpha>(reversedPart<pixelBytes>(r, part), l), part);
+        storePartial(rightEnd, merged<pixelBytes, keepAlpha>(reversedPart<pixelBytes>(l, part), r), part);
+        bytes -= part;
+        left += part;
+    }
+}
+
+template <int pixelBytes, bool keepAlpha>
+void swapRows(uint8_t* a, uint8_t* b, ptrdiff_t pixels) {
+    const ptrdiff_t bytes = pixels * pixelBytes;
+    ptrdiff_t done = 0;
+    for (; done <= bytes - kVector; done += kVector) {
+        const Bytes x = load(a + done), y = load(b + done);
+        store(a + done, merged<pixelBytes, keepAlpha>(y, x));
+        store(b + done, merged<pixelBytes, keepAlpha>(x, y));
+    }
+    if (const ptrdiff_t rest = bytes - done; rest > 0) {
+        const Bytes x = loadPartial(a + done, rest), y = loadPartial(b + done, rest);
+        storePartial(a + done, merged<pixelBytes, keepAlpha>(y, x), rest);
+        storePartial(b + done, merged<pixelBytes, keepAlpha>(x, y), rest);
+    }
+}
+
+#define QORI_INSTANTIATE(pixelBytes, keepAlpha)                                                 \
+    template void reverseRow<pixelBytes, keepAlpha>(uint8_t*, const uint8_t*, ptrdiff_t, bool); \
+    template void swapReversed<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t);           \
+    template void swapRows<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t)
+QORI_INSTANTIATE(1, false);
+QORI_INSTANTIATE(2, false);
+QORI_INSTANTIATE(3, false);
+QORI_INSTANTIATE(4, false);
+QORI_INSTANTIATE(6, false);
+QORI_INSTANTIATE(8, false);
+QORI_INSTANTIATE(12, false);
+QORI_INSTANTIATE(16, false);
+QORI_INSTANTIATE(4, true);
+QORI_INSTANTIATE(8, true);
+QORI_INSTANTIATE(16, true);
+
+}  // namespace qori::kernels

@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+// Rows of pixels reversed or exchanged without looking at their bytes. Pixels take 1, 2, 3, 4, 6, 8, 12 or 16 bytes. Of
+// 4, 8 and 16 the last quarter may be kept: the row that is written then keeps those bytes of its own.
+#pragma once
+#include "kernels/simd.h"
+
+namespace qori::kernels {
+
+/// dst pixel x becomes src pixel pixels - 1 - x. The rows do not overlap. Streaming stores go past the cache wherever
+/// some pixel of dst lies on a 32-byte boundary.
+template <int pixelBytes, bool keepAlpha>
+void reverseRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming);
+
+/// Exchanges pixel x at `left` with pixel x counted backwards from `rightEnd`. The two runs do not overlap.
+template <int pixelBytes, bool keepAlpha>
+void swapReversed(uint8_t* left, uint8_t* rightEnd, ptrdiff_t pixels);
+
+/// Exchanges two rows that do not overlap.
+template <int pixelBytes, bool keepAlpha>
+void swapRows(uint8_t* a, uint8_t* b, ptrdiff_t pixels);
+
+}  // namespace qori::kernels

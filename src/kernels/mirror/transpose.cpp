@@ -1,0 +1,181 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "transpose.h"
+
+#include <algorithm>
+
+#include "kernels/select_rows.h"
+
+namespace qori::kernels {
+namespace {
+
+/// Interleaves the halves of two vectors by elements of so many bytes: the low or the high quarters.
+template <int element, bool high>
+QORI_INLINE Bytes interleave(Bytes a, Bytes b) {
+    if constexpr (element == 1)
+        return {high ? _mm256_unpackhi_epi8(a.v, b.v) : _mm256_unpacklo_epi8(a.v, b.v)};
+    else if constexpr (element == 2)
+        return {high ? _mm256_unpackhi_epi16(a.v, b.v) : _mm256_unpacklo_epi16(a.v, b.v)};
+    else if constexpr (element == 4)
+        return {high ? _mm256_unpackhi_epi32(a.v, b.v) : _mm256_unpacklo_epi32(a.v, b.v)};
+    else
+        return {high ? _mm256_unpackhi_epi64(a.v, b.v) : _mm256_unpacklo_epi64(a.v, b.v)};
+}
+
+/// Turns n vectors whose halves hold n elements each: element j of vector i becomes element i of vector j, in both
+/// halves. A round interleaves the first half of the vectors with the second, which rotates the bits of (vector,
+/// element) by one; after as many rounds as either has bits they have changed places.
+template <int n>
+QORI_INLINE void turn(Bytes (&v)[n]) {
+    constexpr int element = 16 / n;
+    for (int round = 1; round < n; round *= 2) {
+        Bytes next[n];
+        for (int i = 0; i < n / 2; ++i) {
+            next[2 * i] = interleave<element, false>(v[i], v[i + n / 2]);
+            next[2 * i + 1] = interleave<element, true>(v[i], v[i + n / 2]);
+        }
+        for (int i = 0; i < n; ++i) v[i] = next[i];
+    }
+}
+
+/// How pixels of a size are turned. Those of 3, 6 and 12 bytes are turned in elements of 4, 8 and 16.
+template <int pixelBytes>
+struct Turning {
+    static constexpr bool even = 16 % pixelBytes == 0;
+    static constexpr int element = even ? pixelBytes : pixelBytes / 3 * 4;
+    static constexpr int n = 16 / element;                ///< Pixels in a half.
+    static constexpr int rows = 2 * n;                    ///< Source rows of a block.
+    static constexpr int columns = even ? n : 2 * n;      ///< Source columns of a block: 16 or 24 bytes.
+    static constexpr int tileRowBytes = even ? 64 : 192;  ///< Whole cache lines of the destination.
+    static constexpr int tileRows = tileRowBytes / pixelBytes;
+    static constexpr int tileColumns = std::max(columns, std::min(64, (even ? 128 : 96) / pixelBytes));
+    /// A block of uneven pixels stores four bytes behind its last.
+    static constexpr int tileStep = tileRowBytes + (even ? 0 : 32);
+};
+
+/// Pixels of 3, 6 or 12 bytes spread over elements of 4, 8 or 16. The first 12 bytes of both halves, or the last.
+template <int pixelBytes>
+constexpr ByteTable spread(bool last) {
+    return bothHalves([=](int i) {
+        constexpr int element = pixelBytes / 3 * 4;
+        return i % element < pixelBytes ? i / element * pixelBytes + i % element + (last ? 4 : 0) : int{kNone};
+    });
+}
+
+template <int pixelBytes>
+constexpr ByteTable gathered() {
+    return bothHalves([](int i) {
+        constexpr int element = pixelBytes / 3 * 4;
+        return i < 12 ? i / pixelBytes * element + i % pixelBytes : int{kNone};
+    });
+}
+
+/// A block of `rows` x `columns` source pixels.
+template <int pixelBytes>
+QORI_INLINE void turnBlock(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, ptrdiff_t fromStep) {
+    constexpr int n = Turning<pixelBytes>::n;
+    Bytes v[n];
+    if constexpr (Turning<pixelBytes>::even) {
+        for (int i = 0; i < n; ++i) v[i] = loadHalves(from + i * fromStep, from + (i + n) * fromStep);
+        turn(v);
+        for (int i = 0; i < n; ++i) store(to + i * toStep, v[i]);
+    } else {
+        static constexpr ByteTable spreads[2] = {spread<pixelBytes>(false), spread<pixelBytes>(true)};
+        static constexpr ByteTable gather = gathered<pixelBytes>();
+        for (int side = 0; side < 2; ++side, from += 8, to += n * toStep) {
+            for (int i = 0; i < n; ++i)
+                v[i] =
+                    shuffleHalves(loadHalves(from + i * fromStep, from + (i + n) * fromStep), load(spreads[side].at));
+            turn(v);
+            for (int i = 0; i < n; ++i)
+                storeHalves(to + i * toStep, to + i * toStep + 12, shuffleHalves(v[i], load(gather.at)));
+        }
+    }
+}
+
+/// Enough blocks for so many rows and columns, into a tile.
+template <int pixelBytes>
+QORI_INLINE void turnBlocks(uint8_t* tile, const uint8_t* from, ptrdiff_t fromStep, int32_t rows, int32_t columns) {
+    using T = Turning<pixelBytes>;
+    for (int32_t x = 0; x < columns; x += T::columns)
+        for (int32_t y = 0; y < rows; y += T::rows)
+            turnBlock<pixelBytes>(tile + x * T::tileStep + y * pixelBytes, T::tileStep,
+                                  from + y * fromStep + x * pixelBytes, fromStep);
+}
+
+/// Turns tile after tile. A tile is turned on the stack, so that the destination is written in whole cache lines and
+/// the source is read no further than its edge.
+template <int pixelBytes, bool keepAlpha>
+class Turner {
+    using T = Turning<pixelBytes>;
+
+public:
+    /// A tile at from, of no more rows and columns than a tile has.
+    void turnTile(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, ptrdiff_t fromStep, int32_t rows, int32_t columns,
+                  bool streaming) {
+        if (rows == T::tileRows && columns == T::tileColumns) {
+            turnBlocks<pixelBytes>(tile_, from, fromStep, T::tileRows, T::tileColumns);
+            if constexpr (!keepAlpha) return putWhole(to, toStep, streaming);
+        } else {
+            for (int32_t y = 0; y < rows; ++y)
+                copyRow(edge_ + y * kEdgeStep, from + y * fromStep, ptrdiff_t{columns} * pixelBytes);
+            turnBlocks<pixelBytes>(tile_, edge_, kEdgeStep, rows, columns);
+        }
+        for (int32_t x = 0; x < columns; ++x) {
+            if constexpr (keepAlpha)
+                selectRow<pixelBytes, pixelBytes / 4 * 3>(to + x * toStep, tile_ + x * T::tileStep, rows);
+            else
+                copyRow(to + x * toStep, tile_ + x * T::tileStep, ptrdiff_t{rows} * pixelBytes);
+        }
+    }
+
+private:
+    static constexpr int kEdgeStep = (T::tileColumns + T::columns) * pixelBytes;
+
+    void putWhole(uint8_t* to, ptrdiff_t toStep, bool streaming) const {
+        for (int x = 0; x < T::tileColumns; ++x)
+            for (int i = 0; i < T::tileRowBytes; i += 32) {
+                const Bytes a = load(tile_ + x * T::tileStep + i);
+                if (streaming)
+                    stream(to + x * toStep + i, a);
+                else
+                    store(to + x * toStep + i, a);
+            }
+    }
+
+    // Blocks may turn what edges leave unset; it is not stored.
+    alignas(32) uint8_t tile_[(T::tileColumns + T::columns) * T::tileStep];
+    alignas(32) uint8_t edge_[(T::tileRows + T::rows) * kEdgeStep];
+};
+
+}  // namespace
+
+template <int pixelBytes, bool keepAlpha>
+void transposeImage(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, QorImageSize size,
+                    bool streaming) {
+    using T = Turning<pixelBytes>;
+    Turner<pixelBytes, keepAlpha> turner;
+    const bool aligned = ((reinterpret_cast<uintptr_t>(dst) | static_cast<uintptr_t>(dstStep)) & 31u) == 0;
+    for (int32_t y = 0; y < size.height; y += T::tileRows)
+        for (int32_t x = 0; x < size.width; x += T::tileColumns)
+            turner.turnTile(dst + x * dstStep + ptrdiff_t{y} * pixelBytes, dstStep,
+                            src + y * srcStep + ptrdiff_t{x} * pixelBytes, srcStep,
+                            std::min(T::tileRows, size.height - y), std::min(T::tileColumns, size.width - x),
+                            streaming && aligned);
+}
+
+#define QORI_INSTANTIATE(pixelBytes, keepAlpha)                                                                       \
+    template void transposeImage<pixelBytes, keepAlpha>(uint8_t*, ptrdiff_t, const uint8_t*, ptrdiff_t, QorImageSize, \
+                                                        bool)
+QORI_INSTANTIATE(1, false);
+QORI_INSTANTIATE(2, false);
+QORI_INSTANTIATE(3, false);
+QORI_INSTANTIATE(4, false);
+QORI_INSTANTIATE(6, false);
+QORI_INSTANTIATE(8, false);
+QORI_INSTANTIATE(12, false);
+QORI_INSTANTIATE(16, false);
+QORI_INSTANTIATE(4, true);
+QORI_INSTANTIATE(8, true);
+QORI_INSTANTIATE(16, true);
+
+}  // namespace qori::kernels
