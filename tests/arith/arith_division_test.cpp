@@ -155,7 +155,7 @@ TEST(Division, HalvesOfComplexNumbers) {
         for (int i = 0; i < count; ++i) {
             a[i] = {drawn(bits), drawn(bits)};
             // a (p + qi) / 2 for odd p and q; with a scale factor that is somewhere on the grid.
-            const int64_t p = 2 * (drawn(other) / 4) + 1, q = 2 * (drawn(other) / 4) + 1;
+            const int64_t p = 2 * (drawn(other) / 4) + (random().oneIn(2) ? 1 : -1), q = 2 * (drawn(other) / 4) + 1;
             const int nudge = random().below(3) - 1;
             b[i] = {static_cast<int32_t>((a[i].re * p - a[i].im * q) / 2 + nudge),
                     static_cast<int32_t>((a[i].re * q + a[i].im * p) / 2)};
