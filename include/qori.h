@@ -5023,8 +5023,8 @@ QORI_API QorResult QORI_CALL qoriSet_32f_C4CR(float value, float* pDst, int32_t 
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null),
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null),
  *            QOR_ERR_UNSUPPORTED_MODE (cmpOp is neither cmpLess nor cmpGreater); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriThreshold_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
@@ -5084,8 +5084,8 @@ QORI_API QorResult QORI_CALL qoriThreshold_32f_AC4IR(float* pSrcDst, int32_t src
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null); then nothing is
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null); then nothing is
  *            written.
  *  Example   const uint8_t broadcastWhite[3] = {235, 235, 235};
  *            qoriThreshold_GT_8u_C3IR(picture, step, (QorImageSize){640, 480}, broadcastWhite);
@@ -5147,8 +5147,8 @@ QORI_API QorResult QORI_CALL qoriThreshold_GT_32f_AC4IR(float* pSrcDst, int32_t 
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null); then nothing is
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold is null); then nothing is
  *            written.
  *  Example   qoriThreshold_LT_16u_C1R(raw, rawStep, dst, dstStep, roi, blackLevel);
  */
@@ -5211,7 +5211,7 @@ QORI_API QorResult QORI_CALL qoriThreshold_LT_32f_AC4IR(float* pSrcDst, int32_t 
  *  Notes     cmpOp is looked at before all else. AC4 may rewrite channel 3 with its own value: do not let
  *            another thread write it during the call.
  *  Returns   QOR_OK; in this order QOR_ERR_UNSUPPORTED_MODE (cmpOp is neither cmpLess nor cmpGreater),
- *            QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step
+ *            QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (a step
  *            below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriThreshold_Val_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
@@ -5271,8 +5271,8 @@ QORI_API QorResult QORI_CALL qoriThreshold_Val_32f_AC4IR(float* pSrcDst, int32_t
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then
  *            nothing is written.
  *  Example   qoriThreshold_GTVal_8u_C1R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, 100, 0);   // keeps 100
  */
@@ -5349,8 +5349,8 @@ QORI_API QorResult QORI_CALL qoriThreshold_GTVal_32f_AC4IR(float* pSrcDst, int32
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array threshold or value is null); then
  *            nothing is written.
  *  Example   qoriThreshold_LTVal_32f_C1IR(score, scoreStep, roi, 0.5f, 0.0f);
  */
@@ -5427,9 +5427,9 @@ QORI_API QorResult QORI_CALL qoriThreshold_LTVal_32f_AC4IR(float* pSrcDst, int32
  *  Units     Steps in bytes, at least 1; roiSize in pixels.
  *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
  *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
- *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
- *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array thresholdLT, valueLT, thresholdGT
- *            or valueGT is null), QOR_ERR_THRESHOLD (a channel's thresholdGT below its thresholdLT; equal is
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (an image is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_STEP (a step below 1), QOR_ERR_NULL_PTR (the array thresholdLT, valueLT, thresholdGT or
+ *            valueGT is null), QOR_ERR_THRESHOLD (a channel's thresholdGT below its thresholdLT; equal is
  *            allowed); then nothing is written.
  *  Example   qoriThreshold_LTValGTVal_8u_C1IR(depth, step, roi, 50, 0, 200, 255);
  */
