@@ -7,7 +7,11 @@
 // warning seen) and may offer
 //     Pack<D, n> tail(int phase, ptrdiff_t count, Pack<S, n>... sources)   for the last, partial block, whose elements
 //                                                                           from count on are zeros and never stored;
-//     static constexpr bool mayStream = true                               to be compiled with streaming stores too.
+//     static constexpr bool mayStream = true                               to be compiled with streaming stores too;
+//     static constexpr bool inRegisters = true                             to run from a copy, which it must not
+//     change:
+//                                                                           stores might change the original, so that
+//                                                                           constants are loaded for every vector.
 #pragma once
 #include <algorithm>
 
@@ -96,7 +100,9 @@ QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
 /// Blocks three at a time, then one at a time, then what is left. Pointers come by value: through a reference, every
 /// store might change them, and they would be loaded again for each vector.
 template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
-QORI_INLINE void mapBlocks(Op& op, ptrdiff_t elements, D* dst, const S*... src) {
+QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
+    std::conditional_t < requires { Op::inRegisters; }
+    , Op, Op& > op = original;
     ptrdiff_t i = 0;
     for (; i <= elements - 3 * n; i += 3 * n) {
         for (int phase = 0; phase < 3; ++phase)
