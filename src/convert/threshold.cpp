@@ -27,12 +27,30 @@ Constants<T, channels(layout)> constantsOf(const T* values) {
     return Constants<T, channels(layout)>(perChannel);
 }
 
+/// Rows of 16 bytes, two to a vector: small tiles are of this width, and the way for partial vectors takes longer than
+/// their work. Constants must repeat within 16 bytes.
+template <class T, class Rule>
+QORI_NOINLINE void mapRowPairs(Rule rule, Image<const T> src, Image<T> dst, int32_t rows) {
+    for (int32_t y = 0; y < rows; y += 2) {
+        const int32_t other = y + 1 < rows ? y + 1 : y;
+        const Bytes two = loadHalves(asBytes(src.row(y)), asBytes(src.row(other)));
+        const Vec<T> out = rule(0, fromInteger<T>(two.v));
+        storeHalves(asBytes(dst.row(y)), asBytes(dst.row(other)), {toInteger(out.v)});
+    }
+}
+
 /// Runs the rule that make() gives, made and run under the default control register where elements are floats: flushed
 /// subnormals would compare as equal.
 template <Layout layout, class T, class Make>
 QorResult run(Image<const T> src, Image<T> dst, QorImageSize roi, Make make) {
     constexpr StreamRule rule = std::is_same_v<T, uint16_t> ? streamRules::threshold16u : streamRules::copy;
     return underControlOf<T>([&] {
+        if constexpr (layout == Layout::C1) {
+            if (roi.width * int64_t{elementBytes<T>} == 16 && (src.step != 16 || dst.step != 16)) {
+                mapRowPairs(make(), src, dst, roi.height);
+                return QOR_OK;
+            }
+        }
         const bool streaming =
             src.data != dst.data && streams(rule, traffic(roi, 2 * channels(layout) * elementBytes<T>));
         mapImage<layout == Layout::AC4>(roi, channels(layout), Thresholding<decltype(make())>{make()}, streaming, dst,
@@ -102,8 +120,8 @@ QorResult replaceOutside(Image<const T> src, Image<T> dst, QorImageSize roi, con
         if (!areOrdered<T, layout>(thresholdLT, thresholdGT)) return QorResult{QOR_ERR_THRESHOLD};
         const auto constants = [](const T* values) { return constantsOf<T, layout>(values); };
         return run<layout>(src, dst, roi, [=] {
-            return ReplaceOutside<T, channels(layout)>{
-                {constants(thresholdLT), constants(valueLT)}, constants(thresholdGT), constants(valueGT)};
+            return ReplaceOutside<T, channels(layout)>{{constants(thresholdLT), constants(valueLT)},
+                                                       {constants(thresholdGT), constants(valueGT)}};
         });
     });
 }

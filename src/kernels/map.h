@@ -10,7 +10,10 @@
 // warning seen) and may offer
 //     Pack<D, n> tail(int phase, ptrdiff_t count, Pack<S, n>... sources)   for the last, partial block, whose elements
 //                                                                           from count on are zeros and never stored;
-//     static constexpr bool mayStream = true                               to be compiled with streaming stores too.
+//     static constexpr bool mayStream = true                               to be compiled with streaming stores too;
+//     static constexpr bool inRegisters = true                             to run from a copy, which stays as it is:
+//                                                                           stores might change the original, so that
+//                                                                           constants are loaded for every vector.
 #pragma once
 #include <algorithm>
 #include <cstdlib>
@@ -99,10 +102,16 @@ QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
         return op(phase, packs...);
 }
 
+template <class Op>
+constexpr bool runsFromCopy = requires {
+    Op::inRegisters;
+};
+
 /// Blocks three at a time, then one at a time, then what is left. Pointers come by value: through a reference, every
 /// store might change them, and they would be loaded again for each vector.
 template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
-QORI_INLINE void mapBlocks(Op& op, ptrdiff_t elements, D* dst, const S*... src) {
+QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
+    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
     ptrdiff_t i = 0;
     for (; i <= elements - 3 * n; i += 3 * n) {
         for (int phase = 0; phase < 3; ++phase)

@@ -176,7 +176,7 @@ constexpr int wordsOf = static_cast<int>(sizeof(T) / 4);
 /// The first n elements at p (0 <= n < lanes), zeros behind them.
 template <class T>
 QORI_INLINE Vec<T> loadPartial(const T* p, ptrdiff_t n) {
-    if constexpr (detail::wordsOf < T >> 0)
+    if constexpr (sizeof(T) >= 4)
         return fromInteger<T>(
             _mm256_maskload_epi32(reinterpret_cast<const int*>(p), detail::firstWords(n * detail::wordsOf<T>)));
     const auto* bytes = reinterpret_cast<const uint8_t*>(p);
@@ -193,7 +193,7 @@ QORI_INLINE Vec<T> loadPartial(const T* p, ptrdiff_t n) {
 /// Stores the first n elements (0 <= n < lanes).
 template <class T>
 QORI_INLINE void storePartial(T* p, Vec<T> a, ptrdiff_t n) {
-    if constexpr (detail::wordsOf < T >> 0)
+    if constexpr (sizeof(T) >= 4)
         return _mm256_maskstore_epi32(reinterpret_cast<int*>(p), detail::firstWords(n * detail::wordsOf<T>),
                                       toInteger(a.v));
     auto* bytes = reinterpret_cast<uint8_t*>(p);
