@@ -16,6 +16,7 @@ struct Panel {
 
 std::span<const Panel> copyPanels();
 std::span<const Panel> arithPanels();
+std::span<const Panel> borderPanels();
 std::span<const Panel> filterPanels();
 std::span<const Panel> resizePanels();
 std::span<const Panel> statsPanels();

@@ -34,9 +34,6 @@ struct Moved {
         else
             (streaming ? kernels::copyRowStreaming : kernels::copyRow)(dst, src, pixels * bytes);
     }
-    static void reverse(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
-        kernels::reverseRow<bytes, alphaKept>(dst, src, pixels, streaming);
-    }
     static void swap(uint8_t* a, uint8_t* b, ptrdiff_t pixels) { kernels::swapRows<bytes, alphaKept>(a, b, pixels); }
     /// Pixels from `left` on with those before `rightEnd`.
     static void swapReversed(uint8_t* left, uint8_t* rightEnd, ptrdiff_t pixels) {
@@ -58,31 +55,29 @@ bool streamsOut(QorImageSize roi, int channels) {
 template <class M>
 void reflect(Image<const uint8_t> src, Image<uint8_t> dst, QorImageSize roi, int32_t axis, bool streaming) {
     if (axis == flipBothAxes && isOneRun(roi, walk(src, M::pixelBytes), walk(dst, M::pixelBytes)))
-        return M::reverse(dst.data, src.data, ptrdiff_t{roi.width} * roi.height, streaming);
-    const auto row = reversesColumns(axis) ? M::reverse : M::copy;
-    for (int32_t y = 0; y < roi.height; ++y)
-        row(dst.row(y), src.row(reversesRows(axis) ? roi.height - 1 - y : y), roi.width, streaming);
+        return reflect<M>(src, dst, {roi.width * roi.height, 1}, flipVerticalAxis, streaming);
+    const uint8_t* const first = reversesRows(axis) ? src.row(roi.height - 1) : src.data;
+    const ptrdiff_t step = reversesRows(axis) ? -ptrdiff_t{src.step} : src.step;
+    if (reversesColumns(axis))
+        return kernels::reverseRows<M::pixelBytes, M::keepAlpha>(dst.data, dst.step, first, step, roi.width, roi.height,
+                                                                 streaming);
+    for (int32_t y = 0; y < roi.height; ++y) M::copy(dst.row(y), first + y * step, roi.width, streaming);
 }
 
 /// Exchanges what belongs together from both ends towards the middle.
 template <class M>
 void reflectInPlace(Image<uint8_t> image, QorImageSize roi, int32_t axis) {
-    const auto reverse = [](uint8_t* row, ptrdiff_t pixels) {
-        M::swapReversed(row, M::pixel(row, pixels), pixels / 2);
-    };
-    if (axis == flipVerticalAxis) {
-        for (int32_t y = 0; y < roi.height; ++y) reverse(image.row(y), roi.width);
-        return;
-    }
+    const auto reverse = kernels::reverseRowsInPlace<M::pixelBytes, M::keepAlpha>;
+    if (axis == flipVerticalAxis) return reverse(image.data, image.step, roi.width, roi.height);
     if (axis == flipBothAxes && isOneRun(roi, walk(image, M::pixelBytes)))
-        return reverse(image.data, ptrdiff_t{roi.width} * roi.height);
+        return reverse(image.data, 0, ptrdiff_t{roi.width} * roi.height, 1);
     for (int32_t top = 0, bottom = roi.height - 1; top < bottom; ++top, --bottom) {
         if (axis == flipHorizontalAxis)
             M::swap(image.row(top), image.row(bottom), roi.width);
         else
             M::swapReversed(image.row(top), M::pixel(image.row(bottom), roi.width), roi.width);
     }
-    if (axis == flipBothAxes && roi.height % 2 != 0) reverse(image.row(roi.height / 2), roi.width);
+    if (axis == flipBothAxes && roi.height % 2 != 0) reverse(image.row(roi.height / 2), 0, roi.width, 1);
 }
 
 /// The other diagonal is the first one with both images upside down.

@@ -168,13 +168,20 @@ QORI_INLINE void reverseGroups(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes
 }  // namespace
 
 template <int pixelBytes, bool keepAlpha>
-void reverseRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
+void reverseRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, ptrdiff_t pixels, int32_t rows,
+                 bool streaming) {
     const ptrdiff_t bytes = pixels * pixelBytes;
-    if (bytes < Group<pixelBytes>::bytes) return reverseShort<pixelBytes, keepAlpha>(dst, src, bytes);
-    const ptrdiff_t head = bytesToAlignment<pixelBytes>(dst);
-    if constexpr (!keepAlpha)
-        if (streaming && head >= 0) return reverseGroups<pixelBytes, false, true>(dst, src, bytes, head);
-    reverseGroups<pixelBytes, keepAlpha, false>(dst, src, bytes, head);
+    if (bytes < Group<pixelBytes>::bytes) {
+        for (; rows > 0; --rows, dst += dstStep, src += srcStep) reverseShort<pixelBytes, keepAlpha>(dst, src, bytes);
+        return;
+    }
+    for (; rows > 0; --rows, dst += dstStep, src += srcStep) {
+        const ptrdiff_t head = bytesToAlignment<pixelBytes>(dst);
+        if (!keepAlpha && streaming && head >= 0)
+            reverseGroups<pixelBytes, keepAlpha, true>(dst, src, bytes, head);
+        else
+            reverseGroups<pixelBytes, keepAlpha, false>(dst, src, bytes, head);
+    }
 }
 
 template <int pixelBytes, bool keepAlpha>
@@ -204,6 +211,17 @@ void swapReversed(uint8_t* left, uint8_t* rightEnd, ptrdiff_t pixels) {
 }
 
 template <int pixelBytes, bool keepAlpha>
+void reverseRowsInPlace(uint8_t* image, ptrdiff_t step, ptrdiff_t pixels, int32_t rows) {
+    const ptrdiff_t bytes = pixels * pixelBytes;
+    for (; rows > 0; --rows, image += step) {
+        if (bytes <= kHalfBytes<pixelBytes>)
+            reversePart<pixelBytes, keepAlpha>(image, image, bytes);
+        else
+            swapReversed<pixelBytes, keepAlpha>(image, image + bytes, pixels / 2);
+    }
+}
+
+template <int pixelBytes, bool keepAlpha>
 void swapRows(uint8_t* a, uint8_t* b, ptrdiff_t pixels) {
     const ptrdiff_t bytes = pixels * pixelBytes;
     ptrdiff_t done = 0;
@@ -219,9 +237,11 @@ void swapRows(uint8_t* a, uint8_t* b, ptrdiff_t pixels) {
     }
 }
 
-#define QORI_INSTANTIATE(pixelBytes, keepAlpha)                                                 \
-    template void reverseRow<pixelBytes, keepAlpha>(uint8_t*, const uint8_t*, ptrdiff_t, bool); \
-    template void swapReversed<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t);           \
+#define QORI_INSTANTIATE(pixelBytes, keepAlpha)                                                                 \
+    template void reverseRows<pixelBytes, keepAlpha>(uint8_t*, ptrdiff_t, const uint8_t*, ptrdiff_t, ptrdiff_t, \
+                                                     int32_t, bool);                                            \
+    template void reverseRowsInPlace<pixelBytes, keepAlpha>(uint8_t*, ptrdiff_t, ptrdiff_t, int32_t);           \
+    template void swapReversed<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t);                           \
     template void swapRows<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t)
 QORI_INSTANTIATE(1, false);
 QORI_INSTANTIATE(2, false);

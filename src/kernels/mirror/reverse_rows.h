@@ -6,10 +6,15 @@
 
 namespace qori::kernels {
 
-/// dst pixel x becomes src pixel pixels - 1 - x. The rows do not overlap. Streaming stores go past the cache wherever
-/// some pixel of dst lies on a 32-byte boundary.
+/// In each of some rows, dst pixel x becomes src pixel pixels - 1 - x. The images do not overlap. Streaming stores go
+/// past the cache wherever some pixel of a dst row lies on a 32-byte boundary.
 template <int pixelBytes, bool keepAlpha>
-void reverseRow(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming);
+void reverseRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, ptrdiff_t pixels, int32_t rows,
+                 bool streaming);
+
+/// The same in place.
+template <int pixelBytes, bool keepAlpha>
+void reverseRowsInPlace(uint8_t* image, ptrdiff_t step, ptrdiff_t pixels, int32_t rows);
 
 /// Exchanges pixel x at `left` with pixel x counted backwards from `rightEnd`. The two runs do not overlap.
 template <int pixelBytes, bool keepAlpha>
