@@ -142,20 +142,19 @@ QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, co
 
 namespace detail {
 
-/// Whether rows are gathered: several, shorter than a block, and apart from each other in every image, so that a row
-/// that is read ahead of the one before it being written is the same row.
-template <class... T>
-bool gathersRows(QorImageSize roi, int channels, Image<T>... images) {
-    constexpr int least = 4;
-    const int64_t elements = int64_t{roi.width} * channels;
-    if (elements >= blockOf<T...> || roi.height < least) return false;
-    return ((elements * elementBytes<T> <= kNarrowRow &&
-             std::abs(int64_t{images.step}) >= elements * elementBytes<T>)&&...);
-}
-
-/// mapRow over rows of fewer elements than a block, with buffers of 12 blocks for each image.
+/// mapRow over rows of fewer elements than a block, with buffers of 12 blocks for each image. False, and nothing done,
+/// where rows are long in bytes, are one run, or do not lie apart in every image: a row that is read ahead of the one
+/// before it being written must be the same row.
 template <bool keepAlpha, class Op, class D, class... S>
-QORI_NOINLINE void mapGathered(Op& op, int elements, int32_t rows, Image<D> dst, Image<const S>... src) {
+QORI_NOINLINE bool mapGathered(Op& op, int channels, QorImageSize roi, const Image<D>& dst,
+                               const Image<const S>&... src) {
+    const int elements = roi.width * channels;
+    const auto liesApart = [=](const auto& image) {
+        const int bytes = elements * static_cast<int>(sizeof(*image.data));
+        return bytes <= kNarrowRow && std::abs(int64_t{image.step}) >= bytes;
+    };
+    if (!(liesApart(dst) && ... && liesApart(src))) return false;
+    if (isOneRun(roi, walk(dst, channels), walk(src, channels)...)) return false;
     constexpr int n = blockOf<D, S...>, room = 12 * n;
     alignas(32) D result[room];
     alignas(32) uint8_t sources[sizeof...(S) + 1][room * std::max({sizeof(D), sizeof(S)...})];
@@ -164,8 +163,8 @@ QORI_NOINLINE void mapGathered(Op& op, int elements, int32_t rows, Image<D> dst,
         copyNarrowRows(asBytes(to), bytes, asBytes(from.row(y)), from.step, bytes, count);
     };
     const int most = room / elements;
-    for (int32_t y = 0, count; y < rows; y += count) {
-        count = std::min(most, rows - y);
+    for (int32_t y = 0, count; y < roi.height; y += count) {
+        count = std::min(most, roi.height - y);
         if constexpr (keepAlpha) gather(result, dst, y, count);
         [&]<size_t... i>(std::index_sequence<i...>) {
             (gather(sources[i], src, y, count), ...);
@@ -176,6 +175,7 @@ QORI_NOINLINE void mapGathered(Op& op, int elements, int32_t rows, Image<D> dst,
         const int bytes = elements * elementBytes<D>;
         copyNarrowRows(asBytes(dst.row(y)), dst.step, asBytes(result), bytes, bytes, count);
     }
+    return true;
 }
 
 }  // namespace detail
@@ -183,8 +183,11 @@ QORI_NOINLINE void mapGathered(Op& op, int elements, int32_t rows, Image<D> dst,
 /// mapRow over a region of `channels` interleaved channels.
 template <bool keepAlpha = false, class Op, class D, class... S>
 void mapImage(QorImageSize roi, int channels, Op&& op, bool streaming, Image<D> dst, Image<const S>... src) {
-    if (detail::gathersRows(roi, channels, dst, src...) && !isOneRun(roi, walk(dst, channels), walk(src, channels)...))
-        return detail::mapGathered<keepAlpha>(op, roi.width * channels, roi.height, dst, src...);
+    constexpr int fewest = 4;  // rows that are worth gathering
+    if (int64_t{roi.width} * channels < blockOf<D, S...> && roi.height >= fewest) [[unlikely]] {
+        // Copies of the images, so that the others may stay in registers.
+        if (detail::mapGathered<keepAlpha>(op, channels, roi, Image<D>{dst}, Image<const S>{src}...)) return;
+    }
     forEachRow(
         roi,
         [&](ptrdiff_t pixels, D* d, const S*... s) { mapRow<keepAlpha>(op, pixels * channels, streaming, d, s...); },
