@@ -61,7 +61,7 @@ Picture turnedTiles(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Framed tiles", "CopyConstBorder C3", framedTiles, {16, 16}},
+    {"Framed tiles", "CopyConstBorder C3", framedTiles, {48, 48}},
     {"Outermost pixels repeated", "CopyReplicateBorder C3", drawnOut, {16, 16}},
     {"Mirrored quarters", "Mirror C3, axes 0 to 2", kaleidoscope, {16, 16}},
     {"Tiles about their diagonals", "Mirror C3, axes 3 and 4", turnedTiles, {16, 16}},
