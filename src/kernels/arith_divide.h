@@ -335,7 +335,7 @@ private:
             _mm256_sub_epi64(_mm256_castpd_si256(_mm256_add_pd(below, shift)), _mm256_castpd_si256(shift));
         const __m256i odd = _mm256_add_epi64(_mm256_add_epi64(k, k), one);
         // A shift by 64 or more gives 0, which is right modulo 2^64.
-        const __m256i twice = _mm256_sll_epi64(sum, _mm_cvtsi32_si128(1 + -std::clamp(scale, -100, 0)));
+        const __m256i twice = _mm256_sll_epi64(sum, _mm_cvtsi32_si128(1 - std::clamp(scale, -100, 0)));
         const __m256i half = _mm256_sll_epi64(product(odd, norm), _mm_cvtsi32_si128(std::clamp(scale, 0, 100)));
         const __m256i d = _mm256_sub_epi64(twice, half), zero = _mm256_setzero_si256();
         // One more where D > 0, and where D = 0 for an odd k.
