@@ -59,7 +59,8 @@ auto overRegions(bool squares, Call call) {
 
 template <class S, class D, int n, int sources, class Call>
 std::vector<Ladder> widthsAndSquares(const std::string& operation, Call call) {
-    return {ladder(operation + ", widths", kWidths, overRegions<S, D, n, sources>(false, call)),
+    return {ladder(operation + ", widths", kWidths, overRegions<S, D, n, sources>(false, call),
+                   "rows of less than a vector, or of 64 bytes, are worked on together"),
             ladder(operation + ", squares", kSquares, overRegions<S, D, n, sources>(true, call), "beyond a cache")};
 }
 
@@ -182,7 +183,9 @@ Job floatsOf(Order order, int count) {
             }};
 }
 const Ladders rangeOfFloats{
-    {ladder("histogram range 32f, levels", kLevelCounts, [](int count) { return floatsOf(Order::random, count); }),
+    {ladder(
+         "histogram range 32f, levels", kLevelCounts, [](int count) { return floatsOf(Order::random, count); },
+         "levels are compared eight at a time"),
      {"histogram range 32f, constant to random data", [] {
           const auto step = [](const char* name, Order order) {
               Job job = floatsOf(order, 256);
@@ -197,11 +200,14 @@ const Ladders rangeOfFloats{
 /// Cost per pixel read or written, whichever are more.
 template <class T>
 Ladder ratioLadder(const char* operation, QorInterpolationKind kind, bool antialiasing, std::vector<int> lengths) {
-    return ladder(operation, std::move(lengths), [=](int length) -> Job {
-        const Sizes sizes{{480, 480}, {length, length}};
-        return {double(sizes.src.pixels() + sizes.dst.pixels()),
-                resizeJob<T, 1>(kind, antialiasing, Image<T>(sizes.src, 1), Image<T>(sizes.dst, 1), sizes)};
-    });
+    return ladder(
+        operation, std::move(lengths),
+        [=](int length) -> Job {
+            const Sizes sizes{{480, 480}, {length, length}};
+            return {double(sizes.src.pixels() + sizes.dst.pixels()),
+                    resizeJob<T, 1>(kind, antialiasing, Image<T>(sizes.src, 1), Image<T>(sizes.dst, 1), sizes)};
+        },
+        "halves and other simple ratios have ways of their own");
 }
 const std::vector<int> kReduced = {1,   2,   3,   5,   8,   13,  21,  34,  48,  55,  60,  80,  89,  96,
                                    120, 144, 160, 200, 233, 240, 241, 320, 359, 360, 377, 400, 479, 480};
