@@ -260,7 +260,8 @@ using ChunkOf = Chunk<typename Taps::Source, Taps::block>;
 
 /// The sums of a chunk, by slots; where `toDst`, those of its first blocks go there instead. Returns how many did.
 template <class Taps, int rows>
-ptrdiff_t sumChunk(const PackedKernel<Taps>& kernel, const ChunkOf<Taps>& chunk, bool toDst, ChunkSums<Taps>& sums) {
+QORI_INLINE ptrdiff_t sumChunk(const PackedKernel<Taps>& kernel, const ChunkOf<Taps>& chunk, bool toDst,
+                               ChunkSums<Taps>& sums) {
     constexpr ptrdiff_t block = Taps::block;
     const auto [p, step, pixel, elements, readable, dst, dstStep, dstElementBytes] = chunk;
     const ptrdiff_t whole = elements / block, all = chunk.slots();
@@ -297,6 +298,12 @@ void filterChunk(const PackedKernel<Taps>& kernel, const ChunkOf<Taps>& chunk, F
                    chunk.elements - first);
 }
 
+/// For InGroups, whose every rule would have it again.
+template <class Taps, int rows>
+QORI_NOINLINE void sumGroup(const PackedKernel<Taps>& kernel, const ChunkOf<Taps>& chunk, ChunkSums<Taps>& sums) {
+    sumChunk<Taps, rows>(kernel, chunk, false, sums);
+}
+
 /// The sums of one group of rows to those of the groups before it; `start` is the total's, for the first.
 template <int rows, class Taps>
 QORI_NOINLINE void addGroup(ChunkSums<InGroups<Taps>>& sums, ptrdiff_t slots, bool isFirst, int32_t start) {
@@ -326,7 +333,7 @@ requires(!std::is_same_v<typename Grouped::Sum, typename Grouped::Total>)  //
             kernel.coefficients + y * kernel.rowCoefficients(), {kernel.size.width, end - y}, kernel.start};
         ChunkOf<Taps> below = chunk;
         below.window = advance(chunk.window, y * chunk.step);
-        sumChunk<Taps, rows>(part, below, false, sums);
+        sumGroup<Taps, rows>(part, below, sums);
         addGroup<rows>(sums, chunk.slots(), group == 0, start);
         y = end;
     }
