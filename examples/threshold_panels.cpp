@@ -39,8 +39,7 @@ Picture zebra(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Otsu mask, the photograph in its left half", "ComputeThreshold_Otsu C1, Threshold_GTVal, _LTVal C1, Copy C3M",
-     brightParts},
+    {"Otsu mask, the photograph in its left half", "ComputeThreshold_Otsu C1, Threshold C1, Copy C3M", brightParts},
     {"Channels below 64 and above 192 replaced", "Threshold_LTValGTVal C3", zebra},
 };
 
