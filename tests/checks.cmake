@@ -68,7 +68,7 @@ if(NOT WIN32)
     file(CONFIGURE OUTPUT ${headers_folder}/together.cpp CONTENT "${together}")
     add_library(headers_alone OBJECT ${header_sources} ${headers_folder}/together.cpp)
     target_include_directories(headers_alone PRIVATE ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR}/core
-        ${PROJECT_SOURCE_DIR}/src ${PROJECT_SOURCE_DIR}/src/frame)
+        ${PROJECT_SOURCE_DIR}/src)
     target_link_libraries(headers_alone PRIVATE qori_warnings qori_target qori_freestanding)
     # Nothing of the objects is used.
     target_compile_options(headers_alone PRIVATE -O0 -Wno-unused-function)

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // An image and constants, one per processed channel.
 #include "images.h"
-#include "kernels/arith_divide.h"
+#include "kernels/arith/divide.h"
 #include "kernels/copy_rows.h"
 
 namespace qori::arith {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Quotients of two images.
 #include "images.h"
-#include "kernels/arith_divide.h"
+#include "kernels/arith/divide.h"
 
 namespace qori::arith {
 namespace {

@@ -4,7 +4,7 @@
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "frame/streaming.h"
-#include "kernels/arith.h"
+#include "kernels/arith/arith.h"
 
 namespace qori::arith {
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Functions of one image. Integer results are the real results under the scaling rule, rounded once.
 #include "images.h"
-#include "kernels/exp_ln.h"
+#include "kernels/arith/exp_ln.h"
 #include "kernels/pack_convert.h"
 
 namespace qori::arith {

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <bit>
 
-#include "checks.h"
-#include "float_control.h"
-#include "kernels/bits.h"
+#include "frame/checks.h"
+#include "frame/float_control.h"
+#include "kernels/convert/bits.h"
 #include "kernels/pack_convert.h"
-#include "kernels/scale_integers.h"
-#include "streaming.h"
+#include "kernels/convert/scale_integers.h"
+#include "frame/streaming.h"
 
 namespace qori::convert {
 namespace {

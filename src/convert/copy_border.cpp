@@ -2,7 +2,7 @@
 // An image inside a larger one, with a frame around it.
 #include "frame/checks.h"
 #include "frame/streaming.h"
-#include "kernels/select_rows.h"
+#include "kernels/copy/select_rows.h"
 
 namespace qori::convert {
 namespace {

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Otsu's threshold of an 8-bit image.
-#include "checks.h"
-#include "driver.h"
-#include "float_control.h"
-#include "kernels/histogram.h"
+#include "frame/checks.h"
+#include "image/driver.h"
+#include "frame/float_control.h"
+#include "kernels/stats/histogram.h"
 
 namespace qori::convert {
 namespace {

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "checks.h"
-#include "float_control.h"
+#include "frame/checks.h"
+#include "frame/float_control.h"
 #include "kernels/pack_convert.h"
-#include "streaming.h"
+#include "frame/streaming.h"
 
 namespace qori::convert {
 namespace {

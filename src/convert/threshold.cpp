@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Fixed thresholds: clipping to a threshold, and replacing what lies beyond it.
 #include "kernels/threshold/threshold.h"
-#include "checks.h"
-#include "float_control.h"
-#include "streaming.h"
+#include "frame/checks.h"
+#include "frame/float_control.h"
+#include "frame/streaming.h"
 
 namespace qori::convert {
 namespace {

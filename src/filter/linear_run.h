@@ -1,10 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Packed kernels and rounding rules meet images: the run of every general linear filter.
 #pragma once
+#include "frame/border.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
-#include "kernels/filter_rules.h"
-#include "kernels/filter_sums.h"
+#include "kernels/filter/rules.h"
+#include "kernels/filter/sums.h"
 #include "packing.h"
 
 namespace qori::filter {

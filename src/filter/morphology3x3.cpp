@@ -5,7 +5,7 @@
 #include "frame/plan.h"
 #include "frame/row_window.h"
 #include "frame/streaming.h"
-#include "kernels/morphology.h"
+#include "kernels/filter/morphology.h"
 
 namespace qori::filter {
 namespace {

@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <limits>
 
-#include "kernels/filter_taps.h"
+#include "kernels/filter/taps.h"
 
 namespace qori::filter {
 

@@ -18,7 +18,7 @@
 //     |         band of b rows        |   Nothing outside the region is read beyond a closed side.
 //     +-------------------------------+
 #pragma once
-#include "image.h"
+#include "image/image.h"
 
 namespace qori {
 

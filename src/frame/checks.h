@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Argument checks. Each returns QOR_OK or its status; a family writes `firstOf(...)` with its checks in their order.
 #pragma once
-#include "image.h"
+#include "image/image.h"
 
 namespace qori {
 

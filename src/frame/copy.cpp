@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copies: elements are moved bit for bit, so all types of one size share their kernels.
 #include "checks.h"
-#include "driver.h"
-#include "kernels/channel_rows.h"
-#include "kernels/select_rows.h"
+#include "image/driver.h"
+#include "kernels/copy/channel_rows.h"
+#include "kernels/copy/select_rows.h"
 #include "kernels/simd.h"
 #include "streaming.h"
 

@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <type_traits>
 
-#include "image.h"
+#include "image/image.h"
 #include "qorcore.h"
 
 namespace qori {

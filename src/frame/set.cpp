@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "checks.h"
-#include "driver.h"
-#include "kernels/select_rows.h"
+#include "image/driver.h"
+#include "kernels/copy/select_rows.h"
 #include "kernels/simd.h"
 #include "streaming.h"
 

@@ -2,7 +2,7 @@
 // When a call stores past the cache. Streaming pays where the result would be evicted before anyone reads it, so the
 // call's traffic is held against the largest cache; the choice never changes a result.
 #pragma once
-#include "image.h"
+#include "image/image.h"
 
 namespace qori {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "checks.h"
+#include "frame/checks.h"
 #include "frame/float_control.h"
 #include "resize_columns_run.h"
 #include "resize_half_run.h"

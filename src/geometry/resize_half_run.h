@@ -2,7 +2,7 @@
 // Tiles of linear and super-sampling resizes that halve both lengths: every pixel is the mean of four, no border is met
 // and no table is needed. The results are those of the general ways, bit for bit.
 #pragma once
-#include "kernels/resize_half.h"
+#include "kernels/resize/half.h"
 #include "resize_run.h"
 
 namespace qori::geometry {

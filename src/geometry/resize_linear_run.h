@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Tiles of linear 8u in fixed point.
 #pragma once
-#include "kernels/resize_linear.h"
+#include "kernels/resize/linear.h"
 #include "resize_run.h"
 
 namespace qori::geometry {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "resize_plan.h"
 
-#include "kernels/resize_words.h"
+#include "kernels/resize/words.h"
 #include "lanczos_table.h"
 
 namespace qori::geometry {

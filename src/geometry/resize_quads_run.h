@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Filtering the rows of a tile of three or four channels, four at once: one of the ways of resize_rows.h.
 #pragma once
-#include "kernels/resize_quads.h"
+#include "kernels/resize/quads.h"
 #include "resize_rows.h"
 
 namespace qori::geometry {

@@ -11,8 +11,8 @@
 #pragma once
 #include <algorithm>
 
-#include "kernels/resize_lines.h"
-#include "kernels/resize_phases.h"
+#include "kernels/resize/lines.h"
+#include "kernels/resize/phases.h"
 #include "resize_run.h"
 #include "resize_totals.h"
 

@@ -2,8 +2,8 @@
 // Resizing one tile. Each way of doing it is a class that takes its memory from a work buffer in its constructor, so
 // that the query for the buffer's size and the operation cannot disagree, and then runs.
 #pragma once
-#include "kernels/resize_gather.h"
-#include "kernels/resize_taps.h"
+#include "kernels/resize/gather.h"
+#include "kernels/resize/taps.h"
 #include "resize_plan.h"
 
 namespace qori::geometry {

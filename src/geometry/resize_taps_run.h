@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Tiles of the weighted forms in single precision: linear, cubic, Lanczos, super and antialiasing.
 #pragma once
-#include "kernels/resize_taps_columns.h"
+#include "kernels/resize/taps_columns.h"
 #include "resize_rows.h"
 #include "resize_totals.h"
 

@@ -5,7 +5,7 @@
 #pragma once
 #include <algorithm>
 
-#include "kernels/resize_taps_columns.h"
+#include "kernels/resize/taps_columns.h"
 #include "resize_run.h"
 
 namespace qori::geometry {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Tiles of the weighted 8u forms in integers, for plans whose weights allow it.
 #pragma once
-#include "kernels/resize_words.h"
+#include "kernels/resize/words.h"
 #include "resize_run.h"
 
 namespace qori::geometry {

@@ -20,7 +20,7 @@
 #include <utility>
 
 #include "copy_rows.h"
-#include "frame/driver.h"
+#include "image/driver.h"
 #include "simd.h"
 
 namespace qori::kernels {

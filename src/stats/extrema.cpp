@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Extrema, their positions, extrema of blocks, and counts of elements within bounds.
-#include "checks.h"
-#include "driver.h"
-#include "float_control.h"
-#include "kernels/reduce_count.h"
-#include "kernels/reduce_extrema.h"
-#include "kernels/reduce_narrow.h"
+#include "frame/checks.h"
+#include "image/driver.h"
+#include "frame/float_control.h"
+#include "kernels/stats/reduce_count.h"
+#include "kernels/stats/reduce_extrema.h"
+#include "kernels/stats/reduce_narrow.h"
 
 namespace qori::stats {
 namespace {

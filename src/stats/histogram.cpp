@@ -2,10 +2,10 @@
 // Histograms with levels given in the call or prepared in a record.
 #include <cfloat>
 
-#include "checks.h"
-#include "float_control.h"
+#include "frame/checks.h"
+#include "frame/float_control.h"
 #include "histogram_count.h"
-#include "plan.h"
+#include "frame/plan.h"
 
 namespace qori::stats {
 namespace {

@@ -2,9 +2,9 @@
 // Counts an image between levels. All ways give the same counts; which one is taken depends on the number of pixels and
 // on the levels.
 #pragma once
-#include "driver.h"
-#include "kernels/histogram.h"
-#include "kernels/histogram_levels.h"
+#include "image/driver.h"
+#include "kernels/stats/histogram.h"
+#include "kernels/stats/histogram_levels.h"
 
 namespace qori::stats {
 

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Norms, sums, means and dot products: a quantity is accumulated per channel over the region, then finished in double
 // precision.
-#include "checks.h"
-#include "float_control.h"
-#include "kernels/reduce_measures.h"
-#include "kernels/reduce_narrow.h"
-#include "kernels/reduce_sequential.h"
+#include "frame/checks.h"
+#include "frame/float_control.h"
+#include "kernels/stats/reduce_measures.h"
+#include "kernels/stats/reduce_narrow.h"
+#include "kernels/stats/reduce_sequential.h"
 
 namespace qori::stats {
 namespace {

@@ -3,7 +3,7 @@
 
 #include <algorithm>
 
-#include "kernels/select_rows.h"
+#include "kernels/copy/select_rows.h"
 
 namespace qori::kernels {
 namespace {

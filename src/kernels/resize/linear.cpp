@@ -1,0 +1,155 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "linear.h"
+
+#include "floats.h"
+
+namespace qori::kernels {
+namespace {
+
+/// Fine: with a = 64 (p0 - p1), the product a * -2w is 128 w (p1 - p0), below 2^29, and the rounding high multiply
+/// gives (w (p1 - p0) + 128) >> 8. -2w reaches -32768, a never does. Coarse: with w = 128 v, the same is half of p0
+/// (128 - v) + p1 v, rounded up; that sum is 32640 at most.
+template <bool coarse>
+QORI_INLINE __m256i interpolatePairs(Bytes pairs, __m256i weights) {
+    if constexpr (coarse) return _mm256_avg_epu16(_mm256_maddubs_epi16(pairs.v, weights), _mm256_setzero_si256());
+    const __m256i difference = _mm256_maddubs_epi16(pairs.v, _mm256_set1_epi16(static_cast<int16_t>(0xC040)));
+    const __m256i first = _mm256_maddubs_epi16(pairs.v, _mm256_set1_epi16(0x0040));
+    return _mm256_add_epi16(first, _mm256_mulhrs_epi16(difference, weights));
+}
+
+/// An even number of groups; two of them move on by 64 bytes where rows are not much reduced.
+template <int windows, bool coarse>
+QORI_INLINE void linearGroups(const Gather& gather, LinearRow row, const int16_t* weights, int16_t* out, ptrdiff_t g,
+                              ptrdiff_t end) {
+    const int32_t* base = gather.bases + 2 * windows * g;
+    const uint8_t* mask = gather.masks + 32 * windows * g;
+    for (; g < end; g += 2) {
+        prefetch(row.later + base[0]);
+        const Bytes first = gatherGroup<windows>(row.bytes, base, mask);
+        const Bytes second = gatherGroup<windows>(row.bytes, base, mask);
+        store(out + 16 * g, Vec<int16_t>{interpolatePairs<coarse>(first, load(weights + 16 * g).v)});
+        store(out + 16 * g + 16, Vec<int16_t>{interpolatePairs<coarse>(second, load(weights + 16 * g + 16).v)});
+    }
+}
+
+template <int windows, bool coarse>
+QORI_NOINLINE void linearRowOf(const Gather& gather, LinearRow row, const int16_t* weights, int16_t* out) {
+    linearGroups<windows, coarse>(gather, row, weights, out, 0, gather.groups);
+}
+
+/// Masks, weights and bases of alike groups stay in registers.
+template <bool coarse>
+QORI_NOINLINE void linearRowAlike(const Gather& gather, LinearRow row, const int16_t* weights, int16_t* out) {
+    constexpr ptrdiff_t kFirst = 2;
+    linearGroups<1, coarse>(gather, row, weights, out, 0, kFirst);
+    const Bytes masks[2] = {load(gather.masks + 32 * kFirst), load(gather.masks + 32 * kFirst + 32)};
+    const __m256i factors[2] = {load(weights + 16 * kFirst).v, load(weights + 16 * kFirst + 16).v};
+    const uint8_t* from[4];
+    for (int i = 0; i < 4; ++i) from[i] = row.bytes + gather.bases[2 * kFirst + i];
+    const ptrdiff_t end = gather.alikeEnd, stride = gather.stride;
+    ptrdiff_t g = kFirst;
+    const uint8_t* const later = row.later + gather.bases[2 * kFirst];
+    for (ptrdiff_t at = 0; g + 2 <= end; g += 2, at += stride) {
+        prefetch(later + at);
+        for (int i = 0; i < 2; ++i) {
+            const Bytes pairs = shuffleHalves(loadHalves(from[2 * i] + at, from[2 * i + 1] + at), masks[i]);
+            store(out + 16 * (g + i), Vec<int16_t>{interpolatePairs<coarse>(pairs, factors[i])});
+        }
+    }
+    linearGroups<1, coarse>(gather, row, weights, out, g, gather.groups);
+}
+
+QORI_NOINLINE void linearRowByElements(const Gather& gather, const uint8_t* row, const int16_t* weights, bool coarse,
+                                       int16_t* out) {
+    for (ptrdiff_t i = 0; i < 16 * gather.groups; ++i) {
+        const int p0 = row[gather.offsets[2 * i]], p1 = row[gather.offsets[2 * i + 1]];
+        const int w = coarse ? (weights[i] >> 8) * 128 : -weights[i] >> 1;
+        out[i] = static_cast<int16_t>((p0 << 6) + (((p1 - p0) * w + 128) >> 8));
+    }
+}
+
+template <bool coarse>
+void linearRow(const Gather& gather, LinearRow row, const int16_t* weights, int16_t* out) {
+    if (gather.alikeEnd > 4) return linearRowAlike<coarse>(gather, row, weights, out);
+    switch (gather.windows) {
+        case 1: return linearRowOf<1, coarse>(gather, row, weights, out);
+        case 2: return linearRowOf<2, coarse>(gather, row, weights, out);
+        case 3: return linearRowOf<3, coarse>(gather, row, weights, out);
+        case 4: return linearRowOf<4, coarse>(gather, row, weights, out);
+        default: return linearRowByElements(gather, row.bytes, weights, coarse, out);
+    }
+}
+
+/// (h0 * 2^14 + (h1 - h0) w + 2^19) >> 20 is (h0 + ((h1 - h0) 4w >> 16) + 32) >> 6: the parts dropped early are below
+/// the last bit that counts. 4w must be a signed factor, so from 2^15 on the sum starts at h1 with 4w - 2^16.
+struct LinearMix {
+    bool nearFirst;
+    __m256i factor;
+
+    explicit LinearMix(int32_t w)
+        : nearFirst(w < 8192), factor(_mm256_set1_epi16(static_cast<int16_t>(nearFirst ? 4 * w : 4 * w - 65536))) {}
+};
+
+/// The rounding high multiply by 2^9 rounds 6 bits off.
+QORI_INLINE __m256i mixWords(__m256i origin, __m256i difference, __m256i factor) {
+    const __m256i sum = _mm256_add_epi16(origin, _mm256_mulhi_epi16(difference, factor));
+    return _mm256_mulhrs_epi16(sum, _mm256_set1_epi16(1 << 9));
+}
+
+template <bool isPair, bool nearFirst, bool otherNearFirst>
+QORI_NOINLINE void mixRows(const int16_t* h0, const int16_t* h1, __m256i factor, __m256i otherFactor, uint8_t* dst,
+                           uint8_t* other, ptrdiff_t elements) {
+    for (ptrdiff_t i = 0; i < elements; i += 32) {
+        prefetchAhead(dst + i);
+        if constexpr (isPair) prefetchAhead(other + i);
+        const __m256i low = load(h0 + i).v, high = load(h0 + i + 16).v;
+        const __m256i low1 = load(h1 + i).v, high1 = load(h1 + i + 16).v;
+        const __m256i lowRise = _mm256_sub_epi16(low1, low), highRise = _mm256_sub_epi16(high1, high);
+        const auto mix = [&](bool isNear, __m256i f) {
+            return Bytes{_mm256_packus_epi16(mixWords(isNear ? low : low1, lowRise, f),
+                                             mixWords(isNear ? high : high1, highRise, f))};
+        };
+        storeUpTo(dst + i, mix(nearFirst, factor), elements - i);
+        if constexpr (isPair) storeUpTo(other + i, mix(otherNearFirst, otherFactor), elements - i);
+    }
+}
+
+}  // namespace
+
+bool makeCoarse(int16_t* weights, ptrdiff_t count) {
+    const __m256i zero = _mm256_setzero_si256(), fine = _mm256_set1_epi16(255);
+    __m256i refused = zero;
+    for (ptrdiff_t i = 0; i < count; i += 16) {
+        const __m256i w = load(weights + i).v;
+        refused = _mm256_or_si256(refused, _mm256_or_si256(_mm256_and_si256(w, fine), _mm256_cmpeq_epi16(w, zero)));
+    }
+    if (!_mm256_testz_si256(refused, refused)) return false;
+    for (ptrdiff_t i = 0; i < count; i += 16) {
+        // -256 v becomes 128 - v in the low byte and v in the high one.
+        const __m256i high = _mm256_sub_epi16(zero, load(weights + i).v);
+        const __m256i low = _mm256_sub_epi16(_mm256_set1_epi16(128), _mm256_srli_epi16(high, 8));
+        store(weights + i, Vec<int16_t>{_mm256_or_si256(high, low)});
+    }
+    return true;
+}
+
+void linearRow8u(const Gather& gather, LinearRow row, const int16_t* weights, bool coarse, int16_t* out) {
+    (coarse ? linearRow<true> : linearRow<false>)(gather, row, weights, out);
+}
+
+void linearColumn8u(const int16_t* h0, const int16_t* h1, int32_t w, uint8_t* dst, ptrdiff_t elements) {
+    const LinearMix mix(w);
+    (mix.nearFirst ? mixRows<false, true, true> : mixRows<false, false, true>)(h0, h1, mix.factor, mix.factor, dst, dst,
+                                                                               elements);
+}
+
+void linearColumns8u(const int16_t* h0, const int16_t* h1, const int32_t w[2], uint8_t* dst, uint8_t* second,
+                     ptrdiff_t elements) {
+    const LinearMix mix(w[0]), other(w[1]);
+    const auto run = mix.nearFirst     ? other.nearFirst ? mixRows<true, true, true> : mixRows<true, true, false>
+                         : other.nearFirst ? mixRows<true, false, true>
+                                       : mixRows<true, false, false>;
+    run(h0, h1, mix.factor, other.factor, dst, second, elements);
+}
+
+}  // namespace qori::kernels

@@ -1,0 +1,47 @@
+// SPDX-License-Identifier: Apache-2.0
+// Weighted sums along a row by permutation, for enlargements and small reductions. The source row lies as a line of
+// floats; the taps of eight neighbouring results come from a window of eight floats, or of two times eight, in the same
+// arrangement for every tap. The sums are those of resize_taps.h, bit for bit.
+#pragma once
+#include "taps.h"
+
+namespace qori::kernels {
+
+/// Whether lines are the way: eight neighbouring results must look at sixteen neighbouring floats, and one window
+/// serves many taps better than two do. Pixels n apart look ceil(n * ratio) apart at most; eight elements are of pixels
+/// 7, 3 (from a last channel on) or 1 apart.
+constexpr bool suitsLines(double ratio, int32_t taps, int channels) {
+    if (ratio <= 1) return true;
+    return taps <= 2 && ratio <= (channels == 1 ? 2 : channels == 3 ? 4.0 / 3 : 3);
+}
+
+struct LineFilter {
+    static constexpr int kOverrun = 16;  ///< Floats behind a line's last that may be read.
+
+    enum class Windows {
+        one,  ///< Eight floats.
+        two   ///< Sixteen.
+    };
+
+    int32_t taps = 0, channels = 0;
+    Windows windows = Windows::one;
+    ptrdiff_t groups = 0;      ///< Of eight results.
+    int32_t* bases = nullptr;  ///< Per group: where the window of the first tap begins.
+    int32_t* order = nullptr;  ///< Per result: place in the windows.
+    float* weights = nullptr;  ///< Per group and tap: eight weights.
+    ptrdiff_t cycle = 0;       ///< Groups after which order and weights repeat, or 0. The last group may differ.
+};
+
+/// Fills the filter's tables for `width` pixels; the line begins at source column `origin`. Results behind the last
+/// repeat it.
+void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t origin);
+
+/// `later` is the memory of a row that will be needed soon, with `bytes` per float of the line; it is asked for, not
+/// read.
+void filterLine(const LineFilter& filter, const float* line, const uint8_t* later, int bytes, float* out);
+
+/// Converts `elements` elements and repeats the first and the last pixel at the ends.
+template <class T, int channels>
+void expandLine(const T* row, ptrdiff_t elements, int32_t left, int32_t right, float* line);
+
+}  // namespace qori::kernels

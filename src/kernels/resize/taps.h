@@ -1,0 +1,46 @@
+// SPDX-License-Identifier: Apache-2.0
+// Separable weighted sums in single precision. Eight rows are filtered at once: a chunk of their columns is turned so
+// that a column's eight elements fill a vector, each result is a weighted sum of such vectors, and the results are
+// turned back into rows. This costs the same for every ratio and number of channels, and reads no element twice.
+//
+// The order of resize_pairs.h: how an image is cut into tiles changes no bit.
+#pragma once
+#include "pairs.h"
+
+namespace qori::kernels {
+
+constexpr int kTapRows = 8;    ///< Rows filtered at once.
+constexpr int kTapChunk = 32;  ///< Destination pixels whose results are turned back together.
+constexpr int kTapBlock = 32;  ///< Elements to which filtered rows are padded.
+
+/// What a destination pixel is made of, along a row.
+struct PixelTaps {
+    int32_t first;    ///< Source column of the first tap; columns outside the legal ones repeat the nearest.
+    int32_t weights;  ///< Where its weights begin.
+};
+
+struct RowFilter {
+    const PixelTaps* pixels;
+    const float* weights;
+    int32_t taps;
+    int32_t width;                  ///< Destination pixels.
+    int32_t legalFirst, legalLast;  ///< Source columns that may be read.
+    int32_t group;                  ///< Destination pixels, at most kTapChunk, whose columns are turned together.
+    int32_t period;                 ///< Pixels after which the weights repeat, or 0.
+    bool isPadded;                  ///< A last weight of 0 stands for no tap: there may be no such pixel.
+    double scale;                   ///< Factor of the results that have more taps than a chain.
+    float* columns;                 ///< Room for the turned columns of a group: tapColumnFloats().
+    float* results;                 ///< kTapChunk pixels of eight rows.
+};
+
+/// Pixels per group for a ratio and a number of taps: columns between the taps of distant pixels are not worth turning.
+int32_t tapGroup(double ratio, int32_t taps);
+/// Floats of RowFilter::columns.
+int64_t tapColumnFloats(double ratio, int32_t taps, int channels);
+
+/// Filters eight rows, each given by the address of source column 0, into rows of floats that hold whole blocks. The
+/// last vector is filled up with zeros.
+template <class T, int channels>
+void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* const out[kTapRows]);
+
+}  // namespace qori::kernels

@@ -1,0 +1,88 @@
+// SPDX-License-Identifier: Apache-2.0
+// Rows for reductions. To begin and to end a row costs as much as hundreds of its bytes, so that narrow rows are
+// brought together first: their pixels follow each other in a buffer as they would in an image without padding, which
+// leaves channels in their lanes and the order of the elements as it was.
+#pragma once
+#include <algorithm>
+#include <utility>
+
+#include "image/driver.h"
+#include "kernels/simd.h"
+
+namespace qori::kernels {
+
+namespace detail {
+
+/// Bytes up to which a row is worth a copy, and of rows brought together.
+constexpr ptrdiff_t kNarrow = 160, kTogether = 4'096;
+/// Fewer rows cost less than the wait until the buffer can be read.
+constexpr int32_t kFewRows = 8;
+
+struct Sixteen {
+    uint64_t halves[2];
+};
+
+/// Copies rows that are as long as a chunk, or up to twice as long: two chunks each, which may overlap.
+template <class Chunk>
+QORI_INLINE void packByTwo(uint8_t* out, const uint8_t* src, ptrdiff_t step, int32_t rows, ptrdiff_t bytes) {
+    const ptrdiff_t second = bytes - static_cast<ptrdiff_t>(sizeof(Chunk));
+    for (int32_t y = 0; y < rows; ++y, src += step, out += bytes) {
+        Chunk first, last;
+        __builtin_memcpy(&first, src, sizeof first);
+        __builtin_memcpy(&last, src + second, sizeof last);
+        __builtin_memcpy(out, &first, sizeof first);
+        __builtin_memcpy(out + second, &last, sizeof last);
+    }
+}
+
+/// Copies rows, one behind the other.
+QORI_NOINLINE inline void packRows(uint8_t* out, const uint8_t* src, ptrdiff_t step, int32_t rows, ptrdiff_t bytes) {
+    if (bytes >= 32) {
+        for (int32_t y = 0; y < rows; ++y, src += step, out += bytes) {
+            for (ptrdiff_t i = 0; i < bytes - 32; i += 32) store(out + i, load(src + i));
+            store(out + bytes - 32, load(src + bytes - 32));
+        }
+    } else if (bytes >= 16) {
+        packByTwo<Sixteen>(out, src, step, rows, bytes);
+    } else if (bytes >= 8) {
+        packByTwo<uint64_t>(out, src, step, rows, bytes);
+    } else if (bytes >= 4) {
+        packByTwo<uint32_t>(out, src, step, rows, bytes);
+    } else if (bytes >= 2) {
+        packByTwo<uint16_t>(out, src, step, rows, bytes);
+    } else {
+        packByTwo<uint8_t>(out, src, step, rows, bytes);
+    }
+}
+
+/// Out of line, so that the buffers are on the stack only where they are used.
+template <class Row, class T, size_t... image>
+QORI_NOINLINE void forEachRowsTogether(QorImageSize roi, int pixelBytes, Row& row, const Image<const T>* images,
+                                       std::index_sequence<image...>) {
+    alignas(32) uint8_t together[sizeof...(image)][kTogether];
+    const ptrdiff_t bytes = ptrdiff_t{roi.width} * pixelBytes;
+    const auto most = static_cast<int32_t>(kTogether / bytes);
+    for (int32_t y = 0; y < roi.height;) {
+        const int32_t rows = std::min(most, roi.height - y);
+        (packRows(together[image], asBytes(images[image].row(y)), images[image].step, rows, bytes), ...);
+        row(ptrdiff_t{rows} * roi.width, reinterpret_cast<const T*>(together[image])...);
+        y += rows;
+    }
+}
+
+}  // namespace detail
+
+/// As forEachRow, for rows that are only read: row(pixels, rows...) may be handed several rows as one.
+template <class Row, class T, class... More>
+QORI_INLINE void forEachRowToReduce(QorImageSize roi, int channels, Row row, Image<const T> first, More... more) {
+    const int pixelBytes = channels * static_cast<int>(sizeof(T));
+    if (roi.height >= detail::kFewRows && int64_t{roi.width} * pixelBytes <= detail::kNarrow &&
+        !isOneRun(roi, walk(first, channels), walk(more, channels)...)) {
+        const Image<const T> images[] = {first, more...};
+        return detail::forEachRowsTogether(roi, pixelBytes, row, images,
+                                           std::make_index_sequence<1 + sizeof...(More)>());
+    }
+    forEachRow(roi, row, walk(first, channels), walk(more, channels)...);
+}
+
+}  // namespace qori::kernels
