@@ -36,7 +36,7 @@ int64_t packedBytes(QorImageSize kernel) {
 template <Layout layout, class S, class D>
 Target<S, D> openTarget(Image<const S> src, Image<D> dst, QorImageSize roi, QorImageSize kernel, QorPoint2D anchor) {
     const Reach reach{kernel.width - 1 - anchor.x, kernel.height - 1 - anchor.y, anchor.x, anchor.y};
-    return makeTarget(src, dst, roi, layout, reach, BorderRule::of(borderReadAll, nullptr), nullptr);
+    return makeTarget(src, dst, roi, layout, reach, BorderRule::readAll(), nullptr);
 }
 
 template <class K>

@@ -103,7 +103,7 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
         return r;
     const LinearPlan& plan = *recordIn<LinearPlan>(pSpec);
     return underDefaultControl([&] {
-        return runPlan<T, channels>(src, dst, roi, BorderRule::of(border, borderValue), plan, blockStart(pBuffer));
+        return runPlan<T, channels>(src, dst, roi, BorderRule::of(Border::of(border), borderValue), plan, blockStart(pBuffer));
     });
 }
 

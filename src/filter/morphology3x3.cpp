@@ -27,8 +27,7 @@ QorResult stepFits(int32_t step, int64_t pixels) {
 
 template <Layout layout, class T>
 BorderedImage around(Image<T> src, QorImageSize roi) {
-    return {asBytes(src.data), src.step, roi, channels(layout) * elementBytes<T>,
-            BorderRule::of(borderReadAll, nullptr)};
+    return {asBytes(src.data), src.step, roi, channels(layout) * elementBytes<T>, BorderRule::readAll()};
 }
 
 /// One group of rows. Two or three are made as four, the last of which give way: in place, none may be written before

@@ -9,8 +9,6 @@
 namespace qori {
 namespace {
 
-constexpr int32_t kKindMask = 15, kSides = 0xF0;
-
 /// n copies of a pixel of so many bytes.
 template <int bytes>
 void repeatPixel(uint8_t* to, const uint8_t* pixel, ptrdiff_t n) {
@@ -44,22 +42,14 @@ int64_t product(int64_t a, int64_t b) {
 
 }  // namespace
 
-BorderRule BorderRule::of(int32_t border, const void* value) {
-    const int32_t kind = border & kKindMask;
-    const bool all = kind == borderReadAll || (border & kSides) == kSides;
-    const auto open = [=](int32_t flag) { return all || (border & flag) != 0; };
-    return {open(borderReadLeft), open(borderReadTop), open(borderReadRight), open(borderReadBottom),
-            kind == borderConstant ? static_cast<const uint8_t*>(value) : nullptr};
-}
-
 void BorderedImage::gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) const {
-    const int32_t missingLeft = rule.openLeft ? 0 : std::clamp(-rect.x, 0, rect.width);
-    const int32_t missingRight = rule.openRight ? 0 : std::clamp(rect.x + rect.width - size.width, 0, rect.width);
+    const int32_t missingLeft = rule.open.left ? 0 : std::clamp(-rect.x, 0, rect.width);
+    const int32_t missingRight = rule.open.right ? 0 : std::clamp(rect.x + rect.width - size.width, 0, rect.width);
     const int32_t present = std::max(rect.width - missingLeft - missingRight, 0);
     const ptrdiff_t leftBytes = ptrdiff_t{missingLeft} * pixelBytes, presentBytes = ptrdiff_t{present} * pixelBytes;
-    const int32_t firstPresent = std::clamp(rect.x + missingLeft, rule.openLeft ? INT32_MIN : 0, INT32_MAX);
+    const int32_t firstPresent = std::clamp(rect.x + missingLeft, rule.open.left ? INT32_MIN : 0, INT32_MAX);
     for (int32_t y = rect.y; y < rect.y + rect.height; ++y, to += toStep) {
-        const bool missing = (y < 0 && !rule.openTop) || (y >= size.height && !rule.openBottom);
+        const bool missing = (y < 0 && !rule.open.top) || (y >= size.height && !rule.open.bottom);
         if (missing && rule.constant != nullptr) {
             repeat(to, rule.constant, pixelBytes, rect.width);
             continue;
@@ -92,7 +82,7 @@ BorderParts::BorderParts(const BorderedImage& image, Reach reach, PartHints hint
 /// so that its surroundings still fit the buffer.
 void BorderParts::addRows() {
     const auto [width, height] = image_.size;
-    const int32_t top = image_.rule.openTop ? 0 : reach_.top, bottom = image_.rule.openBottom ? 0 : reach_.bottom;
+    const int32_t top = image_.rule.open.top ? 0 : reach_.top, bottom = image_.rule.open.bottom ? 0 : reach_.bottom;
     if (height <= top + bottom) return add({{0, 0, width, height}, false, 0});
     if (top > 0) add({{0, 0, width, top}, false, 0});
     if (bottom > 0) add({{0, height - bottom, width, bottom}, false, 0});
@@ -102,7 +92,7 @@ void BorderParts::addRows() {
 /// Strips as wide as the kernel likes where the buffer allows, else just wide enough: those always fit.
 void BorderParts::addColumns(int32_t y, int32_t height) {
     const int32_t width = image_.size.width, block = hints_.blockPixels;
-    const int32_t left = image_.rule.openLeft ? 0 : reach_.left, right = image_.rule.openRight ? 0 : reach_.right;
+    const int32_t left = image_.rule.open.left ? 0 : reach_.left, right = image_.rule.open.right ? 0 : reach_.right;
     int32_t leftStrip = left > 0 ? std::max(left, block) : 0, rightStrip = 0;
     ptrdiff_t slack = hints_.slackBytes;
     if (right > 0) {

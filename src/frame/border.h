@@ -35,14 +35,55 @@ struct Reach {
     int32_t rows() const { return top + bottom; }
 };
 
-/// What lies beyond each side.
-struct BorderRule {
-    bool openLeft, openTop, openRight, openBottom;  ///< Read from memory.
-    const uint8_t* constant;                        ///< The missing pixel, or null where pixels are replicated.
+/// Sides of an image, each beyond which pixels are read from memory (open) or not.
+struct Sides {
+    bool left, top, right, bottom;
 
-    /// From a QorBorderMode; kinds that are no kind of this model replicate.
-    static BorderRule of(int32_t border, const void* value);
-    bool isOpen() const { return openLeft && openTop && openRight && openBottom; }
+    constexpr bool all() const { return left && top && right && bottom; }
+};
+
+/// How pixels beyond a closed side come about.
+enum class BorderKind {
+    constant,
+    replicate,
+    mirror,   ///< The pixel as far on the other side of the edge pixel, which is not repeated itself.
+    readAll,  ///< They do not: all sides are open.
+    unknown   ///< Not named; a family refuses it, or says what it does instead.
+};
+
+/// A QorBorderMode taken apart, which happens here only. Each family states the kinds that it takes and its status for
+/// others.
+struct Border {
+    BorderKind kind;  ///< As given, also where no side is closed.
+    Sides open;
+
+    static constexpr Border of(int32_t mode);
+    constexpr bool isOneOf(auto... kinds) const { return ((kind == kinds) || ...); }
+};
+
+constexpr Border Border::of(int32_t mode) {
+    constexpr int32_t kKindMask = 15, kMirror = 3, kSides = 0xF0;
+    const int32_t kind = mode & kKindMask;
+    const bool all = kind == borderReadAll || (mode & kSides) == kSides;
+    const auto open = [=](int32_t flag) { return all || (mode & flag) != 0; };
+    return {kind == borderConstant    ? BorderKind::constant
+            : kind == borderReplicate ? BorderKind::replicate
+            : kind == kMirror         ? BorderKind::mirror
+            : kind == borderReadAll   ? BorderKind::readAll
+                                      : BorderKind::unknown,
+            {open(borderReadLeft), open(borderReadTop), open(borderReadRight), open(borderReadBottom)}};
+}
+
+/// What windows see beyond each side, by this model: from memory, one constant, or the nearest pixel.
+struct BorderRule {
+    Sides open;
+    const uint8_t* constant;  ///< The missing pixel, or null where pixels are replicated.
+
+    static constexpr BorderRule readAll() { return {{true, true, true, true}, nullptr}; }
+    /// Of a family that takes no kinds but these; any other would replicate.
+    static BorderRule of(Border border, const void* value) {
+        return {border.open, border.kind == BorderKind::constant ? static_cast<const uint8_t*>(value) : nullptr};
+    }
 };
 
 /// A region and its surroundings by a rule.

@@ -13,12 +13,12 @@ RowWindow::RowWindow(const BorderedImage& image, const WindowNeeds& needs, uint8
     const int32_t saved = needs.place == Place::apart ? 0 : sets ? 2 * needs.above() : needs.above() + needs.rowsAtOnce;
     const int64_t seen = int64_t{image.size.width} + needs.reach.columns();
     saved_ = take(memory, seen, saved);
-    const bool closed = !image.rule.openTop || !image.rule.openBottom;
+    const bool closed = !image.rule.open.top || !image.rule.open.bottom;
     constant_ = take(memory, seen, image.rule.constant != nullptr && closed ? 1 : 0);
     addParts(memory);
     if (constant_.memory == nullptr || constant_.rows == 0) return;
     BorderedImage outside = image;  // a row above it, with that side closed, is all constants
-    outside.rule.openTop = false;
+    outside.rule.open.top = false;
     outside.gather({0, -1, image.size.width + needs.reach.columns(), 1}, constant_.memory, 0);
 }
 
@@ -35,8 +35,8 @@ void RowWindow::addParts(uint8_t*& memory) {
     const auto strip = [this](bool open, int32_t reach) {
         return open || reach == 0 ? 0 : std::max(reach, needs_.partPixels);
     };
-    const int32_t left = strip(image_.rule.openLeft, needs_.reach.left);
-    const int32_t right = strip(image_.rule.openRight, needs_.reach.right);
+    const int32_t left = strip(image_.rule.open.left, needs_.reach.left);
+    const int32_t right = strip(image_.rule.open.right, needs_.reach.right);
     if (int64_t{left} + right >= width && left + int64_t{right} > 0) return addPart(memory, 0, width, true);
     addPart(memory, left, width - left - right, false);
     if (left > 0) addPart(memory, 0, left, true);
@@ -81,8 +81,8 @@ int32_t RowWindow::savedSlot(int32_t y) const {
 
 /// With the neighbours on open sides, in the place that the row's first seen column has in its slot.
 void RowWindow::save(int32_t y) {
-    const int32_t left = image_.rule.openLeft ? needs_.reach.left : 0;
-    const int32_t right = image_.rule.openRight ? needs_.reach.right : 0;
+    const int32_t left = image_.rule.open.left ? needs_.reach.left : 0;
+    const int32_t right = image_.rule.open.right ? needs_.reach.right : 0;
     const ptrdiff_t skipped = ptrdiff_t{needs_.reach.left - left} * image_.pixelBytes;
     const ptrdiff_t bytes = (ptrdiff_t{image_.size.width} + left + right) * image_.pixelBytes;
     kernels::copyRow(saved_.row(savedSlot(y)) + skipped, image_.pixel(-left, y), bytes);
@@ -90,7 +90,7 @@ void RowWindow::save(int32_t y) {
 
 const uint8_t* RowWindow::interiorRow(int32_t x, int32_t y) const {
     const int32_t last = image_.size.height - 1;
-    const bool missing = (y < 0 && !image_.rule.openTop) || (y > last && !image_.rule.openBottom);
+    const bool missing = (y < 0 && !image_.rule.open.top) || (y > last && !image_.rule.open.bottom);
     if (missing && image_.rule.constant != nullptr) return constant_.memory;
     const int32_t row = missing ? std::clamp(y, 0, last) : y;
     if (row < 0 || row >= overwrittenBelow_) return image_.pixel(x - needs_.reach.left, row);

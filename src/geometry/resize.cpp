@@ -259,25 +259,18 @@ QorResult planCheck(const ResizePlan& plan, int32_t interpolation, bool antialia
 }
 
 /// Border values are accepted and not used: no kind that this family takes needs them.
-struct Border {
-    int32_t type;
+struct BorderArgument {
+    int32_t mode;
     const void* values;
 };
 
-QorResult borderCheck(Border border) {
-    if (border.type & ~0xF7) return QOR_ERR_BORDER;
-    const int32_t kind = border.type & 7;
-    return kind == borderReplicate || kind == borderReadAll ? QOR_OK : QOR_ERR_UNSUPPORTED_MODE;
-}
-
-OpenSides openSides(Border border) {
-    const bool all = (border.type & 7) == borderReadAll;
-    const auto open = [=](int32_t flag) { return all || (border.type & flag) != 0; };
-    return {open(borderReadTop), open(borderReadBottom), open(borderReadLeft), open(borderReadRight)};
+QorResult borderCheck(int32_t mode) {
+    if (mode & ~0xF7) return QOR_ERR_BORDER;
+    return Border::of(mode).isOneOf(BorderKind::replicate, BorderKind::readAll) ? QOR_OK : QOR_ERR_UNSUPPORTED_MODE;
 }
 
 template <class T, int channels>
-QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open,
+QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, Sides open,
                   const QorResizePlan* pPlan, uint8_t* pBuffer) {
     const ResizePlan& plan = *planOf(pPlan);
     return underDefaultControl([&] {
@@ -299,12 +292,13 @@ QorResult resizeInside(Image<const T> src, Image<T> dst, QorPoint2D offset, QorI
 constexpr int32_t kAnyAntialiasing = 0;
 
 template <class T, int channels, int32_t interpolation>
-QorResult resizeBordered(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, Border border,
+QorResult resizeBordered(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, BorderArgument border,
                          const QorResizePlan* pPlan, uint8_t* pBuffer) {
     if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
     constexpr bool antialiasing = interpolation == kAnyAntialiasing;
-    if (QorResult r = firstOf(planCheck(*planOf(pPlan), interpolation, antialiasing), borderCheck(border))) return r;
-    return runTile<T, channels>(src, dst, offset, size, openSides(border), pPlan, pBuffer);
+    if (QorResult r = firstOf(planCheck(*planOf(pPlan), interpolation, antialiasing), borderCheck(border.mode)))
+        return r;
+    return runTile<T, channels>(src, dst, offset, size, Border::of(border.mode).open, pPlan, pBuffer);
 }
 
 template <class T, int channels>

@@ -33,7 +33,7 @@ public:
     ColumnsFirstTile(const ColumnsFirstTile&) = delete;
     ColumnsFirstTile& operator=(const ColumnsFirstTile&) = delete;
 
-    void run(Image<const T> src, Image<T> dst, OpenSides open) {
+    void run(Image<const T> src, Image<T> dst, Sides open) {
         source_.open(src, open);
         lines_.begin();
         for (int32_t x = 0; x < source_.tile.width; x += stripPixels_)

@@ -20,7 +20,7 @@ public:
 
     HalfTile(const ResizePlan& plan, Tile tile, WorkBuffer&) : source_{plan, tile} {}
 
-    void run(Image<const T> src, Image<T> dst, OpenSides) {
+    void run(Image<const T> src, Image<T> dst, Sides) {
         source_.open(src, {});
         const Tile& tile = source_.tile;
         const bool isSuper = source_.plan.interpolation == interpSuper;

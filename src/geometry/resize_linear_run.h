@@ -18,7 +18,7 @@ public:
           weights_(buffer.take<int16_t>(padded_)),
           pair_(buffer, padded_) {}
 
-    void run(Image<const uint8_t> src, Image<uint8_t> dst, OpenSides open) {
+    void run(Image<const uint8_t> src, Image<uint8_t> dst, Sides open) {
         source_.open(src, open);
         rows_.open(source_);
         const kernels::Gather gather = buildTables();

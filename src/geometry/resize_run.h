@@ -2,6 +2,7 @@
 // Resizing one tile. Each way of doing it is a class that takes its memory from a work buffer in its constructor, so
 // that the query for the buffer's size and the operation cannot disagree, and then runs.
 #pragma once
+#include "frame/border.h"
 #include "kernels/resize/gather.h"
 #include "kernels/resize/taps.h"
 #include "resize_plan.h"
@@ -18,11 +19,6 @@ struct Range {
     int32_t first, last;
 
     int32_t clamp(int32_t index) const { return index < first ? first : index > last ? last : index; }
-};
-
-/// Sides beyond which the source goes on in memory.
-struct OpenSides {
-    bool top = false, bottom = false, left = false, right = false;
 };
 
 /// Indices that `count` positions are made of, within the source except on open sides. Every other index is as good as
@@ -43,7 +39,7 @@ struct TileSource {
     Range columns{}, rows{};
     Image<const T> image{};  ///< At pixel (0, 0) of the whole source.
 
-    void open(Image<const T> src, OpenSides open) {
+    void open(Image<const T> src, Sides open) {
         columns = tapRange(plan, plan.horizontal, tile.x, tile.width, open.left, open.right);
         rows = tapRange(plan, plan.vertical, tile.y, tile.height, open.top, open.bottom);
         const ptrdiff_t x = sourceOffset(plan.horizontal, tile.x), y = sourceOffset(plan.vertical, tile.y);
@@ -88,7 +84,7 @@ public:
           rowBytes_(ptrdiff_t{tile.width} * kPixel),
           tables_(buffer.take<uint8_t>(2 * ((int64_t{tile.width} * kPixel + 31) / 32) * kernels::Gather::kLaneBytes)) {}
 
-    void run(Image<const T> src, Image<T> dst, OpenSides) {
+    void run(Image<const T> src, Image<T> dst, Sides) {
         source_.open(src, {});
         rows_.open(source_);
         const kernels::Gather gather = buildTables();
@@ -186,7 +182,7 @@ public:
           places_{buffer.take<int32_t>(padded_), buffer.take<int32_t>(padded_)},
           pair_(buffer, padded_) {}
 
-    void run(Image<const double> src, Image<double> dst, OpenSides open) {
+    void run(Image<const double> src, Image<double> dst, Sides open) {
         source_.open(src, open);
         listElements();
         const ResizePlan& plan = source_.plan;

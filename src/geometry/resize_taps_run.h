@@ -22,7 +22,7 @@ public:
     TapsTile(const TapsTile&) = delete;
     TapsTile& operator=(const TapsTile&) = delete;
 
-    void run(Image<const T> src, Image<T> dst, OpenSides open) {
+    void run(Image<const T> src, Image<T> dst, Sides open) {
         source_.open(src, open);
         rows_.begin();
         for (int32_t x = 0; x < source_.tile.width; x += stripPixels_) {

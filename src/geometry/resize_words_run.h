@@ -26,7 +26,7 @@ public:
         ring_ = buffer.take<int16_t>(int64_t{ringPairs()} * 2 * ringStep_);
     }
 
-    void run(Image<const uint8_t> src, Image<uint8_t> dst, OpenSides open) {
+    void run(Image<const uint8_t> src, Image<uint8_t> dst, Sides open) {
         source_.open(src, open);
         for (int32_t x = 0; x < source_.tile.width; x += stripPixels_) {
             const int32_t rest = source_.tile.width - x;

@@ -20,8 +20,8 @@ struct Case {
 
 /// What the source has at (x, y) by the rule, -1 for the constant.
 ptrdiff_t sourceOffset(const Case& job, const BorderRule& rule, int x, int y) {
-    const bool missingX = (x < 0 && !rule.openLeft) || (x >= job.size.width && !rule.openRight);
-    const bool missingY = (y < 0 && !rule.openTop) || (y >= job.size.height && !rule.openBottom);
+    const bool missingX = (x < 0 && !rule.open.left) || (x >= job.size.width && !rule.open.right);
+    const bool missingY = (y < 0 && !rule.open.top) || (y >= job.size.height && !rule.open.bottom);
     if (rule.constant != nullptr && (missingX || missingY)) return -1;
     const Reach& reach = job.needs.reach;
     const int column = missingX ? std::clamp(x, 0, job.size.width - 1) : x;
@@ -38,7 +38,7 @@ void checkCase(const Case& job) {
     const Snapshot before = image.snapshot();
     const uint8_t* const source = before.bytes.data() + before.originOffset;
     const uint8_t constant[] = {1, 2, 3, 4, 5, 6};
-    const BorderRule rule = BorderRule::of(job.border, constant);
+    const BorderRule rule = BorderRule::of(Border::of(job.border), constant);
     auto* const origin =
         image.data<uint8_t>() + reach.top * ptrdiff_t{image.step()} + ptrdiff_t{reach.left} * job.pixelBytes;
     const BorderedImage bordered{origin, image.step(), job.size, job.pixelBytes, rule};
@@ -117,7 +117,7 @@ TEST(RowWindow, NeedsMostWithConstantsOnClosedSides) {
         const WindowNeeds needs{reach, 1 + below(4), below(2), 1, static_cast<Place>(below(3))};
         const QorImageSize size{1 + below(20), 1 + below(20)};
         const auto bytes = [&](int32_t border) {
-            return RowWindow::bytes({nullptr, 0, size, 3, BorderRule::of(border, constant)}, needs);
+            return RowWindow::bytes({nullptr, 0, size, 3, BorderRule::of(Border::of(border), constant)}, needs);
         };
         for (int32_t border : {0x10, 0x20, 0x40, 0x80, 0xF0, 0x01, 0xC1, 0x06})
             EXPECT_LE(bytes(border), bytes(borderConstant)) << border;
