@@ -55,7 +55,7 @@ void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if constexpr (keepsAlpha<layout>) {
         runUnary<layout>([](int, auto block) { return block; }, src, dst, roi);
     } else {
-        constexpr int pixel = channels(layout) * elementBytes<T>;
+        constexpr int pixel = pixelSize<T, layout>;
         const bool streaming = streams(streamRules::copy, traffic(roi, 2 * pixel));
         const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
         forEachRow(

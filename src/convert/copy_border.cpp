@@ -47,7 +47,7 @@ struct Rows {
 };
 
 template <class T, Layout layout>
-using RowsOf = Rows<channels(layout) * elementBytes<T>, layout == Layout::AC4>;
+using RowsOf = Rows<pixelSize<T, layout>, layout == Layout::AC4>;
 
 template <class R>
 void frameByConstant(const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t dstStep, const Frame& frame,

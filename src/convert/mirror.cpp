@@ -42,7 +42,7 @@ struct Moved {
 };
 
 template <class T, Layout layout>
-using MovedOf = Moved<channels(layout) * elementBytes<T>, layout == Layout::AC4>;
+using MovedOf = Moved<pixelSize<T, layout>, layout == Layout::AC4>;
 
 /// Images of four channels keep the rule of the widening moves; alpha is read from the destination, which is cached
 /// then.

@@ -59,7 +59,7 @@ int bestLevel(const double* counts) {
 
 QorResult otsuThreshold(Image<const uint8_t> src, QorImageSize roi, uint8_t* pThreshold) {
     if (QorResult r = firstOf(nullCheck(src, pThreshold), sizeCheck(roi))) return r;
-    if (roi.width > src.step) return QOR_ERR_STEP;
+    if (QorResult r = rowCheck(src.step, roi.width)) return r;
     return underDefaultControl([&] {
         double counts[kLevels];
         countLevels(src, roi, counts);

@@ -52,7 +52,7 @@ QorResult run(Image<const T> src, Image<T> dst, QorImageSize roi, Make make) {
             }
         }
         const bool streaming =
-            src.data != dst.data && streams(rule, traffic(roi, 2 * channels(layout) * elementBytes<T>));
+            src.data != dst.data && streams(rule, traffic(roi, 2 * pixelSize<T, layout>));
         mapImage<layout == Layout::AC4>(roi, channels(layout), Thresholding<decltype(make())>{make()}, streaming, dst,
                                         src);
         return QOR_OK;

@@ -18,9 +18,8 @@ QorResult divisorCheck(int32_t divisor) { return divisor == 0 ? QOR_ERR_DIVISOR 
 /// The source row with its neighbours, and the destination row, must lie within their steps.
 template <Layout layout, class S, class D>
 QorResult stepsCheck(Image<const S> src, Image<D> dst, QorImageSize roi, QorImageSize kernel) {
-    const int64_t seen = (int64_t{roi.width} + kernel.width - 1) * channels(layout) * elementBytes<S>;
-    const int64_t made = int64_t{roi.width} * channels(layout) * elementBytes<D>;
-    return seen > src.step || made > dst.step ? QOR_ERR_STEP : QOR_OK;
+    return firstOf(rowCheck(src.step, (int64_t{roi.width} + kernel.width - 1) * pixelSize<S, layout>),
+                   rowCheck(dst.step, int64_t{roi.width} * pixelSize<D, layout>));
 }
 
 /// Packed kernels begin on the next multiple of 16, which every reported size allows for.

@@ -7,21 +7,20 @@
 namespace qori::filter {
 namespace {
 
-QorResult dataTypeCheck(int32_t dataType, bool floatsToo) {
-    const bool known = dataType == k8u || dataType == k16u || dataType == k16s || (floatsToo && dataType == k32f);
-    return known ? QOR_OK : QOR_ERR_DATA_TYPE;
-}
-
-QorResult channelsCheck(int32_t numChannels) { return numChannels < 1 || numChannels > 4 ? QOR_ERR_CHANNELS : QOR_OK; }
+/// Channel counts with which a plan can be made, 2 among them.
+QorResult countCheck(int32_t numChannels) { return numChannels < 1 || numChannels > 4 ? QOR_ERR_CHANNELS : QOR_OK; }
 
 QorResult filterBorderGetSize(QorImageSize kernelSize, QorImageSize roi, int32_t dataType, int32_t kernelType,
                               int32_t numChannels, int32_t* pSpecSize, int32_t* pBufferSize) {
-    if (QorResult r = firstOf(sizeCheck(kernelSize), sizeCheck(roi), dataTypeCheck(dataType, true))) return r;
-    if (kernelType != k16s && kernelType != k32f) return QOR_ERR_DATA_TYPE;
-    if (QorResult r = firstOf(channelsCheck(numChannels), nullCheck(pSpecSize, pBufferSize))) return r;
+    if (QorResult r =
+            firstOf(sizeCheck(kernelSize), sizeCheck(roi), dataTypeCheck(dataType, qor8u, qor16u, qor16s, qor32f)))
+        return r;
+    if (QorResult r = firstOf(dataTypeCheck(kernelType, qor16s, qor32f), countCheck(numChannels),
+                              nullCheck(pSpecSize, pBufferSize)))
+        return r;
     if (!isModest(kernelSize)) return QOR_ERR_SIZE;
-    if (kernelType == k16s && isConverted(dataType, numChannels)) kernelType = k32f;
-    const int32_t elementBytes = dataType == k8u ? 1 : dataType == k32f ? 4 : 2;
+    if (kernelType == qor16s && isConverted(dataType, numChannels)) kernelType = qor32f;
+    const int32_t elementBytes = dataType == qor8u ? 1 : dataType == qor32f ? 4 : 2;
     const int64_t plan = planBytes(kernelSize, kernelType);
     const int64_t work = workBytes(kernelSize, roi.width, dataType, kernelType, numChannels);
     const int64_t border = borderBytes(roi, Reach::ofKernel(kernelSize), numChannels * elementBytes);
@@ -36,8 +35,9 @@ QorResult filterBorderGetSize(QorImageSize kernelSize, QorImageSize roi, int32_t
 
 QorResult filterBorderInit16s(const int16_t* pKernel, QorImageSize size, int32_t divisor, int32_t dataType,
                               int32_t numChannels, int32_t roundMode, QorLinearFilterPlan* pSpec) {
-    if (QorResult r = firstOf(nullCheck(pKernel, pSpec), sizeCheck(size), dataTypeCheck(dataType, false),
-                              channelsCheck(numChannels), roundModeCheck(roundMode)))
+    if (QorResult r =
+            firstOf(nullCheck(pKernel, pSpec), sizeCheck(size), dataTypeCheck(dataType, qor8u, qor16u, qor16s),
+                    countCheck(numChannels), roundModeCheck(roundMode)))
         return r;
     if (divisor == 0) return QOR_ERR_DIVISOR;
     return underDefaultControl([&] {
@@ -51,8 +51,9 @@ QorResult filterBorderInit16s(const int16_t* pKernel, QorImageSize size, int32_t
 
 QorResult filterBorderInit32f(const float* pKernel, QorImageSize size, int32_t dataType, int32_t numChannels,
                               int32_t roundMode, QorLinearFilterPlan* pSpec) {
-    if (QorResult r = firstOf(nullCheck(pKernel, pSpec), sizeCheck(size), dataTypeCheck(dataType, true),
-                              channelsCheck(numChannels), roundModeCheck(roundMode)))
+    if (QorResult r =
+            firstOf(nullCheck(pKernel, pSpec), sizeCheck(size), dataTypeCheck(dataType, qor8u, qor16u, qor16s, qor32f),
+                    countCheck(numChannels), roundModeCheck(roundMode)))
         return r;
     fillPlan(pSpec, pKernel, size, dataType, numChannels, roundMode);
     return QOR_OK;
@@ -103,7 +104,8 @@ QorResult filterBorder(Image<const T> src, Image<T> dst, QorImageSize roi, int32
         return r;
     const LinearPlan& plan = *recordIn<LinearPlan>(pSpec);
     return underDefaultControl([&] {
-        return runPlan<T, channels>(src, dst, roi, BorderRule::of(Border::of(border), borderValue), plan, blockStart(pBuffer));
+        return runPlan<T, channels>(src, dst, roi, BorderRule::of(Border::of(border), borderValue), plan,
+                                    blockStart(pBuffer));
     });
 }
 

@@ -57,9 +57,9 @@ void classifyDivisor(LinearPlan& plan, int32_t divisor) {
 
 int32_t floatPath(int32_t dataType) {
     switch (dataType) {
-        case k8u: return LinearPlan::float8u;
-        case k16s: return LinearPlan::float16s;
-        case k16u: return LinearPlan::float16u;
+        case qor8u: return LinearPlan::float8u;
+        case qor16s: return LinearPlan::float16s;
+        case qor16u: return LinearPlan::float16u;
         default: return LinearPlan::float32f;
     }
 }
@@ -77,28 +77,29 @@ void fillFloats(QorLinearFilterPlan* block, QorImageSize size, int32_t dataType,
 }  // namespace
 
 int64_t planBytes(QorImageSize kernel, int32_t kernelType) {
-    return Places(kernel, kernelType == k16s ? 2 : 4).bytes + kBlockAlignment - 1;
+    return Places(kernel, kernelType == qor16s ? 2 : 4).bytes + kBlockAlignment - 1;
 }
 
 int64_t workBytes(QorImageSize kernel, int32_t roiWidth, int32_t dataType, int32_t kernelType, int32_t channels) {
     const int64_t area = int64_t{kernel.width} * kernel.height, p = 4 * area, w = roiWidth;
     const auto rounded = [](int64_t bytes) { return bytes == 0 ? 0 : (bytes + 191) / 64 * 64; };
-    if (channels == 2 || (kernelType == k16s && dataType == k32f)) return 0;
-    if (kernelType == k16s) {
-        if (channels == 4) return rounded(dataType == k8u ? 16 * (area + w) : (16 * (area + w) + 124) / 16 * 16);
-        if (dataType == k8u) return rounded(channels == 1 ? 32 * ((8 * area + w + 7) / 8) : 16 * ((p + 3 * w + 3) / 4));
+    if (channels == 2 || (kernelType == qor16s && dataType == qor32f)) return 0;
+    if (kernelType == qor16s) {
+        if (channels == 4) return rounded(dataType == qor8u ? 16 * (area + w) : (16 * (area + w) + 124) / 16 * 16);
+        if (dataType == qor8u)
+            return rounded(channels == 1 ? 32 * ((8 * area + w + 7) / 8) : 16 * ((p + 3 * w + 3) / 4));
         return rounded(channels == 1 ? 16 * ((p + w + 3) / 4) : 16 * ((p + 3 * w + 31) / 4));
     }
-    if (dataType == k32f) return rounded((channels == 1 ? 32 : 16) * area);
+    if (dataType == qor32f) return rounded((channels == 1 ? 32 : 16) * area);
     if (channels == 4) return rounded(32 * w + 4 * (p + 8 * w));
     if (channels == 3) return rounded(32 * ((3 * w + 3) / 4) + 16 * ((p + 6 * w + 10) / 4));
-    if (dataType == k16u) return rounded(16 * ((w + 10) / 4));
+    if (dataType == qor16u) return rounded(16 * ((w + 10) / 4));
     return rounded(32 * ((w + 3) / 4) + 16 * ((p + 2 * w + 10) / 4));
 }
 
 void fillPlan(QorLinearFilterPlan* block, const int16_t* kernel, QorImageSize size, int32_t divisor, int32_t dataType,
               int32_t roundMode) {
-    const bool is8u = dataType == k8u;
+    const bool is8u = dataType == qor8u;
     LinearPlan& plan =
         startPlan(block, is8u ? LinearPlan::integer8u : LinearPlan::integer16s, size, sizeof(int16_t), roundMode);
     classifyDivisor(plan, divisor);

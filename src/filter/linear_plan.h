@@ -6,8 +6,6 @@
 
 namespace qori::filter {
 
-enum TypeCode : int32_t { k8u = 1, k16u = 5, k16s = 7, k32f = 13 };
-
 struct LinearPlan {
     enum Path : int32_t { integer8u = 0, integer16s = 1, float8u = 3, float16s = 4, float16u = 5, float32f = 6 };
     enum Divide : int32_t { none = 0, byShift = 1, byQuotient = 2 };
@@ -32,7 +30,7 @@ struct LinearPlan {
 
 /// Whether such pixels take an integer kernel as floats.
 constexpr bool isConverted(int32_t dataType, int32_t channels) {
-    return dataType == k16u || (dataType == k16s && channels > 2);
+    return dataType == qor16u || (dataType == qor16s && channels > 2);
 }
 
 /// Bytes of a plan, slack for its alignment included.

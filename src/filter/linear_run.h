@@ -18,10 +18,6 @@ using kernels::NeighbourTaps;
 using kernels::PackedKernel;
 using kernels::PairTaps;
 
-inline QorResult roundModeCheck(int32_t roundMode) {
-    return static_cast<uint32_t>(roundMode) > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
-}
-
 /// Where results go, and how a region is cut so that its windows exist.
 template <class S, class D>
 struct Target {

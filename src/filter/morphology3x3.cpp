@@ -19,15 +19,15 @@ using kernels::Stores;
 constexpr int32_t kRows = 4;
 constexpr int kReach = 1;
 
-/// The bytes of a row of so many pixels must lie within the step.
+/// A row of so many pixels must lie within the step.
 template <Layout layout, class T>
 QorResult stepFits(int32_t step, int64_t pixels) {
-    return step < pixels * channels(layout) * elementBytes<T> ? QOR_ERR_STEP_TOO_SMALL : QOR_OK;
+    return rowCheck(step, pixels * pixelSize<T, layout>, QOR_ERR_STEP_TOO_SMALL);
 }
 
 template <Layout layout, class T>
 BorderedImage around(Image<T> src, QorImageSize roi) {
-    return {asBytes(src.data), src.step, roi, channels(layout) * elementBytes<T>, BorderRule::readAll()};
+    return {asBytes(src.data), src.step, roi, pixelSize<T, layout>, BorderRule::readAll()};
 }
 
 /// One group of rows. Two or three are made as four, the last of which give way: in place, none may be written before
@@ -88,7 +88,7 @@ QorResult extreme3x3(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (checked != QOR_OK) return checked;
     return underControlOf<T>([&] {
         const BorderedImage image = around<layout>(src, roi);
-        constexpr int kBytesPerPixel = 2 * channels(layout) * elementBytes<T>;
+        constexpr int kBytesPerPixel = 2 * pixelSize<T, layout>;
         if constexpr (layout != Layout::AC4)  // which has the destination in the cache, having read it
             if (isAligned(dst) && streams(streamRules::copy, traffic(roi, kBytesPerPixel))) {
                 run<Order, Stores::streaming, layout>(image, dst, nullptr);

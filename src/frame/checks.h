@@ -43,4 +43,38 @@ QorResult stepCheck(Images... images) {
     return ((images.step < 1) || ...) ? QOR_ERR_STEP : QOR_OK;
 }
 
+/// Whether a row of so many bytes, with whatever it needs around it, lies within its step.
+inline QorResult rowCheck(int32_t step, int64_t bytes, QorResult refusal = QOR_ERR_STEP) {
+    return bytes > step ? refusal : QOR_OK;
+}
+
+/// Steps that are whole elements.
+template <class... Images>
+QorResult alignedStepCheck(Images... images) {
+    return ((images.step % elementBytes<std::remove_pointer_t<decltype(images.data)>> != 0) || ...) ? QOR_ERR_STEP_ALIGN
+                                                                                                    : QOR_OK;
+}
+
+inline QorResult dataTypeCheck(int32_t code, auto... accepted) {
+    return ((code == accepted) || ...) ? QOR_OK : QOR_ERR_DATA_TYPE;
+}
+
+/// Channel counts of operations that take 1, 3 and 4.
+inline QorResult channelsCheck(int32_t count) {
+    return count == 1 || count == 3 || count == 4 ? QOR_OK : QOR_ERR_CHANNELS_UNSUPPORTED;
+}
+
+inline QorResult roundModeCheck(int32_t mode) {
+    return mode < roundTowardZero || mode > roundHalfAway ? QOR_ERR_ROUND_MODE : QOR_OK;
+}
+
+inline QorResult maskSizeCheck(QorImageSize mask) {
+    return mask.width < 1 || mask.height < 1 ? QOR_ERR_MASK_SIZE : QOR_OK;
+}
+
+inline QorResult anchorCheck(QorPoint2D anchor, QorImageSize mask) {
+    const bool inside = anchor.x >= 0 && anchor.x < mask.width && anchor.y >= 0 && anchor.y < mask.height;
+    return inside ? QOR_OK : QOR_ERR_ANCHOR;
+}
+
 }  // namespace qori

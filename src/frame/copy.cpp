@@ -54,7 +54,7 @@ QorResult copyColour(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T, Layout layout>
 QorResult copyMasked(Image<const T> src, Image<T> dst, QorImageSize roi, Image<const uint8_t> mask) {
     if (QorResult r = firstOf(nullCheck(src, dst, mask), sizeCheck(roi))) return r;
-    constexpr int pixel = channels(layout) * elementBytes<T>, selected = processedChannels(layout) * elementBytes<T>;
+    constexpr int pixel = pixelSize<T, layout>, selected = processedChannels(layout) * elementBytes<T>;
     forEachRow(
         roi,
         [](ptrdiff_t pixels, const T* s, T* d, const uint8_t* m) {

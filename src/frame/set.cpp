@@ -41,7 +41,7 @@ QorResult setColour(const T* value, Image<T> dst, QorImageSize roi) {
 template <class T, Layout layout>
 QorResult setMasked(const T* value, Image<T> dst, QorImageSize roi, Image<const uint8_t> mask) {
     if (QorResult r = firstOf(nullCheck(value, dst, mask), sizeCheck(roi))) return r;
-    constexpr int pixel = channels(layout) * elementBytes<T>, selected = processedChannels(layout) * elementBytes<T>;
+    constexpr int pixel = pixelSize<T, layout>, selected = processedChannels(layout) * elementBytes<T>;
     T values[channels(layout)] = {};
     for (int i = 0; i < processedChannels(layout); ++i) values[i] = value[i];
     const kernels::Pattern pattern = kernels::patternOf<channels(layout)>(values);

@@ -130,8 +130,7 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (QorResult r = firstOf(nullCheck(pPlan, pBufSize), emptyCheck(dst))) return r;
     const ResizePlan& plan = *planOf(pPlan);
     if (QorResult r = tagCheck(&plan)) return r;
-    if (numChannels != 1 && numChannels != 3 && numChannels != 4) return QOR_ERR_CHANNELS_UNSUPPORTED;
-    if (QorResult r = sizeCheck(dst)) return r;
+    if (QorResult r = firstOf(channelsCheck(numChannels), sizeCheck(dst))) return r;
     int64_t bytes = 0;
     underDefaultControl([&] {  // as in the operation
         bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);

@@ -38,6 +38,10 @@ constexpr int processedChannels(Layout layout) {
 template <class T>
 constexpr int elementBytes = static_cast<int>(sizeof(T));
 
+/// Bytes of a pixel in memory.
+template <class T, Layout layout>
+constexpr int pixelSize = channels(layout) * elementBytes<T>;
+
 template <class T>
 auto* asBytes(T* row) {
     return reinterpret_cast<std::conditional_t<std::is_const_v<T>, const uint8_t, uint8_t>*>(row);

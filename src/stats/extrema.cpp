@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Extrema, their positions, extrema of blocks, and counts of elements within bounds.
 #include "frame/checks.h"
-#include "image/driver.h"
 #include "frame/float_control.h"
+#include "image/driver.h"
 #include "kernels/stats/reduce_count.h"
 #include "kernels/stats/reduce_extrema.h"
 #include "kernels/stats/reduce_narrow.h"
@@ -283,7 +283,7 @@ QorResult blockMinMax(Image<const T> src, QorImageSize roi, Image<T> dstMin, Ima
     if (QorResult r = firstOf(sizeCheck(roi), sizeCheck(block))) return r;
     const int32_t blocks = (roi.width - 1) / block.width + 1;
     // Numbers of elements against steps in bytes: the check is that coarse.
-    if (roi.width > src.step) return QOR_ERR_STEP;
+    if (QorResult r = rowCheck(src.step, roi.width)) return r;
     if ((!isNull(dstMin) && blocks > dstMin.step) || (!isNull(dstMax) && blocks > dstMax.step)) return QOR_ERR_STEP;
     return underControlOf<T>([&] {
         MinMax<T> all;

@@ -4,8 +4,8 @@
 
 #include "frame/checks.h"
 #include "frame/float_control.h"
-#include "histogram_count.h"
 #include "frame/plan.h"
+#include "histogram_count.h"
 
 namespace qori::stats {
 namespace {
@@ -131,18 +131,14 @@ bool strictlyIncreasing(const float* levels, int32_t count) {
     return true;
 }
 
-QorResult channelCheck(int32_t n) { return n == 1 || n == 3 || n == 4 ? QOR_OK : QOR_ERR_CHANNELS_UNSUPPORTED; }
-
-QorResult typeCheck(int32_t type) {
-    return type == qor8u || type == qor16u || type == qor16s || type == qor32f ? QOR_OK : QOR_ERR_DATA_TYPE;
-}
+QorResult typeCheck(int32_t type) { return dataTypeCheck(type, qor8u, qor16u, qor16s, qor32f); }
 
 /// Truncation towards zero; what 32 bits do not hold, infinity included, becomes the nearest end of their range.
 int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(std::clamp<double>(value, INT32_MIN, INT32_MAX))); }
 
 QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t,
                          int32_t* pSpecSize, int32_t* pBufferSize) {
-    if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelCheck(numChannels)))
+    if (QorResult r = firstOf(nullCheck(nLevels, pSpecSize, pBufferSize), sizeCheck(roi), channelsCheck(numChannels)))
         return r;
     if (QorResult r = levelCountCheck(nLevels, numChannels)) return r;
     if (QorResult r = reportSize(Record::offset(nLevels, numChannels), pSpecSize)) return r;
@@ -155,7 +151,7 @@ QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLev
 
 QorResult histogramInit(int32_t dataType, const float* const* pLevels, const int32_t* nLevels, int32_t numChannels,
                         QorHistogramSpec* pSpec) {
-    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelCheck(numChannels)))
+    if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLevels, nLevels, pSpec), channelsCheck(numChannels)))
         return r;
     return underDefaultControl([=]() -> QorResult {
         for (int c = 0; c < numChannels; ++c) {
@@ -202,7 +198,7 @@ double spaceUniformly(float lower, float upper, int32_t count, int32_t* levels) 
 QorResult histogramUniformInit(int32_t dataType, const float* pLowerLevel, const float* pUpperLevel,
                                const int32_t* nLevels, int32_t numChannels, QorHistogramSpec* pSpec) {
     if (QorResult r = firstOf(typeCheck(dataType), nullCheck(pLowerLevel, pUpperLevel, nLevels, pSpec),
-                              channelCheck(numChannels)))
+                              channelsCheck(numChannels)))
         return r;
     return underDefaultControl([=]() -> QorResult {
         for (int c = 0; c < numChannels; ++c) {
@@ -242,7 +238,7 @@ QorResult histogram(Image<const T> src, QorImageSize roi, int32_t* const* pHist,
     constexpr int n = channels(layout);
     if (isNull(src) || anyNull(pHist, n) || pSpec == nullptr || pBuffer == nullptr) return QOR_ERR_NULL_PTR;
     if (QorResult r = firstOf(sizeCheck(roi), stepCheck(src))) return r;
-    if (src.step < int64_t{roi.width} * n * elementBytes<T>) return QOR_ERR_STEP;
+    if (QorResult r = rowCheck(src.step, int64_t{roi.width} * n * elementBytes<T>)) return r;
     const Record* const record = recordOf(pSpec);
     if (record->identifier != Record::kIdentifier) return QOR_ERR_BAD_ARG;
     Channel<Level<T>> out[n];
