@@ -143,7 +143,7 @@ QorResult runDivision(Image<const T> src, const T* value, Image<T> dst, QorImage
             runConstant<layout>(kernels::Binary<T, Divide>{division}, value, src, dst, roi);
     };
     if constexpr (std::is_same_v<T, float>) {
-        run([](auto d, auto n) __attribute__((always_inline)) { return Vec<float>{_mm256_div_ps(n.v, d.v)}; });
+        run([](auto d, auto n) __attribute__((always_inline)) { return n / d; });
     } else {
         kernels::withDivision<T>(scale, run);
     }

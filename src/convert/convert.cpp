@@ -3,107 +3,15 @@
 
 #include "frame/checks.h"
 #include "frame/float_control.h"
-#include "kernels/convert/bits.h"
-#include "kernels/pack_convert.h"
-#include "kernels/convert/scale_integers.h"
 #include "frame/streaming.h"
+#include "kernels/convert/bits.h"
+#include "kernels/convert/elements.h"
+#include "kernels/convert/scale_integers.h"
 
 namespace qori::convert {
 namespace {
 
 using namespace kernels;
-
-// Operations by element types; `mayStream` where the result is wider than the source.
-
-template <class S, class D>
-struct Widen {
-    static constexpr bool mayStream = true;
-
-    template <int n>
-    QORI_INLINE Pack<D, n> operator()(int, Pack<S, n> a) const {
-        return extend<D>(a);
-    }
-};
-
-template <class S, class D>
-struct ToFloat {
-    static constexpr bool mayStream = true;
-
-    template <int n>
-    QORI_INLINE Pack<D, n> operator()(int, Pack<S, n> a) const {
-        return toFloat(a);
-    }
-};
-
-template <class S, class D>
-struct ClampNegative {
-    template <int n>
-    QORI_INLINE Pack<D, n> operator()(int, Pack<S, n> a) const {
-        for (Vec<S>& v : a.v) {
-            const __m256i none = _mm256_setzero_si256();
-            v.v = sizeof(S) == 1   ? _mm256_max_epi8(v.v, none)
-                  : sizeof(S) == 2 ? _mm256_max_epi16(v.v, none)
-                                   : _mm256_max_epi32(v.v, none);
-        }
-        return extend<D>(a);
-    }
-};
-
-template <class S, class D>
-struct Saturate {
-    static constexpr bool mayStream = true;
-
-    template <int n>
-    QORI_INLINE Pack<D, n> operator()(int, Pack<S, n> a) const {
-        if constexpr (std::is_same_v<S, uint16_t>) {
-            // Brought below 256 first: the narrowing would take 32768 and more for negative.
-            Pack<int16_t, n> limited;
-            for (int i = 0; i < Pack<S, n>::vectors; ++i)
-                limited.v[i] = {_mm256_min_epu16(a.v[i].v, _mm256_set1_epi16(255))};
-            return narrow<D>(limited);
-        } else {
-            return narrow<D>(a);
-        }
-    }
-};
-
-template <class Mode, class D>
-struct RoundFloats {
-    static constexpr bool mayStream = true;
-
-    template <int n>
-    QORI_INLINE Pack<D, n> operator()(int, Pack<float, n> a) const {
-        return roundTo<Mode, D>(a);
-    }
-};
-
-/// The product by a power of two in two exact steps: neither factor leaves the normal range, and what the first one
-/// makes subnormal is far below a half in the end.
-template <class Mode, class D>
-struct ScaleFloats {
-    float first, second;
-
-    template <int n>
-    QORI_INLINE Pack<D, n> operator()(int, Pack<float, n> a) const {
-        for (Vec<float>& v : a.v)
-            v.v = _mm256_mul_ps(_mm256_mul_ps(v.v, _mm256_set1_ps(first)), _mm256_set1_ps(second));
-        return roundTo<Mode, D>(a);
-    }
-};
-
-/// Lanes of all ones, which is the maximum, where a comparison with 0 holds; else 0.
-template <int comparison>
-struct MaximumWhere {
-    template <int n>
-    QORI_INLINE Pack<uint32_t, n> operator()(int, Pack<float, n> a) const {
-        Pack<uint32_t, n> out;
-        for (int i = 0; i < Pack<float, n>::vectors; ++i)
-            out.v[i] = {_mm256_castps_si256(_mm256_cmp_ps(a.v[i].v, _mm256_setzero_ps(), comparison))};
-        return out;
-    }
-};
-using PositiveToMaximum = MaximumWhere<_CMP_GT_OQ>;
-using NanToMaximum = MaximumWhere<_CMP_UNORD_Q>;
 
 template <Layout layout, class Op, class S, class D>
 QorResult mapLayout(Image<const S> src, Image<D> dst, QorImageSize roi, Op op) {
@@ -161,8 +69,12 @@ QorResult roundFloats(Image<const float> src, Image<D> dst, QorImageSize roi, in
 template <class D>
 QorResult runScaled(Image<const float> src, Image<D> dst, QorImageSize roi, int32_t roundMode, int32_t scaleFactor) {
     if constexpr (std::is_same_v<D, uint32_t>) {
-        if (scaleFactor < -159) return mapLayout<Layout::C1>(src, dst, roi, PositiveToMaximum{});
-        if (scaleFactor > 128) return mapLayout<Layout::C1>(src, dst, roi, NanToMaximum{});
+        // Every positive value saturates, or every value but NaN vanishes.
+        const auto maximumWhere = [&](auto test) {
+            return mapLayout<Layout::C1>(src, dst, roi, MaximumWhere<decltype(test)>{test});
+        };
+        if (scaleFactor < -159) return maximumWhere([](Vec<float> v) { return isLess(zero<float>(), v); });
+        if (scaleFactor > 128) return maximumWhere([](Vec<float> v) { return isNan(v); });
     }
     // Beyond 2^252 either way every result is 0 or saturated.
     const int exponent = scaleFactor < -252 ? 252 : scaleFactor > 252 ? -252 : -scaleFactor;

@@ -6,6 +6,7 @@
 #include "frame/float_control.h"
 #include "kernels/filter/rules.h"
 #include "kernels/filter/sums.h"
+#include "kernels/vector_math.h"
 #include "packing.h"
 
 namespace qori::filter {
@@ -85,14 +86,13 @@ template <class S, class D>
 void filterPairs(const int32_t* packed, QorImageSize size, int32_t start, Division division, Target<S, D>& target) {
     if constexpr (sizeof(S) == 2)
         if (target.channels == 1)
-            return divideSums(PackedKernel<NeighbourTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division,
-                              target);
-    divideSums(PackedKernel<PairTaps<S>>{packed, size, {_mm256_set1_epi32(start)}}, division, target);
+            return divideSums(PackedKernel<NeighbourTaps<S>>{packed, size, splat(start)}, division, target);
+    divideSums(PackedKernel<PairTaps<S>>{packed, size, splat(start)}, division, target);
 }
 
 template <class Taps>
 void divideWords(const int32_t* packed, QorImageSize size, Division division, Target<uint8_t, uint8_t>& target) {
-    const PackedKernel<Taps> kernel{packed, size, {_mm256_setzero_si256()}};
+    const PackedKernel<Taps> kernel{packed, size, zero<int16_t>()};
     const kernels::QuotientInWords words{division.divisor, division.mode};
     if (words.isExact()) return filterBy(kernel, words, target);
     withDivision<uint8_t>(division, [&]<class Rule>(const Rule& rule) {
@@ -104,8 +104,7 @@ template <class Taps>
 void divideGroups(const int32_t* packed, QorImageSize size, ByteGroups groups, Division division,
                   Target<uint8_t, uint8_t>& target) {
     using Grouped = kernels::InGroups<Taps>;
-    const __m256i start = _mm256_set1_epi16(static_cast<int16_t>(groups.start));
-    const PackedKernel<Grouped> kernel{packed, size, {start}, groups.count};
+    const PackedKernel<Grouped> kernel{packed, size, splat(static_cast<int16_t>(groups.start)), groups.count};
     withDivision<uint8_t>(division, [&]<class Rule>(const Rule& rule) {
         filterBy(kernel, kernels::Widened<Rule, kernels::WideSum>{rule}, target);
     });
@@ -129,7 +128,7 @@ inline void filterBytes(const int32_t* packed, QorImageSize size, ByteGroups gro
 /// -0 begins a sum that may be a single product: +0 would turn a product of -0.
 template <class S, class D>
 void filterSingle(const float* packed, QorImageSize size, int32_t mode, Target<S, D>& target) {
-    const PackedKernel<FloatTaps<S>> kernel{packed, size, {_mm256_set1_ps(-0.0f)}};
+    const PackedKernel<FloatTaps<S>> kernel{packed, size, splat(-0.0f)};
     if constexpr (std::is_same_v<D, float>)
         filterBy(kernel, kernels::Kept<float>{}, target);
     else
@@ -138,7 +137,7 @@ void filterSingle(const float* packed, QorImageSize size, int32_t mode, Target<S
 
 template <class S, class D>
 void filterDouble(const double* packed, QorImageSize size, Division division, Target<S, D>& target) {
-    const PackedKernel<DoubleTaps<S>> kernel{packed, size, {_mm256_set1_pd(-0.0)}};
+    const PackedKernel<DoubleTaps<S>> kernel{packed, size, splat(-0.0)};
     if constexpr (std::is_same_v<D, double>)
         filterBy(kernel, kernels::Kept<double>{}, target);
     else

@@ -10,71 +10,9 @@
 #include <bit>
 #include <limits>
 
-#include "simd.h"
+#include "vector_math.h"
 
 namespace qori::kernels {
-
-/// The operations that the rules need on lanes of 16 bits, 32 bits, or signed 64 bits.
-template <class W>
-struct Lane {
-    using V = Vec<W>;
-    static constexpr bool isSigned = std::is_signed_v<W>;
-    static constexpr int bits = 8 * static_cast<int>(sizeof(W));
-    static_assert(bits < 64 || isSigned);
-
-    static QORI_INLINE V all(W value) {
-        if constexpr (bits == 16)
-            return {_mm256_set1_epi16(static_cast<int16_t>(value))};
-        else if constexpr (bits == 32)
-            return {_mm256_set1_epi32(static_cast<int32_t>(value))};
-        else
-            return {_mm256_set1_epi64x(value)};
-    }
-    static QORI_INLINE V add(V a, V b) {
-        if constexpr (bits == 16)
-            return {_mm256_add_epi16(a.v, b.v)};
-        else if constexpr (bits == 32)
-            return {_mm256_add_epi32(a.v, b.v)};
-        else
-            return {_mm256_add_epi64(a.v, b.v)};
-    }
-    static QORI_INLINE V shiftLeft(V a, __m128i count) {
-        if constexpr (bits == 16)
-            return {_mm256_sll_epi16(a.v, count)};
-        else if constexpr (bits == 32)
-            return {_mm256_sll_epi32(a.v, count)};
-        else
-            return {_mm256_sll_epi64(a.v, count)};
-    }
-    /// Floor of a / 2^count: arithmetic where the lane is signed.
-    static QORI_INLINE V shiftRight(V a, __m128i count) {
-        if constexpr (bits == 16)
-            return {isSigned ? _mm256_sra_epi16(a.v, count) : _mm256_srl_epi16(a.v, count)};
-        else if constexpr (bits == 32)
-            return {isSigned ? _mm256_sra_epi32(a.v, count) : _mm256_srl_epi32(a.v, count)};
-        else {  // AVX2 shifts 64 bits only logically: as unsigned from the minimum up
-            const __m256i minimum = _mm256_set1_epi64x(INT64_MIN);
-            const __m256i raised = _mm256_srl_epi64(_mm256_xor_si256(a.v, minimum), count);
-            return {_mm256_sub_epi64(raised, _mm256_srl_epi64(minimum, count))};
-        }
-    }
-    static QORI_INLINE V min(V a, V b) {
-        if constexpr (bits == 16)
-            return {isSigned ? _mm256_min_epi16(a.v, b.v) : _mm256_min_epu16(a.v, b.v)};
-        else if constexpr (bits == 32)
-            return {isSigned ? _mm256_min_epi32(a.v, b.v) : _mm256_min_epu32(a.v, b.v)};
-        else
-            return {_mm256_blendv_epi8(a.v, b.v, _mm256_cmpgt_epi64(a.v, b.v))};
-    }
-    static QORI_INLINE V max(V a, V b) {
-        if constexpr (bits == 16)
-            return {isSigned ? _mm256_max_epi16(a.v, b.v) : _mm256_max_epu16(a.v, b.v)};
-        else if constexpr (bits == 32)
-            return {isSigned ? _mm256_max_epi32(a.v, b.v) : _mm256_max_epu32(a.v, b.v)};
-        else
-            return {_mm256_blendv_epi8(b.v, a.v, _mm256_cmpgt_epi64(a.v, b.v))};
-    }
-};
 
 // --- elements to lanes of twice their width and back ----------------------------------------------------------------
 
@@ -115,9 +53,7 @@ QORI_INLINE Vec<T> narrow(Vec<W> low, Vec<W> high) {
         return {_mm256_packs_epi32(low.v, high.v)};
     } else {
         static_assert(std::is_same_v<T, int32_t>);
-        const auto clamp = [](Vec<W> a) {
-            return Lane<W>::max(Lane<W>::min(a, Lane<W>::all(INT32_MAX)), Lane<W>::all(INT32_MIN));
-        };
+        const auto clamp = [](Vec<W> a) { return larger(smaller(a, splat<W>(INT32_MAX)), splat<W>(INT32_MIN)); };
         return {_mm256_blend_epi32(clamp(low).v, _mm256_slli_epi64(clamp(high).v, 32), 0xAA)};
     }
 }
@@ -131,7 +67,7 @@ struct Saturate {
         if constexpr (std::is_signed_v<W>)
             return v;
         else
-            return Lane<W>::min(v, Lane<W>::all(std::numeric_limits<T>::max()));
+            return smaller(v, splat<W>(std::numeric_limits<T>::max()));
     }
 };
 
@@ -140,22 +76,28 @@ struct Saturate {
 /// the element's width (n is cut there) every value but 0 saturates.
 template <class T, class W>
 struct LeftShift {
-    explicit LeftShift(int32_t scale) {
-        constexpr int elementBits = 8 * static_cast<int>(sizeof(T));
-        const int n = scale < -elementBits ? elementBits : -scale;
-        using Limits = std::numeric_limits<T>;
-        high = Lane<W>::all(static_cast<W>((int64_t{Limits::max()} >> n) + 1));
-        // The floor of min / 2^n is the exact quotient or, past the element's width, -1.
-        low = Lane<W>::all(static_cast<W>((int64_t{Limits::min()} >> n) - (Limits::min() < 0)));
-        count = _mm_cvtsi32_si128(n);
-    }
+    explicit LeftShift(int32_t scale) : LeftShift(Bits{scale < -elementBits ? elementBits : -scale}) {}
     QORI_INLINE Vec<W> operator()(Vec<W> v) const {
-        v = Lane<W>::min(v, high);
-        if constexpr (std::is_signed_v<W>) v = Lane<W>::max(v, low);
-        return Lane<W>::shiftLeft(v, count);
+        v = smaller(v, high);
+        if constexpr (std::is_signed_v<W>) v = larger(v, low);
+        return shiftLeft(v, count);
     }
+
+private:
+    static constexpr int elementBits = 8 * static_cast<int>(sizeof(T));
+    using Limits = std::numeric_limits<T>;
+    struct Bits {
+        int n;
+    };
+
+    // The floor of min / 2^n is the exact quotient or, past the element's width, -1.
+    explicit LeftShift(Bits shift)
+        : high(splat(static_cast<W>((int64_t{Limits::max()} >> shift.n) + 1))),
+          low(splat(static_cast<W>((int64_t{Limits::min()} >> shift.n) - (Limits::min() < 0)))),
+          count(shift.n) {}
+
     Vec<W> high, low;
-    __m128i count;
+    ShiftCount count;
 };
 
 /// Scale above 0: (v + odd + 2^(scale-1) - 1) >> scale, odd being the lowest bit of v >> scale. An exact half reaches
@@ -163,15 +105,13 @@ struct LeftShift {
 template <class W>
 struct RoundShift {
     explicit RoundShift(int32_t scale)
-        : bias(Lane<W>::all(static_cast<W>((uint64_t{1} << (scale - 1)) - 1))),
-          one(Lane<W>::all(1)),
-          count(_mm_cvtsi32_si128(scale)) {}
+        : bias(splat(static_cast<W>((uint64_t{1} << (scale - 1)) - 1))), one(splat<W>(1)), count(scale) {}
     QORI_INLINE Vec<W> operator()(Vec<W> v) const {
-        const Vec<W> odd{_mm256_and_si256(Lane<W>::shiftRight(v, count).v, one.v)};
-        return Lane<W>::shiftRight(Lane<W>::add(Lane<W>::add(v, odd), bias), count);
+        const Vec<W> odd = shiftRight(v, count) & one;
+        return shiftRight(v + odd + bias, count);
     }
     Vec<W> bias, one;
-    __m128i count;
+    ShiftCount count;
 };
 
 /// Scale above 2, any v: halves v first. The bit shifted out stays in the lowest bit, where it keeps telling exact
@@ -180,10 +120,7 @@ struct RoundShift {
 template <class W>
 struct RoundShiftSticky {
     explicit RoundShiftSticky(int32_t scale) : rest(scale - 1) {}
-    QORI_INLINE Vec<W> operator()(Vec<W> v) const {
-        const Vec<W> half = Lane<W>::shiftRight(v, _mm_cvtsi32_si128(1));
-        return rest({_mm256_or_si256(half.v, _mm256_and_si256(v.v, rest.one.v))});
-    }
+    QORI_INLINE Vec<W> operator()(Vec<W> v) const { return rest(shiftRight(v, ShiftCount(1)) | (v & rest.one)); }
     RoundShift<W> rest;
 };
 

@@ -50,6 +50,21 @@ QORI_INLINE Vec<T> fromInteger(__m256i v) {
         return {v};
 }
 
+// --- bits -----------------------------------------------------------------------------------------------------------
+
+template <class T>
+QORI_INLINE Vec<T> operator|(Vec<T> a, Vec<T> b) {
+    return fromInteger<T>(_mm256_or_si256(toInteger(a.v), toInteger(b.v)));
+}
+template <class T>
+QORI_INLINE Vec<T> operator&(Vec<T> a, Vec<T> b) {
+    return fromInteger<T>(_mm256_and_si256(toInteger(a.v), toInteger(b.v)));
+}
+template <class T>
+QORI_INLINE Vec<T> operator^(Vec<T> a, Vec<T> b) {
+    return fromInteger<T>(_mm256_xor_si256(toInteger(a.v), toInteger(b.v)));
+}
+
 // --- whole vectors --------------------------------------------------------------------------------------------------
 
 /// For a loaded vector that is used more than once. Compilers fold the load into the first use and load again for the
@@ -232,9 +247,6 @@ QORI_INLINE void storeWords(uint8_t* p, Bytes a, Bytes mask) {
 
 /// Per byte: where the mask's top bit is set b, else a.
 QORI_INLINE Bytes blend(Bytes a, Bytes b, Bytes mask) { return {_mm256_blendv_epi8(a.v, b.v, mask.v)}; }
-
-QORI_INLINE Bytes operator|(Bytes a, Bytes b) { return {_mm256_or_si256(a.v, b.v)}; }
-QORI_INLINE Bytes operator&(Bytes a, Bytes b) { return {_mm256_and_si256(a.v, b.v)}; }
 
 QORI_INLINE Bytes isZero(Bytes a) { return {_mm256_cmpeq_epi8(a.v, _mm256_setzero_si256())}; }
 

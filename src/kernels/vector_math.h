@@ -91,6 +91,17 @@ QORI_INLINE Vec<T> selectOrZero(Mask<T> mask, Vec<T> a) {
 
 // --- comparing ------------------------------------------------------------------------------------------------------
 
+namespace detail {
+
+/// 64-bit elements have no smallest and largest of their own, and compare as signed ones only.
+template <class T>
+QORI_INLINE __m256i isGreater64(Vec<T> a, Vec<T> b) {
+    static_assert(std::is_signed_v<T> && sizeof(T) == 8);
+    return _mm256_cmpgt_epi64(a.v, b.v);
+}
+
+}  // namespace detail
+
 /// The smaller of two elements. Floats: b where they are equal or one of them is NaN.
 template <class T>
 QORI_INLINE Vec<T> smaller(Vec<T> a, Vec<T> b) {
@@ -102,8 +113,10 @@ QORI_INLINE Vec<T> smaller(Vec<T> a, Vec<T> b) {
         return {std::is_signed_v<T> ? _mm256_min_epi8(a.v, b.v) : _mm256_min_epu8(a.v, b.v)};
     else if constexpr (sizeof(T) == 2)
         return {std::is_signed_v<T> ? _mm256_min_epi16(a.v, b.v) : _mm256_min_epu16(a.v, b.v)};
-    else
+    else if constexpr (sizeof(T) == 4)
         return {std::is_signed_v<T> ? _mm256_min_epi32(a.v, b.v) : _mm256_min_epu32(a.v, b.v)};
+    else
+        return {_mm256_blendv_epi8(a.v, b.v, detail::isGreater64(a, b))};
 }
 
 /// The larger of two elements. Floats: b where they are equal or one of them is NaN.
@@ -117,8 +130,10 @@ QORI_INLINE Vec<T> larger(Vec<T> a, Vec<T> b) {
         return {std::is_signed_v<T> ? _mm256_max_epi8(a.v, b.v) : _mm256_max_epu8(a.v, b.v)};
     else if constexpr (sizeof(T) == 2)
         return {std::is_signed_v<T> ? _mm256_max_epi16(a.v, b.v) : _mm256_max_epu16(a.v, b.v)};
-    else
+    else if constexpr (sizeof(T) == 4)
         return {std::is_signed_v<T> ? _mm256_max_epi32(a.v, b.v) : _mm256_max_epu32(a.v, b.v)};
+    else
+        return {_mm256_blendv_epi8(b.v, a.v, detail::isGreater64(a, b))};
 }
 
 template <class T>
@@ -131,8 +146,10 @@ QORI_INLINE Mask<T> isEqual(Vec<T> a, Vec<T> b) {
         return {_mm256_cmpeq_epi8(a.v, b.v)};
     else if constexpr (sizeof(T) == 2)
         return {_mm256_cmpeq_epi16(a.v, b.v)};
-    else
+    else if constexpr (sizeof(T) == 4)
         return {_mm256_cmpeq_epi32(a.v, b.v)};
+    else
+        return {_mm256_cmpeq_epi64(a.v, b.v)};
 }
 
 /// a <= b. Unsigned elements have no instruction of their own; the smaller one tells.
@@ -228,11 +245,114 @@ QORI_INLINE Vec<T> operator-(Vec<T> a, Vec<T> b) {
         return {_mm256_sub_epi64(a.v, b.v)};
 }
 
-/// |a - b| in the unsigned type of the element's size, which holds it.
 template <class T>
-QORI_INLINE Vec<std::make_unsigned_t<T>> absoluteDifference(Vec<T> a, Vec<T> b) {
-    static_assert(std::is_integral_v<T> && sizeof(T) <= 4);
-    return {(larger(a, b) - smaller(a, b)).v};
+QORI_INLINE Vec<T> operator*(Vec<T> a, Vec<T> b) {
+    static_assert(std::is_floating_point_v<T>);
+    if constexpr (std::is_same_v<T, float>)
+        return {_mm256_mul_ps(a.v, b.v)};
+    else
+        return {_mm256_mul_pd(a.v, b.v)};
+}
+
+template <class T>
+QORI_INLINE Vec<T> operator/(Vec<T> a, Vec<T> b) {
+    static_assert(std::is_floating_point_v<T>);
+    if constexpr (std::is_same_v<T, float>)
+        return {_mm256_div_ps(a.v, b.v)};
+    else
+        return {_mm256_div_pd(a.v, b.v)};
+}
+
+template <class T>
+QORI_INLINE Vec<T> squareRoot(Vec<T> a) {
+    static_assert(std::is_floating_point_v<T>);
+    if constexpr (std::is_same_v<T, float>)
+        return {_mm256_sqrt_ps(a.v)};
+    else
+        return {_mm256_sqrt_pd(a.v)};
+}
+
+namespace detail {
+
+template <class T>
+struct MagnitudeOf {
+    using type = std::make_unsigned_t<T>;
+};
+template <>
+struct MagnitudeOf<float> {
+    using type = float;
+};
+template <>
+struct MagnitudeOf<double> {
+    using type = double;
+};
+
+}  // namespace detail
+
+/// Holds |a| and |a - b| of any two elements: the unsigned type of an integer's size.
+template <class T>
+using Magnitude = typename detail::MagnitudeOf<T>::type;
+
+/// |a|. Of floats it clears the sign, whatever they are.
+template <class T>
+QORI_INLINE Vec<Magnitude<T>> magnitude(Vec<T> a) {
+    if constexpr (std::is_same_v<T, float>)
+        return {_mm256_andnot_ps(_mm256_set1_ps(-0.0f), a.v)};
+    else if constexpr (std::is_same_v<T, double>)
+        return {_mm256_andnot_pd(_mm256_set1_pd(-0.0), a.v)};
+    else if constexpr (std::is_unsigned_v<T>)
+        return a;
+    else if constexpr (sizeof(T) == 1)
+        return {_mm256_abs_epi8(a.v)};
+    else if constexpr (sizeof(T) == 2)
+        return {_mm256_abs_epi16(a.v)};
+    else
+        return {_mm256_abs_epi32(a.v)};
+}
+
+/// |a - b|.
+template <class T>
+QORI_INLINE Vec<Magnitude<T>> absoluteDifference(Vec<T> a, Vec<T> b) {
+    if constexpr (std::is_floating_point_v<T>)
+        return magnitude(a - b);
+    else
+        return {(larger(a, b) - smaller(a, b)).v};
+}
+
+/// How far a shift goes, the same in all lanes: 0 to the lane's bits and beyond.
+struct ShiftCount {
+    __m128i v;
+
+    QORI_INLINE explicit ShiftCount(int bits) : v(_mm_cvtsi32_si128(bits)) {}
+};
+
+template <class T>
+QORI_INLINE Vec<T> shiftLeft(Vec<T> a, ShiftCount count) {
+    static_assert(std::is_integral_v<T> && sizeof(T) >= 2);
+    if constexpr (sizeof(T) == 2)
+        return {_mm256_sll_epi16(a.v, count.v)};
+    else if constexpr (sizeof(T) == 4)
+        return {_mm256_sll_epi32(a.v, count.v)};
+    else
+        return {_mm256_sll_epi64(a.v, count.v)};
+}
+
+/// The floor of a / 2^count, of signed elements too.
+template <class T>
+QORI_INLINE Vec<T> shiftRight(Vec<T> a, ShiftCount count) {
+    static_assert(std::is_integral_v<T> && sizeof(T) >= 2);
+    constexpr bool isSigned = std::is_signed_v<T>;
+    if constexpr (sizeof(T) == 2)
+        return {isSigned ? _mm256_sra_epi16(a.v, count.v) : _mm256_srl_epi16(a.v, count.v)};
+    else if constexpr (sizeof(T) == 4)
+        return {isSigned ? _mm256_sra_epi32(a.v, count.v) : _mm256_srl_epi32(a.v, count.v)};
+    else if constexpr (!isSigned)
+        return {_mm256_srl_epi64(a.v, count.v)};
+    else {  // AVX2 shifts 64 bits only logically: as unsigned from the minimum up
+        const __m256i minimum = _mm256_set1_epi64x(INT64_MIN);
+        const __m256i raised = _mm256_srl_epi64(_mm256_xor_si256(a.v, minimum), count.v);
+        return {_mm256_sub_epi64(raised, _mm256_srl_epi64(minimum, count.v))};
+    }
 }
 
 // --- widths ---------------------------------------------------------------------------------------------------------

@@ -174,7 +174,7 @@ void scanPieces(QorImageSize roi, int stored, int results, Image<const T> src, B
 /// The first pixel of the region whose element equals value; false, with (0, 0), where there is none.
 template <class T>
 bool locate(QorImageSize roi, int stored, int channel, Image<const T> src, T value, int32_t* x, int32_t* y) {
-    const auto masks = kernels::channelMasks<T>(stored, channel);
+    const kernels::ChannelMasks<T> masks(stored, channel);
     const QorImageSize rows = isOneRun(roi, walk(src, stored)) ? QorImageSize{roi.width * roi.height, 1} : roi;
     *x = *y = 0;
     for (int32_t row = 0; row < rows.height; ++row) {

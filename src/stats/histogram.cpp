@@ -134,7 +134,10 @@ bool strictlyIncreasing(const float* levels, int32_t count) {
 QorResult typeCheck(int32_t type) { return dataTypeCheck(type, qor8u, qor16u, qor16s, qor32f); }
 
 /// Truncation towards zero; what 32 bits do not hold, infinity included, becomes the nearest end of their range.
-int32_t truncated(double value) { return _mm_cvttsd_si32(_mm_set_sd(std::clamp<double>(value, INT32_MIN, INT32_MAX))); }
+int32_t truncated(double value) {
+    if (!(value > INT32_MIN)) return INT32_MIN;  // NaN too, between infinite levels
+    return value < INT32_MAX ? static_cast<int32_t>(value) : INT32_MAX;
+}
 
 QorResult histogramSizes(int32_t dataType, QorImageSize roi, const int32_t* nLevels, int32_t numChannels, int32_t,
                          int32_t* pSpecSize, int32_t* pBufferSize) {

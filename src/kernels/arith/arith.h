@@ -4,11 +4,12 @@
 //     wide(a, b)    the exact value in lanes W, of magnitude up to `limit`, for the scaling rule.
 // b is the second operand: differences are b - a.
 #pragma once
+#include <bit>
 #include <type_traits>
 
 #include "kernels/map.h"
-#include "qori.h"
 #include "kernels/scale_round.h"
+#include "qori.h"
 
 namespace qori::kernels {
 
@@ -60,9 +61,7 @@ QORI_INLINE __m256i saturateSum32(__m256i a, __m256i sum, __m256i overflowSign) 
 /// the two apart, as scales that bring M into the element's range make less than 1/2 of 256.
 template <class W>
 QORI_INLINE Vec<W> mendMinimum(Vec<W> v) {
-    const Vec<W> minimum = Lane<W>::all(std::numeric_limits<W>::min());
-    const __m256i hit = sizeof(W) == 4 ? _mm256_cmpeq_epi32(v.v, minimum.v) : _mm256_cmpeq_epi64(v.v, minimum.v);
-    return {_mm256_xor_si256(v.v, _mm256_and_si256(hit, Lane<W>::all(-256).v))};
+    return v ^ selectOrZero(isEqual(v, splat(std::numeric_limits<W>::min())), splat<W>(-256));
 }
 
 /// Real and imaginary parts exchanged.
@@ -71,6 +70,11 @@ QORI_INLINE Vec<int16_t> swapParts(Vec<int16_t> a) {
 }
 
 }  // namespace detail
+
+/// For exponents of normal numbers.
+QORI_INLINE double powerOfTwo(int exponent) {
+    return std::bit_cast<double>(static_cast<int64_t>(1023 + exponent) << 52);
+}
 
 /// The largest magnitude of an integer component, and the lanes of twice its width.
 template <class C>
@@ -96,13 +100,9 @@ struct Sum {
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const Vec<C> a = components(first), b = components(second);
         if constexpr (isFloat<T>)
-            return elements<T>({_mm256_add_ps(a.v, b.v)});
-        else if constexpr (std::is_same_v<C, uint8_t>)
-            return elements<T>({_mm256_adds_epu8(a.v, b.v)});
-        else if constexpr (std::is_same_v<C, uint16_t>)
-            return elements<T>({_mm256_adds_epu16(a.v, b.v)});
-        else if constexpr (std::is_same_v<C, int16_t>)
-            return elements<T>({_mm256_adds_epi16(a.v, b.v)});
+            return elements<T>(a + b);
+        else if constexpr (sizeof(C) <= 2)
+            return elements<T>(addSaturated(a, b));
         else {
             const __m256i sum = _mm256_add_epi32(a.v, b.v);
             return elements<T>({detail::saturateSum32(
@@ -111,7 +111,7 @@ struct Sum {
     }
     static QORI_INLINE Wide<W> wide(Vec<T> first, Vec<T> second) {
         const Wide<W> a = widen<W>(components(first)), b = widen<W>(components(second));
-        return {Lane<W>::add(a.low, b.low), Lane<W>::add(a.high, b.high)};
+        return {a.low + b.low, a.high + b.high};
     }
     /// Half the sum: the average that rounds up, less 1 where it rounded an odd sum to an odd value.
     static QORI_INLINE Vec<T> halved(Vec<T> a, Vec<T> b) requires std::is_same_v<T, uint8_t> {
@@ -132,13 +132,9 @@ struct Difference {
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
         const Vec<C> a = components(first), b = components(second);
         if constexpr (isFloat<T>)
-            return elements<T>({_mm256_sub_ps(b.v, a.v)});
-        else if constexpr (std::is_same_v<C, uint8_t>)
-            return elements<T>({_mm256_subs_epu8(b.v, a.v)});
-        else if constexpr (std::is_same_v<C, uint16_t>)
-            return elements<T>({_mm256_subs_epu16(b.v, a.v)});
-        else if constexpr (std::is_same_v<C, int16_t>)
-            return elements<T>({_mm256_subs_epi16(b.v, a.v)});
+            return elements<T>(b - a);
+        else if constexpr (sizeof(C) <= 2)
+            return elements<T>(subtractSaturated(b, a));
         else {
             const __m256i difference = _mm256_sub_epi32(b.v, a.v);
             return elements<T>({detail::saturateSum32(
@@ -150,13 +146,7 @@ struct Difference {
             return widen<W>(exact(first, second));
         } else {
             const Wide<W> a = widen<W>(components(first)), b = widen<W>(components(second));
-            const auto minus = [](Vec<W> x, Vec<W> y) -> Vec<W> {
-                if constexpr (sizeof(W) == 4)
-                    return {_mm256_sub_epi32(x.v, y.v)};
-                else
-                    return {_mm256_sub_epi64(x.v, y.v)};
-            };
-            return {minus(b.low, a.low), minus(b.high, a.high)};
+            return {b.low - a.low, b.high - a.high};
         }
     }
     static QORI_INLINE Vec<T> halved(Vec<T> a, Vec<T> b) requires std::is_same_v<T, uint8_t> {
@@ -175,13 +165,13 @@ struct Product {
                               limit = isComplex<T> ? 2 * square - 256 : square;
 
     static QORI_INLINE Vec<T> exact(Vec<T> first, Vec<T> second) {
-        const __m256 a = components(first).v, b = components(second).v;
+        const Vec<float> a = components(first), b = components(second);
         if constexpr (isComplex<T>) {
-            const __m256 byReal = _mm256_mul_ps(a, _mm256_moveldup_ps(b));
-            const __m256 byImaginary = _mm256_mul_ps(_mm256_permute_ps(a, 0xB1), _mm256_movehdup_ps(b));
+            const __m256 byReal = _mm256_mul_ps(a.v, _mm256_moveldup_ps(b.v));
+            const __m256 byImaginary = _mm256_mul_ps(_mm256_permute_ps(a.v, 0xB1), _mm256_movehdup_ps(b.v));
             return elements<T>({_mm256_addsub_ps(byReal, byImaginary)});
         } else {
-            return {_mm256_mul_ps(a, b)};
+            return a * b;
         }
     }
     static QORI_INLINE Wide<W> wide(Vec<T> first, Vec<T> second) {
@@ -290,11 +280,9 @@ QORI_INLINE Vec<T> fractionProduct(Vec<T> a, Vec<T> b) {
     constexpr int n = 8 * static_cast<int>(sizeof(T));
     const Wide<W> product = Product<T>::wide(a, b);
     const auto divide = [](Vec<W> v) {
-        const Vec<W> t = Lane<W>::add(v, Lane<W>::all(static_cast<W>(W{1} << (n - 1))));
-        if constexpr (n == 8)
-            return Vec<W>{_mm256_srli_epi16(_mm256_add_epi16(t.v, _mm256_srli_epi16(t.v, 8)), 8)};
-        else
-            return Vec<W>{_mm256_srli_epi32(_mm256_add_epi32(t.v, _mm256_srli_epi32(t.v, 16)), 16)};
+        const Vec<W> t = v + splat(static_cast<W>(W{1} << (n - 1)));
+        const ShiftCount shift(n);
+        return shiftRight(t + shiftRight(t, shift), shift);
     };
     return narrow<T>(divide(product.low), divide(product.high));
 }

@@ -23,10 +23,6 @@ constexpr double kTiny = 0x1p-60;
 /// the tiny one.
 constexpr int kLeastScale = -48, kMostScale = 33;
 
-QORI_INLINE double powerOfTwo(int exponent) {
-    return std::bit_cast<double>(static_cast<int64_t>(1023 + exponent) << 52);
-}
-
 /// What a division has met: which elements had a zero divisor, by their place among the lanes.
 struct ZeroDivisors {
     __m256i seen = _mm256_setzero_si256();

@@ -15,11 +15,11 @@ struct CountLanes {
     static constexpr int banks = 1;
     static constexpr ptrdiff_t limit = 255;
 
-    __m256i counts;
+    Vec<T> counts;
 
     /// Matching lanes are all ones, that is -1.
-    QORI_INLINE void add(__m256i matches) { counts = _mm256_sub_epi8(counts, matches); }
-    void spillTo(Next& next) const { next.add({counts}); }
+    QORI_INLINE void add(Mask<T> matches) { counts = counts - Vec<T>{matches.v}; }
+    void spillTo(Next& next) const { next.add(counts); }
 };
 
 template <>
@@ -28,12 +28,12 @@ struct CountLanes<float> {
     static constexpr int banks = 1, count = 8;
     static constexpr ptrdiff_t limit = UINT32_MAX / 2;
 
-    __m256i counts;
+    Vec<uint32_t> counts;
 
-    QORI_INLINE void add(__m256i matches) { counts = _mm256_sub_epi32(counts, matches); }
+    QORI_INLINE void add(Mask<float> matches) { counts = counts - Vec<uint32_t>{matches.v}; }
     void values(Total* out) const {
         uint32_t words[count];
-        _mm256_storeu_si256(reinterpret_cast<__m256i*>(words), counts);
+        store(words, counts);
         detail::widen(words, out);
     }
 };
@@ -42,15 +42,12 @@ template <class T>
 struct Bounds {
     ChannelVectors<T> lower, upper;
 
-    /// All bits of the lanes within the bounds. NaN is in no range.
-    QORI_INLINE __m256i matches(int phase, Vec<T> a) const {
-        if constexpr (std::is_same_v<T, float>) {
-            const __m256 above = _mm256_cmp_ps(a.v, lower.v[phase].v, _CMP_GE_OQ);
-            return toInteger(_mm256_and_ps(above, _mm256_cmp_ps(a.v, upper.v[phase].v, _CMP_LE_OQ)));
-        } else {
-            const __m256i clamped = _mm256_min_epu8(_mm256_max_epu8(a.v, lower.v[phase].v), upper.v[phase].v);
-            return _mm256_cmpeq_epi8(clamped, a.v);
-        }
+    /// The lanes within the bounds. NaN is in no range.
+    QORI_INLINE Mask<T> matches(int phase, Vec<T> a) const {
+        if constexpr (std::is_same_v<T, float>)
+            return isAtMost(lower.v[phase], a) & isAtMost(a, upper.v[phase]);
+        else
+            return isEqual(smaller(larger(a, lower.v[phase]), upper.v[phase]), a);
     }
 };
 
@@ -73,8 +70,8 @@ QORI_NOINLINE void countRow(Counts<T>& counts, const Bounds<T>& bounds, int chan
     if (i == elements) return;
     for (int v = 0; i < elements; i += n, ++v) {
         const ptrdiff_t rest = elements - i;
-        const __m256i own = detail::firstLanes<T>(rest < n ? rest : n);
-        counts.lanes[v].add(_mm256_and_si256(own, bounds.matches(v, loadUpTo(src + i, rest))));
+        const Mask<T> own = firstLanes<T>(rest < n ? rest : n);
+        counts.lanes[v].add(own & bounds.matches(v, loadUpTo(src + i, rest)));
     }
     if (--counts.left == 0) counts.spill(channels);
 }

@@ -8,19 +8,9 @@
 #include <limits>
 
 #include "kernels/map.h"
-#include "kernels/simd.h"
+#include "kernels/vector_math.h"
 
 namespace qori::kernels {
-
-template <class T>
-QORI_INLINE Vec<T> filled(T value) {
-    if constexpr (std::is_same_v<T, float>)
-        return {_mm256_set1_ps(value)};
-    else if constexpr (sizeof(T) == 1)
-        return {_mm256_set1_epi8(static_cast<char>(value))};
-    else
-        return {_mm256_set1_epi16(static_cast<int16_t>(value))};
-}
 
 template <class T>
 struct Smallest {
@@ -33,16 +23,7 @@ struct Smallest {
         std::is_floating_point_v<T> ? -std::numeric_limits<T>::infinity() : std::numeric_limits<T>::lowest();
 
     static bool better(T a, T b) { return a < b; }
-    QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> best) {
-        if constexpr (std::is_same_v<T, float>)
-            return {_mm256_min_ps(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint8_t>)
-            return {_mm256_min_epu8(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint16_t>)
-            return {_mm256_min_epu16(a.v, best.v)};
-        else
-            return {_mm256_min_epi16(a.v, best.v)};
-    }
+    QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> best) { return smaller(a, best); }
 };
 
 template <class T>
@@ -51,16 +32,7 @@ struct Biggest {
     static constexpr T start = Smallest<T>::limit, limit = Smallest<T>::start;
 
     static bool better(T a, T b) { return a > b; }
-    QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> best) {
-        if constexpr (std::is_same_v<T, float>)
-            return {_mm256_max_ps(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint8_t>)
-            return {_mm256_max_epu8(a.v, best.v)};
-        else if constexpr (std::is_same_v<T, uint16_t>)
-            return {_mm256_max_epu16(a.v, best.v)};
-        else
-            return {_mm256_max_epi16(a.v, best.v)};
-    }
+    QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> best) { return larger(a, best); }
 };
 
 namespace detail {
@@ -70,34 +42,6 @@ namespace detail {
 template <class V>
 QORI_INLINE void updateInPlace(V& accumulator, const V& other) {
     __asm__("" : "+x"(accumulator) : "x"(other));
-}
-
-alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
-                                                           255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
-                                                           255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
-
-/// All bits of the first `count` lanes (0 to all).
-template <class T>
-QORI_INLINE __m256i firstLanes(ptrdiff_t count) {
-    return _mm256_loadu_si256(
-        reinterpret_cast<const __m256i*>(kOnesThenZeros + 32 - count * static_cast<ptrdiff_t>(sizeof(T))));
-}
-
-/// The lanes of a that mask selects, `other` elsewhere.
-template <class T>
-QORI_INLINE Vec<T> select(Vec<T> a, T other, __m256i mask) {
-    return fromInteger<T>(_mm256_blendv_epi8(toInteger(filled(other).v), toInteger(a.v), mask));
-}
-
-/// All bits of the equal lanes.
-template <class T>
-QORI_INLINE __m256i equal(Vec<T> a, Vec<T> b) {
-    if constexpr (std::is_same_v<T, float>)
-        return toInteger(_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ));
-    else if constexpr (sizeof(T) == 1)
-        return _mm256_cmpeq_epi8(a.v, b.v);
-    else
-        return _mm256_cmpeq_epi16(a.v, b.v);
 }
 
 /// The best of the elements that lie a multiple of `count` (1 or 4) apart, in the first ones.
@@ -121,7 +65,7 @@ struct ExtremumLanes {
     using T = typename Order::Element;
     static constexpr int vectors = 3;
 
-    Vec<T> best[vectors] = {filled(Order::start), filled(Order::start), filled(Order::start)};
+    Vec<T> best[vectors] = {splat(Order::start), splat(Order::start), splat(Order::start)};
 
     /// The best of each channel, in the first of four elements.
     QORI_INLINE void ofChannels(int channels, T* out) const {
@@ -145,9 +89,9 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
     constexpr int n = Vec<T>::lanes;
     const auto join = [](auto& lane, Vec<T> a, auto order) { lane = decltype(order)::join(a, lane); };
     if (elements < n) {
-        const __m256i own = detail::firstLanes<T>(elements);
+        const Mask<T> own = firstLanes<T>(elements);
         const Vec<T> a = loadPartial(src, elements);
-        (join(lanes.best[0], detail::select(a, Orders::start, own), Orders{}), ...);
+        (join(lanes.best[0], select(own, a, splat(Orders::start)), Orders{}), ...);
         return;
     }
     ptrdiff_t i = 0;
@@ -176,38 +120,38 @@ QORI_NOINLINE void extremaRow(ptrdiff_t elements, const T* src, ExtremumLanes<Or
 /// Whether any lane has become better than its channel's best.
 template <class Order, class T>
 QORI_INLINE bool anyBetter(const ExtremumLanes<Order>& lanes, const ChannelVectors<T>& best) {
-    __m256i same = _mm256_set1_epi8(-1);
-    for (int v = 0; v < 3; ++v)
-        same = _mm256_and_si256(same, detail::equal(Order::join(lanes.best[v], best.v[v]), best.v[v]));
-    return _mm256_movemask_epi8(same) != -1;
+    const auto same = [&](int v) { return isEqual(Order::join(lanes.best[v], best.v[v]), best.v[v]); };
+    return !all(same(0) & same(1) & same(2));
 }
 
-/// All bits of one channel's elements.
+/// The elements of one channel, by the phase of their vector.
 template <class T>
-ChannelVectors<T> channelMasks(int channels, int channel) {
-    T masks[4] = {};
-    __builtin_memset(masks + channel, 0xFF, sizeof(T));
-    return channelVectors(masks, channels);
-}
+struct ChannelMasks {
+    Mask<T> of[3];
+
+    ChannelMasks(int channels, int channel) {
+        T values[4] = {};
+        __builtin_memset(values + channel, 0xFF, sizeof(T));
+        const ChannelVectors<T> vectors = channelVectors(values, channels);
+        for (int phase = 0; phase < 3; ++phase) of[phase] = {toInteger(vectors.v[phase].v)};
+    }
+};
 
 /// The index of a row's first element of a channel that equals value, or -1.
 template <class T>
-QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const ChannelVectors<T>& masks, T value) {
+QORI_NOINLINE ptrdiff_t findInRow(const T* src, ptrdiff_t elements, const ChannelMasks<T>& masks, T value) {
     constexpr int n = Vec<T>::lanes;
-    const Vec<T> wanted = filled(value);
-    const auto found = [&](Vec<T> a, int phase) {
-        return _mm256_and_si256(detail::equal(a, wanted), toInteger(masks.v[phase].v));
-    };
+    const Vec<T> wanted = splat(value);
+    const auto found = [&](Vec<T> a, int phase) { return isEqual(a, wanted) & masks.of[phase]; };
     ptrdiff_t i = 0;
     for (; i <= elements - 3 * n; i += 3 * n) {
-        const __m256i first = found(load(src + i), 0), second = found(load(src + i + n), 1);
-        const __m256i any = _mm256_or_si256(_mm256_or_si256(first, second), found(load(src + i + 2 * n), 2));
-        if (!_mm256_testz_si256(any, any)) break;
+        const Mask<T> first = found(load(src + i), 0), second = found(load(src + i + n), 1);
+        if (any(first | second | found(load(src + i + 2 * n), 2))) break;
     }
     for (int phase = 0; i < elements; i += n, phase = phase < 2 ? phase + 1 : 0) {
-        const int bits = _mm256_movemask_epi8(found(loadUpTo(src + i, elements - i), phase));
-        if (bits == 0) continue;
-        const ptrdiff_t at = i + __builtin_ctz(static_cast<unsigned>(bits)) / static_cast<int>(sizeof(T));
+        const Mask<T> here = found(loadUpTo(src + i, elements - i), phase);
+        if (!any(here)) continue;
+        const ptrdiff_t at = i + firstSelected(here);
         return at < elements ? at : -1;  // zeros behind the row may equal the value
     }
     return -1;
@@ -224,8 +168,8 @@ QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptr
     ptrdiff_t i = 0;
     for (; i <= columns - 2 * n; i += 2 * n) {
         const T* p = src + i;
-        Vec<T> low[2] = {filled(Smallest<T>::start), filled(Smallest<T>::start)};
-        Vec<T> high[2] = {filled(Biggest<T>::start), filled(Biggest<T>::start)};
+        Vec<T> low[2] = {splat(Smallest<T>::start), splat(Smallest<T>::start)};
+        Vec<T> high[2] = {splat(Biggest<T>::start), splat(Biggest<T>::start)};
         for (int32_t y = 0; y < rows; ++y, p = advanced(p))
             for (int v = 0; v < 2; ++v) {
                 Vec<T> a = load(p + v * n);
@@ -240,7 +184,7 @@ QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptr
     }
     for (; i < columns; i += n) {
         const T* p = src + i;
-        Vec<T> low = filled(Smallest<T>::start), high = filled(Biggest<T>::start);
+        Vec<T> low = splat(Smallest<T>::start), high = splat(Biggest<T>::start);
         for (int32_t y = 0; y < rows; ++y, p = advanced(p)) {
             const Vec<T> a = loadUpTo(p, columns - i);
             low = Smallest<T>::join(a, low);
@@ -255,9 +199,9 @@ QORI_NOINLINE void columnExtrema(const T* src, ptrdiff_t step, int32_t rows, ptr
 template <class Order, class T>
 QORI_INLINE T bestOf(const T* buffer, ptrdiff_t count) {
     constexpr int n = Vec<T>::lanes;
-    Vec<T> best = filled(Order::start);
+    Vec<T> best = splat(Order::start);
     for (; count >= n; count -= n, buffer += n) best = Order::join(load(buffer), best);
-    if (count > 0) best = Order::join(detail::select(load(buffer), Order::start, detail::firstLanes<T>(count)), best);
+    if (count > 0) best = Order::join(select(firstLanes<T>(count), load(buffer), splat(Order::start)), best);
     best = detail::folded<Order>(best, 1);
     T lanes[n];
     store(lanes, best);

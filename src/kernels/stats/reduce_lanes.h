@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Accumulators of integer reductions. All are exact; each states how many vectors its lanes hold.
 #pragma once
-#include "kernels/simd.h"
+#include "kernels/vector_math.h"
 
 namespace qori::kernels {
 

@@ -8,41 +8,15 @@
 
 namespace qori::kernels {
 
+/// |a - b| of two vectors in memory, each loaded once.
 template <class T>
-struct MagnitudeType {
-    using type = std::make_unsigned_t<T>;
-};
-template <>
-struct MagnitudeType<float> {
-    using type = float;
-};
-/// Holds |a| and |a - b| of any two elements: |-32768| = 32768 and 32767 - -32768 = 65535 fit 16 unsigned bits.
-template <class T>
-using Magnitude = typename MagnitudeType<T>::type;
-
-QORI_INLINE Vec<uint8_t> magnitude(Vec<uint8_t> a) { return a; }
-QORI_INLINE Vec<uint16_t> magnitude(Vec<uint16_t> a) { return a; }
-QORI_INLINE Vec<uint16_t> magnitude(Vec<int16_t> a) { return {_mm256_abs_epi16(a.v)}; }
-QORI_INLINE Vec<uint32_t> magnitude(Vec<int32_t> a) { return {_mm256_abs_epi32(a.v)}; }
-QORI_INLINE Vec<float> magnitude(Vec<float> a) { return {_mm256_andnot_ps(_mm256_set1_ps(-0.0f), a.v)}; }
-
-QORI_INLINE Vec<uint8_t> magnitude(Vec<uint8_t> a, Vec<uint8_t> b) {
-    loadOnce(a.v);
-    loadOnce(b.v);
-    return {_mm256_sub_epi8(_mm256_max_epu8(a.v, b.v), _mm256_min_epu8(a.v, b.v))};
+QORI_INLINE Vec<Magnitude<T>> magnitude(Vec<T> a, Vec<T> b) {
+    if constexpr (std::is_integral_v<T>) {
+        loadOnce(a.v);
+        loadOnce(b.v);
+    }
+    return absoluteDifference(a, b);
 }
-QORI_INLINE Vec<uint16_t> magnitude(Vec<uint16_t> a, Vec<uint16_t> b) {
-    loadOnce(a.v);
-    loadOnce(b.v);
-    return {_mm256_sub_epi16(_mm256_max_epu16(a.v, b.v), _mm256_min_epu16(a.v, b.v))};
-}
-QORI_INLINE Vec<uint16_t> magnitude(Vec<int16_t> a, Vec<int16_t> b) {
-    loadOnce(a.v);
-    loadOnce(b.v);
-    return {_mm256_sub_epi16(_mm256_max_epi16(a.v, b.v), _mm256_min_epi16(a.v, b.v))};
-}
-QORI_INLINE Vec<float> magnitude(Vec<float> a, Vec<float> b) { return magnitude(Vec<float>{_mm256_sub_ps(a.v, b.v)}); }
-
 QORI_INLINE Doubles magnitude(Doubles a, Doubles b) { return magnitude(a - b); }
 
 template <class T, class... Other>
