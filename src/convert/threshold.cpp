@@ -33,9 +33,9 @@ template <class T, class Rule>
 QORI_NOINLINE void mapRowPairs(Rule rule, Image<const T> src, Image<T> dst, int32_t rows) {
     for (int32_t y = 0; y < rows; y += 2) {
         const int32_t other = y + 1 < rows ? y + 1 : y;
-        const Bytes two = loadHalves(asBytes(src.row(y)), asBytes(src.row(other)));
+        const Bytes two = loadBlocks(asBytes(src.row(y)), asBytes(src.row(other)));
         const Vec<T> out = rule(0, fromInteger<T>(two.v));
-        storeHalves(asBytes(dst.row(y)), asBytes(dst.row(other)), {toInteger(out.v)});
+        storeBlocks(asBytes(dst.row(y)), asBytes(dst.row(other)), {toInteger(out.v)});
     }
 }
 

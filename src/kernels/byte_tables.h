@@ -6,9 +6,11 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "simd.h"
+
 namespace qori::kernels {
 
-struct alignas(32) ByteTable {
+struct alignas(kVectorBytes) ByteTable {
     uint8_t at[32];
 };
 
@@ -71,7 +73,7 @@ constexpr ByteTable interleaveWords() {
 
 /// Where vector k of a row with pixels of `pixelBytes` finds the mask of each of its bytes: four words of the mask of
 /// 32 pixels, for both halves, and an index into their bytes.
-struct alignas(32) Window {
+struct alignas(kVectorBytes) Window {
     int32_t words[8];
     ByteTable index;
 };

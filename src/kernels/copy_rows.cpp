@@ -4,7 +4,7 @@
 namespace qori::kernels {
 namespace {
 
-constexpr ptrdiff_t kVector = 32, kLine = 64;
+constexpr ptrdiff_t kVector = kVectorBytes, kLine = 64;
 constexpr ptrdiff_t kStringRow = 8192;  // in rows of 2 to 6 KiB string moves gain nothing and fills lose up to 40 %
 
 /// Bytes from p to the next multiple of `boundary`, a power of two.
@@ -19,8 +19,8 @@ QORI_INLINE void copyShort(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
         store(dst, first);
         store(dst + bytes - kVector, last);
     } else if (bytes >= 16) {
-        const Bytes ends = loadHalves(src, src + bytes - 16);
-        storeHalves(dst, dst + bytes - 16, ends);
+        const Bytes ends = loadBlocks(src, src + bytes - 16);
+        storeBlocks(dst, dst + bytes - 16, ends);
     } else if (bytes >= 8) {
         const auto first = detail::loadWord<uint64_t>(src), last = detail::loadWord<uint64_t>(src + bytes - 8);
         detail::storeWord(dst, first);
@@ -78,7 +78,7 @@ QORI_INLINE void copyEnds(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
         store(dst, a);
         store(dst + last, b);
     } else if constexpr (size == 16) {
-        storeHalves(dst, dst + last, loadHalves(src, src + last));
+        storeBlocks(dst, dst + last, loadBlocks(src, src + last));
     } else {
         using Word = std::conditional_t<
             size == 8, uint64_t,

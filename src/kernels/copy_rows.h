@@ -26,7 +26,7 @@ void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool s
 /// and any 32 bytes from an offset below 96 can be loaded.
 struct Pattern {
     static constexpr int period = 96;
-    alignas(32) uint8_t bytes[128];
+    alignas(kVectorBytes) uint8_t bytes[128];
 };
 
 template <int pixelBytes>
@@ -40,7 +40,7 @@ Pattern repeatPixel(const uint8_t* pixel) {
     const Bytes both{_mm256_broadcastsi128_si256(_mm256_castsi256_si128(loadPartial(pixel, pixelBytes).v))};
     Pattern pattern;
     for (int k = 0; k < 4; ++k)
-        store(pattern.bytes + 32 * k, shuffleHalves(both, load(index[static_cast<size_t>(k)].at)));
+        store(pattern.bytes + 32 * k, shuffleInBlocks(both, load(index[static_cast<size_t>(k)].at)));
     return pattern;
 }
 

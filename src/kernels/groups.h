@@ -25,7 +25,7 @@ constexpr Run oneChannel(int pixelBytes, int elementBytes) { return {pixelBytes,
 template <int channels, int spans>
 QORI_INLINE Bytes loadSpans(const uint8_t* in, int k) {
     if constexpr (spans == 2)
-        return loadHalves(in + 16 * k, in + 16 * (channels + k));
+        return loadBlocks(in + 16 * k, in + 16 * (channels + k));
     else
         return {_mm256_castsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(in + 16 * k)))};
 }
@@ -33,7 +33,7 @@ QORI_INLINE Bytes loadSpans(const uint8_t* in, int k) {
 template <int channels, int spans>
 QORI_INLINE void storeSpans(uint8_t* out, int k, Bytes a) {
     if constexpr (spans == 2)
-        storeHalves(out + 16 * k, out + 16 * (channels + k), a);
+        storeBlocks(out + 16 * k, out + 16 * (channels + k), a);
     else
         _mm_storeu_si128(reinterpret_cast<__m128i*>(out + 16 * k), _mm256_castsi256_si128(a.v));
 }
@@ -48,11 +48,11 @@ QORI_INLINE void storeAllSpans(uint8_t* out, const Bytes (&halves)[channels]) {
         storeAs<streaming>(out, halves[0]);
     } else if constexpr (channels == 3) {
         storeAs<streaming>(out, Bytes{_mm256_permute2x128_si256(halves[0].v, halves[1].v, low)});
-        storeAs<streaming>(out + 32, Bytes{_mm256_blend_epi32(halves[2].v, halves[0].v, 0xF0)});
+        storeAs<streaming>(out + kVectorBytes, Bytes{_mm256_blend_epi32(halves[2].v, halves[0].v, 0xF0)});
         storeAs<streaming>(out + 64, Bytes{_mm256_permute2x128_si256(halves[1].v, halves[2].v, high)});
     } else {
         storeAs<streaming>(out, Bytes{_mm256_permute2x128_si256(halves[0].v, halves[1].v, low)});
-        storeAs<streaming>(out + 32, Bytes{_mm256_permute2x128_si256(halves[2].v, halves[3].v, low)});
+        storeAs<streaming>(out + kVectorBytes, Bytes{_mm256_permute2x128_si256(halves[2].v, halves[3].v, low)});
         storeAs<streaming>(out + 64, Bytes{_mm256_permute2x128_si256(halves[0].v, halves[1].v, high)});
         storeAs<streaming>(out + 96, Bytes{_mm256_permute2x128_si256(halves[2].v, halves[3].v, high)});
     }
@@ -66,20 +66,20 @@ template <class Kernel, size_t ins, size_t outs>
 QORI_INLINE void shortRow(const Kernel& kernel, std::array<uint8_t*, outs> out, std::array<const uint8_t*, ins> in,
                           ptrdiff_t pixels) {
     constexpr int kMost = 64;  // four channels
-    alignas(32) uint8_t buffers[ins + outs][kMost];
+    alignas(kVectorBytes) uint8_t buffers[ins + outs][kMost];
     std::array<const uint8_t*, ins> from;
     std::array<uint8_t*, outs> to;
     const auto bytesOf = [=](const Run& run) { return (pixels - 1) * run.pixelBytes + run.lastBytes; };
     for (size_t r = 0; r < ins; ++r) {
         const ptrdiff_t bytes = bytesOf(Kernel::in[r]);
-        for (int at = 0; at < bytes; at += 32) store(buffers[r] + at, loadUpTo(in[r] + at, bytes - at));
+        for (int at = 0; at < bytes; at += kVectorBytes) store(buffers[r] + at, loadUpTo(in[r] + at, bytes - at));
         from[r] = buffers[r];
     }
     for (size_t r = 0; r < outs; ++r) to[r] = buffers[ins + r];
     kernel.template run<1, false>(to, from);
     for (size_t r = 0; r < outs; ++r) {
         const ptrdiff_t bytes = bytesOf(Kernel::out[r]);
-        for (int at = 0; at < bytes; at += 32) storeUpTo(out[r] + at, load(to[r] + at), bytes - at);
+        for (int at = 0; at < bytes; at += kVectorBytes) storeUpTo(out[r] + at, load(to[r] + at), bytes - at);
     }
 }
 

@@ -28,12 +28,12 @@ namespace qori::kernels {
 /// n elements of type T in whole vectors.
 template <class T, int n>
 struct Pack {
-    static constexpr int vectors = n * static_cast<int>(sizeof(T)) / 32;
+    static constexpr int vectors = n * static_cast<int>(sizeof(T)) / kVectorBytes;
     Vec<T> v[vectors];
 };
 
 template <class... T>
-constexpr int blockOf = 32 / static_cast<int>(std::min({sizeof(T)...}));
+constexpr int blockOf = kVectorBytes / static_cast<int>(std::min({sizeof(T)...}));
 
 namespace detail {
 
@@ -129,12 +129,12 @@ QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*...
 }  // namespace detail
 
 /// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
-/// sources may be the same. Streaming wants dst on a 32-byte boundary and is ignored elsewhere.
+/// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere.
 template <bool keepAlpha, class Op, class D, class... S>
 QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
     if constexpr (requires { Op::mayStream; }) {
-        if (streaming && reinterpret_cast<uintptr_t>(dst) % 32 == 0)
+        if (streaming && reinterpret_cast<uintptr_t>(dst) % kVectorBytes == 0)
             return detail::mapBlocks<keepAlpha, true, n>(op, elements, dst, src...);
     }
     detail::mapBlocks<keepAlpha, false, n>(op, elements, dst, src...);
@@ -156,8 +156,8 @@ QORI_NOINLINE bool mapGathered(Op& op, int channels, QorImageSize roi, const Ima
     if (!(liesApart(dst) && ... && liesApart(src))) return false;
     if (isOneRun(roi, walk(dst, channels), walk(src, channels)...)) return false;
     constexpr int n = blockOf<D, S...>, room = 12 * n;
-    alignas(32) D result[room];
-    alignas(32) uint8_t sources[sizeof...(S) + 1][room * std::max({sizeof(D), sizeof(S)...})];
+    alignas(kVectorBytes) D result[room];
+    alignas(kVectorBytes) uint8_t sources[sizeof...(S) + 1][room * std::max({sizeof(D), sizeof(S)...})];
     const auto gather = [=](auto* to, auto from, int32_t y, int count) {
         const int bytes = elements * static_cast<int>(sizeof(*from.data));
         copyNarrowRows(asBytes(to), bytes, asBytes(from.row(y)), from.step, bytes, count);
@@ -205,7 +205,7 @@ struct ChannelVectors {
 template <class T>
 ChannelVectors<T> channelVectors(const T* values, int channels) {
     constexpr int kGroup = 12;  // whole pixels of 1, 3 and 4 channels
-    alignas(32) T all[3 * Vec<T>::lanes];
+    alignas(kVectorBytes) T all[3 * Vec<T>::lanes];
     T group[kGroup];
     for (int i = 0, c = 0; i < kGroup; ++i, c = c + 1 < channels ? c + 1 : 0) group[i] = values[c];
     for (int i = 0; i < 3 * Vec<T>::lanes; i += kGroup) __builtin_memcpy(all + i, group, sizeof group);

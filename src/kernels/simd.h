@@ -14,9 +14,12 @@
 
 namespace qori {
 
+/// Of a vector; and of the blocks that shuffles stay within.
+inline constexpr int kVectorBytes = 32, kBlockBytes = 16;
+
 template <class T>
 struct Vec {
-    static constexpr int lanes = 32 / static_cast<int>(sizeof(T));
+    static constexpr int lanes = kVectorBytes / static_cast<int>(sizeof(T));
     __m256i v;
 };
 
@@ -112,20 +115,20 @@ QORI_INLINE Vec<T> zero() {
     return fromInteger<T>(_mm256_setzero_si256());
 }
 
-/// 16 bytes at low and 16 at high.
-QORI_INLINE Bytes loadHalves(const uint8_t* low, const uint8_t* high) {
+/// The block at low and the block at high.
+QORI_INLINE Bytes loadBlocks(const uint8_t* low, const uint8_t* high) {
     const __m128i a = _mm_loadu_si128(reinterpret_cast<const __m128i*>(low));
     const __m128i b = _mm_loadu_si128(reinterpret_cast<const __m128i*>(high));
     return {_mm256_inserti128_si256(_mm256_castsi128_si256(a), b, 1)};
 }
 
-QORI_INLINE void storeHalves(uint8_t* low, uint8_t* high, Bytes a) {
+QORI_INLINE void storeBlocks(uint8_t* low, uint8_t* high, Bytes a) {
     _mm_storeu_si128(reinterpret_cast<__m128i*>(low), _mm256_castsi256_si128(a.v));
     _mm_storeu_si128(reinterpret_cast<__m128i*>(high), _mm256_extracti128_si256(a.v, 1));
 }
 
-/// 16 bytes at p in both halves.
-QORI_INLINE Bytes loadTwice(const uint8_t* p) {
+/// The block at p in every block.
+QORI_INLINE Bytes repeatBlock(const uint8_t* p) {
     return {_mm256_broadcastsi128_si256(_mm_loadu_si128(reinterpret_cast<const __m128i*>(p)))};
 }
 
@@ -253,7 +256,7 @@ QORI_INLINE Bytes isZero(Bytes a) { return {_mm256_cmpeq_epi8(a.v, _mm256_setzer
 /// One bit per byte: its top bit.
 QORI_INLINE uint32_t topBits(Bytes a) { return static_cast<uint32_t>(_mm256_movemask_epi8(a.v)); }
 
-/// Within each half, byte i becomes a[index[i] & 15], or 0 where the index has its top bit set.
-QORI_INLINE Bytes shuffleHalves(Bytes a, Bytes index) { return {_mm256_shuffle_epi8(a.v, index.v)}; }
+/// Within each block, byte i becomes a[index[i] & 15], or 0 where the index has its top bit set.
+QORI_INLINE Bytes shuffleInBlocks(Bytes a, Bytes index) { return {_mm256_shuffle_epi8(a.v, index.v)}; }
 
 }  // namespace qori

@@ -46,7 +46,7 @@ QORI_INLINE int firstSelected(Mask<T> a) {
 
 namespace detail {
 
-alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
+alignas(kVectorBytes) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
                                                            255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
                                                            255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
 
@@ -55,7 +55,7 @@ alignas(32) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 2
 /// The first n lanes (0 to all).
 template <class T>
 QORI_INLINE Mask<T> firstLanes(ptrdiff_t n) {
-    return {load(detail::kOnesThenZeros + 32 - n * static_cast<ptrdiff_t>(sizeof(T))).v};
+    return {load(detail::kOnesThenZeros + kVectorBytes - n * static_cast<ptrdiff_t>(sizeof(T))).v};
 }
 
 // --- making and choosing --------------------------------------------------------------------------------------------

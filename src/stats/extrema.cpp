@@ -251,7 +251,7 @@ struct BlockRow {
 template <class T>
 MinMax<T> blockRow(Image<const T> src, int32_t y, int32_t rows, int32_t width, int32_t blockWidth, BlockRow<T> out) {
     constexpr int32_t kStrip = 2'048 / static_cast<int32_t>(sizeof(T));
-    alignas(32) T smallest[kStrip + Vec<T>::lanes], biggest[kStrip + Vec<T>::lanes];
+    alignas(kVectorBytes) T smallest[kStrip + Vec<T>::lanes], biggest[kStrip + Vec<T>::lanes];
     const int32_t strip = blockWidth < kStrip ? kStrip / blockWidth * blockWidth : kStrip;
     MinMax<T> all, block;
     ptrdiff_t done = 0;

@@ -119,7 +119,7 @@ QORI_INLINE __m256d logarithm(__m128i x) {
 /// which stand in the table, `most` above it, as e^13 exceeds twice 65,536.
 struct ExponentialTable {
     static constexpr int kSize = 16;
-    alignas(32) int32_t value[kSize];  ///< For x = first - 1 (and less), first, ..., first + 14 (and more).
+    alignas(kVectorBytes) int32_t value[kSize];  ///< For x = first - 1 (and less), first, ..., first + 14 (and more).
     int32_t first;
 
     ExponentialTable(int32_t scale, int32_t most) {

@@ -112,7 +112,7 @@ struct Logarithm {
     /// The zeros behind the last elements are no zeros of the image.
     template <int n>
     QORI_INLINE Pack<T, n> tail(int phase, ptrdiff_t count, Pack<T, n> a) {
-        alignas(32) T padded[n];
+        alignas(kVectorBytes) T padded[n];
         store(padded, a.v[0]);
         for (ptrdiff_t i = count; i < n; ++i) padded[i] = 1;
         return (*this)(phase, Pack<T, n>{{load(padded)}});

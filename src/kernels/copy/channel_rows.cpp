@@ -58,10 +58,10 @@ struct Split {
                                                   takeMixed<3, element>(2)};
             for (int c = 0; c < 3; ++c)
                 storeAllSpans<spans, streaming>(to[static_cast<size_t>(c)],
-                                                {shuffleHalves(mix3<element>(a[0], a[1], a[2], c), table(take[c]))});
+                                                {shuffleInBlocks(mix3<element>(a[0], a[1], a[2], c), table(take[c]))});
         } else {
             static constexpr ByteTable words = channelWords<element>();
-            for (Bytes& half : a) half = element == 4 ? half : shuffleHalves(half, table(words));
+            for (Bytes& half : a) half = element == 4 ? half : shuffleInBlocks(half, table(words));
             transposeWords(a);
             for (size_t c = 0; c < 4; ++c) storeAllSpans<spans, streaming>(to[c], {a[c]});
         }
@@ -86,14 +86,14 @@ struct Merge {
                                                     selectChannel<3, element>(1, 2)};
             static constexpr ByteTable third[3] = {selectChannel<3, element>(2, 0), selectChannel<3, element>(2, 1),
                                                    selectChannel<3, element>(2, 2)};
-            for (int c = 0; c < 3; ++c) a[c] = shuffleHalves(a[c], table(put[c]));
+            for (int c = 0; c < 3; ++c) a[c] = shuffleInBlocks(a[c], table(put[c]));
             Bytes halves[3];
             for (int k = 0; k < 3; ++k) halves[k] = blend(blend(a[0], a[1], table(second[k])), a[2], table(third[k]));
             storeAllSpans<spans, streaming>(to[0], halves);
         } else {
             static constexpr ByteTable bytes = interleaveWords<element>();
             transposeWords(a);
-            for (Bytes& half : a) half = element == 4 ? half : shuffleHalves(half, table(bytes));
+            for (Bytes& half : a) half = element == 4 ? half : shuffleInBlocks(half, table(bytes));
             storeAllSpans<spans, streaming>(to[0], a);
         }
     }
@@ -129,9 +129,9 @@ struct Extract {
     template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
         static constexpr auto take = tables<channels>(moves);
-        Bytes gathered = shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], 0), table(take[0]));
+        Bytes gathered = shuffleInBlocks(loadChannelHalf<channels, element, spans>(from[0], 0), table(take[0]));
         for (int k = 1; k < channels; ++k)
-            gathered = gathered | shuffleHalves(loadChannelHalf<channels, element, spans>(from[0], k),
+            gathered = gathered | shuffleInBlocks(loadChannelHalf<channels, element, spans>(from[0], k),
                                                 table(take[static_cast<size_t>(k)]));
         storeAllSpans<spans, streaming>(to[0], {gathered});
     }
@@ -164,7 +164,7 @@ struct Insert {
         for (int k = 0; k < channels; ++k) {
             const auto t = static_cast<size_t>(k);
             halves[k] = blend(loadChannelHalf<channels, element, spans>(from[1], k),
-                              shuffleHalves(elements, table(spread[t])), table(select[t]));
+                              shuffleInBlocks(elements, table(spread[t])), table(select[t]));
         }
         for (int k = 0; k < channels; ++k)
             storeSpans<channels, spans>(to[0] + channelHalf<channels, element>(k) - 16 * k, k, halves[k]);
@@ -188,7 +188,7 @@ struct Duplicate {
         static constexpr auto spread = tables<channels>(moves);
         const Bytes elements = loadSpans<1, spans>(from[0], 0);
         Bytes halves[channels];
-        for (int k = 0; k < channels; ++k) halves[k] = shuffleHalves(elements, table(spread[static_cast<size_t>(k)]));
+        for (int k = 0; k < channels; ++k) halves[k] = shuffleInBlocks(elements, table(spread[static_cast<size_t>(k)]));
         storeAllSpans<spans, streaming>(to[0], halves);
     }
 };
@@ -217,7 +217,7 @@ struct DropAlpha {
         Bytes a[4], halves[3];
         for (int k = 0; k < 4; ++k) a[k] = loadSpans<4, spans>(from[0], k);
         for (int k = 0; k < 3; ++k)
-            halves[k] = shuffleHalves(a[k], table(first[k])) | shuffleHalves(a[k + 1], table(second[k]));
+            halves[k] = shuffleInBlocks(a[k], table(first[k])) | shuffleInBlocks(a[k + 1], table(second[k]));
         storeAllSpans<spans, streaming>(to[0], halves);
     }
 };
@@ -241,10 +241,10 @@ struct FillColour {
     template <int spans, bool streaming, class Out, class In>
     QORI_INLINE void run(const Out& to, const In& from) const {
         static constexpr auto spread = tables<4>(moves);
-        alignas(32) static constexpr auto colour = selectWithinPixel<4 * element>(3 * element);
+        alignas(kVectorBytes) static constexpr auto colour = selectWithinPixel<4 * element>(3 * element);
         Bytes halves[4];
         for (int k = 0; k < 4; ++k) {
-            const Bytes elements = shuffleHalves(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k),
+            const Bytes elements = shuffleInBlocks(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k),
                                                  table(spread[static_cast<size_t>(k)]));
             halves[k] = blend(loadSpans<4, spans>(from[1], k), elements, load(colour.data()));
         }

@@ -26,7 +26,7 @@ struct PatternSource {
 
 template <int pixelBytes, int selectedBytes, class Source>
 QORI_INLINE void selectBytes(uint8_t* dst, Source source, ptrdiff_t pixels) {
-    alignas(32) static constexpr auto select = selectWithinPixel<pixelBytes>(selectedBytes);
+    alignas(kVectorBytes) static constexpr auto select = selectWithinPixel<pixelBytes>(selectedBytes);
     const ptrdiff_t bytes = (pixels - 1) * pixelBytes + selectedBytes;
     const Bytes s0 = load(select.data()), s1 = load(select.data() + 32), s2 = load(select.data() + 64);
     ptrdiff_t done = 0;
@@ -107,18 +107,18 @@ struct Masked {
         static constexpr auto windows = maskWindows<pixelBytes>();
         const Window& window = windows[static_cast<size_t>(k)];
         const __m256i words = _mm256_load_si256(reinterpret_cast<const __m256i*>(window.words));
-        return shuffleHalves({_mm256_permutevar8x32_epi32(flags.v, words)}, load(window.index.at));
+        return shuffleInBlocks({_mm256_permutevar8x32_epi32(flags.v, words)}, load(window.index.at));
     }
 
     static QORI_INLINE Bytes selectedWords(Bytes selected, int k) {
         if constexpr (wholePixel) return spread(selected, k);
-        alignas(32) static constexpr auto colour = selectWithinPixel<pixelBytes>(selectedBytes);
+        alignas(kVectorBytes) static constexpr auto colour = selectWithinPixel<pixelBytes>(selectedBytes);
         return spread(selected, k) & load(colour.data());
     }
 
     static QORI_INLINE Bytes keptBytes(Bytes kept, int k) {
         if constexpr (wholePixel) return spread(kept, k);
-        alignas(32) static constexpr auto alpha = [] {
+        alignas(kVectorBytes) static constexpr auto alpha = [] {
             auto select = selectWithinPixel<pixelBytes>(selectedBytes);
             for (uint8_t& byte : select) byte = static_cast<uint8_t>(~byte);
             return select;

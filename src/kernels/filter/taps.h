@@ -83,7 +83,7 @@ struct PairTaps : TwoVectors<int32_t> {
     /// 8-11 and widens them.
     struct Free {
         explicit Free(ptrdiff_t nextPixel) : next(nextPixel) {
-            alignas(32) uint8_t at[32];
+            alignas(kVectorBytes) uint8_t at[32];
             for (int lane = 0; lane < 8; ++lane) {
                 const int element = lane % 4 + lane / 4 * 8;
                 at[4 * lane] = static_cast<uint8_t>(element);
@@ -93,7 +93,7 @@ struct PairTaps : TwoVectors<int32_t> {
             index = load(at);
         }
         QORI_INLINE Sum vector(const S* p, int i) const requires(sizeof(S) == 1) {
-            return {shuffleHalves(loadTwice(p + i / 2 * block + i % 2 * 4), index).v};
+            return {shuffleInBlocks(repeatBlock(p + i / 2 * block + i % 2 * 4), index).v};
         }
         QORI_INLINE void operator()(const S* p, bool, Partial& out) const requires(sizeof(S) == 2) {
             pairUp(wide(p, block), wide(p + next, block), out);
@@ -153,13 +153,13 @@ struct ByteTaps : TwoVectors<int16_t> {
     /// Pairs of eight elements from either half.
     struct Free {
         explicit Free(ptrdiff_t next) {
-            alignas(32) uint8_t at[32];
+            alignas(kVectorBytes) uint8_t at[32];
             for (int i = 0; i < 32; ++i) at[i] = static_cast<uint8_t>(i % 16 / 2 + (i % 2) * static_cast<int>(next));
             index = load(at);
         }
         QORI_INLINE Sum vector(const uint8_t* p, int i) const {
             const uint8_t* const at = p + i / 2 * block + i % 2 * 8;
-            return {shuffleHalves(loadHalves(at, at + 16), index).v};
+            return {shuffleInBlocks(loadBlocks(at, at + 16), index).v};
         }
         Bytes index;
     };

@@ -8,7 +8,7 @@
 namespace qori::kernels {
 namespace {
 
-constexpr int kVector = 32, kHalf = 16;
+constexpr int kVector = kVectorBytes, kHalf = kBlockBytes;
 
 /// Where a half of a reversed group finds its bytes: two windows of 16 that together hold them all, and an index into
 /// each, kNone where the other has the byte.
@@ -71,11 +71,11 @@ struct Group {
         Group group;
         for (int k = 0; k < vectors; ++k) {
             const VectorSource& source = sources[static_cast<size_t>(k)];
-            group.at[k] = loadHalves(p + source.first[0], p + source.first[1]);
-            if constexpr (pixelBytes < kHalf) group.at[k] = shuffleHalves(group.at[k], load(source.fromFirst.at));
+            group.at[k] = loadBlocks(p + source.first[0], p + source.first[1]);
+            if constexpr (pixelBytes < kHalf) group.at[k] = shuffleInBlocks(group.at[k], load(source.fromFirst.at));
             if constexpr (!even) {
-                const Bytes others = loadHalves(p + source.second[0], p + source.second[1]);
-                group.at[k] = group.at[k] | shuffleHalves(others, load(source.fromSecond.at));
+                const Bytes others = loadBlocks(p + source.second[0], p + source.second[1]);
+                group.at[k] = group.at[k] | shuffleInBlocks(others, load(source.fromSecond.at));
             }
         }
         return group;
@@ -91,7 +91,7 @@ struct Group {
 template <int pixelBytes, bool keepAlpha>
 QORI_INLINE Bytes merged(Bytes fresh, Bytes old) {
     if constexpr (!keepAlpha) return fresh;
-    alignas(32) static constexpr auto select = selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
+    alignas(kVectorBytes) static constexpr auto select = selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
     return blend(old, fresh, load(select.data()));
 }
 
@@ -111,7 +111,7 @@ QORI_INLINE Bytes reversedPart(Bytes a, ptrdiff_t n) {
                                                 : kNone;
         return index;
     }();
-    return shuffleHalves(a, loadTwice(order.data() + kHalfBytes<pixelBytes> - n));
+    return shuffleInBlocks(a, repeatBlock(order.data() + kHalfBytes<pixelBytes> - n));
 }
 
 template <int pixelBytes, bool keepAlpha>

@@ -76,7 +76,7 @@ QORI_INLINE void turnBlock(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, p
     constexpr int n = Turning<pixelBytes>::n;
     Bytes v[n];
     if constexpr (Turning<pixelBytes>::even) {
-        for (int i = 0; i < n; ++i) v[i] = loadHalves(from + i * fromStep, from + (i + n) * fromStep);
+        for (int i = 0; i < n; ++i) v[i] = loadBlocks(from + i * fromStep, from + (i + n) * fromStep);
         turn(v);
         for (int i = 0; i < n; ++i) store(to + i * toStep, v[i]);
     } else {
@@ -85,10 +85,10 @@ QORI_INLINE void turnBlock(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, p
         for (int side = 0; side < 2; ++side, from += 8, to += n * toStep) {
             for (int i = 0; i < n; ++i)
                 v[i] =
-                    shuffleHalves(loadHalves(from + i * fromStep, from + (i + n) * fromStep), load(spreads[side].at));
+                    shuffleInBlocks(loadBlocks(from + i * fromStep, from + (i + n) * fromStep), load(spreads[side].at));
             turn(v);
             for (int i = 0; i < n; ++i)
-                storeHalves(to + i * toStep, to + i * toStep + 12, shuffleHalves(v[i], load(gather.at)));
+                storeBlocks(to + i * toStep, to + i * toStep + 12, shuffleInBlocks(v[i], load(gather.at)));
         }
     }
 }
@@ -138,7 +138,7 @@ private:
                 uint8_t* const p = to + x * toStep + i;
                 Bytes a = load(tile_ + x * T::tileStep + i);
                 if constexpr (keepAlpha) {
-                    alignas(32) static constexpr auto colour = selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
+                    alignas(kVectorBytes) static constexpr auto colour = selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
                     a = blend(load(p), a, load(colour.data()));
                 }
                 if (streaming)
@@ -149,8 +149,8 @@ private:
     }
 
     // Blocks may turn what edges leave unset; it is not stored.
-    alignas(32) uint8_t tile_[(T::tileColumns + T::columns) * T::tileStep];
-    alignas(32) uint8_t edge_[(T::tileRows + T::rows) * kEdgeStep];
+    alignas(kVectorBytes) uint8_t tile_[(T::tileColumns + T::columns) * T::tileStep];
+    alignas(kVectorBytes) uint8_t edge_[(T::tileRows + T::rows) * kEdgeStep];
 };
 
 /// Bytes of an image from which on lines are fetched ahead: below, they are in the second-level cache already, and

@@ -32,7 +32,7 @@ template <int windows>
 QORI_INLINE Bytes gatherGroup(const uint8_t* row, const int32_t*& base, const uint8_t*& mask) {
     Bytes result;
     for (int w = 0; w < windows; ++w) {
-        const Bytes part = shuffleHalves(loadHalves(row + base[2 * w], row + base[2 * w + 1]), load(mask + 32 * w));
+        const Bytes part = shuffleInBlocks(loadBlocks(row + base[2 * w], row + base[2 * w + 1]), load(mask + 32 * w));
         result = w == 0 ? part : result | part;
     }
     base += 2 * windows;

@@ -16,7 +16,7 @@ QORI_INLINE Bytes pairUp(Bytes pixels) {
     if constexpr (channels == 1) return pixels;
     const __m128i order = channels == 3 ? _mm_setr_epi8(0, 3, 1, 4, 2, 5, 6, 9, 7, 10, 8, 11, -1, -1, -1, -1)
                                         : _mm_setr_epi8(0, 4, 1, 5, 2, 6, 3, 7, 8, 12, 9, 13, 10, 14, 11, 15);
-    return shuffleHalves(pixels, {_mm256_broadcastsi128_si256(order)});
+    return shuffleInBlocks(pixels, {_mm256_broadcastsi128_si256(order)});
 }
 
 /// Sums of four, at most 1020, halved twice.
@@ -31,7 +31,7 @@ QORI_INLINE __m256i quarter(__m256i sum) {
 template <int channels, bool toEven>
 QORI_INLINE __m256i halve(const uint8_t* a, const uint8_t* b, int first) {
     const auto sums = [=](const uint8_t* row) {
-        const Bytes pixels = loadHalves(row + first, row + first + 2 * kStride<channels>);
+        const Bytes pixels = loadBlocks(row + first, row + first + 2 * kStride<channels>);
         return _mm256_maddubs_epi16(pairUp<channels>(pixels).v, _mm256_set1_epi8(1));
     };
     return quarter<toEven>(_mm256_add_epi16(sums(a), sums(b)));
@@ -44,7 +44,7 @@ QORI_INLINE void halveBlock(const uint8_t* a, const uint8_t* b, uint8_t* dst) {
         _mm256_packus_epi16(halve<channels, toEven>(a, b, 0), halve<channels, toEven>(a, b, kStride<channels>))};
     if constexpr (channels == 3) {
         const __m128i close = _mm_setr_epi8(0, 1, 2, 3, 4, 5, 8, 9, 10, 11, 12, 13, -1, -1, -1, -1);
-        storeHalves(dst, dst + 12, shuffleHalves(packed, {_mm256_broadcastsi128_si256(close)}));
+        storeBlocks(dst, dst + 12, shuffleInBlocks(packed, {_mm256_broadcastsi128_si256(close)}));
     } else {
         store(dst, packed);
     }
@@ -62,7 +62,7 @@ QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, ptrdiff_t late
         halveBlock<channels, toEven>(a + 2 * i, b + 2 * i, dst + i);
     }
     for (; i < bytes; i += kResult) {
-        alignas(32) uint8_t upper[64], lower[64], result[32];
+        alignas(kVectorBytes) uint8_t upper[64], lower[64], result[32];
         const ptrdiff_t rest = bytes - i < kResult ? bytes - i : kResult;
         for (int part = 0; part < 64; part += 32) {
             store(upper + part, loadUpTo(a + 2 * i + part, 2 * rest - part));

@@ -52,7 +52,7 @@ QORI_NOINLINE void linearRowAlike(const Gather& gather, LinearRow row, const int
     for (ptrdiff_t at = 0; g + 2 <= end; g += 2, at += stride) {
         prefetch(later + at);
         for (int i = 0; i < 2; ++i) {
-            const Bytes pairs = shuffleHalves(loadHalves(from[2 * i] + at, from[2 * i + 1] + at), masks[i]);
+            const Bytes pairs = shuffleInBlocks(loadBlocks(from[2 * i] + at, from[2 * i + 1] + at), masks[i]);
             store(out + 16 * (g + i), Vec<int16_t>{interpolatePairs<coarse>(pairs, factors[i])});
         }
     }

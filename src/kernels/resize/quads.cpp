@@ -17,7 +17,7 @@ constexpr int kLoadElements = kLoadPixels<T>* channels;
 /// Shuffles that put the elements of one pixel of a load into 32 bits each: into the upper half where they are signed.
 template <class T, int channels>
 struct Places {
-    alignas(32) uint8_t of[kLoadPixels<T>][32];
+    alignas(kVectorBytes) uint8_t of[kLoadPixels<T>][32];
 
     constexpr Places() : of{} {
         constexpr int kBytes = sizeof(T), kShift = std::is_signed_v<T> ? 4 - kBytes : 0;
@@ -36,7 +36,7 @@ constexpr Places<T, channels> kPlaces{};
 template <class T, int channels>
 QORI_INLINE __m256 quadsOf(Bytes both, int p) {
     if constexpr (std::is_same_v<T, float>) return _mm256_castsi256_ps(both.v);
-    const __m256i lanes = shuffleHalves(both, load(kPlaces<T, channels>.of[p])).v;
+    const __m256i lanes = shuffleInBlocks(both, load(kPlaces<T, channels>.of[p])).v;
     return _mm256_cvtepi32_ps(std::is_signed_v<T> ? _mm256_srai_epi32(lanes, 16) : lanes);
 }
 

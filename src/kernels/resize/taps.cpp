@@ -145,7 +145,7 @@ QORI_NOINLINE void sumPhases(const RowFilter& filter, const PixelTaps* pixels, i
 /// even to the sign of a zero.
 template <int channels>
 QORI_NOINLINE void sumPaddedGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
-    alignas(32) float nothing[8 * channels];
+    alignas(kVectorBytes) float nothing[8 * channels];
     for (float& element : nothing) element = -0.0f;
     const int32_t last = filter.taps - 1;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {

@@ -19,8 +19,8 @@ QORI_INLINE __m256i sumOctet(const uint8_t* low, const uint8_t* high, Bytes orde
     __m256i sum = _mm256_set1_epi32((1 << (kDropped - 1)) - 128 * kOne);
 #pragma GCC unroll 8
     for (int32_t k = 0; k < n; k += 2) {
-        const Bytes window = shared ? loadTwice(low) : loadHalves(low, high);
-        sum = _mm256_add_epi32(sum, _mm256_madd_epi16(shuffleHalves(window, order).v, _mm256_load_si256(weights++)));
+        const Bytes window = shared ? repeatBlock(low) : loadBlocks(low, high);
+        sum = _mm256_add_epi32(sum, _mm256_madd_epi16(shuffleInBlocks(window, order).v, _mm256_load_si256(weights++)));
         low += 2 * channels;
         high += 2 * channels;
     }

@@ -14,7 +14,7 @@ constexpr double kWordGain = 1.98;  ///< Above the sum of the magnitudes of a re
 /// Sixteen results of a row, in two octets of two quads. A quad is made of windows of 16 bytes; those of the next two
 /// taps begin two pixels on and are shuffled alike.
 struct WordGroup {
-    alignas(32) uint8_t masks[2][32];  ///< Per octet: two quads.
+    alignas(kVectorBytes) uint8_t masks[2][32];  ///< Per octet: two quads.
     int32_t bases[2][2];               ///< Where the quads' first windows begin in the line.
 };
 

@@ -37,10 +37,10 @@ QORI_INLINE void packByTwo(uint8_t* out, const uint8_t* src, ptrdiff_t step, int
 
 /// Copies rows, one behind the other.
 QORI_NOINLINE inline void packRows(uint8_t* out, const uint8_t* src, ptrdiff_t step, int32_t rows, ptrdiff_t bytes) {
-    if (bytes >= 32) {
+    if (bytes >= kVectorBytes) {
         for (int32_t y = 0; y < rows; ++y, src += step, out += bytes) {
-            for (ptrdiff_t i = 0; i < bytes - 32; i += 32) store(out + i, load(src + i));
-            store(out + bytes - 32, load(src + bytes - 32));
+            for (ptrdiff_t i = 0; i < bytes - kVectorBytes; i += kVectorBytes) store(out + i, load(src + i));
+            store(out + bytes - kVectorBytes, load(src + bytes - kVectorBytes));
         }
     } else if (bytes >= 16) {
         packByTwo<Sixteen>(out, src, step, rows, bytes);
@@ -59,7 +59,7 @@ QORI_NOINLINE inline void packRows(uint8_t* out, const uint8_t* src, ptrdiff_t s
 template <class Row, class T, size_t... image>
 QORI_NOINLINE void forEachRowsTogether(QorImageSize roi, int pixelBytes, Row& row, const Image<const T>* images,
                                        std::index_sequence<image...>) {
-    alignas(32) uint8_t together[sizeof...(image)][kTogether];
+    alignas(kVectorBytes) uint8_t together[sizeof...(image)][kTogether];
     const ptrdiff_t bytes = ptrdiff_t{roi.width} * pixelBytes;
     const auto most = static_cast<int32_t>(kTogether / bytes);
     for (int32_t y = 0; y < roi.height;) {
