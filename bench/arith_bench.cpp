@@ -22,16 +22,17 @@ struct PartOf<T> {
 template <class T>
 class Pixels {
     using Part = typename PartOf<T>::type;
-    static constexpr int parts = sizeof(T) / sizeof(Part);
+    static constexpr int count = sizeof(T) / sizeof(Part);
 
 public:
-    Pixels(Size size, int channels) : image_(size, channels * parts) {
+    Pixels(Size size, int channels) : image_(size, channels * count) {
         for (int y = 0; y < size.height; ++y)
             for (int i = 0; i < image_.elements(); ++i) image_.row(y)[i] = static_cast<Part>((i * 7 + y) % 251 + 1);
     }
     T* data() const { return reinterpret_cast<T*>(image_.data()); }
     T* row(int y) const { return reinterpret_cast<T*>(image_.row(y)); }
     int32_t step() const { return image_.step(); }
+    const Image<Part>& parts() const { return image_; }
 
 private:
     Image<Part> image_;
@@ -65,11 +66,12 @@ Row binary(std::string name, double bestAtL2, double bestAtFrame, Function funct
     const auto make = [=](Size size) {
         const Images<T, channels> images(size);
         return Contenders{[=] {
-                              function(images.a.data(), images.a.step(), images.b.data(), images.b.step(),
-                                       images.dst.data(), images.dst.step(), size.roi(), scale...);
+                              must(function(images.a.data(), images.a.step(), images.b.data(), images.b.step(),
+                                            images.dst.data(), images.dst.step(), size.roi(), scale...));
                           },
                           [=] { plainRows<channels>(images.a, images.b, images.dst, size, element); },
-                          {}};
+                          {},
+                          outputOf(images.dst.parts())};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = 3.0 * channels * sizeof(T),
@@ -93,8 +95,8 @@ Row constant(std::string name, double bestAtL2, double bestAtFrame, Function fun
                                   else
                                       return values;
                               }();
-                              function(images.a.data(), images.a.step(), value, images.dst.data(), images.dst.step(),
-                                       size.roi(), scale...);
+                              must(function(images.a.data(), images.a.step(), value, images.dst.data(),
+                                            images.dst.step(), size.roi(), scale...));
                           },
                           [=] {
                               const int width = size.width,
@@ -111,7 +113,8 @@ Row constant(std::string name, double bestAtL2, double bestAtFrame, Function fun
                                   keep(d);
                               }
                           },
-                          {}};
+                          {},
+                          outputOf(images.dst.parts())};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = 2.0 * channels * sizeof(T),

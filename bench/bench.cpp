@@ -5,6 +5,7 @@
 #include <immintrin.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
 #include <cstring>
 #include <ctime>
@@ -97,8 +98,27 @@ Timed prepare(std::function<void()> work) {
     return timed;
 }
 
+/// Whether ours writes what the plain loop writes.
+bool agrees(const Contenders& contenders) {
+    if (!contenders.plain || !contenders.output.elements) return true;
+    contenders.output.spoil();
+    contenders.plain();
+    const std::vector<double> wanted = contenders.output.elements();
+    contenders.output.spoil();
+    contenders.ours();
+    const std::vector<double> got = contenders.output.elements();
+    const double within = contenders.output.within;
+    return std::equal(got.begin(), got.end(), wanted.begin(), wanted.end(), [=](double a, double b) {
+        return a == b || std::abs(a - b) <= within * std::max(1.0, std::abs(b));
+    });
+}
+
 void run(benchmark::State& state, const Row& row, Size size) {
     const Contenders contenders = row.make(size);
+    if (!agrees(contenders)) {
+        std::fprintf(stderr, "%s: not what the plain loop gives\n", row.operation.c_str());
+        std::exit(1);
+    }
     const auto bytes = static_cast<int64_t>(row.bytesPerPixel * static_cast<double>(size.pixels()));
     Timed ours = prepare(contenders.ours), roof = prepare(rooflineOf(row.roofline, bytes));
     const int64_t copied = row.best > 0 ? kFrame.pixels() : size.pixels();

@@ -3,7 +3,9 @@
 // plain loop as the compiler makes it, a peer where there is one, and the roofline, which moves the same bytes and
 // does nothing else. Rates and ratios come from the medians of the rounds.
 #pragma once
+#include <algorithm>
 #include <cstdint>
+#include <cstdio>
 #include <cstdlib>
 #include <functional>
 #include <memory>
@@ -57,12 +59,42 @@ private:
     std::shared_ptr<uint8_t> memory_;
 };
 
+/// An image that ours and the plain loop write alike: compared once, before anything is timed.
+struct Output {
+    std::function<std::vector<double>()> elements = {};
+    std::function<void()> spoil = {};
+    double within = 0;  ///< How far elements may differ, relative to those above 1.
+};
+
+template <class T>
+Output outputOf(const Image<T>& image, double within = 0) {
+    return {[=] {
+                std::vector<double> all;
+                for (int y = 0; y < image.height(); ++y)
+                    all.insert(all.end(), image.row(y), image.row(y) + image.elements());
+                return all;
+            },
+            [=] {
+                for (int y = 0; y < image.height(); ++y) std::fill_n(image.row(y), image.elements(), T{77});
+            },
+            within};
+}
+
 /// What a row runs; closures keep their images alive. Empty ones are left out.
 struct Contenders {
     std::function<void()> ours;
     std::function<void()> plain;
     std::function<void()> peer;
+    Output output = {};
 };
+
+/// Around every call of the library: a benchmark of a refusal says nothing.
+inline void must(QorResult status) {
+    if (status >= QOR_OK) [[likely]]
+        return;
+    std::fprintf(stderr, "a call that is measured failed: status %d\n", status);
+    std::exit(1);
+}
 
 enum class Roofline {
     copy,  ///< memcpy of as many bytes read and written

@@ -13,7 +13,7 @@ const std::vector<Size> kMirrorSizes = {kL1, kL2, kFrame, kNarrow, kSmall};
 
 /// The source pixel's column and row behind each destination pixel, as a plain loop has them.
 template <class T, int n>
-void plainMirror(const Image<T>& src, const Image<T>& dst, Size size, int axis) {
+void plainMirror(const Image<T>& src, const Image<T>& dst, Size size, int axis, int written) {
     const bool turns = axis >= flipDiagonal;
     const int width = turns ? size.height : size.width, height = turns ? size.width : size.height;
     for (int y = 0; y < height; ++y) {
@@ -21,12 +21,12 @@ void plainMirror(const Image<T>& src, const Image<T>& dst, Size size, int axis) 
         const T* s = src.row(axis == flipHorizontalAxis || axis == flipBothAxes ? height - 1 - y : turns ? 0 : y);
         if (turns)
             for (int x = 0; x < width; ++x)
-                for (int c = 0; c < n; ++c) d[x * n + c] = src.row(x)[y * n + c];
+                for (int c = 0; c < written; ++c) d[x * n + c] = src.row(x)[y * n + c];
         else if (axis == flipHorizontalAxis)
             for (int x = 0; x < width * n; ++x) d[x] = s[x];
         else
             for (int x = 0; x < width; ++x)
-                for (int c = 0; c < n; ++c) d[x * n + c] = s[(width - 1 - x) * n + c];
+                for (int c = 0; c < written; ++c) d[x * n + c] = s[(width - 1 - x) * n + c];
         keep(d);
     }
 }
@@ -36,9 +36,10 @@ Row mirrorRow(std::string name, QorResult(QORI_CALL* function)(const T*, int32_t
               int axis, Best best = {}, int bytesKept = 0) {
     const auto make = [=](Size size) {
         const Image<T> src(size, n), dst(axis >= flipDiagonal ? Size{size.height, size.width} : size, n);
-        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), axis); },
-                          [=] { plainMirror<T, n>(src, dst, size, axis); },
-                          {}};
+        return Contenders{[=] { must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), axis)); },
+                          [=] { plainMirror<T, n>(src, dst, size, axis, bytesKept > 0 ? n - 1 : n); },
+                          {},
+                          outputOf(dst)};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = 2.0 * n * sizeof(T) + bytesKept,
@@ -52,7 +53,7 @@ template <class T, int n>
 Row inPlaceRow(std::string name, QorResult(QORI_CALL* function)(T*, int32_t, QorImageSize, int32_t), int axis) {
     const auto make = [=](Size size) {
         const Image<T> image(size, n);
-        return Contenders{[=] { function(image.data(), image.step(), size.roi(), axis); }, {}, {}};
+        return Contenders{[=] { must(function(image.data(), image.step(), size.roi(), axis)); }, {}, {}};
     };
     return {.operation = std::move(name), .bytesPerPixel = 2.0 * n * sizeof(T), .sizes = kMirrorSizes, .make = make};
 }
@@ -90,7 +91,7 @@ Row borderRow(std::string name, Copy copy, Best best = {}) {
 template <class Function>
 auto replicate(Function function) {
     return [=](const auto& src, const auto& dst, QorImageSize inner, QorImageSize outer) {
-        function(src.data(), src.step(), inner, dst.data(), dst.step(), outer, 16, 16);
+        must(function(src.data(), src.step(), inner, dst.data(), dst.step(), outer, 16, 16));
     };
 }
 
@@ -98,7 +99,7 @@ template <class T, class Function>
 auto constant(Function function) {
     return [=](const auto& src, const auto& dst, QorImageSize inner, QorImageSize outer) {
         const T value[4] = {1, 2, 3, 4};
-        function(src.data(), src.step(), inner, dst.data(), dst.step(), outer, 16, 16, value);
+        must(function(src.data(), src.step(), inner, dst.data(), dst.step(), outer, 16, 16, value));
     };
 }
 

@@ -22,14 +22,15 @@ Row copyRow(std::string name, Unary<T> function, int from, int to, int bytesRead
             std::vector<Size> sizes = kSizes, double bestAtL2 = 0, double bestAtFrame = 0, bool packed = false) {
     const auto make = [=](Size size) {
         Image<T> src(size, from, packed), dst(size, to, packed);
-        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi()); },
+        return Contenders{[=] { must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi())); },
                           [=] {
                               for (int y = 0; y < size.height; ++y) {
                                   plain(src.row(y), dst.row(y), size.width);
                                   keep(dst.row(y));
                               }
                           },
-                          {}};
+                          {},
+                          outputOf(dst)};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = double(bytesRead + bytesWritten),
@@ -50,6 +51,12 @@ void plainChannels(const T* s, T* d, int width) {
         for (int c = 0; c < count; ++c) d[x * to + c] = s[x * from + c];
 }
 
+template <int to, class T>
+void plainDuplicate(const T* s, T* d, int width) {
+    for (int x = 0; x < width; ++x)
+        for (int c = 0; c < to; ++c) d[x * to + c] = s[x];
+}
+
 template <class T, int n>
 Row splitRow(std::string name, QorResult(QORI_CALL* function)(const T*, int32_t, T* const*, int32_t, QorImageSize),
              double bestAtL2 = 0, double bestAtFrame = 0) {
@@ -60,7 +67,7 @@ Row splitRow(std::string name, QorResult(QORI_CALL* function)(const T*, int32_t,
         return Contenders{[=] {
                               T* pointers[n];
                               for (size_t c = 0; c < n; ++c) pointers[c] = planes[c].data();
-                              function(src.data(), src.step(), pointers, planes[0].step(), size.roi());
+                              must(function(src.data(), src.step(), pointers, planes[0].step(), size.roi()));
                           },
                           [=] {
                               for (int y = 0; y < size.height; ++y) {
@@ -91,7 +98,7 @@ Row mergeRow(std::string name, QorResult(QORI_CALL* function)(const T* const*, i
         return Contenders{[=] {
                               const T* pointers[n];
                               for (size_t c = 0; c < n; ++c) pointers[c] = planes[c].data();
-                              function(pointers, planes[0].step(), dst.data(), dst.step(), size.roi());
+                              must(function(pointers, planes[0].step(), dst.data(), dst.step(), size.roi()));
                           },
                           [=] {
                               for (int y = 0; y < size.height; ++y) {
@@ -103,7 +110,8 @@ Row mergeRow(std::string name, QorResult(QORI_CALL* function)(const T* const*, i
                                   keep(d);
                               }
                           },
-                          {}};
+                          {},
+                          outputOf(dst)};
     };
     return {.operation = std::move(name), .bytesPerPixel = 2.0 * n * sizeof(T), .sizes = kSizes, .make = make};
 }
@@ -119,7 +127,9 @@ Row maskedRow(std::string name,
         for (int y = 0; y < size.height; ++y)
             for (int x = 0; x < size.width; ++x) mask.row(y)[x] = mask.row(y)[x] & 1;
         return Contenders{
-            [=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask.data(), mask.step()); },
+            [=] {
+                must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask.data(), mask.step()));
+            },
             [=] {
                 for (int y = 0; y < size.height; ++y) {
                     for (int x = 0; x < size.width; ++x)
@@ -128,7 +138,8 @@ Row maskedRow(std::string name,
                     keep(dst.row(y));
                 }
             },
-            {}};
+            {},
+            outputOf(dst)};
     };
     // Source and destination are read, the destination is written.
     return {.operation = std::move(name),
@@ -147,9 +158,9 @@ Row fillRow(std::string name, Function function, std::vector<Size> sizes = kSize
         return Contenders{[=] {
                               const T values[4] = {1, 2, 3, 4};
                               if constexpr (n == 1)
-                                  function(values[0], dst.data(), dst.step(), size.roi());
+                                  must(function(values[0], dst.data(), dst.step(), size.roi()));
                               else
-                                  function(values, dst.data(), dst.step(), size.roi());
+                                  must(function(values, dst.data(), dst.step(), size.roi()));
                           },
                           [=] {
                               for (int y = 0; y < size.height; ++y) {
@@ -159,7 +170,8 @@ Row fillRow(std::string name, Function function, std::vector<Size> sizes = kSize
                                   keep(d);
                               }
                           },
-                          {}};
+                          {},
+                          outputOf(dst)};
     };
     return {.operation = std::move(name),
             .bytesPerPixel = double(n * sizeof(T)),
@@ -204,8 +216,8 @@ const Rows rows{{
     copyRow<uint8_t>("channel 8u C3C", qoriCopy_8u_C3CR, 3, 3, 3, 6, plainChannels<3, 3, 1, uint8_t>),
     copyRow<uint8_t>("drop alpha 8u AC4C3", qoriCopy_8u_AC4C3R, 4, 3, 4, 3, plainChannels<4, 3, 3, uint8_t>),
     copyRow<uint8_t>("fill colour 8u C3AC4", qoriCopy_8u_C3AC4R, 3, 4, 3, 8, plainChannels<3, 4, 3, uint8_t>),
-    copyRow<uint8_t>("duplicate 8u C1C3", qoriDup_8u_C1C3R, 1, 3, 1, 3, plainChannels<1, 3, 1, uint8_t>),
-    copyRow<uint8_t>("duplicate 8u C1C4", qoriDup_8u_C1C4R, 1, 4, 1, 4, plainChannels<1, 4, 1, uint8_t>),
+    copyRow<uint8_t>("duplicate 8u C1C3", qoriDup_8u_C1C3R, 1, 3, 1, 3, plainDuplicate<3, uint8_t>),
+    copyRow<uint8_t>("duplicate 8u C1C4", qoriDup_8u_C1C4R, 1, 4, 1, 4, plainDuplicate<4, uint8_t>),
     splitRow<uint8_t, 3>("split 8u C3P3", qoriCopy_8u_C3P3R, 12'973, 4'600),
     splitRow<uint8_t, 4>("split 8u C4P4", qoriCopy_8u_C4P4R),
     splitRow<int16_t, 3>("split 16s C3P3", qoriCopy_16s_C3P3R),

@@ -68,18 +68,18 @@ std::function<void()> oursOf(Function function, Image<T> src, Image<T> dst, QorI
     constexpr bool isFloat = sizeof(T) == 4;
     const QorImageSize size{side, side};
     int32_t planBytes, bufferBytes;
-    qoriFilterBorderGetSize(size, roi, kTypeCode<T>, isFloat ? 13 : 7, channels, &planBytes, &bufferBytes);
+    must(qoriFilterBorderGetSize(size, roi, kTypeCode<T>, isFloat ? 13 : 7, channels, &planBytes, &bufferBytes));
     const Block plan = allocate(static_cast<size_t>(planBytes)), buffer = allocate(static_cast<size_t>(bufferBytes));
     auto* record = reinterpret_cast<QorLinearFilterPlan*>(plan.get());
     if constexpr (isFloat)
-        qoriFilterBorderInit_32f(makeKernel<float>(side).data(), size, 13, channels, roundNearestEven, record);
+        must(qoriFilterBorderInit_32f(makeKernel<float>(side).data(), size, 13, channels, roundNearestEven, record));
     else
-        qoriFilterBorderInit_16s(makeKernel<int16_t>(side).data(), size, divisor, kTypeCode<T>, channels,
-                                 roundNearestEven, record);
+        must(qoriFilterBorderInit_16s(makeKernel<int16_t>(side).data(), size, divisor, kTypeCode<T>, channels,
+                                      roundNearestEven, record));
     return [=] {
         const T value[4] = {};
-        function(src.data(), src.step(), dst.data(), dst.step(), roi, borderReplicate, value,
-                 reinterpret_cast<QorLinearFilterPlan*>(plan.get()), buffer.get());
+        must(function(src.data(), src.step(), dst.data(), dst.step(), roi, borderReplicate, value,
+                      reinterpret_cast<QorLinearFilterPlan*>(plan.get()), buffer.get()));
     };
 }
 

@@ -67,20 +67,21 @@ std::vector<Ladder> widthsAndSquares(const std::string& operation, Call call) {
 template <class Function, class... Rest>
 auto unary(Function function, Rest... rest) {
     return [=](const auto& src, const auto& dst, QorImageSize roi) {
-        function(src[0].data(), src[0].step(), dst.data(), dst.step(), roi, rest...);
+        must(function(src[0].data(), src[0].step(), dst.data(), dst.step(), roi, rest...));
     };
 }
 template <class Function, class... Rest>
 auto binary(Function function, Rest... rest) {
     return [=](const auto& src, const auto& dst, QorImageSize roi) {
-        function(src[0].data(), src[0].step(), src[1].data(), src[1].step(), dst.data(), dst.step(), roi, rest...);
+        must(
+            function(src[0].data(), src[0].step(), src[1].data(), src[1].step(), dst.data(), dst.step(), roi, rest...));
     };
 }
 template <class Function, class... Rest>
 auto reduction(Function function, Rest... rest) {
     return [=](const auto& src, const auto&, QorImageSize roi) {
         double result[4];
-        function(src[0].data(), src[0].step(), roi, result, rest...);
+        must(function(src[0].data(), src[0].step(), roi, result, rest...));
         keep(result);
     };
 }
@@ -89,7 +90,7 @@ const Ladders copies8u{widthsAndSquares<uint8_t, uint8_t, 1, 1>("copy 8u C1", un
 const Ladders copies8uC3{widthsAndSquares<uint8_t, uint8_t, 3, 1>("copy 8u C3", unary(qoriCopy_8u_C3R))};
 const Ladders masked{widthsAndSquares<uint8_t, uint8_t, 1, 2>(
     "copy masked 8u C1", [](const auto& src, const auto& dst, QorImageSize roi) {
-        qoriCopy_8u_C1MR(src[0].data(), src[0].step(), dst.data(), dst.step(), roi, src[1].data(), src[1].step());
+        must(qoriCopy_8u_C1MR(src[0].data(), src[0].step(), dst.data(), dst.step(), roi, src[1].data(), src[1].step()));
     })};
 const Ladders adds8u{widthsAndSquares<uint8_t, uint8_t, 1, 2>("add 8u C1", binary(qoriAdd_8u_C1RSfs, 0))};
 const Ladders adds32f{widthsAndSquares<float, float, 1, 2>("add 32f C1", binary(qoriAdd_32f_C1R))};
@@ -130,8 +131,8 @@ Ladder kernelLadder(const char* operation, Function function, int value, Divisor
         const Image<T> src(whole, 1), dst(whole, 1);
         const std::vector<K> kernel(static_cast<size_t>(side * side), static_cast<K>(value));
         return {double(size.pixels()) * (side * side + 8), [=] {
-                    function(src.row(31) + 31, src.step(), dst.data(), dst.step(), size.roi(), kernel.data(),
-                             {side, side}, {0, 0}, divisor...);
+                    must(function(src.row(31) + 31, src.step(), dst.data(), dst.step(), size.roi(), kernel.data(),
+                                  {side, side}, {0, 0}, divisor...));
                 }};
     });
 }
@@ -156,8 +157,8 @@ const Ladders rangeOfWords{{ladder("histogram range 16u, levels", kLevelCounts, 
         for (int x = 0; x < kCounted.width; ++x)
             image.row(y)[x] = static_cast<uint16_t>((state = state * 1664525u + 1013904223u) >> 16);
     return {double(kCounted.pixels()), [=] {
-                qoriHistogramRange_16u_C1R(image.data(), image.step(), kCounted.roi(), bins->data(), levels.data(),
-                                           static_cast<int32_t>(levels.size()));
+                must(qoriHistogramRange_16u_C1R(image.data(), image.step(), kCounted.roi(), bins->data(), levels.data(),
+                                                static_cast<int32_t>(levels.size())));
             }};
 })}};
 
@@ -178,8 +179,8 @@ Job floatsOf(Order order, int count) {
         }
     const auto bins = std::make_shared<std::vector<int32_t>>(levels.size());
     return {double(kCounted.pixels()) * (2 + std::log2(count)), [=] {
-                qoriHistogramRange_32f_C1R(image.data(), image.step(), kCounted.roi(), bins->data(), levels.data(),
-                                           static_cast<int32_t>(levels.size()));
+                must(qoriHistogramRange_32f_C1R(image.data(), image.step(), kCounted.roi(), bins->data(), levels.data(),
+                                                static_cast<int32_t>(levels.size())));
             }};
 }
 const Ladders rangeOfFloats{

@@ -49,7 +49,7 @@ std::function<void()> resizeJob(QorInterpolationKind kind, bool antialiasing, Im
     const QorImageSize from = sizes.src.roi(), to = sizes.dst.roi(),
                        tile{to.width, tileRows > 0 ? tileRows : to.height};
     int32_t planBytes, initBytes, bufferBytes;
-    E::getSize(from, to, kind, antialiasing, &planBytes, &initBytes);
+    must(E::getSize(from, to, kind, antialiasing, &planBytes, &initBytes));
     const Block memory = allocate(static_cast<size_t>(planBytes)), init = allocate(static_cast<size_t>(initBytes));
     auto* plan = reinterpret_cast<QorResizePlan*>(memory.get());
     uint8_t* scratch = init.get();
@@ -58,44 +58,44 @@ std::function<void()> resizeJob(QorInterpolationKind kind, bool antialiasing, Im
         case interpSuper: E::superInit(from, to, plan); break;
         case interpLinear:
             if (antialiasing)
-                qoriResizeAntialiasingLinearInit(from, to, plan, scratch);
+                must(qoriResizeAntialiasingLinearInit(from, to, plan, scratch));
             else
-                E::linearInit(from, to, plan);
+                must(E::linearInit(from, to, plan));
             break;
         case interpCubic:
             if (antialiasing)
-                qoriResizeAntialiasingCubicInit(from, to, 0, 0.5f, plan, scratch);
+                must(qoriResizeAntialiasingCubicInit(from, to, 0, 0.5f, plan, scratch));
             else
-                E::cubicInit(from, to, 0, 0.5f, plan, scratch);
+                must(E::cubicInit(from, to, 0, 0.5f, plan, scratch));
             break;
         case interpLanczos:
             if (antialiasing)
-                qoriResizeAntialiasingLanczosInit(from, to, kLobes, plan, scratch);
+                must(qoriResizeAntialiasingLanczosInit(from, to, kLobes, plan, scratch));
             else
-                E::lanczosInit(from, to, kLobes, plan, scratch);
+                must(E::lanczosInit(from, to, kLobes, plan, scratch));
             break;
     }
-    E::getBufferSize(plan, tile, channels, &bufferBytes);
+    must(E::getBufferSize(plan, tile, channels, &bufferBytes));
     const Block buffer = allocate(static_cast<size_t>(bufferBytes));
     const auto inTiles = [=](auto runTile) -> std::function<void()> {
         return [=] {
             for (int y = 0; y < to.height; y += tile.height) {
                 QorPoint2D offset{0, y}, origin{0, 0};
-                E::getSrcOffset(reinterpret_cast<QorResizePlan*>(memory.get()), offset, &origin);
+                must(E::getSrcOffset(reinterpret_cast<QorResizePlan*>(memory.get()), offset, &origin));
                 runTile(src.row(origin.y), dst.row(y), offset);
             }
         };
     };
     const auto inside = [=](auto function) {
         return inTiles([=](const T* in, T* out, QorPoint2D offset) {
-            function(in, src.step(), out, dst.step(), offset, tile, reinterpret_cast<QorResizePlan*>(memory.get()),
-                     buffer.get());
+            must(function(in, src.step(), out, dst.step(), offset, tile, reinterpret_cast<QorResizePlan*>(memory.get()),
+                          buffer.get()));
         });
     };
     const auto bordered = [=](auto function) {
         return inTiles([=](const T* in, T* out, QorPoint2D offset) {
-            function(in, src.step(), out, dst.step(), offset, tile, borderReplicate, nullptr,
-                     reinterpret_cast<QorResizePlan*>(memory.get()), buffer.get());
+            must(function(in, src.step(), out, dst.step(), offset, tile, borderReplicate, nullptr,
+                          reinterpret_cast<QorResizePlan*>(memory.get()), buffer.get()));
         });
     };
     if (antialiasing) return bordered(E::widened);

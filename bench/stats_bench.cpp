@@ -68,7 +68,7 @@ template <class Function, class... Hint>
 auto unary(Function function, Hint... hint) {
     return [=](const auto& images, QorImageSize roi) {
         double result[4];
-        function(images[0].data(), images[0].step(), roi, result, hint...);
+        must(function(images[0].data(), images[0].step(), roi, result, hint...));
         keep(result);
     };
 }
@@ -77,7 +77,7 @@ template <class Function, class... Hint>
 auto binary(Function function, Hint... hint) {
     return [=](const auto& images, QorImageSize roi) {
         double result[4];
-        function(images[0].data(), images[0].step(), images[1].data(), images[1].step(), roi, result, hint...);
+        must(function(images[0].data(), images[0].step(), images[1].data(), images[1].step(), roi, result, hint...));
         keep(result);
     };
 }
@@ -86,7 +86,7 @@ template <class T, class Function>
 auto extremum(Function function) {
     return [=](const auto& images, QorImageSize roi) {
         T result[4];
-        function(images[0].data(), images[0].step(), roi, result);
+        must(function(images[0].data(), images[0].step(), roi, result));
         keep(result);
     };
 }
@@ -95,7 +95,7 @@ template <class T, class Function>
 auto bothExtrema(Function function) {
     return [=](const auto& images, QorImageSize roi) {
         T low[4], high[4];
-        function(images[0].data(), images[0].step(), roi, low, high);
+        must(function(images[0].data(), images[0].step(), roi, low, high));
         keep(low);
         keep(high);
     };
@@ -170,7 +170,7 @@ auto indexed(Function function) {
     return [=](const auto& images, QorImageSize roi) {
         T value[4];
         int32_t x[4], y[4];
-        function(images[0].data(), images[0].step(), roi, value, x, y);
+        must(function(images[0].data(), images[0].step(), roi, value, x, y));
         keep(value);
         keep(x);
         keep(y);
@@ -229,14 +229,14 @@ const auto blocks8u = [](const auto& images, QorImageSize roi) {
     static std::vector<uint8_t> low(1 << 20), high(1 << 20);
     uint8_t all[2];
     const int step = (roi.width + 15) / 16;
-    qoriBlockMinMax_8u_C1R(images[0].data(), images[0].step(), roi, low.data(), step, high.data(), step, {16, 16}, all,
-                           all + 1);
+    must(qoriBlockMinMax_8u_C1R(images[0].data(), images[0].step(), roi, low.data(), step, high.data(), step, {16, 16},
+                                all, all + 1));
     keep(low.data());
 };
 
 const auto inRange8u = [](const auto& images, QorImageSize roi) {
     int32_t count;
-    qoriCountInRange_8u_C1R(images[0].data(), images[0].step(), roi, &count, 50, 180);
+    must(qoriCountInRange_8u_C1R(images[0].data(), images[0].step(), roi, &count, 50, 180));
     keep(&count);
 };
 
@@ -317,7 +317,7 @@ std::vector<int32_t> levelsUpTo(int32_t last) {
 
 const auto bytes1 = [levels = levelsUpTo(256)](const Image<uint8_t>& image, QorImageSize roi) {
     int32_t bins[256];
-    qoriHistogramRange_8u_C1R(image.data(), image.step(), roi, bins, levels.data(), 257);
+    must(qoriHistogramRange_8u_C1R(image.data(), image.step(), roi, bins, levels.data(), 257));
     keep(bins);
 };
 
@@ -326,7 +326,7 @@ const auto bytes3 = [levels = levelsUpTo(256)](const Image<uint8_t>& image, QorI
     int32_t* binPointers[3] = {bins[0], bins[1], bins[2]};
     const int32_t* levelPointers[3] = {levels.data(), levels.data(), levels.data()};
     const int32_t counts[3] = {257, 257, 257};
-    qoriHistogramRange_8u_C3R(image.data(), image.step(), roi, binPointers, levelPointers, counts);
+    must(qoriHistogramRange_8u_C3R(image.data(), image.step(), roi, binPointers, levelPointers, counts));
     keep(bins);
 };
 
@@ -334,21 +334,22 @@ const auto bytes3 = [levels = levelsUpTo(256)](const Image<uint8_t>& image, QorI
 auto words(int32_t count) {
     int32_t specSize, bufferSize;
     const float lower = 0, upper = 65'536;
-    qoriHistogramGetBufferSize(qor16u, {1, 1}, &count, 1, 1, &specSize, &bufferSize);
+    must(qoriHistogramGetBufferSize(qor16u, {1, 1}, &count, 1, 1, &specSize, &bufferSize));
     const auto spec = std::make_shared<std::vector<int32_t>>(specSize / 4);
     const auto buffer = std::make_shared<std::vector<uint8_t>>(bufferSize);
     const auto bins = std::make_shared<std::vector<int32_t>>(count);
-    qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, reinterpret_cast<QorHistogramSpec*>(spec->data()));
+    must(
+        qoriHistogramUniformInit(qor16u, &lower, &upper, &count, 1, reinterpret_cast<QorHistogramSpec*>(spec->data())));
     return [=](const Image<uint16_t>& image, QorImageSize roi) {
-        qoriHistogram_16u_C1R(image.data(), image.step(), roi, bins->data(),
-                              reinterpret_cast<const QorHistogramSpec*>(spec->data()), buffer->data());
+        must(qoriHistogram_16u_C1R(image.data(), image.step(), roi, bins->data(),
+                                   reinterpret_cast<const QorHistogramSpec*>(spec->data()), buffer->data()));
         keep(bins->data());
     };
 }
 
 const auto searched = [](const Image<uint16_t>& image, QorImageSize roi) {
     int32_t bins[256], levels[257];
-    qoriHistogramEven_16u_C1R(image.data(), image.step(), roi, bins, levels, 257, 0, 65'536);
+    must(qoriHistogramEven_16u_C1R(image.data(), image.step(), roi, bins, levels, 257, 0, 65'536));
     keep(bins);
 };
 
@@ -364,9 +365,9 @@ auto ranged(int32_t count, int32_t times = 1) {
     const auto bins = std::make_shared<std::vector<int32_t>>(count);
     return [=](const Image<T>& image, QorImageSize roi) {
         if constexpr (std::is_floating_point_v<T>)
-            qoriHistogramRange_32f_C1R(image.data(), image.step(), roi, bins->data(), levels.data(), count);
+            must(qoriHistogramRange_32f_C1R(image.data(), image.step(), roi, bins->data(), levels.data(), count));
         else
-            qoriHistogramRange_16u_C1R(image.data(), image.step(), roi, bins->data(), levels.data(), count);
+            must(qoriHistogramRange_16u_C1R(image.data(), image.step(), roi, bins->data(), levels.data(), count));
         keep(bins->data());
     };
 }

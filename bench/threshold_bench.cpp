@@ -51,7 +51,7 @@ Row otsuRow() {
         const Image<uint8_t> src(size, 1);
         return Contenders{[=] {
                               uint8_t level;
-                              qoriComputeThreshold_Otsu_8u_C1R(src.data(), src.step(), size.roi(), &level);
+                              must(qoriComputeThreshold_Otsu_8u_C1R(src.data(), src.step(), size.roi(), &level));
                               keep(&level);
                           },
                           [=] {

@@ -63,10 +63,10 @@ const Rows rows{{
     unaryRow<float, float>("sqrt 32f C1", 1, qoriSqrt_32f_C1R, Root{}),
     integers<uint8_t, Exponential>("exp 8u C1 sfs 0", qoriExp_8u_C1RSfs),
     integers<int16_t, Exponential>("exp 16s C1 sfs 0", qoriExp_16s_C1RSfs),
-    unaryRow<float, float>("exp 32f C1", 1, qoriExp_32f_C1R, Exponential{}, 0, 0, exponent),
+    unaryRow<float, float>("exp 32f C1", 1, qoriExp_32f_C1R, Exponential{}, 0, 0, exponent, 1e-6),
     integers<uint8_t, Logarithm>("ln 8u C1 sfs 0", qoriLn_8u_C1RSfs, atLeastOne<uint8_t>),
     integers<int16_t, Logarithm>("ln 16s C1 sfs 0", qoriLn_16s_C1RSfs, atLeastOne<int16_t>),
-    unaryRow<float, float>("ln 32f C1", 1, qoriLn_32f_C1R, Logarithm{}, 0, 0, positive),
+    unaryRow<float, float>("ln 32f C1", 1, qoriLn_32f_C1R, Logarithm{}, 0, 0, positive, 1e-6),
 }};
 
 }  // namespace

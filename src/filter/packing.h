@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Kernels as the sums of kernels/filter_sums.h want them, and how large sums can become.
+// Kernels as the sums of kernels/filter/sums.h want them, and how large sums can become.
 #pragma once
 #include <algorithm>
 #include <limits>

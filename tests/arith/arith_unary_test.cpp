@@ -33,16 +33,6 @@ std::vector<T> domain() {
     return all;
 }
 
-const std::vector<Shape>& upright() {
-    static const std::vector<Shape> shapes = [] {
-        std::vector<Shape> all;
-        for (const Shape& shape : smallShapes())
-            if (!shape.flipped) all.push_back(shape);
-        return all;
-    }();
-    return shapes;
-}
-
 /// Calls an export on one image, in place or not, with or without a scale factor.
 template <class T, Kind kind, bool scaled, class Function>
 QorResult run(Function function, const TestImage& src, const TestImage& dst, QorImageSize roi, int scale) {
@@ -64,7 +54,7 @@ template <class T, Layout L, Kind kind, class Function, class Reference, class S
 void sweep(const char* name, Function function, Reference reference, Status status) {
     constexpr bool scaled = !std::is_same_v<T, float>;
     const int usual = sizeof(T) == 1 ? 1 : 3;
-    forShapes(upright(), [&](const Shape& shape) {
+    forShapes(uprightShapes(), [&](const Shape& shape) {
         QorResult expected = QOR_OK;
         checkUnary<T, T, L, kind>(
             shape,
@@ -108,7 +98,7 @@ void absolute(const char* name, Function function) {
             return x == INT16_MIN ? T{INT16_MAX} : static_cast<T>(x < 0 ? -x : x);
         }
     };
-    forShapes(upright(), [&](const Shape& shape) {
+    forShapes(uprightShapes(), [&](const Shape& shape) {
         Shape even = shape;
         if (sizeof(T) == 2) even.padding &= ~1;  // odd steps have a test of their own
         checkUnary<T, T, L, kind>(
@@ -164,7 +154,7 @@ void checkFloats(const std::vector<float>& in, const std::vector<float>& out, Tr
 template <Layout L, Kind kind, class Function, class Truth>
 void sweepFloats(const char* name, Function function, Truth truth) {
     // Shapes: the bytes that a long contiguous row gives, and nothing else touched.
-    forShapes(upright(), [&](const Shape& shape) {
+    forShapes(uprightShapes(), [&](const Shape& shape) {
         checkUnary<float, float, L, kind>(
             shape,
             [&](const TestImage& src, const TestImage& dst, QorImageSize roi) {

@@ -42,17 +42,6 @@ void sweepWith(const std::vector<Shape>& shapes, Function function, Reference re
     });
 }
 
-/// Shapes without negative steps, for families that check them.
-const std::vector<Shape>& upright() {
-    static const std::vector<Shape> shapes = [] {
-        std::vector<Shape> all;
-        for (const Shape& shape : smallShapes())
-            if (!shape.flipped) all.push_back(shape);
-        return all;
-    }();
-    return shapes;
-}
-
 const std::vector<Shape>& fewShapes() {
     static const std::vector<Shape> shapes = {
         {.width = 67, .height = 3, .padding = 5}, {.width = 512, .height = 2}, {.width = 7, .atBegin = true}};
@@ -62,7 +51,7 @@ const std::vector<Shape>& fewShapes() {
 template <class S, class D, Layout L, class Function>
 void plain(const char* name, Function function) {
     const auto reference = [](S x) { return reference::convertInteger<S, D>(x); };
-    sweepWith<S, D, L>(upright(), function, reference);
+    sweepWith<S, D, L>(uprightShapes(), function, reference);
     forStreamingChoices(channels(L) * static_cast<int>(sizeof(S) + sizeof(D)), (1 << 20) + (1 << 16),
                         [&](const Shape& shape) { sweepWith<S, D, L>({shape}, function, reference); });
     markSwept(name);
@@ -97,7 +86,7 @@ template <class S, class D, Layout L, class Function>
 void roundFloats(const char* name, Function function) {
     for (int mode : kModes) {
         const auto reference = [=](float x) { return reference::convertFloat<D>(x, mode, 0); };
-        sweepWith<S, D, L>(mode < 3 && mode >= 0 ? upright() : fewShapes(), function, reference, mode);
+        sweepWith<S, D, L>(mode < 3 && mode >= 0 ? uprightShapes() : fewShapes(), function, reference, mode);
     }
     markSwept(name);
 }
@@ -145,7 +134,7 @@ void scaleFloats(const char* name, Function function) {
 template <class S, class D, Layout L, class Function>
 void unpackBits(const char* name, Function function) {
     for (int offset = 0; offset < 27; ++offset)
-        forShapes(upright(), [&](const Shape& pixels) {
+        forShapes(uprightShapes(), [&](const Shape& pixels) {
             if ((pixels.width + offset) % 3 != 0) return;
             Shape bits = pixels;
             bits.width = (offset + pixels.width + 7) / 8;
@@ -175,7 +164,7 @@ void scaleUp(const char* name, Function function) {
         const int64_t repeated = sizeof(D) == 2 ? x * 257 : x * int64_t{16843009};
         return static_cast<D>(repeated + std::numeric_limits<D>::min());
     };
-    sweepWith<S, D, L>(upright(), function, reference);
+    sweepWith<S, D, L>(uprightShapes(), function, reference);
     if (L == Layout::C1) sweepWith<S, D, L>({{.width = 1280, .height = 1100}}, function, reference);  // streams
     markSwept(name);
 }
@@ -190,7 +179,7 @@ void scaleToFloat(const char* name, Function function) {
             const volatile float product = static_cast<float>(x) * factor;
             return lower + product;
         };
-        sweepWith<S, D, L>(low == 0 ? upright() : fewShapes(), function, reference, low, high);
+        sweepWith<S, D, L>(low == 0 ? uprightShapes() : fewShapes(), function, reference, low, high);
     }
     markSwept(name);
 }
@@ -203,7 +192,7 @@ void scaleFromFloat(const char* name, Function function) {
             const float value = std::fma(x, factor, -offset);
             return !(value > -1.0f) ? 0 : value > 256.0f ? 255 : reference::nearestByte(value);
         };
-        sweepWith<S, D, L>(low == 0 ? upright() : fewShapes(), function, reference, low, high);
+        sweepWith<S, D, L>(low == 0 ? uprightShapes() : fewShapes(), function, reference, low, high);
     }
     markSwept(name);
 }
@@ -223,8 +212,8 @@ void scaleDown(const char* name, Function function) {
             return reference::nearestByte(distance * 0.0038910505827516317f);
         }
     };
-    for (int hint : {0, 1, 3}) sweepWith<S, D, L>(hint == 1 ? upright() : fewShapes(), function, fast, hint);
-    sweepWith<S, D, L>(upright(), function, accurate, 2);
+    for (int hint : {0, 1, 3}) sweepWith<S, D, L>(hint == 1 ? uprightShapes() : fewShapes(), function, fast, hint);
+    sweepWith<S, D, L>(uprightShapes(), function, accurate, 2);
     if (L == Layout::C1) sweepWith<S, D, L>({{.width = 1280, .height = 1100}}, function, fast, 1);
     markSwept(name);
 }

@@ -52,6 +52,15 @@ const std::vector<Shape>& smallShapes() {
     return shapes;
 }
 
+const std::vector<Shape>& uprightShapes() {
+    static const std::vector<Shape> shapes = [] {
+        std::vector<Shape> all = makeSmallShapes();
+        std::erase_if(all, [](const Shape& shape) { return shape.flipped; });
+        return all;
+    }();
+    return shapes;
+}
+
 std::vector<Shape> largeShapes(int bytesPerPixel, int trafficBytes) {
     const auto tall = [=](int width) { return trafficBytes / (width * bytesPerPixel) + 1; };
     constexpr int wide = 1531;

@@ -43,6 +43,8 @@ std::string describe(const Shape& shape);
 
 /// Every width around the vector sizes and a few larger ones, each packed and padded, at both guards, some flipped.
 const std::vector<Shape>& smallShapes();
+/// Those without negative steps, for families that check them.
+const std::vector<Shape>& uprightShapes();
 /// Regions whose traffic, at so many bytes per pixel, is a little more than `trafficBytes`; at alignments where stores
 /// can stream and where they cannot.
 std::vector<Shape> largeShapes(int bytesPerPixel, int trafficBytes);

@@ -331,7 +331,7 @@ QORI_INLINE void storeElements(D* p, Elements<D, n> e, ptrdiff_t count) {
 
 }  // namespace detail
 
-/// A row of sums to elements: Finish (filter_sums.h) with a rule.
+/// A row of sums to elements: Finish (sums.h) with a rule.
 template <class Rule, bool keepAlpha, class Sum>
 void finishRow(const void* rule, const Sum (*slots)[2], uint8_t* dst, ptrdiff_t elements) {
     using D = typename Rule::Element;

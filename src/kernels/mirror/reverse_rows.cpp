@@ -4,6 +4,7 @@
 #include <array>
 
 #include "kernels/byte_tables.h"
+#include "pixels.h"
 
 namespace qori::kernels {
 namespace {
@@ -243,16 +244,6 @@ void swapRows(uint8_t* a, uint8_t* b, ptrdiff_t pixels) {
     template void reverseRowsInPlace<pixelBytes, keepAlpha>(uint8_t*, ptrdiff_t, ptrdiff_t, int32_t);           \
     template void swapReversed<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t);                           \
     template void swapRows<pixelBytes, keepAlpha>(uint8_t*, uint8_t*, ptrdiff_t)
-QORI_INSTANTIATE(1, false);
-QORI_INSTANTIATE(2, false);
-QORI_INSTANTIATE(3, false);
-QORI_INSTANTIATE(4, false);
-QORI_INSTANTIATE(6, false);
-QORI_INSTANTIATE(8, false);
-QORI_INSTANTIATE(12, false);
-QORI_INSTANTIATE(16, false);
-QORI_INSTANTIATE(4, true);
-QORI_INSTANTIATE(8, true);
-QORI_INSTANTIATE(16, true);
+QORI_FOR_EACH_PIXEL(QORI_INSTANTIATE)
 
 }  // namespace qori::kernels

@@ -4,6 +4,7 @@
 #include <algorithm>
 
 #include "kernels/copy/select_rows.h"
+#include "pixels.h"
 
 namespace qori::kernels {
 namespace {
@@ -138,7 +139,8 @@ private:
                 uint8_t* const p = to + x * toStep + i;
                 Bytes a = load(tile_ + x * T::tileStep + i);
                 if constexpr (keepAlpha) {
-                    alignas(kVectorBytes) static constexpr auto colour = selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
+                    alignas(kVectorBytes) static constexpr auto colour =
+                        selectWithinPixel<pixelBytes>(pixelBytes / 4 * 3);
                     a = blend(load(p), a, load(colour.data()));
                 }
                 if (streaming)
@@ -196,16 +198,6 @@ void transposeImage(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff
 #define QORI_INSTANTIATE(pixelBytes, keepAlpha)                                                                       \
     template void transposeImage<pixelBytes, keepAlpha>(uint8_t*, ptrdiff_t, const uint8_t*, ptrdiff_t, QorImageSize, \
                                                         bool)
-QORI_INSTANTIATE(1, false);
-QORI_INSTANTIATE(2, false);
-QORI_INSTANTIATE(3, false);
-QORI_INSTANTIATE(4, false);
-QORI_INSTANTIATE(6, false);
-QORI_INSTANTIATE(8, false);
-QORI_INSTANTIATE(12, false);
-QORI_INSTANTIATE(16, false);
-QORI_INSTANTIATE(4, true);
-QORI_INSTANTIATE(8, true);
-QORI_INSTANTIATE(16, true);
+QORI_FOR_EACH_PIXEL(QORI_INSTANTIATE)
 
 }  // namespace qori::kernels
