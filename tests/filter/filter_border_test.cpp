@@ -116,11 +116,8 @@ int32_t drawBorder() {
     return random().oneIn(2) ? kind : (kind & 15) | random().below(16) << 4 | (kind & 0x10);
 }
 
-Job drawJob(QorImageSize kernel) {
-    const bool wide = random().oneIn(12);
-    return {kernel,
-            {wide ? 250 + random().below(350) : 1 + random().below(70), 1 + random().below(wide ? 6 : 24)},
-            drawBorder()};
+Job drawJob(QorImageSize kernel, int width) {
+    return {kernel, {width, 1 + random().below(width > 70 ? 6 : 24)}, drawBorder()};
 }
 
 template <class T, int channels, class Function>
@@ -138,15 +135,16 @@ void checkIntegers(Function function, const Source<T, channels>& source, const K
 }
 
 template <class T, int channels, class Function>
-void checkIntegers(Function function, const Kernel<int16_t>& kernel, int32_t divisor, int32_t mode) {
-    checkIntegers<T, channels>(function, Source<T, channels>(drawJob({kernel.width, kernel.height})), kernel, divisor,
-                               mode);
+void checkIntegers(Function function, const Kernel<int16_t>& kernel, int32_t divisor, int32_t mode, int width) {
+    checkIntegers<T, channels>(function, Source<T, channels>(drawJob({kernel.width, kernel.height}, width)), kernel,
+                               divisor, mode);
 }
 
 /// `integers` stand for the same kernel where it is made from them.
 template <class T, int channels, class Function>
-void checkFloats(Function function, const Kernel<float>& kernel, bool eighths, int32_t mode, int32_t divisor = 0) {
-    const Source<T, channels> source(drawJob({kernel.width, kernel.height}));
+void checkFloats(Function function, const Kernel<float>& kernel, bool eighths, int32_t mode, int width,
+                 int32_t divisor = 0) {
+    const Source<T, channels> source(drawJob({kernel.width, kernel.height}, width));
     const Blocks blocks(source.job, kTypeCode<T>, divisor == 0 ? kFloats : kIntegers, channels);
     Kernel<float> applied = kernel;
     if (divisor == 0) {
@@ -166,20 +164,21 @@ void checkFloats(Function function, const Kernel<float>& kernel, bool eighths, i
 
 template <class T, int channels, class Function>
 void filterBorder(const char* name, Function function) {
-    constexpr int kJobs = 150;
+    constexpr int kJobs = 90;
     constexpr bool hasIntegers = std::is_same_v<T, uint8_t> || (std::is_same_v<T, int16_t> && channels == 1);
     for (int i = 0; i < kJobs && !testing::Test::HasFailure(); ++i) {
         const int32_t mode = i % 3;
+        const int width = sweptWidth(i);
         const Coefficients size = drawSize();
         const int most = i % 10 == 0 ? 31 : 9;
         if constexpr (hasIntegers)
-            checkIntegers<T, channels>(function, drawKernel<int16_t>(size, most), drawDivisor(), mode);
+            checkIntegers<T, channels>(function, drawKernel<int16_t>(size, most), drawDivisor(), mode, width);
         checkFloats<T, channels>(function, drawKernel<float>(size, most),
-                                 size == Coefficients::small && !std::is_same_v<T, float>, mode);
+                                 size == Coefficients::small && !std::is_same_v<T, float>, mode, width);
         if constexpr (!hasIntegers && !std::is_same_v<T, float>) {
             Kernel<float> kernel = drawKernel<float>(Coefficients::small);
             for (float& k : kernel.values) k = static_cast<float>(drawCoefficient<int16_t>(size));
-            checkFloats<T, channels>(function, kernel, false, mode, drawDivisor());
+            checkFloats<T, channels>(function, kernel, false, mode, width, drawDivisor());
         }
     }
     markSwept(name);
@@ -297,7 +296,7 @@ void checkLargestByteSums(Function function) {
     for (int n = 0; n < 150 && !testing::Test::HasFailure(); ++n) {
         const bool inAll = random().oneIn(2);
         const Kernel<int16_t> kernel = drawByteKernel(inAll ? 250 + random().below(10) : 3 + random().below(90), inAll);
-        Job job = drawJob({kernel.width, kernel.height});
+        Job job = drawJob({kernel.width, kernel.height}, sweptWidth(random().below(120)));
         job.border = borderReadAll;
         Source<uint8_t, channels> source(job);
         const bool least = random().oneIn(2);

@@ -29,6 +29,15 @@ K drawCoefficient(Coefficients size) {
     }
 }
 
+/// Widths of a sweep: every one to beyond two vectors of bytes, then those around larger ones and any up to 600.
+inline int sweptWidth(int turn) {
+    constexpr int kEvery = 70;
+    static constexpr int further[] = {95, 96, 97, 127, 128, 129, 257};
+    if (turn < kEvery) return turn + 1;
+    turn -= kEvery;
+    return turn < static_cast<int>(std::size(further)) ? further[turn] : 200 + random().below(400);
+}
+
 inline Coefficients drawSize() { return static_cast<Coefficients>(random().below(3)); }
 
 template <class K>

@@ -13,10 +13,10 @@ struct Case {
     QorImageSize roi;
     TestImage src, dst;
 
-    explicit Case(const Kernel<K>& k)
+    Case(const Kernel<K>& k, int width)
         : kernel(k),
           anchor{random().below(k.width + 2) - 1, random().below(k.height + 2) - 1},
-          roi{random().oneIn(10) ? 200 + random().below(300) : 1 + random().below(70), 1 + random().below(9)},
+          roi{width, 1 + random().below(9)},
           src(kSrc, shape(k.width - 1, k.height - 1), n * int{sizeof(S)}),
           dst(kDst, shape(0, 0), n * int{sizeof(D)}) {
         src.template fill<S>(n, drawPixel<S>);
@@ -70,8 +70,8 @@ auto withExtra(Function function, Extra... extra) {
 constexpr int kCases = 90;
 
 template <class S, Layout L, class K, class MakeCall>
-void checkIntegers(MakeCall makeCall, int32_t mode) {
-    Case<S, S, L, K> test(drawKernel<K>(drawSize(), 7));
+void checkIntegers(MakeCall makeCall, int32_t mode, int width) {
+    Case<S, S, L, K> test(drawKernel<K>(drawSize(), 7), width);
     const int32_t divisor = drawDivisor();
     test.check(makeCall(test, divisor), [&](auto pixel, S actual) {
         const int64_t sum = reference::integerSum(test.kernel, test.anchor.x, test.anchor.y, pixel);
@@ -81,10 +81,10 @@ void checkIntegers(MakeCall makeCall, int32_t mode) {
 }
 
 template <class S, class D, Layout L, class K, class MakeCall>
-void checkFloats(MakeCall makeCall, int32_t mode) {
+void checkFloats(MakeCall makeCall, int32_t mode, int width) {
     const Coefficients size = drawSize();
     constexpr bool wide = sizeof(S) == 8 || std::is_same_v<S, int32_t>;
-    Case<S, D, L, K> test(drawKernel<K>(size));
+    Case<S, D, L, K> test(drawKernel<K>(size), width);
     const bool eighths = size == Coefficients::small && std::is_integral_v<S>;
     test.check(makeCall(test), [&](auto pixel, D actual) {
         expectFloatSum<D>(reference::floatSum(test.kernel, test.anchor.x, test.anchor.y, pixel),
@@ -95,7 +95,7 @@ void checkFloats(MakeCall makeCall, int32_t mode) {
 template <class Check>
 void forCases(const char* name, Check check) {
     const int blocks = qorTestLiveBlocks(), damaged = qorTestDamagedBlocks();
-    for (int i = 0; i < kCases && !testing::Test::HasFailure(); ++i) check(i % 3);
+    for (int i = 0; i < kCases && !testing::Test::HasFailure(); ++i) check(i % 3, sweptWidth(i));
     EXPECT_EQ(blocks, qorTestLiveBlocks());
     EXPECT_EQ(damaged, qorTestDamagedBlocks());
     markSwept(name);
@@ -105,22 +105,23 @@ void forCases(const char* name, Check check) {
 
 template <class S, class D, Layout L, class Function>
 void filterIntegers(const char* name, Function function) {
-    forCases(name, [=](int32_t) {
+    forCases(name, [=](int32_t, int width) {
         checkIntegers<S, L, int32_t>([=](auto&, int32_t divisor) { return withExtra(function, divisor); },
-                                     roundNearestEven);
+                                     roundNearestEven, width);
     });
 }
 
 template <class S, class D, Layout L, class Function>
 void filterFloats(const char* name, Function function) {
-    forCases(name,
-             [=](int32_t) { checkFloats<S, S, L, S>([=](auto&) { return withExtra(function); }, roundNearestEven); });
+    forCases(name, [=](int32_t, int width) {
+        checkFloats<S, S, L, S>([=](auto&) { return withExtra(function); }, roundNearestEven, width);
+    });
 }
 
 template <class S, class D, Layout L, class Function>
 void filter32f(const char* name, Function function) {
-    forCases(name, [=](int32_t) {
-        checkFloats<S, D, L, float>([=](auto&) { return withExtra(function); }, roundNearestEven);
+    forCases(name, [=](int32_t, int width) {
+        checkFloats<S, D, L, float>([=](auto&) { return withExtra(function); }, roundNearestEven, width);
     });
 }
 
@@ -164,21 +165,21 @@ uint8_t* makeBuffer(QorImageSize kernel, int32_t width) {
 template <class S, class D, Layout L, class Function>
 void filterRound(const char* name, Function function) {
     using K = std::conditional_t<std::is_same_v<S, uint8_t>, int16_t, int32_t>;
-    forCases(name, [=](int32_t mode) {
+    forCases(name, [=](int32_t mode, int width) {
         checkIntegers<S, L, K>(
             [=](auto& test, int32_t divisor) {
                 return withExtra(function, divisor, mode, makeBuffer<S, K, L>(test.size(), test.roi.width));
             },
-            mode);
+            mode, width);
     });
 }
 
 template <class S, class D, Layout L, class Function>
 void filterRoundFloats(const char* name, Function function) {
-    forCases(name, [=](int32_t mode) {
+    forCases(name, [=](int32_t mode, int width) {
         checkFloats<S, S, L, float>(
             [=](auto& test) { return withExtra(function, mode, makeBuffer<S, float, L>(test.size(), test.roi.width)); },
-            mode);
+            mode, width);
     });
 }
 
