@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Reflections. Whole pixels move, so that all types of one size share their kernels.
 #include "frame/checks.h"
-#include "image/driver.h"
 #include "frame/streaming.h"
+#include "image/driver.h"
+#include "kernels/copy/select_rows.h"
 #include "kernels/mirror/reverse_rows.h"
 #include "kernels/mirror/transpose.h"
-#include "kernels/copy/select_rows.h"
 
 namespace qori::convert {
 namespace {

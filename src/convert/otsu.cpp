@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Otsu's threshold of an 8-bit image.
 #include "frame/checks.h"
-#include "image/driver.h"
 #include "frame/float_control.h"
+#include "image/driver.h"
 #include "kernels/stats/histogram.h"
 
 namespace qori::convert {

@@ -51,8 +51,7 @@ QorResult run(Image<const T> src, Image<T> dst, QorImageSize roi, Make make) {
                 return QOR_OK;
             }
         }
-        const bool streaming =
-            src.data != dst.data && streams(rule, traffic(roi, 2 * pixelSize<T, layout>));
+        const bool streaming = src.data != dst.data && streams(rule, traffic(roi, 2 * pixelSize<T, layout>));
         mapImage<layout == Layout::AC4>(roi, channels(layout), Thresholding<decltype(make())>{make()}, streaming, dst,
                                         src);
         return QOR_OK;

@@ -46,9 +46,9 @@ QORI_INLINE int firstSelected(Mask<T> a) {
 
 namespace detail {
 
-alignas(kVectorBytes) inline constexpr uint8_t kOnesThenZeros[64] = {255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
-                                                           255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
-                                                           255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
+alignas(kVectorBytes) inline constexpr uint8_t kOnesThenZeros[64] = {
+    255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255,
+    255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255, 255};
 
 }  // namespace detail
 

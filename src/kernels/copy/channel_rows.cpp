@@ -132,7 +132,7 @@ struct Extract {
         Bytes gathered = shuffleInBlocks(loadChannelHalf<channels, element, spans>(from[0], 0), table(take[0]));
         for (int k = 1; k < channels; ++k)
             gathered = gathered | shuffleInBlocks(loadChannelHalf<channels, element, spans>(from[0], k),
-                                                table(take[static_cast<size_t>(k)]));
+                                                  table(take[static_cast<size_t>(k)]));
         storeAllSpans<spans, streaming>(to[0], {gathered});
     }
 };
@@ -245,7 +245,7 @@ struct FillColour {
         Bytes halves[4];
         for (int k = 0; k < 4; ++k) {
             const Bytes elements = shuffleInBlocks(loadSpans<3, spans>(from[0] + begin(k) - 16 * k, k),
-                                                 table(spread[static_cast<size_t>(k)]));
+                                                   table(spread[static_cast<size_t>(k)]));
             halves[k] = blend(loadSpans<4, spans>(from[1], k), elements, load(colour.data()));
         }
         storeAllSpans<spans, streaming>(to[0], halves);

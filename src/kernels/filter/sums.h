@@ -2,8 +2,8 @@
 // Weighted sums over the windows of a region, by Taps (filter_taps.h), and what becomes of them, by Finish. The sums of
 // a few rows at a time lie on the stack between the two.
 #pragma once
-#include "taps.h"
 #include "image/image.h"
+#include "taps.h"
 
 namespace qori::kernels {
 

@@ -15,7 +15,7 @@ constexpr double kWordGain = 1.98;  ///< Above the sum of the magnitudes of a re
 /// taps begin two pixels on and are shuffled alike.
 struct WordGroup {
     alignas(kVectorBytes) uint8_t masks[2][32];  ///< Per octet: two quads.
-    int32_t bases[2][2];               ///< Where the quads' first windows begin in the line.
+    int32_t bases[2][2];                         ///< Where the quads' first windows begin in the line.
 };
 
 struct WordFilter {
