@@ -235,6 +235,7 @@ QORI_INLINE Bytes blend(Bytes a, Bytes b, Bytes mask) { return {_mm256_blendv_ep
 
 QORI_INLINE Bytes operator|(Bytes a, Bytes b) { return {_mm256_or_si256(a.v, b.v)}; }
 QORI_INLINE Bytes operator&(Bytes a, Bytes b) { return {_mm256_and_si256(a.v, b.v)}; }
+QORI_INLINE Bytes operator^(Bytes a, Bytes b) { return {_mm256_xor_si256(a.v, b.v)}; }
 
 QORI_INLINE Bytes isZero(Bytes a) { return {_mm256_cmpeq_epi8(a.v, _mm256_setzero_si256())}; }
 
