@@ -95,8 +95,8 @@ template <class T, class L>
 T plainLine(T v, const L* levels, const L* values, int count) {
     for (int k = 0; k < count - 1; ++k)
         if (levels[k] <= v && v < levels[k + 1])
-            return static_cast<T>(values[k] +
-                                  double(v - levels[k]) * double(values[k + 1] - values[k]) / (levels[k + 1] - levels[k]));
+            return static_cast<T>(values[k] + double(v - levels[k]) * double(values[k + 1] - values[k]) /
+                                                  (levels[k + 1] - levels[k]));
     return v;
 }
 
@@ -158,23 +158,22 @@ Step levelStep(int count, int side, double units, Function function) {
 
 template <class T, class L, class Function>
 Ladder countLadder(std::string operation, int side, Function function, std::string reason = {}) {
-    return {std::move(operation),
-            [=] {
-                std::vector<Step> steps;
-                for (int count : kCounts)
-                    steps.push_back(
-                        levelStep<T, L>(count, side, double(side) * side * (2 + std::log2(count)), function));
-                return steps;
-            },
-            std::move(reason)};
+    return {
+        std::move(operation),
+        [=] {
+            std::vector<Step> steps;
+            for (int count : kCounts)
+                steps.push_back(levelStep<T, L>(count, side, double(side) * side * (2 + std::log2(count)), function));
+            return steps;
+        },
+        std::move(reason)};
 }
 template <class T, class L, class Function>
 Ladder sideLadder(std::string operation, int count, Function function, std::string reason = {}) {
     return {std::move(operation),
             [=] {
                 std::vector<Step> steps;
-                for (int side : kSides)
-                    steps.push_back(levelStep<T, L>(count, side, double(side) * side, function));
+                for (int side : kSides) steps.push_back(levelStep<T, L>(count, side, double(side) * side, function));
                 return steps;
             },
             std::move(reason)};

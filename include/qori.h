@@ -3350,7 +3350,7 @@ QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t sr
  *            not above its lower one holds nothing; where several hold an element, the first one counts in 32f,
  *            the last one in integers, and integers from the last level on stay. Results depend on neither the
  *            image's size nor the caller's floating-point modes. 16-bit images of more than 4096 pixels with
- *            more than 16 levels, or levels out of order, take a table of 128 KiB a channel from qorMalloc;
+ *            more than 12 levels, or levels out of order, take a table of 128 KiB a channel from qorMalloc;
  *            nothing else takes memory. AC4 may rewrite channel 3 with its own value: do not let another thread
  *            write it during the call.
  *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
@@ -3442,7 +3442,7 @@ QORI_API QorResult QORI_CALL qoriLUT_32f_AC4IR(float* pSrcDst, int32_t srcDstSte
  *            above its lower one holds nothing; where several hold an element, the first one counts in 32f, the
  *            last one in integers. Results depend on neither the image's size nor the caller's floating-point
  *            modes. Memory is taken from qorMalloc: 32f, 8 bytes an interval and channel; 16 bits of more than
- *            4096 pixels or 129 levels, 128 KiB a channel. AC4 may rewrite channel 3 with its own value: do not
+ *            8192 pixels or 129 levels, 128 KiB a channel. AC4 may rewrite channel 3 with its own value: do not
  *            let another thread write it during the call.
  *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the
@@ -3543,7 +3543,7 @@ QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_AC4IR(float* pSrcDst, int32_t sr
  *            holds nothing; where several hold an element, the first one counts in 32f, the last one in
  *            integers. Results depend on neither the image's size nor the caller's floating-point modes. Memory
  *            is taken from qorMalloc: 32f, three times 8 bytes an interval and channel; 16 bits of more than
- *            4096 pixels or 129 levels, 128 KiB a channel. AC4 may rewrite channel 3 with its own value: do not
+ *            8192 pixels or 129 levels, 128 KiB a channel. AC4 may rewrite channel 3 with its own value: do not
  *            let another thread write it during the call.
  *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the

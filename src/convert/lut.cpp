@@ -104,8 +104,7 @@ QorResult mapWordsByTable(Image<const T> src, Image<T> dst, QorImageSize roi, co
 
 template <class T>
 Search searchOf(const Channel<T>& channel) {
-    if (channel.isOrdered)
-        return channel.curve.count <= kernels::kMostCompared ? Search::comparison : Search::halving;
+    if (channel.isOrdered) return channel.curve.count <= kernels::kMostCompared ? Search::comparison : Search::halving;
     if (std::is_floating_point_v<T>) return Search::first;
     return channel.form == Form::step ? Search::lastOrTail : Search::last;
 }
@@ -130,11 +129,11 @@ void mapBySearch(Image<const T> src, Image<T> dst, QorImageSize roi, const Chann
                                   layout == Layout::AC4 ? kernels::kKeptAlpha : kernels::kSameOrder, T{0}, map);
 }
 
-/// Up to so many levels, each is compared with every element rather than that places are looked up.
+/// Whether no channel has more levels than that, or any out of order.
 template <Layout layout, class T>
-bool isFewSteps(const Channel<T>* channel) {
+bool isFewSteps(const Channel<T>* channel, int32_t most) {
     for (int c = 0; c < processedChannels(layout); ++c)
-        if (!channel[c].isOrdered || channel[c].curve.count > kernels::kMostFewSteps) return false;
+        if (!channel[c].isOrdered || channel[c].curve.count > most) return false;
     return true;
 }
 
@@ -149,13 +148,17 @@ void mapFewSteps(Image<const T> src, Image<T> dst, QorImageSize roi, const Chann
         steps.setChannel(c, curve.levels, curve.values, curve.count);
     }
     steps.finish();
-    kernels::mapImage<layout == Layout::AC4>(roi, n, steps, false, dst, src);
+    kernels::mapImage<layout == Layout::AC4>(roi, n, kernels::ApplyFewSteps<T, n>{&steps, most}, false, dst, src);
 }
 
 // --- choices --------------------------------------------------------------------------------------------------------
 
-/// 16 bits: whether so few pixels are searched one by one that it takes less than to fill a table of 65536 entries.
-inline bool isSmall(QorImageSize roi) { return int64_t{roi.width} * roi.height <= 4'096; }
+/// 16 bits: whether so few pixels are searched one by one that no memory is taken for a table of 65536 entries.
+/// Measured: filling it takes as long as a search of 1,600 pixels (steps of 64 levels, which are found in 3 ns each) or
+/// of 7,700 (curves: 4 ns).
+inline bool isSmall(QorImageSize roi, Form form) {
+    return int64_t{roi.width} * roi.height <= (form == Form::step ? 4'096 : 8'192);
+}
 
 /// Polynomials of a small region stand on the stack.
 constexpr int32_t kMostOnStack = 128;
@@ -169,11 +172,13 @@ bool fitsOnStack(const Channel<T>* channel) {
 
 template <Layout layout, class T>
 QorResult mapWords(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T>* channel, Form form) {
-    if (form == Form::step && isFewSteps<layout>(channel)) {
+    constexpr int32_t mostOverTable = 12;  // levels that are compared in less time than a table is looked up
+    if (form == Form::step &&
+        isFewSteps<layout>(channel, isSmall(roi, form) ? kernels::kMostFewSteps : mostOverTable)) {
         mapFewSteps<layout>(src, dst, roi, channel);
         return QOR_OK;
     }
-    if (!isSmall(roi) || !fitsOnStack<layout>(channel)) return mapWordsByTable<layout>(src, dst, roi, channel);
+    if (!isSmall(roi, form) || !fitsOnStack<layout>(channel)) return mapWordsByTable<layout>(src, dst, roi, channel);
     double c[processedChannels(layout)][3][kMostOnStack];
     for (int i = 0; form != Form::step && i < processedChannels(layout); ++i) {
         for (int power = 0; power < 3; ++power) channel[i].curve.c[power] = c[i][power];
@@ -185,7 +190,7 @@ QorResult mapWords(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T
 
 template <Layout layout>
 QorResult mapFloats(Image<const float> src, Image<float> dst, QorImageSize roi, Channel<float>* channel, Form form) {
-    if (form == Form::step && isFewSteps<layout>(channel)) {
+    if (form == Form::step && isFewSteps<layout>(channel, kernels::kMostFewSteps)) {
         mapFewSteps<layout>(src, dst, roi, channel);
         return QOR_OK;
     }

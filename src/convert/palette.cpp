@@ -32,7 +32,8 @@ constexpr int32_t maskOf(int32_t nBitSize) { return (1 << nBitSize) - 1; }
 
 /// The first 2^bits entries, repeated.
 void repeatEntries(uint8_t* to, int entries, const uint8_t* table, int32_t nBitSize) {
-    for (int i = 0; i < entries; ++i) to[i] = table[i & maskOf(nBitSize)];
+    kernels::copyRow(to, table, 1 << nBitSize);
+    for (int i = 1 << nBitSize; i < entries; i *= 2) kernels::copyRow(to + i, to, i);
 }
 
 template <int rows>
@@ -47,13 +48,10 @@ template <class S, class D>
 QorResult palette(Image<const S> src, Image<D> dst, QorImageSize roi, const D* table, int32_t nBitSize) {
     if (QorResult r = check(src, elementBytes<S>, dst, elementBytes<D>, roi, table, 0, nBitSize)) return r;
     if constexpr (sizeof(S) + sizeof(D) == 2) {
-        (nBitSize <= 4   ? mapBytes<1>
-         : nBitSize <= 7 ? mapBytes<8>
-                         : mapBytes<16>)(src, dst, roi, table, nBitSize);
+        (nBitSize <= 4 ? mapBytes<1> : nBitSize <= 7 ? mapBytes<8> : mapBytes<16>)(src, dst, roi, table, nBitSize);
     } else {
         forEachRow(
-            roi,
-            [=](ptrdiff_t pixels, D* d, const S* s) { kernels::lookUpRow(d, s, pixels, table, maskOf(nBitSize)); },
+            roi, [=](ptrdiff_t pixels, D* d, const S* s) { kernels::lookUpRow(d, s, pixels, table, maskOf(nBitSize)); },
             walk(dst, 1), walk(src, 1));
     }
     return QOR_OK;
@@ -112,9 +110,9 @@ QorResult paletteWithAlpha(Image<const T> src, int32_t alphaValue, Image<T> dst,
         constexpr int none = kernels::kAlphaPlane;
         const kernels::PixelOrder order{{reversed ? 2 : none, reversed ? 1 : 0, reversed ? 0 : 1, reversed ? none : 2},
                                         writesAlpha ? -1 : alphaAt};
-        kernels::mapByPlanes<3, 4, T>(
-            roi, 3, src, dst, order, alpha,
-            [&](int c, uint8_t* plane, int pixels) { kernels::lookUpBlock(plane, pixels, lookups[c]); });
+        kernels::mapByPlanes<3, 4, T>(roi, 3, src, dst, order, alpha, [&](int c, uint8_t* plane, int pixels) {
+            kernels::lookUpBlock(plane, pixels, lookups[c]);
+        });
     } else {
         constexpr int channelAt[3] = {reversed ? 2 : 1, reversed ? 1 : 2, reversed ? 0 : 3};
         forEachRow(

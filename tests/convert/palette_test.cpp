@@ -82,7 +82,8 @@ void sweepTables(const char* name, Function function, int width) {
             [&](auto get, auto set) {
                 for (int c = 0; c < processed; ++c)
                     for (int i = 0; i < width; ++i)
-                        set(c + i, tables[c][(get(c) & mask) * static_cast<unsigned>(width) + static_cast<unsigned>(i)]);
+                        set(c + i,
+                            tables[c][(get(c) & mask) * static_cast<unsigned>(width) + static_cast<unsigned>(i)]);
             });
     });
 }

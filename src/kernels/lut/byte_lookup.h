@@ -21,11 +21,8 @@ public:
 
     ByteLookup() = default;
     explicit ByteLookup(const uint8_t* table) {
-        for (int i = 0; i < entries; ++i) {
-            const int inHalf = i % 128;
-            const auto entry = [&](int k) { return i < 128 ? table[k] : table[k] ^ table[k - 128]; };
-            difference_[i] = static_cast<uint8_t>(entry(i) ^ (inHalf < 16 ? 0 : entry(i - 16)));
-        }
+        takeDifferences(difference_, table, nullptr);
+        if constexpr (rows == 16) takeDifferences(difference_ + 128, table + 128, table);
     }
 
     QORI_INLINE Bytes operator()(Bytes v) const {
@@ -46,6 +43,19 @@ public:
     QORI_INLINE Pack<uint8_t, 32> operator()(int, Pack<uint8_t, 32> source) const { return {{(*this)(source.v[0])}}; }
 
 private:
+    static constexpr int kHalf = rows == 1 ? 16 : 128;  ///< Entries that have their indexes to themselves.
+
+    /// The rows of half a table, less another half's where there is one, as differences to the row before.
+    static void takeDifferences(uint8_t* to, const uint8_t* half, const uint8_t* other) {
+        uint8_t rowsBefore[16 + 128] = {};
+        uint8_t* const entry = rowsBefore + 16;
+        for (int i = 0; i < kHalf; i += 32) {
+            const Bytes two = loadUpTo(half + i, kHalf - i);
+            storeUpTo(entry + i, other == nullptr ? two : two ^ loadUpTo(other + i, kHalf - i), kHalf - i);
+        }
+        for (int i = 0; i < kHalf; i += 32)
+            storeUpTo(to + i, loadUpTo(entry + i, kHalf - i) ^ loadUpTo(rowsBefore + i, kHalf - i), kHalf - i);
+    }
     QORI_INLINE Bytes row(int i) const { return loadTwice(difference_ + 16 * i); }
 
     alignas(32) uint8_t difference_[entries];

@@ -81,24 +81,30 @@ QORI_INLINE __m256d evaluateCubic(__m256d d, __m256d base, __m256d c1, __m256d c
     return _mm256_fmadd_pd(d, _mm256_fmadd_pd(d, _mm256_fmadd_pd(d, c3, c2), c1), base);
 }
 
-/// Clamped to T's range and truncated: in this order, as the ends are integers. Cubics are rounded by adding a half.
+/// Truncated, to be saturated when it is stored: too large ones as T's highest, as they have no conversion; too small
+/// ones convert to the lowest word. Cubics are rounded by adding a half.
 template <class T, bool isCubic>
-QORI_INLINE __m128i toElements(__m256d r) {
+QORI_INLINE __m128i toWords(__m256d r) {
     if constexpr (isCubic) r = _mm256_add_pd(r, _mm256_set1_pd(0.5));
-    r = _mm256_min_pd(_mm256_max_pd(r, _mm256_set1_pd(kLowestOf<T>)), _mm256_set1_pd(kHighestOf<T>));
-    return _mm256_cvttpd_epi32(r);
+    return _mm256_cvttpd_epi32(_mm256_min_pd(r, _mm256_set1_pd(kHighestOf<T>)));
 }
 
-/// The low elements of four words.
-template <class T>
-QORI_INLINE void storeFour(T* p, __m128i words) {
-    if constexpr (sizeof(T) == 2) {
-        words = std::is_signed_v<T> ? _mm_packs_epi32(words, words) : _mm_packus_epi32(words, words);
-        _mm_storel_epi64(reinterpret_cast<__m128i*>(p), words);
-    } else {
-        words = _mm_packs_epi32(words, words);
-        qori::detail::storeWord(reinterpret_cast<uint8_t*>(p), _mm_cvtsi128_si32(_mm_packus_epi16(words, words)));
-    }
+/// Four and eight words, saturated to T.
+QORI_INLINE void storeFour(uint16_t* p, __m128i a) {
+    _mm_storel_epi64(reinterpret_cast<__m128i*>(p), _mm_packus_epi32(a, a));
+}
+QORI_INLINE void storeFour(int16_t* p, __m128i a) {
+    _mm_storel_epi64(reinterpret_cast<__m128i*>(p), _mm_packs_epi32(a, a));
+}
+QORI_INLINE void storeEight(uint16_t* p, __m128i a, __m128i b) {
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(p), _mm_packus_epi32(a, b));
+}
+QORI_INLINE void storeEight(int16_t* p, __m128i a, __m128i b) {
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(p), _mm_packs_epi32(a, b));
+}
+QORI_INLINE void storeEight(uint8_t* p, __m128i a, __m128i b) {
+    const __m128i words = _mm_packs_epi32(a, b);
+    _mm_storel_epi64(reinterpret_cast<__m128i*>(p), _mm_packus_epi16(words, words));
 }
 
 }  // namespace detail
@@ -113,14 +119,14 @@ QORI_NOINLINE void tabulate(T* table, int32_t first, int32_t end, const Curve<in
     const auto four = [&](int32_t v) {
         const __m128i at = _mm_add_epi32(_mm_set1_epi32(v), _mm_setr_epi32(0, 1, 2, 3));
         const __m256d d = _mm256_sub_pd(_mm256_cvtepi32_pd(at), origin);
-        return detail::toElements<T, isCubic>(isCubic ? detail::evaluateCubic(d, base, c1, c2, c3)
-                                                      : detail::evaluateLine(d, base, c1));
+        return detail::toWords<T, isCubic>(isCubic ? detail::evaluateCubic(d, base, c1, c2, c3)
+                                                   : detail::evaluateLine(d, base, c1));
     };
     int32_t v = first;
-    for (; v <= end - 4; v += 4) detail::storeFour(table + v, four(v));
+    for (; v <= end - 8; v += 8) detail::storeEight(table + v, four(v), four(v + 4));
     if (v == end) return;
-    T last[4];
-    detail::storeFour(last, four(v));
+    T last[8];
+    detail::storeEight(last, four(v), four(v + 4));
     for (int i = 0; v < end; ++i, ++v) table[v] = last[i];
 }
 
@@ -173,7 +179,7 @@ QORI_NOINLINE void mapByCurve(T* block, int n, const uint32_t* places, const Cur
             const __m128i mapped = _mm_castps_si128(_mm256_cvtpd_ps(r));
             _mm_storeu_si128(reinterpret_cast<__m128i*>(block + x), _mm_blendv_epi8(words, mapped, inside));
         } else {
-            detail::storeFour(block + x, _mm_blendv_epi8(words, detail::toElements<T, isCubic>(r), inside));
+            detail::storeFour(block + x, _mm_blendv_epi8(words, detail::toWords<T, isCubic>(r), inside));
         }
     }
 }

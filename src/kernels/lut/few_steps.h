@@ -8,9 +8,9 @@
 
 namespace qori::kernels {
 
-inline constexpr int kMostFewSteps = 16;
+inline constexpr int kMostFewSteps = 32;
 
-/// An operation of the row map on 16-bit elements or floats, with levels that never decrease.
+/// For 16-bit elements or floats, with levels that never decrease.
 ///
 /// Each level that is not above the element changes the bits of the result into those of its interval's value, and the
 /// last one changes them to zero, where the element itself comes in: between the first level and the last it does not.
@@ -18,7 +18,6 @@ inline constexpr int kMostFewSteps = 16;
 template <class T, int channels>
 class FewSteps {
 public:
-    static constexpr bool inRegisters = true;
     using Bits = std::conditional_t<std::is_floating_point_v<T>, uint32_t, uint16_t>;
     using Level = std::conditional_t<std::is_floating_point_v<T>, float, int32_t>;
 
@@ -59,17 +58,15 @@ public:
         spread(leaves_, leave_);
     }
 
-    template <int n>
-    QORI_INLINE Pack<T, n> operator()(int phase, Pack<T, n> source) const {
-        static_assert(Pack<T, n>::vectors == 1);
+    /// The vector of a row that has this phase, for so many levels.
+    QORI_INLINE Vec<T> map(int phase, int count, Vec<T> v) const {
         const int p = vectors == 1 ? 0 : phase;
-        const Vec<T> v = source.v[0];
         Vec<Bits> result = start_[p];
-        for (int i = 0; i < count_; ++i) result = changedWhere(result, reached(v, limit_[i][p]), change_[i][p]);
+        for (int i = 0; i < count; ++i) result = changedWhere(result, reached(v, limit_[i][p]), change_[i][p]);
         Vec<Bits> inside = changedWhere(startInside_[p], reached(v, limit_[0][p]), enter_[p]);
-        inside = changedWhere(inside, reached(v, limit_[count_ - 1][p]), leave_[p]);
+        inside = changedWhere(inside, reached(v, limit_[count - 1][p]), leave_[p]);
         const Vec<T> outside = selectOrZero(~Mask<T>{inside.v}, v);
-        return {{fromInteger<T>(_mm256_xor_si256(result.v, toInteger(outside.v)))}};
+        return fromInteger<T>(_mm256_xor_si256(result.v, toInteger(outside.v)));
     }
 
 private:
@@ -109,8 +106,12 @@ private:
     }
     template <class V>
     static void spread(const V (&perChannel)[channels], Vec<V> (&to)[vectors]) {
-        const ChannelVectors<V> all = channelVectors(perChannel, channels);
-        for (int p = 0; p < vectors; ++p) to[p] = all.v[p];
+        if constexpr (channels == 1) {
+            to[0] = splat(perChannel[0]);
+        } else {
+            const ChannelVectors<V> all = channelVectors(perChannel, channels);
+            for (int p = 0; p < vectors; ++p) to[p] = all.v[p];
+        }
     }
 
     int count_;
@@ -119,7 +120,21 @@ private:
     Vec<Bits> start_[vectors], startInside_[vectors], enter_[vectors], leave_[vectors];
     Limit limits_[kMostFewSteps][channels];
     Bits changes_[kMostFewSteps][channels];
-    Bits starts_[channels], startsInside_[channels], enters_[channels], leaves_[channels];
+    Bits starts_[channels] = {}, startsInside_[channels] = {}, enters_[channels] = {}, leaves_[channels] = {};
+};
+
+/// As an operation of the row map. Only where the steps are is copied for each row.
+template <class T, int channels>
+struct ApplyFewSteps {
+    static constexpr bool inRegisters = true;
+    const FewSteps<T, channels>* steps;
+    int count;
+
+    template <int n>
+    QORI_INLINE Pack<T, n> operator()(int phase, Pack<T, n> source) const {
+        static_assert(Pack<T, n>::vectors == 1);
+        return {{steps->map(phase, count, source.v[0])}};
+    }
 };
 
 }  // namespace qori::kernels

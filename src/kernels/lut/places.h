@@ -16,7 +16,7 @@ enum class Search {
     lastOrTail   ///< As last, but from the last level on elements are outside.
 };
 
-inline constexpr int kMostCompared = 16;  ///< Levels from which halving is quicker.
+inline constexpr int kMostCompared = 32;  ///< Levels above which halving is quicker.
 
 namespace detail {
 
@@ -31,9 +31,7 @@ QORI_INLINE __m256i isReached(__m256 level, __m256 v) {
     return _mm256_castps_si256(_mm256_cmp_ps(level, v, _CMP_LE_OQ));
 }
 QORI_INLINE __m256i isBelow(__m256i v, __m256i level) { return _mm256_cmpgt_epi32(level, v); }
-QORI_INLINE __m256i isBelow(__m256 v, __m256 level) {
-    return _mm256_castps_si256(_mm256_cmp_ps(v, level, _CMP_LT_OQ));
-}
+QORI_INLINE __m256i isBelow(__m256 v, __m256 level) { return _mm256_castps_si256(_mm256_cmp_ps(v, level, _CMP_LT_OQ)); }
 
 template <class T, class L>
 QORI_NOINLINE void placeByComparison(const T* block, int n, const L* levels, int32_t count, uint32_t* places) {
@@ -77,10 +75,10 @@ void findPlaces(const T* block, int n, const L* levels, int32_t count, Search wa
 template <class T, class L>
 QORI_NOINLINE void replaceByValues(T* block, int n, const uint32_t* places, const L* values, int32_t count) {
     for (int x = 0; x < n; x += 8) {
-        const __m256i k = _mm256_sub_epi32(_mm256_loadu_si256(reinterpret_cast<const __m256i*>(places + x)),
-                                           _mm256_set1_epi32(1));
-        const __m256i inside = _mm256_andnot_si256(_mm256_srai_epi32(k, 31),
-                                                   _mm256_cmpgt_epi32(_mm256_set1_epi32(count - 1), k));
+        const __m256i k =
+            _mm256_sub_epi32(_mm256_loadu_si256(reinterpret_cast<const __m256i*>(places + x)), _mm256_set1_epi32(1));
+        const __m256i inside =
+            _mm256_andnot_si256(_mm256_srai_epi32(k, 31), _mm256_cmpgt_epi32(_mm256_set1_epi32(count - 1), k));
         if constexpr (std::is_floating_point_v<T>) {
             const __m256 v = _mm256_loadu_ps(block + x);
             _mm256_storeu_ps(block + x,

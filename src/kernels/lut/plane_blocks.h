@@ -3,7 +3,6 @@
 // block, changed there and put together again.
 #pragma once
 #include <algorithm>
-#include <cstdlib>
 
 #include "image/driver.h"
 #include "kernels/copy/channel_rows.h"
@@ -57,19 +56,29 @@ private:
 };
 
 /// Calls map(channel, plane, n) for every block of pixels. Rows that lie apart in both images share a block as far as
-/// it holds them; else each row is written before the next one is read.
+/// it holds them, narrow ones laid end to end before; else each row is written before the next one is read.
 template <int srcChannels, int dstChannels, class T, class Map>
 void mapByPlanes(QorImageSize roi, int processed, Image<const T> src, Image<T> dst, const PixelOrder& order, T alpha,
                  Map map) {
     using Block = PlaneBlock<srcChannels, dstChannels, T>;
     Block block(alpha);
-    const auto liesApart = [&](auto image, int channels) {
-        return std::abs(int64_t{image.step}) >= int64_t{roi.width} * channels * elementBytes<T>;
-    };
-    const bool shares = liesApart(src, srcChannels) && liesApart(dst, dstChannels);
-    const int most = shares ? std::max(1, Block::kPixels / roi.width) : 1;
+    constexpr int srcPixel = srcChannels * elementBytes<T>, dstPixel = dstChannels * elementBytes<T>;
+    const bool liesApart = src.step >= int64_t{roi.width} * srcPixel && dst.step >= int64_t{roi.width} * dstPixel;
+    const bool isNarrow = liesApart && int64_t{roi.width} * std::max(srcPixel, dstPixel) <= kNarrowRow;
+    const int most = liesApart ? std::max(1, Block::kPixels / roi.width) : 1;
     for (int32_t y = 0; y < roi.height; y += most) {
         const int rows = std::min(most, roi.height - y);
+        if (isNarrow) {
+            T from[Block::kPixels * srcChannels], to[Block::kPixels * dstChannels];
+            const int pixels = rows * roi.width, srcRow = roi.width * srcPixel, dstRow = roi.width * dstPixel;
+            copyNarrowRows(asBytes(from), srcRow, asBytes(src.row(y)), src.step, srcRow, rows);
+            if (order.alphaAt >= 0) copyNarrowRows(asBytes(to), dstRow, asBytes(dst.row(y)), dst.step, dstRow, rows);
+            block.take(from, to, 0, pixels, order);
+            for (int c = 0; c < processed; ++c) map(c, block.plane(c), pixels);
+            block.put(to, 0, pixels, order);
+            copyNarrowRows(asBytes(dst.row(y)), dst.step, asBytes(to), dstRow, dstRow, rows);
+            continue;
+        }
         for (int32_t x = 0, pixels; x < roi.width; x += pixels) {
             pixels = std::min(Block::kPixels, roi.width - x);
             const ptrdiff_t from = ptrdiff_t{x} * srcChannels, to = ptrdiff_t{x} * dstChannels;
