@@ -28,19 +28,36 @@ std::shared_ptr<std::vector<D>> noise(size_t entries) {
 uint16_t spread(uint16_t v) { return static_cast<uint16_t>(v * 40'503u); }
 float toUnit(float v) { return v / 256; }
 
+/// The plain loop has the table's address in a register, as a user's loop would.
 template <class S, class D, class Function>
 Row paletteRow(std::string name, Function function, double bestAtL2 = 0, double bestAtFrame = 0) {
     constexpr int bits = 8 * sizeof(S);
     const auto table = noise<D>(size_t{1} << bits);
-    return withSmall(unaryRow<S, D>(
-        std::move(name), 1, [=](auto... a) { function(a..., table->data(), bits); },
-        [entries = table->data(), table](S x) { return entries[x]; }, bestAtL2, bestAtFrame,
-        [] {
-            if constexpr (sizeof(S) == 2)
-                return &spread;
-            else
-                return nullptr;
-        }()));
+    const auto make = [=](Size size) {
+        const Image<S> src(size, 1);
+        const Image<D> dst(size, 1);
+        for (int y = 0; sizeof(S) == 2 && y < size.height; ++y)
+            for (int x = 0; x < size.width; ++x) src.row(y)[x] = static_cast<S>(spread(src.row(y)[x]));
+        return Contenders{
+            [=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), table->data(), bits); },
+            [=] {
+                const D* const entries = table->data();
+                const int width = size.width, height = size.height;
+                for (int y = 0; y < height; ++y) {
+                    const S* const s = src.row(y);
+                    D* const d = dst.row(y);
+                    for (int x = 0; x < width; ++x) d[x] = entries[s[x]];
+                    keep(d);
+                }
+            },
+            {}};
+    };
+    return withSmall({.operation = std::move(name),
+                      .bytesPerPixel = sizeof(S) + sizeof(D),
+                      .sizes = kSizes,
+                      .make = make,
+                      .bestAtL2 = bestAtL2,
+                      .bestAtFrame = bestAtFrame});
 }
 
 /// Three channels; plain takes them in turn.
@@ -48,21 +65,26 @@ Row paletteOfColours() {
     const auto table = noise<uint8_t>(3 * 256);
     const auto make = [=](Size size) {
         const Image<uint8_t> src(size, 3), dst(size, 3);
-        return Contenders{[=] {
-                              const uint8_t* const tables[3] = {table->data(), &(*table)[256], &(*table)[512]};
-                              qoriLUTPalette_8u_C3R(src.data(), src.step(), dst.data(), dst.step(), size.roi(), tables,
-                                                    8);
-                          },
-                          [=] {
-                              const uint8_t* const entries = table->data();
-                              for (int y = 0; y < size.height; ++y) {
-                                  for (int x = 0; x < 3 * size.width; x += 3)
-                                      for (int c = 0; c < 3; ++c)
-                                          dst.row(y)[x + c] = entries[256 * c + src.row(y)[x + c]];
-                                  keep(dst.row(y));
-                              }
-                          },
-                          {}};
+        return Contenders{
+            [=] {
+                const uint8_t* const tables[3] = {table->data(), &(*table)[256], &(*table)[512]};
+                qoriLUTPalette_8u_C3R(src.data(), src.step(), dst.data(), dst.step(), size.roi(), tables, 8);
+            },
+            [=] {
+                const uint8_t *const red = table->data(), *const green = red + 256, *const blue = red + 512;
+                const int bytes = 3 * size.width, height = size.height;
+                for (int y = 0; y < height; ++y) {
+                    const uint8_t* const s = src.row(y);
+                    uint8_t* const d = dst.row(y);
+                    for (int x = 0; x < bytes; x += 3) {
+                        d[x] = red[s[x]];
+                        d[x + 1] = green[s[x + 1]];
+                        d[x + 2] = blue[s[x + 2]];
+                    }
+                    keep(d);
+                }
+            },
+            {}};
     };
     return {.operation = "LUT palette 8u C3", .bytesPerPixel = 6, .sizes = kSizes, .make = make};
 }
