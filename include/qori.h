@@ -3358,7 +3358,7 @@ QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t sr
  *            others QOR_ERR_NULL_PTR (a pointer is null), then channel by channel QOR_ERR_NULL_PTR (its pValues
  *            or pLevels is null) and QOR_ERR_LUT_LEVELS (its nLevels below 2), then size, step and memory as
  *            C1; then nothing is written.
- *  Example   const int32_t levels[5] = {0, 64, 128, 192, 256}, values[5] = {32, 96, 160, 224, 0};   // posterised: the last one is not used
+ *  Example   const int32_t levels[5] = {0, 64, 128, 192, 256}, values[5] = {32, 96, 160, 224, 0};   // four shades
  *            qoriLUT_8u_C1R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, values, levels, 5);
  */
 QORI_API QorResult QORI_CALL qoriLUT_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
