@@ -160,32 +160,41 @@ inline bool isSmall(QorImageSize roi, Form form) {
     return int64_t{roi.width} * roi.height <= (form == Form::step ? 4'096 : 8'192);
 }
 
-/// Polynomials of a small region stand on the stack.
-constexpr int32_t kMostOnStack = 128;
+/// Polynomials of so many intervals a channel stand on the stack: those of 16 bits, so that their small regions rarely
+/// take memory. Others come from the allocator, and cost no more than a table, which solves them too.
+template <class T>
+constexpr int32_t kMostOnStack = std::is_floating_point_v<T> ? 1 : 128;
 
 template <Layout layout, class T>
-bool fitsOnStack(const Channel<T>* channel) {
-    for (int c = 0; c < processedChannels(layout); ++c)
-        if (channel[c].form != Form::step && channel[c].curve.count - 1 > kMostOnStack) return false;
-    return true;
+QorResult mapElements(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T>* channel) {
+    constexpr int processed = processedChannels(layout);
+    OwnedBlocks<3 * processed> blocks;
+    double onStack[processed][3][kMostOnStack<T>];
+    for (int i = 0; i < processed; ++i) {
+        if (channel[i].form == Form::step) continue;
+        Curve<Level<T>>& curve = channel[i].curve;
+        const int32_t intervals = curve.count - 1;
+        const bool fits = !std::is_floating_point_v<T> && intervals <= kMostOnStack<T>;
+        for (int power = 0; power < (curve.isCubic ? 3 : 1); ++power)
+            curve.c[power] =
+                fits ? onStack[i][power] : blocks.template add<double>(int64_t{intervals} * elementBytes<double>);
+    }
+    if (QorResult r = blocks.check()) return r;
+    for (int i = 0; i < processed; ++i)
+        if (channel[i].form != Form::step) kernels::fillPolynomials(channel[i].curve);
+    mapBySearch<layout>(src, dst, roi, channel);
+    return QOR_OK;
 }
 
 template <Layout layout, class T>
 QorResult mapWords(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T>* channel, Form form) {
     constexpr int32_t mostOverTable = 12;  // levels that are compared in less time than a table is looked up
-    if (form == Form::step &&
-        isFewSteps<layout>(channel, isSmall(roi, form) ? kernels::kMostFewSteps : mostOverTable)) {
+    const bool small = isSmall(roi, form);
+    if (form == Form::step && isFewSteps<layout>(channel, small ? kernels::kMostFewSteps : mostOverTable)) {
         mapFewSteps<layout>(src, dst, roi, channel);
         return QOR_OK;
     }
-    if (!isSmall(roi, form) || !fitsOnStack<layout>(channel)) return mapWordsByTable<layout>(src, dst, roi, channel);
-    double c[processedChannels(layout)][3][kMostOnStack];
-    for (int i = 0; form != Form::step && i < processedChannels(layout); ++i) {
-        for (int power = 0; power < 3; ++power) channel[i].curve.c[power] = c[i][power];
-        kernels::fillPolynomials(channel[i].curve);
-    }
-    mapBySearch<layout>(src, dst, roi, channel);
-    return QOR_OK;
+    return small ? mapElements<layout>(src, dst, roi, channel) : mapWordsByTable<layout>(src, dst, roi, channel);
 }
 
 template <Layout layout>
@@ -194,17 +203,7 @@ QorResult mapFloats(Image<const float> src, Image<float> dst, QorImageSize roi, 
         mapFewSteps<layout>(src, dst, roi, channel);
         return QOR_OK;
     }
-    OwnedBlocks<3 * processedChannels(layout)> blocks;
-    for (int i = 0; form != Form::step && i < processedChannels(layout); ++i) {
-        Curve<float>& curve = channel[i].curve;
-        for (int power = 0; power < (curve.isCubic ? 3 : 1); ++power)
-            curve.c[power] = blocks.template add<double>(int64_t{curve.count - 1} * elementBytes<double>);
-    }
-    if (QorResult r = blocks.check()) return r;
-    for (int i = 0; form != Form::step && i < processedChannels(layout); ++i)
-        kernels::fillPolynomials(channel[i].curve);
-    mapBySearch<layout>(src, dst, roi, channel);
-    return QOR_OK;
+    return mapElements<layout>(src, dst, roi, channel);
 }
 
 /// Checked arguments. Cubics of fewer than four levels are straight lines.

@@ -380,8 +380,16 @@ TEST_F(LutStatus, EachAllocationFails) {
     failEach(dst_, 0, real(qoriLUT_32f_C3R));
     failEach(dst_, 3, real(qoriLUT_Linear_32f_C3R));
     failEach(dst_, 3 + 3 + 1, real(qoriLUT_Cubic_32f_AC4R));  // the third channel has three levels
-    std::vector<int32_t> many(40);
+    std::vector<int32_t> many(200);
     std::iota(many.begin(), many.end(), 0);
+    const auto small = [&](int32_t count) {
+        return [=, this] {
+            return call(qoriLUT_Cubic_16u_C1R, static_cast<const uint16_t*>(src_.data<uint16_t>()), 8,
+                        dst_.data<uint16_t>(), 8, QorImageSize{4, 4}, many.data(), many.data(), count);
+        };
+    };
+    failEach(dst_, 0, small(129));
+    failEach(dst_, 3, small(130));
     failEach(dst_, 1, [&] {
         return call(qoriLUT_16s_C1R, src_.data<int16_t>(), 280, dst_.data<int16_t>(), 280, kRoi, many.data(),
                     many.data(), 40);
