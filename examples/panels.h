@@ -20,6 +20,7 @@ std::span<const Panel> borderPanels();
 std::span<const Panel> filterPanels();
 std::span<const Panel> resizePanels();
 std::span<const Panel> statsPanels();
+std::span<const Panel> tablePanels();
 std::span<const Panel> thresholdPanels();
 
 }  // namespace demo

@@ -3333,6 +3333,296 @@ QORI_API QorResult QORI_CALL qoriHistogram_32f_C3R(const float* pSrc, int32_t sr
 QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
     int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
 
+/* ---- Tables by levels ----------------------------------------------------------------------------------------- */
+
+/** Maps intervals to constants: dst = pValues[k] where pLevels[k] <= src < pLevels[k + 1], else src.
+ *  Shapes    pLevels and pValues hold nLevels entries; interval k reaches from pLevels[k] up to, not including,
+ *            pLevels[k + 1], and the last value only ends the last interval. C3, C4 and AC4 take arrays of one
+ *            pointer per processed channel, and of one count: 4, or 3 for C3 and for AC4, which keeps channel 3
+ *            of the destination.
+ *  Elements  Integers: levels may lie outside the elements' range, and values saturate to it. 32f: no
+ *            comparison with NaN holds, so that NaN stays, and so does what is in no interval, bit for bit;
+ *            levels may be infinite.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     Levels should ascend, equal ones allowed: then each element is in one interval at most, and the
+ *            cost grows with the logarithm of their number. In any other order an interval whose upper level is
+ *            not above its lower one holds nothing; where several hold an element, the first one counts in 32f,
+ *            the last one in integers, and integers from the last level on stay. Results depend on neither the
+ *            image's size nor the caller's floating-point modes. 16-bit images of more than 4096 pixels with
+ *            more than 12 levels, or levels out of order, take a table of 128 KiB a channel from qorMalloc;
+ *            nothing else takes memory. AC4 may rewrite channel 3 with its own value: do not let another thread
+ *            write it during the call.
+ *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the
+ *            others QOR_ERR_NULL_PTR (a pointer is null), then channel by channel QOR_ERR_NULL_PTR (its pValues
+ *            or pLevels is null) and QOR_ERR_LUT_LEVELS (its nLevels below 2), then size, step and memory as
+ *            C1; then nothing is written.
+ *  Example   const int32_t levels[5] = {0, 64, 128, 192, 256}, values[5] = {32, 96, 160, 224, 0};   // four shades
+ *            qoriLUT_8u_C1R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, values, levels, 5);
+ */
+QORI_API QorResult QORI_CALL qoriLUT_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pValues, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* pValues, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+
+/** Maps intervals to straight lines from pValues[k] at pLevels[k] to pValues[k + 1] at pLevels[k + 1]; else dst
+ *  = src.
+ *  Shapes    pLevels and pValues hold nLevels entries; interval k reaches from pLevels[k] up to, not including,
+ *            pLevels[k + 1], and the last value only ends the last interval. C3, C4 and AC4 take arrays of one
+ *            pointer per processed channel, and of one count: 4, or 3 for C3 and for AC4, which keeps channel 3
+ *            of the destination.
+ *  Elements  pValues[k] + (src - pLevels[k]) * slope in double precision, fused; the slope is (pValues[k + 1] -
+ *            pValues[k]) / (pLevels[k + 1] - pLevels[k]), of differences that are rounded to single precision
+ *            in 32f. Integers are truncated towards zero and saturate. 32f: NaN stays, and an interval with an
+ *            infinite end gives what the formula gives.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     Levels should ascend, equal ones allowed. In any other order an interval whose upper level is not
+ *            above its lower one holds nothing; where several hold an element, the first one counts in 32f, the
+ *            last one in integers. Results depend on neither the image's size nor the caller's floating-point
+ *            modes. Memory is taken from qorMalloc: 32f, and 16 bits with more than 129 levels, 8 bytes an
+ *            interval and channel; 16 bits of more than 8192 pixels, 128 KiB a channel. AC4 may rewrite channel
+ *            3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the
+ *            others QOR_ERR_NULL_PTR (a pointer is null), then channel by channel QOR_ERR_NULL_PTR (its pValues
+ *            or pLevels is null) and QOR_ERR_LUT_LEVELS (its nLevels below 2), then size, step and memory as
+ *            C1; then nothing is written.
+ *  Example   const float levels[3] = {0, 0.5f, 1}, values[3] = {0, 0.8f, 1};   // brighter middle tones
+ *            qoriLUT_Linear_32f_C1IR(picture, step, (QorImageSize){640, 480}, values, levels, 3);
+ */
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4],
+    const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4],
+    const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pValues, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* pValues, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+
+/** Maps intervals to cubics through the nodes (pLevels, pValues) around them; else dst = src.
+ *  Shapes    pLevels and pValues hold nLevels entries; interval k reaches from pLevels[k] up to, not including,
+ *            pLevels[k + 1], and the last value only ends the last interval. C3, C4 and AC4 take arrays of one
+ *            pointer per processed channel, and of one count: 4, or 3 for C3 and for AC4, which keeps channel 3
+ *            of the destination.
+ *  Elements  Interval k takes the cubic through nodes j to j + 3, j = k - 1 but at least 0 and at most nLevels
+ *            - 4, so that neighbours meet in the nodes. It is solved by Cramer's rule and evaluated by fused
+ *            operations, as differences from node a = j + 1: pValues[a] + d * (c1 + d * (c2 + d * c3)) with d =
+ *            src - pLevels[a], in double precision. Integers are rounded by adding 0.5 and truncating towards
+ *            zero, and saturate. Fewer than 4 levels: exactly qoriLUT_Linear, channel by channel. Where levels
+ *            of the four nodes are equal no such cubic exists: the parabola through node a and the ends of the
+ *            interval instead, or the straight line where node a is one of the ends. 32f: NaN stays, and an
+ *            infinite level among the four nodes gives what the formula gives.
+ *  Units     Steps in bytes, at least 1; roiSize in pixels.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps are undefined.
+ *  Notes     Levels should ascend. In any other order an interval whose upper level is not above its lower one
+ *            holds nothing; where several hold an element, the first one counts in 32f, the last one in
+ *            integers. Results depend on neither the image's size nor the caller's floating-point modes. Memory
+ *            is taken from qorMalloc: 32f, and 16 bits with more than 129 levels, three times 8 bytes an
+ *            interval and channel; 16 bits of more than 8192 pixels, 128 KiB a channel. AC4 may rewrite channel
+ *            3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the
+ *            others QOR_ERR_NULL_PTR (a pointer is null), then channel by channel QOR_ERR_NULL_PTR (its pValues
+ *            or pLevels is null) and QOR_ERR_LUT_LEVELS (its nLevels below 2), then size, step and memory as
+ *            C1; then nothing is written.
+ *  Example   const int32_t levels[4] = {0, 64, 192, 256}, values[4] = {0, 40, 216, 256};   // a gentle S: more contrast
+ *            const int32_t *allLevels[3] = {levels, levels, levels}, *allValues[3] = {values, values, values}, counts[3] = {4, 4, 4};
+ *            qoriLUT_Cubic_8u_C3R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, allValues, allLevels, counts);
+ */
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* pValues, const int32_t* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4],
+    const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[4], const int32_t* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const int32_t* const pValues[3], const int32_t* const pLevels[3],
+    const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const int32_t* const pValues[3], const int32_t* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* pValues, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* pValues, const float* pLevels, int32_t nLevels);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[4], const float* const pLevels[4], const int32_t nLevels[4]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+
 /* ---- Image memory --------------------------------------------------------------------------------------------- */
 
 /** Allocates an image whose rows start on 64-byte boundaries.
@@ -4248,6 +4538,121 @@ QORI_API QorResult QORI_CALL qoriDotProdCol_64f_L2(const double* const* ppSrcRow
  */
 QORI_API QorResult QORI_CALL qoriComputeThreshold_Otsu_8u_C1R(const uint8_t* pSrc, int32_t srcStep,
     QorImageSize roiSize, uint8_t* pThreshold);
+
+/* ---- Palettes ------------------------------------------------------------------------------------------------- */
+
+/** Looks elements up in a palette: dst = pTable[src AND (2^nBitSize - 1)].
+ *  Shapes    pTable: 2^nBitSize entries of the destination's type; no other is read.
+ *  Elements  Higher bits of the source are ignored.
+ *  Units     Steps in bytes, at least those of a row; roiSize in pixels. nBitSize: 1 to 8 for 8u sources, 1 to
+ *            16 for 16u.
+ *  Aliasing  Source and destination of one type may be the same (same pointer and step). Other overlaps, the
+ *            table among them, are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_OUT_OF_RANGE (nBitSize below 1 or above the bits of a source element), QOR_ERR_STEP (a
+ *            step below the bytes of a row); then nothing is written.
+ *  Example   const uint32_t inks[4] = {0xFFFFFFFF, 0xFF2040C0, 0xFF20A060, 0xFF101010};
+ *            qoriLUTPalette_8u32u_C1R(indexes, indexStep, picture, pictureStep, (QorImageSize){640, 480}, inks, 2);
+ */
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pTable, int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t* pTable, int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u32u_C1R(const uint8_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint32_t* pTable, int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u8u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t* pTable, int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u32u_C1R(const uint16_t* pSrc, int32_t srcStep, uint32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint32_t* pTable, int32_t nBitSize);
+
+/** Looks elements up in a palette of three bytes an entry: dst = pTable[src AND (2^nBitSize - 1)].
+ *  Shapes    pTable: 2^nBitSize entries of three bytes; the destination has three bytes a pixel, as 8u C3
+ *            images have.
+ *  Elements  Higher bits of the source are ignored.
+ *  Units     Steps in bytes, at least those of a row; roiSize in pixels. nBitSize: 1 to 8 for 8u sources, 1 to
+ *            16 for 16u.
+ *  Aliasing  Source, destination and table must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_OUT_OF_RANGE (nBitSize below 1 or above the bits of a source element), QOR_ERR_STEP (a
+ *            step below the bytes of a row); then nothing is written.
+ *  Example   const uint8_t inks[3 * 2] = {250, 245, 230, 20, 20, 60};   // paper and ink
+ *            qoriLUTPalette_8u24u_C1R(bits, bitStep, picture, pictureStep, (QorImageSize){640, 480}, inks, 1);
+ */
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u24u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t* pTable, int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u24u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t* pTable, int32_t nBitSize);
+
+/** Looks each channel up in a palette of its own.
+ *  Shapes    pTable: one pointer per processed channel, to 2^nBitSize entries each: 4, or 3 for C3 and for AC4,
+ *            which keeps channel 3 of the destination. The pointers may be equal.
+ *  Elements  Higher bits of the source are ignored.
+ *  Units     Steps in bytes, at least those of a row; roiSize in pixels. nBitSize: 1 to 8 for 8u sources, 1 to
+ *            16 for 16u.
+ *  Aliasing  The destination may be the source (same pointer and step); other overlaps, the tables among them,
+ *            are undefined.
+ *  Notes     AC4 may rewrite channel 3 with its own value: do not let another thread write it during the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_NULL_PTR (an entry of the array pTable is null), QOR_ERR_OUT_OF_RANGE (nBitSize below
+ *            1 or above the bits of a source element), QOR_ERR_STEP (a step below the bytes of a row); then
+ *            nothing is written.
+ *  Example   const uint8_t* const curves[3] = {warmRed, sameGreen, coolBlue};
+ *            qoriLUTPalette_8u_C3R(src, srcStep, dst, dstStep, (QorImageSize){640, 480}, curves, 8);
+ */
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* const pTable[3], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* const pTable[4], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint8_t* const pTable[3], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t* const pTable[3], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t* const pTable[4], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, const uint16_t* const pTable[3], int32_t nBitSize);
+
+/** Looks three channels up in palettes of their own and puts alpha before them.
+ *  Shapes    pTable: three pointers, to 2^nBitSize entries each. dst pixels: alpha, channel 0, channel 1,
+ *            channel 2.
+ *  Elements  Higher bits of the source are ignored. An alphaValue that is no element of the destination, -1 for
+ *            example, leaves its alpha as it was.
+ *  Units     Steps in bytes, at least those of a row; roiSize in pixels. nBitSize: 1 to 8 for 8u sources, 1 to
+ *            16 for 16u.
+ *  Aliasing  Source, destination and tables must not overlap.
+ *  Notes     Alpha that stays may be rewritten with its own value: do not let another thread write it during
+ *            the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_NULL_PTR (an entry of the array pTable is null), QOR_ERR_OUT_OF_RANGE (nBitSize below
+ *            1 or above the bits of a source element), QOR_ERR_STEP (a step below the bytes of a row); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLUTPalette_8u_C3A0C4R(const uint8_t* pSrc, int32_t srcStep, int32_t alphaValue,
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, const uint8_t* const pTable[3], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPalette_16u_C3A0C4R(const uint16_t* pSrc, int32_t srcStep, int32_t alphaValue,
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, const uint16_t* const pTable[3], int32_t nBitSize);
+
+/** Looks three channels up in palettes of their own, reverses them and puts alpha behind.
+ *  Shapes    pTable: three pointers, to 2^nBitSize entries each. dst pixels: channel 2, channel 1, channel 0,
+ *            alpha.
+ *  Elements  Higher bits of the source are ignored. An alphaValue that is no element of the destination, -1 for
+ *            example, leaves its alpha as it was.
+ *  Units     Steps in bytes, at least those of a row; roiSize in pixels. nBitSize: 1 to 8 for 8u sources, 1 to
+ *            16 for 16u.
+ *  Aliasing  Source, destination and tables must not overlap.
+ *  Notes     Alpha that stays may be rewritten with its own value: do not let another thread write it during
+ *            the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_NULL_PTR (an entry of the array pTable is null), QOR_ERR_OUT_OF_RANGE (nBitSize below
+ *            1 or above the bits of a source element), QOR_ERR_STEP (a step below the bytes of a row); then
+ *            nothing is written.
+ *  Example   const uint8_t* const same[3] = {identity, identity, identity};
+ *            qoriLUTPaletteSwap_8u_C3A0C4R(rgb, rgbStep, 255, bgra, bgraStep, (QorImageSize){640, 480}, same, 8);
+ */
+QORI_API QorResult QORI_CALL qoriLUTPaletteSwap_8u_C3A0C4R(const uint8_t* pSrc, int32_t srcStep, int32_t alphaValue,
+    uint8_t* pDst, int32_t dstStep, QorImageSize roiSize, const uint8_t* const pTable[3], int32_t nBitSize);
+QORI_API QorResult QORI_CALL qoriLUTPaletteSwap_16u_C3A0C4R(const uint16_t* pSrc, int32_t srcStep, int32_t alphaValue,
+    uint16_t* pDst, int32_t dstStep, QorImageSize roiSize, const uint16_t* const pTable[3], int32_t nBitSize);
 
 /* ---- Resize --------------------------------------------------------------------------------------------------- */
 
