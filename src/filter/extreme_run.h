@@ -1,0 +1,295 @@
+// SPDX-License-Identifier: Apache-2.0
+// Smallest and largest elements of windows over a region, from top to bottom and row by row. Two ways, by the cover:
+//
+//     rectangles   Rows are joined with themselves until an element is the extreme of a rectangle's width; these rows
+//                  enter a block of the rectangle's height, in which the extremes of its first rows are kept as they
+//                  come and, once it is full, those of its last rows are made backwards: a window is the last rows of
+//                  one block and the first of the next, whatever the height (van Herk 1992; Gil, Werman 1993).
+//     taps         Levels of a row are the row joined with itself to 2, 4, 8 ... pixels; all taps of a pixel are
+//     joined.
+//
+// In place and for floats, source rows are copied, the latter as keys; else they are read where they are.
+#pragma once
+#include "frame/plan.h"
+#include "frame/row_window.h"
+#include "kernels/copy_rows.h"
+#include "kernels/morphology/joins.h"
+#include "window_cover.h"
+
+namespace qori::filter {
+
+template <class T>
+struct ExtremeTask {
+    Image<const T> src;
+    Image<T> dst;
+    QorImageSize roi;
+    int32_t channels;
+    bool keepAlpha;
+    bool isInPlace;
+    Window window;
+    WindowCover cover;
+
+    ptrdiff_t elements(int64_t pixels) const { return static_cast<ptrdiff_t>(pixels * channels); }
+    /// The task of some of its columns.
+    ExtremeTask columns(int32_t x, int32_t width) const {
+        ExtremeTask part = *this;
+        part.src.data += elements(x);
+        part.dst.data += elements(x);
+        part.roi.width = width;
+        return part;
+    }
+};
+
+/// Rows of T, by their number in the ring.
+template <class T>
+struct ElementRows {
+    RowRing ring{};
+
+    void take(WorkBuffer& work, int64_t elements, int32_t rows) {
+        constexpr int64_t lanes = 32 / static_cast<int64_t>(sizeof(T));
+        const int64_t padded = roundUp(elements, lanes);
+        ring = {reinterpret_cast<uint8_t*>(work.take<T>(padded * rows)), padded * static_cast<int64_t>(sizeof(T)),
+                rows};
+    }
+    T* row(int32_t slot) const { return reinterpret_cast<T*>(ring.row(slot)); }
+};
+
+/// Source rows as joins want them, from the box's first column on. For the destination row y those of y + lowest to
+/// y + highest are there.
+template <class Order, bool keyed>
+class SourceRows {
+public:
+    using T = typename Order::Element;
+
+    SourceRows(const ExtremeTask<T>& task, int32_t lowest, bool isKept, WorkBuffer& work)
+        : task_(task), entered_(task.cover.box.y), isKept_(isKept || keyed) {
+        const int32_t highest = task.cover.lastRow();
+        ahead_ = task.isInPlace && highest < 0 ? 0 : highest;
+        elements_ = task.elements(int64_t{task.roi.width} + task.cover.box.width - 1);
+        if (isKept_) rows_.take(work, elements_, ahead_ - lowest + 1);
+    }
+
+    /// Before the destination's row y is written; copies what later rows see of it. Calls entered(row) for each.
+    template <class Entered>
+    void enter(int32_t y, Entered entered) {
+        const int32_t lastSeen = task_.roi.height - 1 + task_.cover.lastRow();
+        for (; entered_ <= y + ahead_ && entered_ <= lastSeen; ++entered_) {
+            if (isKept_) copy(entered_);
+            entered(entered_);
+        }
+    }
+    const T* row(int32_t y) const {
+        return isKept_ ? rows_.row((y - task_.cover.box.y) % rows_.ring.rows) : inImage(y);
+    }
+
+private:
+    const T* inImage(int32_t y) const { return task_.src.row(y) + ptrdiff_t{task_.cover.box.x} * task_.channels; }
+    void copy(int32_t y) {
+        const T* const from = inImage(y);
+        T* const to = rows_.row((y - task_.cover.box.y) % rows_.ring.rows);
+        if constexpr (keyed)
+            kernels::join<Order, kernels::IntoKeys<Order>>(&from, 1, to, elements_);
+        else
+            kernels::copyRow(asBytes(to), asBytes(from), elements_ * elementBytes<T>);
+    }
+
+    const ExtremeTask<T>& task_;
+    ElementRows<T> rows_;
+    int32_t entered_, ahead_;
+    ptrdiff_t elements_;
+    bool isKept_;
+};
+
+/// Joins into a row of the destination.
+template <class Order, bool keyed, class T>
+void joinInto(const ExtremeTask<T>& task, int32_t y, const T* const* taps, int count) {
+    using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
+    const ptrdiff_t elements = task.elements(task.roi.width);
+    if (task.keepAlpha)
+        kernels::join<Order, Finish, true>(taps, count, task.dst.row(y), elements);
+    else
+        kernels::join<Order, Finish>(taps, count, task.dst.row(y), elements);
+}
+
+// --- rectangles -----------------------------------------------------------------------------------------------------
+
+/// The extremes of a rectangle, a row at a time.
+template <class Order>
+class RunningRect {
+public:
+    using T = typename Order::Element;
+
+    void take(const QorImageRect& rect, ptrdiff_t elements, WorkBuffer& work) {
+        rect_ = rect;
+        elements_ = elements;
+        block_.take(work, elements, rect.height);
+        first_.take(work, elements, 1);
+    }
+    /// The source row that completes the rectangles of destination row y.
+    int32_t rowFor(int32_t y) const { return y + rect_.y + rect_.height - 1; }
+    const QorImageRect& rect() const { return rect_; }
+    T* entering() { return block_.row(phase_); }
+
+    /// What entering() holds has come. Returns the number of rows, one or two, that make the rectangles it completes.
+    int enter(const T** taps) {
+        if (phase_ == 0) {
+            soFar_ = block_.row(0);
+        } else {
+            const T* const both[] = {soFar_, block_.row(phase_)};
+            kernels::join<Order>(both, 2, first_.row(0), elements_);
+            soFar_ = first_.row(0);
+        }
+        taps[0] = soFar_;
+        if (phase_ + 1 == rect_.height) return 1;
+        taps[1] = block_.row(phase_ + 1);
+        return 2;
+    }
+    /// After use of the rows that enter() named.
+    void advance() {
+        if (++phase_ < rect_.height) return;
+        phase_ = 0;
+        for (int32_t k = rect_.height - 2; k > 0; --k) {
+            const T* const both[] = {block_.row(k), block_.row(k + 1)};
+            kernels::join<Order>(both, 2, block_.row(k), elements_);
+        }
+    }
+
+private:
+    QorImageRect rect_{};
+    ptrdiff_t elements_ = 0;
+    ElementRows<T> block_, first_;
+    const T* soFar_ = nullptr;
+    int32_t phase_ = 0;
+};
+
+template <class Order, bool keyed>
+class RectRun {
+public:
+    using T = typename Order::Element;
+
+    RectRun(const ExtremeTask<T>& task, WorkBuffer& work)
+        : task_(task), source_(task, lowestRow(task.cover), isKept(task), work) {
+        const ptrdiff_t elements = task.elements(task.roi.width);
+        int32_t widest = 1;
+        for (int k = 0; k < task.cover.rects; ++k) {
+            running_[k].take(task.cover.rect[k], elements, work);
+            widening_[k] = Widening::to(task.cover.rect[k].width);
+            widest = std::max(widest, task.cover.rect[k].width);
+        }
+        wider_.take(work, task.elements(int64_t{task.roi.width} + widest - 1), 2);
+    }
+
+    void run() {
+        int32_t first = 0;
+        for (int k = 0; k < task_.cover.rects; ++k) first = std::min(first, 1 - task_.cover.rect[k].height);
+        for (int32_t y = first; y < task_.roi.height; ++y) {
+            source_.enter(y, [](int32_t) {});
+            const T* taps[2 * WindowCover::kMostRects];
+            int count = 0;
+            for (int k = 0; k < task_.cover.rects; ++k)
+                if (y + task_.cover.rect[k].height > 0) count += enter(k, y, taps + count);
+            if (y >= 0) joinInto<Order, keyed>(task_, y, taps, count);
+            for (int k = 0; k < task_.cover.rects; ++k)
+                if (y + task_.cover.rect[k].height > 0) running_[k].advance();
+        }
+    }
+
+private:
+    static int32_t lowestRow(const WindowCover& cover) {
+        int32_t lowest = INT32_MAX;
+        for (int k = 0; k < cover.rects; ++k) lowest = std::min(lowest, cover.rect[k].y + cover.rect[k].height - 1);
+        return lowest;
+    }
+    /// In place, a row is read once, before it is written, where all rectangles end with it and not above their pixel.
+    static bool isKept(const ExtremeTask<T>& task) {
+        return task.isInPlace && (task.cover.lastRow() < 0 || lowestRow(task.cover) < task.cover.lastRow());
+    }
+
+    int enter(int k, int32_t y, const T** taps) {
+        RunningRect<Order>& running = running_[k];
+        const T* const row = source_.row(running.rowFor(y));
+        widen(row + task_.elements(running.rect().x - task_.cover.box.x), running.rect().width, widening_[k],
+              running.entering());
+        return running.enter(taps);
+    }
+
+    void widen(const T* row, int32_t width, Widening widening, T* to) {
+        int32_t has = 1;
+        for (int32_t pass = 0;; ++pass) {
+            const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening.radix, width));
+            const int count = (next - 1) / has + 1;
+            const T* taps[kMostRadix];
+            for (int i = 0; i < count; ++i) taps[i] = row + task_.elements(std::min(i * has, next - has));
+            T* const out = next == width ? to : wider_.row(pass % 2);
+            kernels::join<Order>(taps, count, out, task_.elements(int64_t{task_.roi.width} + width - next));
+            if (next == width) return;
+            row = out;
+            has = next;
+        }
+    }
+
+    static constexpr int kMostRadix = 16;  ///< Beyond 8, two passes cost less than one.
+
+    const ExtremeTask<T>& task_;
+    SourceRows<Order, keyed> source_;
+    RunningRect<Order> running_[WindowCover::kMostRects];
+    Widening widening_[WindowCover::kMostRects]{};
+    ElementRows<T> wider_;
+};
+
+// --- taps -----------------------------------------------------------------------------------------------------------
+
+template <class Order, bool keyed>
+class TapRun {
+public:
+    using T = typename Order::Element;
+
+    TapRun(const ExtremeTask<T>& task, WorkBuffer& work)
+        : task_(task), source_(task, task.cover.box.y, task.isInPlace, work) {
+        taps_ = work.take<Tap>(task.cover.taps);
+        rows_ = work.take<const T*>(task.cover.taps);
+        const int32_t ahead = task.isInPlace ? std::max(task.cover.lastRow(), 0) : task.cover.lastRow();
+        for (int32_t level = 1; level <= task.cover.levels; ++level)
+            level_[level].take(work, task.elements(widthOf(level)), ahead - task.cover.box.y + 1);
+    }
+
+    void run() {
+        Tap* next = taps_;
+        forEachTap(task_.window, task_.cover.levels > 0, [&](Tap tap) { *next++ = tap; });
+        for (int32_t y = 0; y < task_.roi.height; ++y) {
+            source_.enter(y, [this](int32_t row) { raise(row); });
+            for (int64_t k = 0; k < task_.cover.taps; ++k) {
+                const Tap tap = taps_[k];
+                rows_[k] = rowOf(tap.level, y + tap.y) + task_.elements(tap.x - task_.cover.box.x);
+            }
+            joinInto<Order, keyed>(task_, y, rows_, static_cast<int>(task_.cover.taps));
+        }
+    }
+
+private:
+    static constexpr int kMostLevels = 31;
+
+    int64_t widthOf(int32_t level) const {
+        return int64_t{task_.roi.width} + task_.cover.box.width - (int64_t{1} << level);
+    }
+    const T* rowOf(int32_t level, int32_t y) const {
+        if (level == 0) return source_.row(y);
+        return level_[level].row((y - task_.cover.box.y) % level_[level].ring.rows);
+    }
+    /// Makes the levels of a source row.
+    void raise(int32_t y) {
+        for (int32_t level = 1; level <= task_.cover.levels; ++level) {
+            const T* const lower = rowOf(level - 1, y);
+            const T* const both[] = {lower, lower + task_.elements(int64_t{1} << (level - 1))};
+            kernels::join<Order>(both, 2, const_cast<T*>(rowOf(level, y)), task_.elements(widthOf(level)));
+        }
+    }
+
+    const ExtremeTask<T>& task_;
+    SourceRows<Order, keyed> source_;
+    ElementRows<T> level_[kMostLevels];
+    Tap* taps_;
+    const T** rows_;
+};
+
+}  // namespace qori::filter
