@@ -3612,8 +3612,8 @@ QORI_API QorResult QORI_CALL qoriMirror_32f_AC4IR(float* pSrcDst, int32_t srcDst
 /** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel.
  *  Shapes    pSrc points at the region's first pixel inside a source: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  pSrc == pDst with equal steps runs the in-place form with its checks, before any other. Otherwise
  *            the source, with the neighbours that are read, must not overlap the destination.
@@ -3653,8 +3653,8 @@ QORI_API QorResult QORI_CALL qoriErode3x3_64f_C1R(const double* pSrc, int32_t sr
 /** Erosion by the 3 x 3 square in place.
  *  Shapes    pSrcDst points at the region's first pixel inside an image: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
  *  Notes     Takes two rows of memory from qorMalloc for the duration of the call.
@@ -3678,8 +3678,8 @@ QORI_API QorResult QORI_CALL qoriErode3x3_32f_AC4IR(float* pSrcDst, int32_t srcD
 /** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel.
  *  Shapes    pSrc points at the region's first pixel inside a source: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  pSrc == pDst with equal steps runs the in-place form with its checks, before any other. Otherwise
  *            the source, with the neighbours that are read, must not overlap the destination.
@@ -3717,8 +3717,8 @@ QORI_API QorResult QORI_CALL qoriDilate3x3_64f_C1R(const double* pSrc, int32_t s
 /** Dilation by the 3 x 3 square in place.
  *  Shapes    pSrcDst points at the region's first pixel inside an image: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
  *  Notes     Takes two rows of memory from qorMalloc for the duration of the call.
