@@ -122,43 +122,40 @@ public:
     void take(const QorImageRect& rect, ptrdiff_t elements, WorkBuffer& work) {
         rect_ = rect;
         elements_ = elements;
+        widening_ = Widening::to(rect.width);
         block_.take(work, elements, rect.height);
         first_.take(work, elements, 1);
     }
+    const QorImageRect& rect() const { return rect_; }
+    Widening widening() const { return widening_; }
     /// The source row that completes the rectangles of destination row y.
     int32_t rowFor(int32_t y) const { return y + rect_.y + rect_.height - 1; }
-    const QorImageRect& rect() const { return rect_; }
-    T* entering() { return block_.row(phase_); }
 
-    /// What entering() holds has come. Returns the number of rows, one or two, that make the rectangles it completes.
-    int enter(const T** taps) {
-        if (phase_ == 0) {
-            soFar_ = block_.row(0);
-        } else {
-            const T* const both[] = {soFar_, block_.row(phase_)};
-            kernels::join<Order>(both, 2, first_.row(0), elements_);
-            soFar_ = first_.row(0);
-        }
-        taps[0] = soFar_;
-        if (phase_ + 1 == rect_.height) return 1;
-        taps[1] = block_.row(phase_ + 1);
-        return 2;
+    /// What the next row meets; `elsewhere` may be null.
+    kernels::BlockRows<T> meeting(const T* elsewhere, T* to) const {
+        T* const entering = block_.row(phase_);
+        return {entering,
+                phase_ == 0 ? entering : first_.row(0),
+                first_.row(0),
+                phase_ + 1 == rect_.height ? entering : block_.row(phase_ + 1),
+                elsewhere == nullptr ? entering : elsewhere,
+                to};
     }
-    /// After use of the rows that enter() named.
+    /// The row has entered.
     void advance() {
         if (++phase_ < rect_.height) return;
         phase_ = 0;
-        for (int32_t k = rect_.height - 2; k > 0; --k) {
-            const T* const both[] = {block_.row(k), block_.row(k + 1)};
-            kernels::join<Order>(both, 2, block_.row(k), elements_);
-        }
+        if (rect_.height > 2)
+            kernels::joinBlockUpwards<Order>(block_.row(rect_.height - 1),
+                                             static_cast<ptrdiff_t>(block_.ring.rowBytes) / elementBytes<T>,
+                                             rect_.height - 1, elements_);
     }
 
 private:
     QorImageRect rect_{};
+    Widening widening_{};
     ptrdiff_t elements_ = 0;
     ElementRows<T> block_, first_;
-    const T* soFar_ = nullptr;
     int32_t phase_ = 0;
 };
 
@@ -169,28 +166,23 @@ public:
 
     RectRun(const ExtremeTask<T>& task, WorkBuffer& work)
         : task_(task), source_(task, lowestRow(task.cover), isKept(task), work) {
-        const ptrdiff_t elements = task.elements(task.roi.width);
+        elements_ = task.elements(task.roi.width);
         int32_t widest = 1;
         for (int k = 0; k < task.cover.rects; ++k) {
-            running_[k].take(task.cover.rect[k], elements, work);
-            widening_[k] = Widening::to(task.cover.rect[k].width);
+            running_[k].take(task.cover.rect[k], elements_, work);
             widest = std::max(widest, task.cover.rect[k].width);
         }
         wider_.take(work, task.elements(int64_t{task.roi.width} + widest - 1), 2);
+        joined_.take(work, elements_, 1);
     }
 
     void run() {
-        int32_t first = 0;
-        for (int k = 0; k < task_.cover.rects; ++k) first = std::min(first, 1 - task_.cover.rect[k].height);
-        for (int32_t y = first; y < task_.roi.height; ++y) {
+        int32_t tallest = 1;
+        for (int k = 0; k < task_.cover.rects; ++k) tallest = std::max(tallest, task_.cover.rect[k].height);
+        for (int32_t y = 1 - tallest; y < task_.roi.height; ++y) {
             source_.enter(y, [](int32_t) {});
-            const T* taps[2 * WindowCover::kMostRects];
-            int count = 0;
             for (int k = 0; k < task_.cover.rects; ++k)
-                if (y + task_.cover.rect[k].height > 0) count += enter(k, y, taps + count);
-            if (y >= 0) joinInto<Order, keyed>(task_, y, taps, count);
-            for (int k = 0; k < task_.cover.rects; ++k)
-                if (y + task_.cover.rect[k].height > 0) running_[k].advance();
+                if (y + task_.cover.rect[k].height > 0) enter(k, y);
         }
     }
 
@@ -200,29 +192,41 @@ private:
         for (int k = 0; k < cover.rects; ++k) lowest = std::min(lowest, cover.rect[k].y + cover.rect[k].height - 1);
         return lowest;
     }
-    /// In place, a row is read once, before it is written, where all rectangles end with it and not above their pixel.
+    /// In place, rows need no copy where all rectangles end in the same row, below that of their pixel.
     static bool isKept(const ExtremeTask<T>& task) {
-        return task.isInPlace && (task.cover.lastRow() < 0 || lowestRow(task.cover) < task.cover.lastRow());
+        return task.isInPlace && (task.cover.lastRow() <= 0 || lowestRow(task.cover) < task.cover.lastRow());
     }
 
-    int enter(int k, int32_t y, const T** taps) {
+    /// The next row of a rectangle enters, and is joined with what the rectangles before it made; of the last one comes
+    /// the destination. Nobody wants what comes before its first row.
+    void enter(int k, int32_t y) {
         RunningRect<Order>& running = running_[k];
-        const T* const row = source_.row(running.rowFor(y));
-        widen(row + task_.elements(running.rect().x - task_.cover.box.x), running.rect().width, widening_[k],
-              running.entering());
-        return running.enter(taps);
+        const T* const row = source_.row(running.rowFor(y)) + task_.elements(running.rect().x - task_.cover.box.x);
+        const T* taps[kMostRadix];
+        const int count = widen(row, running.rect().width, running.widening(), taps);
+        T* const joined = joined_.row(0);
+        const bool isLast = k + 1 == task_.cover.rects;
+        const auto rows = running.meeting(k > 0 ? joined : nullptr, isLast && y >= 0 ? task_.dst.row(y) : joined);
+        using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
+        if (!isLast || y < 0)
+            kernels::enterBlock<Order, kernels::AsIs, false>(taps, count, rows, elements_);
+        else if (task_.keepAlpha)
+            kernels::enterBlock<Order, Finish, true>(taps, count, rows, elements_);
+        else
+            kernels::enterBlock<Order, Finish, false>(taps, count, rows, elements_);
+        running.advance();
     }
 
-    void widen(const T* row, int32_t width, Widening widening, T* to) {
+    /// Joins a row with itself, but for the last pass, whose taps it sets; returns their number.
+    int widen(const T* row, int32_t width, Widening widening, const T** taps) {
         int32_t has = 1;
         for (int32_t pass = 0;; ++pass) {
             const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening.radix, width));
             const int count = (next - 1) / has + 1;
-            const T* taps[kMostRadix];
             for (int i = 0; i < count; ++i) taps[i] = row + task_.elements(std::min(i * has, next - has));
-            T* const out = next == width ? to : wider_.row(pass % 2);
+            if (next == width) return count;
+            T* const out = wider_.row(pass % 2);
             kernels::join<Order>(taps, count, out, task_.elements(int64_t{task_.roi.width} + width - next));
-            if (next == width) return;
             row = out;
             has = next;
         }
@@ -233,8 +237,8 @@ private:
     const ExtremeTask<T>& task_;
     SourceRows<Order, keyed> source_;
     RunningRect<Order> running_[WindowCover::kMostRects];
-    Widening widening_[WindowCover::kMostRects]{};
-    ElementRows<T> wider_;
+    ElementRows<T> wider_, joined_;
+    ptrdiff_t elements_;
 };
 
 // --- taps -----------------------------------------------------------------------------------------------------------

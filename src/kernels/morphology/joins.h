@@ -156,4 +156,104 @@ void join(const T* const* row, int count, T* to, ptrdiff_t elements) {
     }
 }
 
+// --- blocks of rows -------------------------------------------------------------------------------------------------
+
+/// What becomes of a row that enters a block, element by element.
+template <class T>
+struct BlockRows {
+    T* entering;        ///< Becomes the joined taps.
+    const T* before;    ///< The join of the block's rows so far, or `entering` for the first.
+    T* soFar;           ///< Becomes that join with the row; may be `before`.
+    const T* lastRows;  ///< The join of the rows of the block before that the window has; `entering` where it has none.
+    const T* elsewhere;  ///< What else the window has; `entering` where that is nothing.
+    T* to;               ///< Becomes the finished join of all that the window has.
+};
+
+namespace detail {
+
+template <class Order, class Finish, bool keepAlpha, int vectors, class T, int fixed>
+QORI_INLINE void enterVectors(Taps<T, fixed> taps, const BlockRows<T>& rows, ptrdiff_t at) {
+    Vec<T> row[vectors];
+    joinVectors<Order, vectors>(taps, at, row);
+    // The row is stored before the others are loaded, which may be the same.
+    for (int v = 0; v < vectors; ++v) store(rows.entering + at + v * Vec<T>::lanes, row[v]);
+    for (int v = 0; v < vectors; ++v) {
+        const ptrdiff_t i = at + v * Vec<T>::lanes;
+        const Vec<T> soFar = Order::join(row[v], load(rows.before + i));
+        store(rows.soFar + i, soFar);
+        Vec<T> out = Order::join(soFar, load(rows.lastRows + i));
+        if (rows.elsewhere != rows.entering) out = Order::join(out, load(rows.elsewhere + i));
+        out = Finish::of(out);
+        if constexpr (keepAlpha) out = withAlphaOf(out, load(rows.to + i));
+        store(rows.to + i, out);
+    }
+}
+
+template <class Order, class Finish, bool keepAlpha, class T>
+QORI_NOINLINE void enterNarrow(const T* const* tap, int count, const BlockRows<T>& rows, ptrdiff_t elements) {
+    joinNarrow<Order, AsIs, false>(tap, count, rows.entering, elements);
+    const T* const both[] = {rows.entering, rows.before};
+    joinNarrow<Order, AsIs, false>(both, 2, rows.soFar, elements);
+    const T* const all[] = {rows.soFar, rows.lastRows, rows.elsewhere};
+    joinNarrow<Order, Finish, keepAlpha>(all, 3, rows.to, elements);
+}
+
+template <class Order, class Finish, bool keepAlpha, int fixed, class T>
+QORI_NOINLINE void enterRow(const T* const* tap, int count, BlockRows<T> rows, ptrdiff_t elements) {
+    constexpr ptrdiff_t n = Vec<T>::lanes;
+    constexpr int vectors = 4;
+    const Taps<T, fixed> taps{tap, count};
+    if (elements < n) return enterNarrow<Order, Finish, keepAlpha>(tap, taps.size(), rows, elements);
+    ptrdiff_t i = 0;
+    for (; i <= elements - vectors * n; i += vectors * n)
+        enterVectors<Order, Finish, keepAlpha, vectors>(taps, rows, i);
+    for (; i <= elements - n; i += n) enterVectors<Order, Finish, keepAlpha, 1>(taps, rows, i);
+    if (i < elements) enterVectors<Order, Finish, keepAlpha, 1>(taps, rows, elements - n);
+}
+
+}  // namespace detail
+
+/// A row, the join of taps, enters a block. The last vector overlaps the one before, as in join().
+template <class Order, class Finish, bool keepAlpha, class T>
+void enterBlock(const T* const* tap, int count, const BlockRows<T>& rows, ptrdiff_t elements) {
+    using namespace detail;
+    switch (count) {
+        case 1: return enterRow<Order, Finish, keepAlpha, 1>(tap, count, rows, elements);
+        case 2: return enterRow<Order, Finish, keepAlpha, 2>(tap, count, rows, elements);
+        case 3: return enterRow<Order, Finish, keepAlpha, 3>(tap, count, rows, elements);
+        case 4: return enterRow<Order, Finish, keepAlpha, 4>(tap, count, rows, elements);
+        case 5: return enterRow<Order, Finish, keepAlpha, 5>(tap, count, rows, elements);
+        case 7: return enterRow<Order, Finish, keepAlpha, 7>(tap, count, rows, elements);
+        default: return enterRow<Order, Finish, keepAlpha, 0>(tap, count, rows, elements);
+    }
+}
+
+namespace detail {
+
+template <class Order, int vectors, class T>
+QORI_INLINE void joinUpwards(T* last, ptrdiff_t step, int32_t rows, ptrdiff_t at) {
+    T* row = last + at;
+    Vec<T> soFar[vectors];
+    for (int v = 0; v < vectors; ++v) soFar[v] = load(row + v * Vec<T>::lanes);
+    for (int32_t k = 1; k < rows; ++k) {
+        row -= step;
+        for (int v = 0; v < vectors; ++v) {
+            soFar[v] = Order::join(soFar[v], load(row + v * Vec<T>::lanes));
+            store(row + v * Vec<T>::lanes, soFar[v]);
+        }
+    }
+}
+
+}  // namespace detail
+
+/// Each row becomes its join with all rows below it. Rows are `step` elements apart and padded to whole vectors.
+template <class Order, class T>
+QORI_NOINLINE void joinBlockUpwards(T* last, ptrdiff_t step, int32_t rows, ptrdiff_t elements) {
+    constexpr ptrdiff_t n = Vec<T>::lanes;
+    constexpr int vectors = 4;
+    ptrdiff_t i = 0;
+    for (; i <= elements - vectors * n; i += vectors * n) detail::joinUpwards<Order, vectors>(last, step, rows, i);
+    for (; i < elements; i += n) detail::joinUpwards<Order, 1>(last, step, rows, i);
+}
+
 }  // namespace qori::kernels
