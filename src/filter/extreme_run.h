@@ -54,22 +54,23 @@ struct ElementRows {
     T* row(int32_t slot) const { return reinterpret_cast<T*>(ring.row(slot)); }
 };
 
-/// Source rows as joins want them, from the box's first column on. For the destination row y those of y + lowest to
-/// y + highest are there.
+/// Source rows as joins want them, from the box's first column on. For a group of destination rows from y on, those of
+/// y + lowest to y + group - 1 + highest are there.
 template <class Order, bool keyed>
 class SourceRows {
 public:
     using T = typename Order::Element;
 
-    SourceRows(const ExtremeTask<T>& task, int32_t lowest, bool isKept, WorkBuffer& work)
+    SourceRows(const ExtremeTask<T>& task, int32_t lowest, int32_t group, bool isKept, WorkBuffer& work)
         : task_(task), entered_(task.cover.box.y), isKept_(isKept || keyed) {
         const int32_t highest = task.cover.lastRow();
         ahead_ = task.isInPlace && highest < 0 ? 0 : highest;
         elements_ = task.elements(int64_t{task.roi.width} + task.cover.box.width - 1);
-        if (isKept_) rows_.take(work, elements_, ahead_ - lowest + 1);
+        if (isKept_) rows_.take(work, elements_, ahead_ - lowest + group);
     }
 
-    /// Before the destination's row y is written; copies what later rows see of it. Calls entered(row) for each.
+    /// Before the destination's rows up to y are written: what they and later ones see is kept. Calls entered(row) for
+    /// each row that comes.
     template <class Entered>
     void enter(int32_t y, Entered entered) {
         const int32_t lastSeen = task_.roi.height - 1 + task_.cover.lastRow();
@@ -113,7 +114,10 @@ void joinInto(const ExtremeTask<T>& task, int32_t y, const T* const* taps, int c
 
 // --- rectangles -----------------------------------------------------------------------------------------------------
 
-/// The extremes of a rectangle, a row at a time.
+/// Destination rows made at a time: what joins hold in registers from row to row is loaded and stored once for all.
+inline constexpr int32_t kGroup = kernels::kMostEntering;
+
+/// The extremes of a rectangle, some rows at a time.
 template <class Order>
 class RunningRect {
 public:
@@ -122,41 +126,44 @@ public:
     void take(const QorImageRect& rect, ptrdiff_t elements, WorkBuffer& work) {
         rect_ = rect;
         elements_ = elements;
-        widening_ = Widening::to(rect.width);
         block_.take(work, elements, rect.height);
-        first_.take(work, elements, 1);
+        soFar_.take(work, elements, 2);
     }
     const QorImageRect& rect() const { return rect_; }
-    Widening widening() const { return widening_; }
     /// The source row that completes the rectangles of destination row y.
     int32_t rowFor(int32_t y) const { return y + rect_.y + rect_.height - 1; }
+    /// Rows that enter together, of so many: those up to the end of a block.
+    int32_t together(int32_t rows) const { return std::min(rows, rect_.height - phase_); }
 
-    /// What the next row meets; `elsewhere` may be null.
-    kernels::BlockRows<T> meeting(const T* elsewhere, T* to) const {
-        T* const entering = block_.row(phase_);
-        return {entering,
-                phase_ == 0 ? entering : first_.row(0),
-                first_.row(0),
-                phase_ + 1 == rect_.height ? entering : block_.row(phase_ + 1),
-                elsewhere == nullptr ? entering : elsewhere,
-                to};
-    }
-    /// The row has entered.
-    void advance() {
-        if (++phase_ < rect_.height) return;
-        phase_ = 0;
-        if (rect_.height > 2)
-            kernels::joinBlockUpwards<Order>(block_.row(rect_.height - 1),
-                                             static_cast<ptrdiff_t>(block_.ring.rowBytes) / elementBytes<T>,
-                                             rect_.height - 1, elements_);
+    /// Rows enter, each the join of its taps, and are joined with what is elsewhere.
+    template <class Finish, bool keepAlpha>
+    void enter(int32_t rows, const T* const* taps, int tapsEach, const T* const* elsewhere, T* const* to) {
+        kernels::EnteringRow<T> row[kGroup];
+        for (int32_t k = 0; k < rows; ++k) {
+            T* const entering = block_.row(phase_ + k);
+            row[k] = {entering, phase_ + k + 1 < rect_.height ? block_.row(phase_ + k + 1) : nullptr,
+                      elsewhere == nullptr ? nullptr : elsewhere[k], to[k]};
+        }
+        const T* const before = phase_ == 0 ? nullptr : soFar_.row(turn_);
+        turn_ ^= 1;
+        kernels::enterBlock<Order, Finish, keepAlpha>(
+            kernels::EnteringRows<T>{taps, tapsEach, row, rows, before, soFar_.row(turn_), elements_});
+        phase_ += rows;
+        if (phase_ == rect_.height) endBlock();
     }
 
 private:
+    void endBlock() {
+        phase_ = 0;
+        if (rect_.height <= 2) return;
+        const auto step = static_cast<ptrdiff_t>(block_.ring.rowBytes) / elementBytes<T>;
+        kernels::joinBlockUpwards<Order>(block_.row(rect_.height - 1), step, rect_.height - 1, elements_);
+    }
+
     QorImageRect rect_{};
-    Widening widening_{};
     ptrdiff_t elements_ = 0;
-    ElementRows<T> block_, first_;
-    int32_t phase_ = 0;
+    ElementRows<T> block_, soFar_;
+    int32_t phase_ = 0, turn_ = 0;
 };
 
 template <class Order, bool keyed>
@@ -165,24 +172,29 @@ public:
     using T = typename Order::Element;
 
     RectRun(const ExtremeTask<T>& task, WorkBuffer& work)
-        : task_(task), source_(task, lowestRow(task.cover), isKept(task), work) {
-        elements_ = task.elements(task.roi.width);
+        : task_(task), source_(task, lowestRow(task.cover), kGroup, isKept(task), work) {
+        const ptrdiff_t elements = task.elements(task.roi.width);
         int32_t widest = 1;
         for (int k = 0; k < task.cover.rects; ++k) {
-            running_[k].take(task.cover.rect[k], elements_, work);
+            running_[k].take(task.cover.rect[k], elements, work);
+            widening_[k] = Widening::to(task.cover.rect[k].width);
             widest = std::max(widest, task.cover.rect[k].width);
         }
-        wider_.take(work, task.elements(int64_t{task.roi.width} + widest - 1), 2);
-        joined_.take(work, elements_, 1);
+        for (ElementRows<T>& rows : wider_)
+            rows.take(work, task.elements(int64_t{task.roi.width} + widest - 1), kGroup);
+        joined_.take(work, elements, kGroup);
     }
 
     void run() {
         int32_t tallest = 1;
         for (int k = 0; k < task_.cover.rects; ++k) tallest = std::max(tallest, task_.cover.rect[k].height);
-        for (int32_t y = 1 - tallest; y < task_.roi.height; ++y) {
-            source_.enter(y, [](int32_t) {});
-            for (int k = 0; k < task_.cover.rects; ++k)
-                if (y + task_.cover.rect[k].height > 0) enter(k, y);
+        for (int32_t y = 1 - tallest; y < task_.roi.height; y += kGroup) {
+            const int32_t end = std::min(y + kGroup, task_.roi.height);
+            source_.enter(end - 1, [](int32_t) {});
+            for (int k = 0; k < task_.cover.rects; ++k) {
+                int32_t row = std::max(y, 1 - task_.cover.rect[k].height);
+                while (row < end) row += enter(k, row, row - y, running_[k].together(end - row));
+            }
         }
     }
 
@@ -192,53 +204,65 @@ private:
         for (int k = 0; k < cover.rects; ++k) lowest = std::min(lowest, cover.rect[k].y + cover.rect[k].height - 1);
         return lowest;
     }
-    /// In place, rows need no copy where all rectangles end in the same row, below that of their pixel.
+    /// In place, rows need no copy where all rectangles end in the same row, below the group that is written.
     static bool isKept(const ExtremeTask<T>& task) {
-        return task.isInPlace && (task.cover.lastRow() <= 0 || lowestRow(task.cover) < task.cover.lastRow());
+        return task.isInPlace && (task.cover.lastRow() < kGroup || lowestRow(task.cover) < task.cover.lastRow());
     }
 
-    /// The next row of a rectangle enters, and is joined with what the rectangles before it made; of the last one comes
-    /// the destination. Nobody wants what comes before its first row.
-    void enter(int k, int32_t y) {
-        RunningRect<Order>& running = running_[k];
-        const T* const row = source_.row(running.rowFor(y)) + task_.elements(running.rect().x - task_.cover.box.x);
-        const T* taps[kMostRadix];
-        const int count = widen(row, running.rect().width, running.widening(), taps);
-        T* const joined = joined_.row(0);
+    /// Rows of a rectangle, the first of them row `at` of the group, joined with those of the rectangles before it; of
+    /// the last one they are the destination's. Nobody wants what comes before its first row.
+    int32_t enter(int k, int32_t y, int32_t at, int32_t rows) {
+        const T* taps[kGroup * Widening::kMostRadix];
+        const T* elsewhere[kGroup];
+        T* to[kGroup];
         const bool isLast = k + 1 == task_.cover.rects;
-        const auto rows = running.meeting(k > 0 ? joined : nullptr, isLast && y >= 0 ? task_.dst.row(y) : joined);
+        for (int32_t i = 0; i < rows; ++i) {
+            elsewhere[i] = joined_.row(at + i);
+            to[i] = isLast && y + i >= 0 ? task_.dst.row(y + i) : joined_.row(at + i);
+        }
+        const int count = widen(k, y, rows, taps);
+        const T* const* const others = k > 0 ? elsewhere : nullptr;
         using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
-        if (!isLast || y < 0)
-            kernels::enterBlock<Order, kernels::AsIs, false>(taps, count, rows, elements_);
+        if (!isLast)
+            running_[k].template enter<kernels::AsIs, false>(rows, taps, count, others, to);
         else if (task_.keepAlpha)
-            kernels::enterBlock<Order, Finish, true>(taps, count, rows, elements_);
+            running_[k].template enter<Finish, true>(rows, taps, count, others, to);
         else
-            kernels::enterBlock<Order, Finish, false>(taps, count, rows, elements_);
-        running.advance();
+            running_[k].template enter<Finish, false>(rows, taps, count, others, to);
+        return rows;
     }
 
-    /// Joins a row with itself, but for the last pass, whose taps it sets; returns their number.
-    int widen(const T* row, int32_t width, Widening widening, const T** taps) {
+    /// Joins rows with themselves, but for the last pass, whose taps it sets; returns their number for each row. All
+    /// rows make a pass before any makes the next: loads across recent stores wait for these.
+    int widen(int k, int32_t y, int32_t rows, const T** taps) {
+        const QorImageRect& rect = task_.cover.rect[k];
+        const T* row[kGroup];
+        for (int32_t i = 0; i < rows; ++i)
+            row[i] = source_.row(running_[k].rowFor(y + i)) + task_.elements(rect.x - task_.cover.box.x);
         int32_t has = 1;
         for (int32_t pass = 0;; ++pass) {
-            const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening.radix, width));
+            const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening_[k].radix, rect.width));
             const int count = (next - 1) / has + 1;
-            for (int i = 0; i < count; ++i) taps[i] = row + task_.elements(std::min(i * has, next - has));
-            if (next == width) return count;
-            T* const out = wider_.row(pass % 2);
-            kernels::join<Order>(taps, count, out, task_.elements(int64_t{task_.roi.width} + width - next));
-            row = out;
+            for (int32_t i = 0; i < rows; ++i)
+                for (int t = 0; t < count; ++t)
+                    taps[i * count + t] = row[i] + task_.elements(std::min(t * has, next - has));
+            if (next == rect.width) return count;
+            for (int32_t i = 0; i < rows; ++i) {
+                T* const out = wider_[pass % 2].row(i);
+                kernels::join<Order>(taps + i * count, count, out,
+                                     task_.elements(int64_t{task_.roi.width} + rect.width - next));
+                row[i] = out;
+            }
             has = next;
         }
     }
 
-    static constexpr int kMostRadix = 16;  ///< Beyond 8, two passes cost less than one.
-
     const ExtremeTask<T>& task_;
     SourceRows<Order, keyed> source_;
     RunningRect<Order> running_[WindowCover::kMostRects];
-    ElementRows<T> wider_, joined_;
-    ptrdiff_t elements_;
+    Widening widening_[WindowCover::kMostRects]{};
+    ElementRows<T> wider_[2];
+    ElementRows<T> joined_;
 };
 
 // --- taps -----------------------------------------------------------------------------------------------------------
@@ -249,7 +273,7 @@ public:
     using T = typename Order::Element;
 
     TapRun(const ExtremeTask<T>& task, WorkBuffer& work)
-        : task_(task), source_(task, task.cover.box.y, task.isInPlace, work) {
+        : task_(task), source_(task, task.cover.box.y, 1, task.isInPlace, work) {
         taps_ = work.take<Tap>(task.cover.taps);
         rows_ = work.take<const T*>(task.cover.taps);
         const int32_t ahead = task.isInPlace ? std::max(task.cover.lastRow(), 0) : task.cover.lastRow();

@@ -13,10 +13,18 @@ constexpr double kRunning = 2 + kStore + 2 + kStore + 2;
 /// A level: a row joined with itself.
 constexpr double kLevel = 2 + kStore;
 
-double widenedCost(Widening widening) { return widening.passes * (widening.radix + kStore); }
+double widenedCost(Widening widening, int32_t width) {
+    double cost = 0;
+    for (int64_t has = 1, next = 0; next < width || next == 0; has = next) {
+        next = std::min<int64_t>(has * widening.radix, width);
+        cost += static_cast<double>((next - 1) / has + 1) + kStore;
+        if (width == 1) break;
+    }
+    return cost;
+}
 
 double costOf(const QorImageRect& rect) {
-    return widenedCost(Widening::to(rect.width)) + (rect.height > 1 ? kRunning : 1);
+    return widenedCost(Widening::to(rect.width), rect.width) + (rect.height > 1 ? kRunning : 1);
 }
 
 bool isFull(const Window& window, int32_t x, int32_t y, int32_t length) {
@@ -83,24 +91,9 @@ Survey survey(const Window& window) {
 }  // namespace
 
 Widening Widening::to(int32_t width) {
-    Widening best{1, width};
-    double least = widenedCost(best);
-    for (int32_t passes = 2; passes <= 16; ++passes) {
-        int32_t radix = 2;
-        const auto reached = [&] {
-            int64_t reach = 1;
-            for (int32_t i = 0; i < passes && reach < width; ++i) reach *= radix;
-            return reach >= width;
-        };
-        while (radix < width && !reached()) ++radix;
-        const Widening next{passes, radix};
-        if (widenedCost(next) >= least) {
-            if (passes > 2 && radix == 2) break;
-            continue;
-        }
-        least = widenedCost(next);
-        best = next;
-    }
+    Widening best{2};
+    for (int32_t radix = 2; radix <= kMostRadix; ++radix)
+        if (widenedCost({radix}, width) < widenedCost(best, width)) best.radix = radix;
     return best;
 }
 

@@ -69,10 +69,12 @@ void forEachTap(const Window& window, bool usesLevels, Visit visit) {
 /// The window has a pixel. One without a mask and of any size takes no time to speak of.
 WindowCover coverOf(const Window& window);
 
-/// How rows are joined with themselves until each element is the extreme of `width` pixels: in `passes` passes, each
-/// widening what the one before joined by `radix`.
+/// How rows are joined with themselves until each element is the extreme of a number of pixels: in passes, each of
+/// which widens what the one before joined by the radix.
 struct Widening {
-    int32_t passes, radix;
+    static constexpr int32_t kMostRadix = 8;  ///< Beyond it, two passes cost less than one.
+
+    int32_t radix;
 
     static Widening to(int32_t width);
 };

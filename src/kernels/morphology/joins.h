@@ -5,6 +5,8 @@
 // Floats are joined as keys: unsigned integers in the order of the numbers, -0 below +0, NaNs where a number always
 // beats them. So no order of joins shows in the result, and no instruction reads the control register.
 #pragma once
+#include <limits>
+
 #include "kernels/map.h"
 #include "kernels/vector_math.h"
 
@@ -14,12 +16,14 @@ namespace qori::kernels {
 template <class T>
 struct Smallest {
     using Element = T;
+    static constexpr T start = std::numeric_limits<T>::max();  ///< What every element replaces.
     QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> b) { return smaller(a, b); }
 };
 
 template <class T>
 struct Largest {
     using Element = T;
+    static constexpr T start = std::numeric_limits<T>::min();
     QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> b) { return larger(a, b); }
 };
 
@@ -158,73 +162,142 @@ void join(const T* const* row, int count, T* to, ptrdiff_t elements) {
 
 // --- blocks of rows -------------------------------------------------------------------------------------------------
 
-/// What becomes of a row that enters a block, element by element.
+/// One of several rows that enter a block of rows, one below the other.
 template <class T>
-struct BlockRows {
-    T* entering;        ///< Becomes the joined taps.
-    const T* before;    ///< The join of the block's rows so far, or `entering` for the first.
-    T* soFar;           ///< Becomes that join with the row; may be `before`.
-    const T* lastRows;  ///< The join of the rows of the block before that the window has; `entering` where it has none.
-    const T* elsewhere;  ///< What else the window has; `entering` where that is nothing.
-    T* to;               ///< Becomes the finished join of all that the window has.
+struct EnteringRow {
+    T* row;              ///< Becomes the join of its taps.
+    const T* lastRows;   ///< The join of the rows of the block before that its window has; null where it has none.
+    const T* elsewhere;  ///< What else the window has, or null.
+    T* to;               ///< Becomes the finished join of all that the window has; may be `elsewhere`.
+};
+
+inline constexpr int kMostEntering = 8;
+
+template <class T>
+struct EnteringRows {
+    const T* const* taps;  ///< So many of the first row, as many of the next ...
+    int tapsEach;
+    const EnteringRow<T>* row;
+    int rows;
+    const T* before;  ///< The join of the block's rows above, or null where these are its first.
+    T* soFar;         ///< Becomes that join with these rows.
+    ptrdiff_t elements;
 };
 
 namespace detail {
 
-template <class Order, class Finish, bool keepAlpha, int vectors, class T, int fixed>
-QORI_INLINE void enterVectors(Taps<T, fixed> taps, const BlockRows<T>& rows, ptrdiff_t at) {
-    Vec<T> row[vectors];
-    joinVectors<Order, vectors>(taps, at, row);
-    // The row is stored before the others are loaded, which may be the same.
-    for (int v = 0; v < vectors; ++v) store(rows.entering + at + v * Vec<T>::lanes, row[v]);
-    for (int v = 0; v < vectors; ++v) {
-        const ptrdiff_t i = at + v * Vec<T>::lanes;
-        const Vec<T> soFar = Order::join(row[v], load(rows.before + i));
-        store(rows.soFar + i, soFar);
-        Vec<T> out = Order::join(soFar, load(rows.lastRows + i));
-        if (rows.elsewhere != rows.entering) out = Order::join(out, load(rows.elsewhere + i));
-        out = Finish::of(out);
-        if constexpr (keepAlpha) out = withAlphaOf(out, load(rows.to + i));
-        store(rows.to + i, out);
+/// Stores what is made of the vectors at a place.
+template <class T>
+struct Stored {
+    const EnteringRows<T>& rows;
+    ptrdiff_t at;
+
+    QORI_INLINE void row(int k, int v, Vec<T> a) { store(rows.row[k].row + at + v * Vec<T>::lanes, a); }
+    QORI_INLINE void result(int k, int v, Vec<T> a) { store(rows.row[k].to + at + v * Vec<T>::lanes, a); }
+    QORI_INLINE void soFar(int v, Vec<T> a) { store(rows.soFar + at + v * Vec<T>::lanes, a); }
+};
+
+/// Keeps what is made of one vector.
+template <class T>
+struct Held {
+    Vec<T> rows[kMostEntering], results[kMostEntering], join;
+
+    QORI_INLINE void row(int k, int, Vec<T> a) { rows[k] = a; }
+    QORI_INLINE void result(int k, int, Vec<T> a) { results[k] = a; }
+    QORI_INLINE void soFar(int, Vec<T> a) { join = a; }
+    void storeAt(const EnteringRows<T>& entering, ptrdiff_t at) const {
+        for (int k = 0; k < entering.rows; ++k) {
+            store(entering.row[k].row + at, rows[k]);
+            store(entering.row[k].to + at, results[k]);
+        }
+        store(entering.soFar + at, join);
+    }
+};
+
+template <class Order, class Finish, bool keepAlpha, int fixed, int vectors, class T, class Made>
+QORI_INLINE void enterVectors(const EnteringRows<T>& rows, ptrdiff_t at, Made& made) {
+    constexpr ptrdiff_t n = Vec<T>::lanes;
+    Vec<T> soFar[vectors];
+    for (int v = 0; v < vectors; ++v)
+        soFar[v] = rows.before == nullptr ? splat(Order::start) : load(rows.before + at + v * n);
+    Taps<T, fixed> taps{rows.taps, rows.tapsEach};
+    for (int k = 0; k < rows.rows; ++k) {
+        const EnteringRow<T> entering = rows.row[k];
+        Vec<T> row[vectors];
+        joinVectors<Order, vectors>(taps, at, row);
+        taps.row += taps.size();
+        for (int v = 0; v < vectors; ++v) {
+            made.row(k, v, row[v]);
+            row[v] = soFar[v] = Order::join(soFar[v], row[v]);
+        }
+        if (entering.lastRows != nullptr)
+            for (int v = 0; v < vectors; ++v) row[v] = Order::join(row[v], load(entering.lastRows + at + v * n));
+        if (entering.elsewhere != nullptr)
+            for (int v = 0; v < vectors; ++v) row[v] = Order::join(row[v], load(entering.elsewhere + at + v * n));
+        for (int v = 0; v < vectors; ++v) {
+            row[v] = Finish::of(row[v]);
+            if constexpr (keepAlpha) row[v] = withAlphaOf(row[v], load(entering.to + at + v * n));
+            made.result(k, v, row[v]);
+        }
+    }
+    for (int v = 0; v < vectors; ++v) made.soFar(v, soFar[v]);
+}
+
+/// Rows of less than a vector.
+template <class Order, class Finish, bool keepAlpha, class T>
+QORI_NOINLINE void enterNarrow(const EnteringRows<T>& rows) {
+    const T* before = rows.before;
+    for (int k = 0; k < rows.rows; ++k) {
+        const EnteringRow<T>& entering = rows.row[k];
+        joinNarrow<Order, AsIs, false>(rows.taps + k * rows.tapsEach, rows.tapsEach, entering.row, rows.elements);
+        const T* const block[] = {entering.row, before};
+        joinNarrow<Order, AsIs, false>(block, before == nullptr ? 1 : 2, rows.soFar, rows.elements);
+        before = rows.soFar;
+        const T* all[3] = {rows.soFar};
+        int count = 1;
+        if (entering.lastRows != nullptr) all[count++] = entering.lastRows;
+        if (entering.elsewhere != nullptr) all[count++] = entering.elsewhere;
+        joinNarrow<Order, Finish, keepAlpha>(all, count, entering.to, rows.elements);
     }
 }
 
-template <class Order, class Finish, bool keepAlpha, class T>
-QORI_NOINLINE void enterNarrow(const T* const* tap, int count, const BlockRows<T>& rows, ptrdiff_t elements) {
-    joinNarrow<Order, AsIs, false>(tap, count, rows.entering, elements);
-    const T* const both[] = {rows.entering, rows.before};
-    joinNarrow<Order, AsIs, false>(both, 2, rows.soFar, elements);
-    const T* const all[] = {rows.soFar, rows.lastRows, rows.elsewhere};
-    joinNarrow<Order, Finish, keepAlpha>(all, 3, rows.to, elements);
-}
-
+/// The last vector ends with the rows and overlaps the one before: it is made first, as rows are read that others
+/// become, and stored last.
 template <class Order, class Finish, bool keepAlpha, int fixed, class T>
-QORI_NOINLINE void enterRow(const T* const* tap, int count, BlockRows<T> rows, ptrdiff_t elements) {
+QORI_NOINLINE void enterRows(const EnteringRows<T>& rows) {
     constexpr ptrdiff_t n = Vec<T>::lanes;
     constexpr int vectors = 4;
-    const Taps<T, fixed> taps{tap, count};
-    if (elements < n) return enterNarrow<Order, Finish, keepAlpha>(tap, taps.size(), rows, elements);
+    const ptrdiff_t elements = rows.elements;
+    if (elements < n) return enterNarrow<Order, Finish, keepAlpha>(rows);
+    const bool overlaps = elements % n != 0;
+    Held<T> last;
+    if (overlaps) enterVectors<Order, Finish, keepAlpha, fixed, 1>(rows, elements - n, last);
     ptrdiff_t i = 0;
-    for (; i <= elements - vectors * n; i += vectors * n)
-        enterVectors<Order, Finish, keepAlpha, vectors>(taps, rows, i);
-    for (; i <= elements - n; i += n) enterVectors<Order, Finish, keepAlpha, 1>(taps, rows, i);
-    if (i < elements) enterVectors<Order, Finish, keepAlpha, 1>(taps, rows, elements - n);
+    for (; i <= elements - vectors * n; i += vectors * n) {
+        Stored<T> stored{rows, i};
+        enterVectors<Order, Finish, keepAlpha, fixed, vectors>(rows, i, stored);
+    }
+    for (; i <= elements - n; i += n) {
+        Stored<T> stored{rows, i};
+        enterVectors<Order, Finish, keepAlpha, fixed, 1>(rows, i, stored);
+    }
+    if (overlaps) last.storeAt(rows, elements - n);
 }
 
 }  // namespace detail
 
-/// A row, the join of taps, enters a block. The last vector overlaps the one before, as in join().
 template <class Order, class Finish, bool keepAlpha, class T>
-void enterBlock(const T* const* tap, int count, const BlockRows<T>& rows, ptrdiff_t elements) {
+void enterBlock(const EnteringRows<T>& rows) {
     using namespace detail;
-    switch (count) {
-        case 1: return enterRow<Order, Finish, keepAlpha, 1>(tap, count, rows, elements);
-        case 2: return enterRow<Order, Finish, keepAlpha, 2>(tap, count, rows, elements);
-        case 3: return enterRow<Order, Finish, keepAlpha, 3>(tap, count, rows, elements);
-        case 4: return enterRow<Order, Finish, keepAlpha, 4>(tap, count, rows, elements);
-        case 5: return enterRow<Order, Finish, keepAlpha, 5>(tap, count, rows, elements);
-        case 7: return enterRow<Order, Finish, keepAlpha, 7>(tap, count, rows, elements);
-        default: return enterRow<Order, Finish, keepAlpha, 0>(tap, count, rows, elements);
+    switch (rows.tapsEach) {
+        case 1: return enterRows<Order, Finish, keepAlpha, 1>(rows);
+        case 2: return enterRows<Order, Finish, keepAlpha, 2>(rows);
+        case 3: return enterRows<Order, Finish, keepAlpha, 3>(rows);
+        case 4: return enterRows<Order, Finish, keepAlpha, 4>(rows);
+        case 5: return enterRows<Order, Finish, keepAlpha, 5>(rows);
+        case 6: return enterRows<Order, Finish, keepAlpha, 6>(rows);
+        case 7: return enterRows<Order, Finish, keepAlpha, 7>(rows);
+        default: return enterRows<Order, Finish, keepAlpha, 0>(rows);
     }
 }
 
