@@ -127,7 +127,7 @@ public:
         rect_ = rect;
         elements_ = elements;
         block_.take(work, elements, rect.height);
-        soFar_.take(work, elements, 2);
+        soFar_.take(work, elements, 1);
     }
     const QorImageRect& rect() const { return rect_; }
     /// The source row that completes the rectangles of destination row y.
@@ -144,10 +144,9 @@ public:
             row[k] = {entering, phase_ + k + 1 < rect_.height ? block_.row(phase_ + k + 1) : nullptr,
                       elsewhere == nullptr ? nullptr : elsewhere[k], to[k]};
         }
-        const T* const before = phase_ == 0 ? nullptr : soFar_.row(turn_);
-        turn_ ^= 1;
+        const T* const before = phase_ == 0 ? nullptr : soFar_.row(0);
         kernels::enterBlock<Order, Finish, keepAlpha>(
-            kernels::EnteringRows<T>{taps, tapsEach, row, rows, before, soFar_.row(turn_), elements_});
+            kernels::EnteringRows<T>{taps, tapsEach, row, rows, before, soFar_.row(0), elements_});
         phase_ += rows;
         if (phase_ == rect_.height) endBlock();
     }
@@ -163,7 +162,7 @@ private:
     QorImageRect rect_{};
     ptrdiff_t elements_ = 0;
     ElementRows<T> block_, soFar_;
-    int32_t phase_ = 0, turn_ = 0;
+    int32_t phase_ = 0;
 };
 
 template <class Order, bool keyed>

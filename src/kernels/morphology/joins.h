@@ -180,7 +180,7 @@ struct EnteringRows {
     const EnteringRow<T>* row;
     int rows;
     const T* before;  ///< The join of the block's rows above, or null where these are its first.
-    T* soFar;         ///< Becomes that join with these rows.
+    T* soFar;         ///< Becomes that join with these rows; may be `before`.
     ptrdiff_t elements;
 };
 
