@@ -3134,6 +3134,110 @@ QORI_API QorResult QORI_CALL qoriFilterBorder_32f_C4R(const float* pSrc, int32_t
     QorImageSize dstRoiSize, int32_t border, const float* borderValue, const QorLinearFilterPlan* pSpec,
     uint8_t* pBuffer);
 
+/* ---- Minimum and maximum filters ------------------------------------------------------------------------------ */
+
+/** The smallest element of a rectangle around each pixel, channel by channel.
+ *  Shapes    The rectangle of destination pixel (x, y) spans source columns x - anchor.x to x - anchor.x +
+ *            maskSize.width - 1 and rows y - anchor.y to y - anchor.y + maskSize.height - 1; all of it is read.
+ *  Elements  32f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, windows of nothing
+ *            else give the quiet NaN, and -0 is below +0. A mask of 1 x 1 copies, bit by bit. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment, and not held against the width; dstRoiSize,
+ *            maskSize and anchor in pixels.
+ *  Aliasing  pSrc == pDst with equal steps gives the results of a source that is a copy. Otherwise the source,
+ *            with the neighbours that are read, must not overlap the destination.
+ *  Notes     The cost hardly depends on the mask. May take memory from qorMalloc for the duration of the call;
+ *            without any, masks up to some hundred rows are done all the same, out of place.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (maskSize.width or height below 1),
+ *            QOR_ERR_ANCHOR (anchor outside the mask), QOR_ERR_NO_MEMORY (no memory for work that does not fit
+ *            on the stack); then nothing is written.
+ *  Example   qoriFilterMin_8u_C1R(frame + 3 * frameStep + 3, frameStep, out, outStep, (QorImageSize){width - 6, height - 6},
+ *                                 (QorImageSize){7, 7}, (QorPoint2D){3, 3});
+ */
+QORI_API QorResult QORI_CALL qoriFilterMin_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMin_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+
+/** The largest element of a rectangle around each pixel, channel by channel.
+ *  Shapes    The rectangle of destination pixel (x, y) spans source columns x - anchor.x to x - anchor.x +
+ *            maskSize.width - 1 and rows y - anchor.y to y - anchor.y + maskSize.height - 1; all of it is read.
+ *  Elements  32f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, windows of nothing
+ *            else give the quiet NaN, and -0 is below +0. A mask of 1 x 1 copies, bit by bit. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment, and not held against the width; dstRoiSize,
+ *            maskSize and anchor in pixels.
+ *  Aliasing  pSrc == pDst with equal steps gives the results of a source that is a copy. Otherwise the source,
+ *            with the neighbours that are read, must not overlap the destination.
+ *  Notes     The cost hardly depends on the mask. May take memory from qorMalloc for the duration of the call;
+ *            without any, masks up to some hundred rows are done all the same, out of place.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (maskSize.width or height below 1),
+ *            QOR_ERR_ANCHOR (anchor outside the mask), QOR_ERR_NO_MEMORY (no memory for work that does not fit
+ *            on the stack); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMax_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMax_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+
 /* ---- Histograms ----------------------------------------------------------------------------------------------- */
 
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1].
@@ -3798,8 +3902,8 @@ QORI_API QorResult QORI_CALL qoriMirror_32f_AC4IR(float* pSrcDst, int32_t srcDst
 /** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel.
  *  Shapes    pSrc points at the region's first pixel inside a source: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  pSrc == pDst with equal steps runs the in-place form with its checks, before any other. Otherwise
  *            the source, with the neighbours that are read, must not overlap the destination.
@@ -3839,8 +3943,8 @@ QORI_API QorResult QORI_CALL qoriErode3x3_64f_C1R(const double* pSrc, int32_t sr
 /** Erosion by the 3 x 3 square in place.
  *  Shapes    pSrcDst points at the region's first pixel inside an image: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
  *  Notes     Takes two rows of memory from qorMalloc for the duration of the call.
@@ -3864,8 +3968,8 @@ QORI_API QorResult QORI_CALL qoriErode3x3_32f_AC4IR(float* pSrcDst, int32_t srcD
 /** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel.
  *  Shapes    pSrc points at the region's first pixel inside a source: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  pSrc == pDst with equal steps runs the in-place form with its checks, before any other. Otherwise
  *            the source, with the neighbours that are read, must not overlap the destination.
@@ -3903,8 +4007,8 @@ QORI_API QorResult QORI_CALL qoriDilate3x3_64f_C1R(const double* pSrc, int32_t s
 /** Dilation by the 3 x 3 square in place.
  *  Shapes    pSrcDst points at the region's first pixel inside an image: one pixel around the region is read on
  *            every side.
- *  Elements  32f and 64f: a NaN takes no part, nine of them give the quiet NaN; of equal zeros of different
- *            sign the one that comes last in row order is taken. AC4 keeps the destination's channel 3.
+ *  Elements  32f and 64f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, nine of
+ *            them give the quiet NaN, and -0 is below +0. AC4 keeps the destination's channel 3.
  *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
  *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
  *  Notes     Takes two rows of memory from qorMalloc for the duration of the call.
@@ -3924,6 +4028,167 @@ QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C1IR(float* pSrcDst, int32_t srcD
 QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriDilate3x3_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriDilate3x3_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize);
+
+/* ---- Morphology by masks -------------------------------------------------------------------------------------- */
+
+/** Erosion by a mask of bytes: the smallest of the pixels under its non-zero bytes, channel by channel.
+ *  Shapes    pMask: maskSize.width x height bytes, row by row without gaps, not reversed; byte (i, j) stands
+ *            for source pixel (x - anchor.x + i, y - anchor.y + j) of destination pixel (x, y). All pixels of
+ *            the smallest rectangle around the mask's non-zero bytes are read, none outside it.
+ *  Elements  32f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, windows of nothing
+ *            else give the quiet NaN, and -0 is below +0. A mask with a single non-zero byte copies, bit by
+ *            bit. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  pSrc == pDst with equal steps gives the results of a source that is a copy. Otherwise the source,
+ *            with the neighbours that are read, must not overlap the destination.
+ *  Notes     Rectangles, lines and what a few of these cover cost the same at any size; other masks cost by the
+ *            number of their runs. Masks of more than 32 elements, and work in place, take memory from
+ *            qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (maskSize.width or height below 1),
+ *            QOR_ERR_ZERO_MASK (all bytes of the mask are 0), QOR_ERR_ANCHOR (anchor outside the mask),
+ *            QOR_ERR_STEP_TOO_SMALL (srcStep below the bytes of roiSize.width + maskSize.width - 1 pixels,
+ *            dstStep below those of roiSize.width), QOR_ERR_NO_MEMORY (no memory for a mask of more than 32
+ *            elements); then nothing is written.
+ *  Example   const uint8_t cross[9] = {0, 1, 0, 1, 1, 1, 0, 1, 0};
+ *            qoriErode_8u_C1R(frame + frameStep + 1, frameStep, out, outStep, (QorImageSize){width - 2, height - 2}, cross,
+ *                             (QorImageSize){3, 3}, (QorPoint2D){1, 1});
+ */
+QORI_API QorResult QORI_CALL qoriErode_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+
+/** Erosion by a mask of bytes in place.
+ *  Shapes    Image and mask as of the form with two images.
+ *  Elements  32f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, windows of nothing
+ *            else give the quiet NaN, and -0 is below +0. A mask with a single non-zero byte copies, bit by
+ *            bit. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
+ *  Notes     Takes memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (maskSize.width or height below 1),
+ *            QOR_ERR_ZERO_MASK (all bytes of the mask are 0), QOR_ERR_ANCHOR (anchor outside the mask),
+ *            QOR_ERR_STEP_TOO_SMALL (srcDstStep below the bytes of roiSize.width + maskSize.width - 1 pixels),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriErode_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriErode_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+
+/** Dilation by a mask of bytes: the largest of the pixels under its non-zero bytes, channel by channel.
+ *  Shapes    pMask: maskSize.width x height bytes, row by row without gaps, not reversed; byte (i, j) stands
+ *            for source pixel (x - anchor.x + i, y - anchor.y + j) of destination pixel (x, y). All pixels of
+ *            the smallest rectangle around the mask's non-zero bytes are read, none outside it.
+ *  Elements  32f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, windows of nothing
+ *            else give the quiet NaN, and -0 is below +0. A mask with a single non-zero byte copies, bit by
+ *            bit. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  pSrc == pDst with equal steps gives the results of a source that is a copy. Otherwise the source,
+ *            with the neighbours that are read, must not overlap the destination.
+ *  Notes     Rectangles, lines and what a few of these cover cost the same at any size; other masks cost by the
+ *            number of their runs. Masks of more than 32 elements, and work in place, take memory from
+ *            qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (maskSize.width or height below 1),
+ *            QOR_ERR_ZERO_MASK (all bytes of the mask are 0), QOR_ERR_ANCHOR (anchor outside the mask),
+ *            QOR_ERR_STEP_TOO_SMALL (srcStep below the bytes of roiSize.width + maskSize.width - 1 pixels,
+ *            dstStep below those of roiSize.width), QOR_ERR_NO_MEMORY (no memory for a mask of more than 32
+ *            elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDilate_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+
+/** Dilation by a mask of bytes in place.
+ *  Shapes    Image and mask as of the form with two images.
+ *  Elements  32f: the minimumNumber and maximumNumber of IEEE 754-2019: a NaN takes no part, windows of nothing
+ *            else give the quiet NaN, and -0 is below +0. A mask with a single non-zero byte copies, bit by
+ *            bit. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
+ *  Notes     Takes memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (maskSize.width or height below 1),
+ *            QOR_ERR_ZERO_MASK (all bytes of the mask are 0), QOR_ERR_ANCHOR (anchor outside the mask),
+ *            QOR_ERR_STEP_TOO_SMALL (srcDstStep below the bytes of roiSize.width + maskSize.width - 1 pixels),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDilate_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriDilate_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    const uint8_t* pMask, QorImageSize maskSize, QorPoint2D anchor);
 
 /* ---- Norms, sums, means and dot products ---------------------------------------------------------------------- */
 

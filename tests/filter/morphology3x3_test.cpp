@@ -1,31 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
-#include <cmath>
-
-#include "harness/window.h"
-#include "reference/morphology.h"
+#include "extreme_cases.h"
 
 namespace qori::test {
 namespace {
 
 constexpr Around kSquare{1, 1, 1, 1};
 constexpr int kStreamsFrom = 1'048'576;  ///< Bytes of traffic up to which no call streams.
-
-/// In floats, one image in two is nearly all NaNs, zeros of both signs, infinities and subnormals.
-template <class T>
-struct Drawn {
-    bool special = std::is_floating_point_v<T> && random().oneIn(2);
-
-    T operator()() const {
-        using Limits = std::numeric_limits<T>;
-        if constexpr (std::is_floating_point_v<T>)
-            if (special && !random().oneIn(16)) {
-                constexpr T values[] = {T(0), -T(0), Limits::infinity(), -Limits::infinity(), Limits::denorm_min()};
-                const int i = random().below(20);
-                return i < 5 ? values[i] : std::copysign(Limits::quiet_NaN(), i % 2 == 0 ? T(1) : T(-1));
-            }
-        return random().value<T>();
-    }
-};
 
 template <class T, Layout L, Kind kind, bool largest, class Function>
 void checkSquare(const Shape& shape, Function function) {
@@ -43,7 +23,7 @@ void checkSquare(const Shape& shape, Function function) {
                 for (int dx = -1; dx <= 1; ++dx) extreme.meet(pixel(dx, dy));
             return extreme.value();
         },
-        Drawn<T>{});
+        ExtremeElement<T>{});
 }
 
 /// The smallest steps that pass are those of the sweep's packed images.

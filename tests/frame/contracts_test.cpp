@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Null pointers, sizes and steps below 1, alone and in pairs, for every export: the status is the one that the header
 // lists first, and nothing is written. Arguments are made from the prototypes, expectations from the header's words.
+#include <algorithm>
 #include <cstring>
 #include <string>
 #include <string_view>
@@ -84,6 +85,9 @@ struct Status {
 };
 constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_SIZE", QOR_ERR_SIZE},
+                                {"QOR_ERR_ZERO_MASK", QOR_ERR_ZERO_MASK},
+                                {"QOR_ERR_ANCHOR", QOR_ERR_ANCHOR},
+                                {"QOR_ERR_MASK_SIZE", QOR_ERR_MASK_SIZE},
                                 {"QOR_ERR_STEP", QOR_ERR_STEP},
                                 {"QOR_WARN_NOTHING_TO_DO", QOR_WARN_NOTHING_TO_DO},
                                 {"QOR_ERR_BAD_ARG", QOR_ERR_BAD_ARG},
@@ -129,7 +133,7 @@ public:
                     if (is("QOR_WARN_NOTHING_TO_DO")) return i;
                     [[fallthrough]];
                 case Flaw::negativeSize:
-                    if (is("QOR_ERR_SIZE")) return i;
+                    if (is(hasOwnStatus(name) ? "QOR_ERR_MASK_SIZE" : "QOR_ERR_SIZE")) return i;
                     break;
                 case Flaw::zeroStep:
                     if (is("QOR_ERR_STEP") && (has(check, "a step") || names(check, name))) return i;
@@ -190,6 +194,12 @@ private:
             if (name == status.name) return status.value;
         ADD_FAILURE() << "unknown status in \"" << text << '"';
         return QOR_OK;
+    }
+    /// Whether the size of a mask is refused otherwise than those of regions.
+    bool hasOwnStatus(const std::string& size) const {
+        return std::any_of(checks_.begin(), checks_.end(), [&](const std::string& check) {
+            return has(check, "QOR_ERR_MASK_SIZE") && names(check, size);
+        });
     }
     bool isStep(int i) const {
         const std::string& name = names_[static_cast<size_t>(i)];

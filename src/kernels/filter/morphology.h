@@ -1,14 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 // Grey-level erosion and dilation: smallest and largest elements of windows.
 //
-// Floats: a NaN is no number and takes no part; a window of nothing else gives the quiet NaN. Extremes join in row
-// order, and of equal ones the later stays, so that zeros of either sign come out the same however rows are grouped.
-// They read the control register: run them under the default one.
+// Floats: a NaN is no number and takes no part; a window of nothing else gives the quiet NaN. -0 is below +0, which the
+// instructions do not know: they join as it comes, and the few vectors where that may be wrong are made again. They
+// read the control register: run them under the default one.
 #pragma once
 #include <limits>
 
 #include "kernels/map.h"
-#include "kernels/simd.h"
+#include "kernels/vector_math.h"
 
 namespace qori::kernels {
 
@@ -19,17 +19,12 @@ struct Erosion {
     static constexpr T start =
         std::is_floating_point_v<T> ? std::numeric_limits<T>::infinity() : std::numeric_limits<T>::max();
 
-    /// `later` where the two are equal, or where `first` is NaN.
-    QORI_INLINE static Vec<T> join(Vec<T> first, Vec<T> later) {
-        if constexpr (std::is_same_v<T, double>)
-            return {_mm256_min_pd(first.v, later.v)};
-        else if constexpr (std::is_same_v<T, float>)
-            return {_mm256_min_ps(first.v, later.v)};
-        else if constexpr (sizeof(T) == 1)
-            return {_mm256_min_epu8(first.v, later.v)};
-        else
-            return {_mm256_min_epu16(first.v, later.v)};
-    }
+    /// `later` where `first` is NaN.
+    QORI_INLINE static Vec<T> join(Vec<T> first, Vec<T> later) { return smaller(first, later); }
+    /// Sign bits that some element has.
+    QORI_INLINE static __m256i joinSigns(__m256i a, __m256i b) { return _mm256_or_si256(a, b); }
+    /// Where one of these should have been the result's.
+    QORI_INLINE static __m256i missed(__m256i result, __m256i signs) { return _mm256_andnot_si256(result, signs); }
 };
 
 template <class T>
@@ -38,16 +33,10 @@ struct Dilation {
     static constexpr T start =
         std::is_floating_point_v<T> ? -std::numeric_limits<T>::infinity() : std::numeric_limits<T>::min();
 
-    QORI_INLINE static Vec<T> join(Vec<T> first, Vec<T> later) {
-        if constexpr (std::is_same_v<T, double>)
-            return {_mm256_max_pd(first.v, later.v)};
-        else if constexpr (std::is_same_v<T, float>)
-            return {_mm256_max_ps(first.v, later.v)};
-        else if constexpr (sizeof(T) == 1)
-            return {_mm256_max_epu8(first.v, later.v)};
-        else
-            return {_mm256_max_epu16(first.v, later.v)};
-    }
+    QORI_INLINE static Vec<T> join(Vec<T> first, Vec<T> later) { return larger(first, later); }
+    /// Sign bits that all elements have.
+    QORI_INLINE static __m256i joinSigns(__m256i a, __m256i b) { return _mm256_and_si256(a, b); }
+    QORI_INLINE static __m256i missed(__m256i result, __m256i signs) { return _mm256_andnot_si256(signs, result); }
 };
 
 /// How results reach the destination.
@@ -67,48 +56,76 @@ struct SquareRows {
 };
 
 template <class T>
-QORI_INLINE auto splat(T value) {
-    if constexpr (std::is_same_v<T, float>)
-        return Vec<T>{_mm256_set1_ps(value)};
-    else
-        return Vec<T>{_mm256_set1_pd(value)};
-}
-
-template <class T>
-QORI_INLINE auto isNan(Vec<T> a) {
-    if constexpr (std::is_same_v<T, float>)
-        return _mm256_cmp_ps(a.v, a.v, _CMP_UNORD_Q);
-    else
-        return _mm256_cmp_pd(a.v, a.v, _CMP_UNORD_Q);
-}
-
-/// One bit per lane that equals b.
-template <class T>
-QORI_INLINE int equalLanes(Vec<T> a, Vec<T> b) {
-    if constexpr (std::is_same_v<T, float>)
-        return _mm256_movemask_ps(_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ));
-    else
-        return _mm256_movemask_pd(_mm256_cmp_pd(a.v, b.v, _CMP_EQ_OQ));
-}
-
-template <class T>
 QORI_INLINE Vec<T> loadElements(const T* p, ptrdiff_t count) {
     return count == Vec<T>::lanes ? load(p) : loadPartial(p, count);
 }
 
-/// Puts NaN where the nine elements of a window are. Rare: only an extreme that equals Order::start leads here.
-template <class T, int rows>
-QORI_NOINLINE void markNans(SquareRows<T, rows> image, ptrdiff_t at, ptrdiff_t channels, ptrdiff_t count, Vec<T>* out) {
-    const Vec<T> nan = splat(std::numeric_limits<T>::quiet_NaN());
+/// The extremes of windows with NaNs or with zeros of either sign, element by element. Not for what is common.
+template <class Order, class T, int rows>
+QORI_NOINLINE void exactExtremes(SquareRows<T, rows> image, ptrdiff_t at, ptrdiff_t channels, ptrdiff_t count,
+                                 Vec<T>* out) {
+    const Vec<T> start = splat(Order::start), nan = splat(std::numeric_limits<T>::quiet_NaN());
     for (int k = 0; k < rows; ++k) {
-        auto nans = isNan(nan);
+        Vec<T> best = start;
+        Mask<T> nans = isNan(nan);
         for (int j = k; j < k + 3; ++j)
             for (ptrdiff_t i = -1; i <= 1; ++i) {
-                const auto own = isNan(loadElements(image.src[j] + at + i * channels, count));
-                nans = fromInteger<T>(_mm256_and_si256(toInteger(nans), toInteger(own))).v;
+                const Vec<T> read = loadElements(image.src[j] + at + i * channels, count);
+                const Vec<T> number = select(isNan(read), start, read);
+                nans = nans & isNan(read);
+                // Of zeros, either order gives one of the two.
+                best = fromInteger<T>(
+                    Order::joinSigns(toInteger(Order::join(best, number).v), toInteger(Order::join(number, best).v)));
             }
-        out[k] = fromInteger<T>(_mm256_blendv_epi8(toInteger(out[k].v), toInteger(nan.v), toInteger(nans)));
+        out[k] = select(nans, nan, best);
     }
+}
+
+/// The extreme of some elements, and for floats their signs, joined as they are.
+template <class Order>
+struct Joined {
+    using T = typename Order::Element;
+    static constexpr bool isFloat = std::is_floating_point_v<T>;
+
+    Vec<T> best;
+    __m256i signs;
+
+    QORI_INLINE static Joined of(const T* row, ptrdiff_t channels, auto count) {
+        const Vec<T> left = loadElements(row - channels, count), middle = loadElements(row, count);
+        Vec<T> right = loadElements(row + channels, count);
+        Joined joined;
+        if constexpr (isFloat) {
+            joined.signs =
+                Order::joinSigns(Order::joinSigns(toInteger(left.v), toInteger(middle.v)), toInteger(right.v));
+            right = Order::join(right, splat(Order::start));
+        }
+        joined.best = Order::join(left, Order::join(middle, right));
+        return joined;
+    }
+    QORI_INLINE Joined with(Joined later) const {
+        Joined joined;
+        joined.best = Order::join(best, later.best);
+        if constexpr (isFloat) joined.signs = Order::joinSigns(signs, later.signs);
+        return joined;
+    }
+};
+
+/// Whether some lane may be wrong: its window has a sign that it should have, or nothing but NaNs. NaNs have signs too.
+template <class Order, int rows>
+QORI_INLINE bool isDoubtful(const Joined<Order>* made) {
+    using T = typename Order::Element;
+    Vec<T> most = made[0].best;
+    __m256i missed = Order::missed(toInteger(most.v), made[0].signs);
+    for (int k = 1; k < rows; ++k) {
+        most = Order::start > 0 ? larger(most, made[k].best) : smaller(most, made[k].best);
+        missed = _mm256_or_si256(missed, Order::missed(toInteger(made[k].best.v), made[k].signs));
+    }
+    const __m256i unmade = isEqual(most, splat(Order::start)).v;
+    const auto doubts = fromInteger<T>(_mm256_or_si256(missed, unmade));
+    if constexpr (std::is_same_v<T, float>)
+        return _mm256_movemask_ps(doubts.v) != 0;
+    else
+        return _mm256_movemask_pd(doubts.v) != 0;
 }
 
 /// The extremes of the windows around `count` elements of each destination row. Each row's extreme of three neighbours
@@ -116,32 +133,25 @@ QORI_NOINLINE void markNans(SquareRows<T, rows> image, ptrdiff_t at, ptrdiff_t c
 /// address is known may be changed by any store.
 template <class Order, class T, int rows, class Channels, class Count>
 QORI_INLINE void squareExtremes(SquareRows<T, rows> image, ptrdiff_t at, Channels channels, Count count, Vec<T>* out) {
-    constexpr bool isFloat = std::is_floating_point_v<T>;
     const auto across = [=](int row) __attribute__((always_inline)) {
-        const T* const p = image.src[row] + at;
-        Vec<T> last = loadElements(p + channels, count);
-        if constexpr (isFloat) last = Order::join(last, splat(Order::start));
-        return Order::join(loadElements(p - channels, count), Order::join(loadElements(p, count), last));
+        return Joined<Order>::of(image.src[row] + at, channels, count);
     };
-    Vec<T> first = across(0), second = across(1);
+    Joined<Order> made[rows];
+    Joined<Order> first = across(0), second = across(1);
     for (int k = 0; k < rows; k += 2) {
-        const Vec<T> third = across(k + 2), shared = Order::join(second, third);
-        out[k] = Order::join(first, shared);
+        const Joined<Order> third = across(k + 2), shared = second.with(third);
+        made[k] = first.with(shared);
         if (k + 1 == rows) break;
         second = across(k + 3);
-        out[k + 1] = Order::join(shared, second);
+        made[k + 1] = shared.with(second);
         first = third;
     }
-    if constexpr (isFloat) {
-        Vec<T> most = out[0];
-        for (int k = 1; k < rows; ++k)
-            most = Order::start > 0 ? Dilation<T>::join(most, out[k]) : Erosion<T>::join(most, out[k]);
-        if (equalLanes(most, splat(Order::start)) != 0) {
-            Vec<T> marked[rows];  // so that `out` stays in registers
-            for (int k = 0; k < rows; ++k) marked[k] = out[k];
-            markNans(image, at, channels, count, marked);
-            for (int k = 0; k < rows; ++k) out[k] = marked[k];
-        }
+    for (int k = 0; k < rows; ++k) out[k] = made[k].best;
+    if constexpr (std::is_floating_point_v<T>) {
+        if (!isDoubtful<Order, rows>(made)) return;
+        Vec<T> exact[rows];  // so that `out` stays in registers
+        exactExtremes<Order>(image, at, channels, count, exact);
+        for (int k = 0; k < rows; ++k) out[k] = exact[k];
     }
 }
 

@@ -1,0 +1,103 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "extreme.h"
+
+#include "extreme_run.h"
+
+namespace qori::filter {
+namespace {
+
+/// Out of place a region is done in tiles of columns, so that the rows in work stay in the second-level cache.
+constexpr int64_t kCached = 256 * 1024;
+constexpr int64_t kOnStack = 32 * 1024;
+
+template <class Run, class T>
+int64_t workBytes(const ExtremeTask<T>& task, int32_t width) {
+    WorkBuffer measured(nullptr);
+    const ExtremeTask<T> tile = task.columns(0, width);
+    const Run run(tile, measured);
+    return measured.bytes();
+}
+
+/// The width of tiles whose work memory keeps to a limit, if any does.
+template <class Run, class T>
+int32_t tileWidth(const ExtremeTask<T>& task, int64_t limit) {
+    if (task.isInPlace) return task.roi.width;
+    constexpr int32_t kLeast = 64 / static_cast<int32_t>(sizeof(T));
+    int32_t tiles = 1, width = task.roi.width;
+    while (width > kLeast && workBytes<Run>(task, width) > limit) {
+        tiles = tiles < INT32_MAX / 2 ? 2 * tiles : INT32_MAX;
+        width = std::max(kLeast, static_cast<int32_t>(roundUp((int64_t{task.roi.width} - 1) / tiles + 1, kLeast)));
+    }
+    return std::min(width, task.roi.width);
+}
+
+template <class Run, class T>
+void runTiles(const ExtremeTask<T>& task, int32_t width, uint8_t* memory) {
+    for (int64_t x = 0; x < task.roi.width; x += width) {
+        const auto left = static_cast<int32_t>(x);
+        const ExtremeTask<T> tile = task.columns(left, std::min(width, task.roi.width - left));
+        WorkBuffer work(memory);
+        Run(tile, work).run();
+    }
+}
+
+template <class Run, class T>
+QORI_NOINLINE QorResult runOnStack(const ExtremeTask<T>& task) {
+    const int32_t width = tileWidth<Run>(task, kOnStack);
+    if (workBytes<Run>(task, width) > kOnStack) return QOR_ERR_NO_MEMORY;
+    uint8_t memory[kOnStack];
+    runTiles<Run>(task, width, memory);
+    return QOR_OK;
+}
+
+template <class Run, class T>
+QorResult runIn(const ExtremeTask<T>& task, WorkFrom from) {
+    if (from == WorkFrom::stackIfItFits && workBytes<Run>(task, task.roi.width) <= kOnStack)
+        return runOnStack<Run>(task);
+    const int32_t width = tileWidth<Run>(task, kCached);
+    const WorkMemory memory(workBytes<Run>(task, width));
+    if (memory.check() != QOR_OK) return from == WorkFrom::allocator ? QOR_ERR_NO_MEMORY : runOnStack<Run>(task);
+    runTiles<Run>(task, width, memory.begin<uint8_t>());
+    return QOR_OK;
+}
+
+template <class Order, bool keyed, class T>
+QorResult runCover(const ExtremeTask<T>& task, WorkFrom from) {
+    return task.cover.rects > 0 ? runIn<RectRun<Order, keyed>>(task, from) : runIn<TapRun<Order, keyed>>(task, from);
+}
+
+template <class T, bool largest>
+using OrderOf = std::conditional_t<largest, kernels::Largest<T>, kernels::Smallest<T>>;
+
+}  // namespace
+
+template <class S, bool largest>
+QorResult extremeOf(Image<const S> src, Image<S> dst, QorImageSize roi, Layout layout, const Window& window,
+                    WorkFrom memory) {
+    constexpr bool isFloat = std::is_floating_point_v<S>;
+    using T = std::conditional_t<isFloat, kernels::Key, S>;
+    using Order = OrderOf<T, largest>;
+    const ExtremeTask<T> task{{reinterpret_cast<const T*>(src.data), src.step},
+                              {reinterpret_cast<T*>(dst.data), dst.step},
+                              roi,
+                              channels(layout),
+                              layout == Layout::AC4,
+                              src.data == dst.data && src.step == dst.step,
+                              window,
+                              coverOf(window)};
+    // One pixel is what it is, payloads of NaNs included.
+    if constexpr (isFloat)
+        if (!task.cover.isOnePixel()) return runCover<Order, true>(task, memory);
+    return runCover<Order, false>(task, memory);
+}
+
+#define QORI_EXTREMES(S)                                                                                             \
+    template QorResult extremeOf<S, false>(Image<const S>, Image<S>, QorImageSize, Layout, const Window&, WorkFrom); \
+    template QorResult extremeOf<S, true>(Image<const S>, Image<S>, QorImageSize, Layout, const Window&, WorkFrom);
+QORI_EXTREMES(uint8_t)
+QORI_EXTREMES(uint16_t)
+QORI_EXTREMES(int16_t)
+QORI_EXTREMES(float)
+#undef QORI_EXTREMES
+
+}  // namespace qori::filter

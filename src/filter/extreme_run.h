@@ -1,0 +1,322 @@
+// SPDX-License-Identifier: Apache-2.0
+// Smallest and largest elements of windows over a region, from top to bottom and row by row. Two ways, by the cover:
+//
+//     rectangles   Rows are joined with themselves until an element is the extreme of a rectangle's width; these rows
+//                  enter a block of the rectangle's height, in which the extremes of its first rows are kept as they
+//                  come and, once it is full, those of its last rows are made backwards: a window is the last rows of
+//                  one block and the first of the next, whatever the height (van Herk 1992; Gil, Werman 1993).
+//     taps         Levels of a row are the row joined with itself to 2, 4, 8 ... pixels; all taps of a pixel are
+//     joined.
+//
+// In place and for floats, source rows are copied, the latter as keys; else they are read where they are.
+#pragma once
+#include "frame/plan.h"
+#include "frame/row_window.h"
+#include "kernels/copy_rows.h"
+#include "kernels/morphology/joins.h"
+#include "window_cover.h"
+
+namespace qori::filter {
+
+template <class T>
+struct ExtremeTask {
+    Image<const T> src;
+    Image<T> dst;
+    QorImageSize roi;
+    int32_t channels;
+    bool keepAlpha;
+    bool isInPlace;
+    Window window;
+    WindowCover cover;
+
+    ptrdiff_t elements(int64_t pixels) const { return static_cast<ptrdiff_t>(pixels * channels); }
+    /// The task of some of its columns.
+    ExtremeTask columns(int32_t x, int32_t width) const {
+        ExtremeTask part = *this;
+        part.src.data += elements(x);
+        part.dst.data += elements(x);
+        part.roi.width = width;
+        return part;
+    }
+};
+
+/// Rows of T, by their number in the ring.
+template <class T>
+struct ElementRows {
+    RowRing ring{};
+
+    void take(WorkBuffer& work, int64_t elements, int32_t rows) {
+        constexpr int64_t lanes = 32 / static_cast<int64_t>(sizeof(T));
+        const int64_t padded = roundUp(elements, lanes);
+        ring = {reinterpret_cast<uint8_t*>(work.take<T>(padded * rows)), padded * static_cast<int64_t>(sizeof(T)),
+                rows};
+    }
+    T* row(int32_t slot) const { return reinterpret_cast<T*>(ring.row(slot)); }
+};
+
+/// Source rows as joins want them, from the box's first column on. For a group of destination rows from y on, those of
+/// y + lowest to y + group - 1 + highest are there.
+template <class Order, bool keyed>
+class SourceRows {
+public:
+    using T = typename Order::Element;
+
+    SourceRows(const ExtremeTask<T>& task, int32_t lowest, int32_t group, bool isKept, WorkBuffer& work)
+        : task_(task), entered_(task.cover.box.y), isKept_(isKept || keyed) {
+        const int32_t highest = task.cover.lastRow();
+        ahead_ = task.isInPlace && highest < 0 ? 0 : highest;
+        elements_ = task.elements(int64_t{task.roi.width} + task.cover.box.width - 1);
+        if (isKept_) rows_.take(work, elements_, ahead_ - lowest + group);
+    }
+
+    /// Before the destination's rows up to y are written: what they and later ones see is kept. Calls entered(row) for
+    /// each row that comes.
+    template <class Entered>
+    void enter(int32_t y, Entered entered) {
+        const int32_t lastSeen = task_.roi.height - 1 + task_.cover.lastRow();
+        for (; entered_ <= y + ahead_ && entered_ <= lastSeen; ++entered_) {
+            if (isKept_) copy(entered_);
+            entered(entered_);
+        }
+    }
+    const T* row(int32_t y) const {
+        return isKept_ ? rows_.row((y - task_.cover.box.y) % rows_.ring.rows) : inImage(y);
+    }
+
+private:
+    const T* inImage(int32_t y) const { return task_.src.row(y) + ptrdiff_t{task_.cover.box.x} * task_.channels; }
+    void copy(int32_t y) {
+        const T* const from = inImage(y);
+        T* const to = rows_.row((y - task_.cover.box.y) % rows_.ring.rows);
+        if constexpr (keyed)
+            kernels::join<Order, kernels::IntoKeys<Order>>(&from, 1, to, elements_);
+        else
+            kernels::copyRow(asBytes(to), asBytes(from), elements_ * elementBytes<T>);
+    }
+
+    const ExtremeTask<T>& task_;
+    ElementRows<T> rows_;
+    int32_t entered_, ahead_;
+    ptrdiff_t elements_;
+    bool isKept_;
+};
+
+/// Joins into a row of the destination.
+template <class Order, bool keyed, class T>
+void joinInto(const ExtremeTask<T>& task, int32_t y, const T* const* taps, int count) {
+    using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
+    const ptrdiff_t elements = task.elements(task.roi.width);
+    if (task.keepAlpha)
+        kernels::join<Order, Finish, true>(taps, count, task.dst.row(y), elements);
+    else
+        kernels::join<Order, Finish>(taps, count, task.dst.row(y), elements);
+}
+
+// --- rectangles -----------------------------------------------------------------------------------------------------
+
+/// Destination rows made at a time: what joins hold in registers from row to row is loaded and stored once for all.
+inline constexpr int32_t kGroup = kernels::kMostEntering;
+
+/// The extremes of a rectangle, some rows at a time.
+template <class Order>
+class RunningRect {
+public:
+    using T = typename Order::Element;
+
+    void take(const QorImageRect& rect, ptrdiff_t elements, WorkBuffer& work) {
+        rect_ = rect;
+        elements_ = elements;
+        block_.take(work, elements, rect.height);
+        soFar_.take(work, elements, 1);
+    }
+    const QorImageRect& rect() const { return rect_; }
+    /// The source row that completes the rectangles of destination row y.
+    int32_t rowFor(int32_t y) const { return y + rect_.y + rect_.height - 1; }
+    /// Rows that enter together, of so many: those up to the end of a block.
+    int32_t together(int32_t rows) const { return std::min(rows, rect_.height - phase_); }
+
+    /// Rows enter, each the join of its taps, and are joined with what is elsewhere.
+    template <class Finish, bool keepAlpha>
+    void enter(int32_t rows, const T* const* taps, int tapsEach, const T* const* elsewhere, T* const* to) {
+        kernels::EnteringRow<T> row[kGroup];
+        for (int32_t k = 0; k < rows; ++k) {
+            T* const entering = block_.row(phase_ + k);
+            row[k] = {entering, phase_ + k + 1 < rect_.height ? block_.row(phase_ + k + 1) : nullptr,
+                      elsewhere == nullptr ? nullptr : elsewhere[k], to[k]};
+        }
+        const T* const before = phase_ == 0 ? nullptr : soFar_.row(0);
+        kernels::enterBlock<Order, Finish, keepAlpha>(
+            kernels::EnteringRows<T>{taps, tapsEach, row, rows, before, soFar_.row(0), elements_});
+        phase_ += rows;
+        if (phase_ == rect_.height) endBlock();
+    }
+
+private:
+    void endBlock() {
+        phase_ = 0;
+        if (rect_.height <= 2) return;
+        const auto step = static_cast<ptrdiff_t>(block_.ring.rowBytes) / elementBytes<T>;
+        kernels::joinBlockUpwards<Order>(block_.row(rect_.height - 1), step, rect_.height - 1, elements_);
+    }
+
+    QorImageRect rect_{};
+    ptrdiff_t elements_ = 0;
+    ElementRows<T> block_, soFar_;
+    int32_t phase_ = 0;
+};
+
+template <class Order, bool keyed>
+class RectRun {
+public:
+    using T = typename Order::Element;
+
+    RectRun(const ExtremeTask<T>& task, WorkBuffer& work)
+        : task_(task), source_(task, lowestRow(task.cover), kGroup, isKept(task), work) {
+        const ptrdiff_t elements = task.elements(task.roi.width);
+        int32_t widest = 1;
+        for (int k = 0; k < task.cover.rects; ++k) {
+            running_[k].take(task.cover.rect[k], elements, work);
+            widening_[k] = Widening::to(task.cover.rect[k].width);
+            widest = std::max(widest, task.cover.rect[k].width);
+        }
+        for (ElementRows<T>& rows : wider_)
+            rows.take(work, task.elements(int64_t{task.roi.width} + widest - 1), kGroup);
+        joined_.take(work, elements, kGroup);
+    }
+
+    void run() {
+        int32_t tallest = 1;
+        for (int k = 0; k < task_.cover.rects; ++k) tallest = std::max(tallest, task_.cover.rect[k].height);
+        for (int32_t y = 1 - tallest; y < task_.roi.height; y += kGroup) {
+            const int32_t end = std::min(y + kGroup, task_.roi.height);
+            source_.enter(end - 1, [](int32_t) {});
+            for (int k = 0; k < task_.cover.rects; ++k) {
+                int32_t row = std::max(y, 1 - task_.cover.rect[k].height);
+                while (row < end) row += enter(k, row, row - y, running_[k].together(end - row));
+            }
+        }
+    }
+
+private:
+    static int32_t lowestRow(const WindowCover& cover) {
+        int32_t lowest = INT32_MAX;
+        for (int k = 0; k < cover.rects; ++k) lowest = std::min(lowest, cover.rect[k].y + cover.rect[k].height - 1);
+        return lowest;
+    }
+    /// In place, rows need no copy where all rectangles end in the same row, below the group that is written.
+    static bool isKept(const ExtremeTask<T>& task) {
+        return task.isInPlace && (task.cover.lastRow() < kGroup || lowestRow(task.cover) < task.cover.lastRow());
+    }
+
+    /// Rows of a rectangle, the first of them row `at` of the group, joined with those of the rectangles before it; of
+    /// the last one they are the destination's. Nobody wants what comes before its first row.
+    int32_t enter(int k, int32_t y, int32_t at, int32_t rows) {
+        const T* taps[kGroup * Widening::kMostRadix];
+        const T* elsewhere[kGroup];
+        T* to[kGroup];
+        const bool isLast = k + 1 == task_.cover.rects;
+        for (int32_t i = 0; i < rows; ++i) {
+            elsewhere[i] = joined_.row(at + i);
+            to[i] = isLast && y + i >= 0 ? task_.dst.row(y + i) : joined_.row(at + i);
+        }
+        const int count = widen(k, y, rows, taps);
+        const T* const* const others = k > 0 ? elsewhere : nullptr;
+        using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
+        if (!isLast)
+            running_[k].template enter<kernels::AsIs, false>(rows, taps, count, others, to);
+        else if (task_.keepAlpha)
+            running_[k].template enter<Finish, true>(rows, taps, count, others, to);
+        else
+            running_[k].template enter<Finish, false>(rows, taps, count, others, to);
+        return rows;
+    }
+
+    /// Joins rows with themselves, but for the last pass, whose taps it sets; returns their number for each row. All
+    /// rows make a pass before any makes the next: loads across recent stores wait for these.
+    int widen(int k, int32_t y, int32_t rows, const T** taps) {
+        const QorImageRect& rect = task_.cover.rect[k];
+        const T* row[kGroup];
+        for (int32_t i = 0; i < rows; ++i)
+            row[i] = source_.row(running_[k].rowFor(y + i)) + task_.elements(rect.x - task_.cover.box.x);
+        int32_t has = 1;
+        for (int32_t pass = 0;; ++pass) {
+            const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening_[k].radix, rect.width));
+            const int count = (next - 1) / has + 1;
+            for (int32_t i = 0; i < rows; ++i)
+                for (int t = 0; t < count; ++t)
+                    taps[i * count + t] = row[i] + task_.elements(std::min(t * has, next - has));
+            if (next == rect.width) return count;
+            for (int32_t i = 0; i < rows; ++i) {
+                T* const out = wider_[pass % 2].row(i);
+                kernels::join<Order>(taps + i * count, count, out,
+                                     task_.elements(int64_t{task_.roi.width} + rect.width - next));
+                row[i] = out;
+            }
+            has = next;
+        }
+    }
+
+    const ExtremeTask<T>& task_;
+    SourceRows<Order, keyed> source_;
+    RunningRect<Order> running_[WindowCover::kMostRects];
+    Widening widening_[WindowCover::kMostRects]{};
+    ElementRows<T> wider_[2];
+    ElementRows<T> joined_;
+};
+
+// --- taps -----------------------------------------------------------------------------------------------------------
+
+template <class Order, bool keyed>
+class TapRun {
+public:
+    using T = typename Order::Element;
+
+    TapRun(const ExtremeTask<T>& task, WorkBuffer& work)
+        : task_(task), source_(task, task.cover.box.y, 1, task.isInPlace, work) {
+        taps_ = work.take<Tap>(task.cover.taps);
+        rows_ = work.take<const T*>(task.cover.taps);
+        const int32_t ahead = task.isInPlace ? std::max(task.cover.lastRow(), 0) : task.cover.lastRow();
+        for (int32_t level = 1; level <= task.cover.levels; ++level)
+            level_[level].take(work, task.elements(widthOf(level)), ahead - task.cover.box.y + 1);
+    }
+
+    void run() {
+        Tap* next = taps_;
+        forEachTap(task_.window, task_.cover.levels > 0, [&](Tap tap) { *next++ = tap; });
+        for (int32_t y = 0; y < task_.roi.height; ++y) {
+            source_.enter(y, [this](int32_t row) { raise(row); });
+            for (int64_t k = 0; k < task_.cover.taps; ++k) {
+                const Tap tap = taps_[k];
+                rows_[k] = rowOf(tap.level, y + tap.y) + task_.elements(tap.x - task_.cover.box.x);
+            }
+            joinInto<Order, keyed>(task_, y, rows_, static_cast<int>(task_.cover.taps));
+        }
+    }
+
+private:
+    static constexpr int kMostLevels = 31;
+
+    int64_t widthOf(int32_t level) const {
+        return int64_t{task_.roi.width} + task_.cover.box.width - (int64_t{1} << level);
+    }
+    const T* rowOf(int32_t level, int32_t y) const {
+        if (level == 0) return source_.row(y);
+        return level_[level].row((y - task_.cover.box.y) % level_[level].ring.rows);
+    }
+    /// Makes the levels of a source row.
+    void raise(int32_t y) {
+        for (int32_t level = 1; level <= task_.cover.levels; ++level) {
+            const T* const lower = rowOf(level - 1, y);
+            const T* const both[] = {lower, lower + task_.elements(int64_t{1} << (level - 1))};
+            kernels::join<Order>(both, 2, const_cast<T*>(rowOf(level, y)), task_.elements(widthOf(level)));
+        }
+    }
+
+    const ExtremeTask<T>& task_;
+    SourceRows<Order, keyed> source_;
+    ElementRows<T> level_[kMostLevels];
+    Tap* taps_;
+    const T** rows_;
+};
+
+}  // namespace qori::filter
