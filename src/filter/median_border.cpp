@@ -49,21 +49,23 @@ QorResult medianBorderBufferSize(QorImageSize roi, QorImageSize mask, int32_t da
     return reportSize(bufferBytes(roi, mask, dataType, e), pBufferSize);
 }
 
-/// Networks, on rows straight from the image wherever it still has them. In place, eight rows of 5 x 5 and the four
-/// above them are saved, where the buffer has room for more than 15.
-template <class T>
-void runWindow(const BorderedImage& src, Image<T> dst, QorImageSize mask, bool inPlace, uint8_t* buffer) {
+/// What networks want of a window: in place, eight rows of 5 x 5 at a time, with the four above them.
+WindowNeeds networkNeeds(QorImageSize mask, bool inPlace) {
     constexpr int32_t kRowsOf5x5 = 8;
-    const Reach reach = Reach::ofKernel(mask);
-    const WindowNeeds needs{.reach = reach,
-                            .rowsAtOnce = networkRows(mask, kRowsOf5x5),
-                            .place = inPlace ? Place::anyOrder : Place::apart};
+    return {.reach = Reach::ofKernel(mask),
+            .rowsAtOnce = networkRows(mask, kRowsOf5x5),
+            .place = inPlace ? Place::anyOrder : Place::apart};
+}
+
+/// Networks, on rows straight from the image wherever it still has them.
+template <class T>
+void runWindow(const BorderedImage& src, Image<T> dst, QorImageSize mask, const WindowNeeds& needs, uint8_t* buffer) {
     RowWindow window(src, needs, buffer);
     window.forEach([&](const WindowPart& part, int32_t y, int32_t rows) {
         T* to[kMostNetworkRows];
         for (int32_t k = 0; k < rows; ++k) to[k] = dst.row(y + k) + part.x;
         medianByNetwork<false>(
-            mask, [&](int32_t k) { return part.row<T>(y + k - reach.top); }, to, rows, part.width, 1);
+            mask, [&](int32_t k) { return part.row<T>(y + k - needs.reach.top); }, to, rows, part.width, 1);
     });
 }
 
@@ -122,10 +124,13 @@ QorResult medianBorder(Image<const T> src, Image<T> dst, QorImageSize roi, QorIm
     }
     const BorderedImage image{asBytes(src.data), src.step, roi, elementBytes<T>, BorderRule::of(border, &value)};
     constexpr int32_t kCode = sizeof(T) == 1 ? qor8u : std::is_floating_point_v<T> ? qor32f : qor16u;
-    if (hasNetwork(mask) && isSmallerThan(mask, roi))
-        runWindow(image, dst, mask, inPlace, pBuffer);
+    // A region of few columns or rows leaves the buffer too small for the window, but never for a band.
+    const int64_t bytes = bufferBytes(roi, mask, kCode, elementBytes<T>);
+    const WindowNeeds needs = networkNeeds(mask, inPlace);
+    if (hasNetwork(mask) && RowWindow::bytes(image, needs) <= bytes)
+        runWindow(image, dst, mask, needs, pBuffer);
     else
-        runBands(image, dst, mask, pBuffer, bufferBytes(roi, mask, kCode, elementBytes<T>));
+        runBands(image, dst, mask, pBuffer, bytes);
     return QOR_OK;
 }
 
