@@ -91,8 +91,8 @@ void runBands(const BorderedImage& src, Image<T> dst, QorImageSize mask, uint8_t
     for (int32_t y = 0, rows; y < src.size.height; y += rows) {
         rows = std::min(most, src.size.height - y);
         gather(y + reach.bottom, rows, reach.rows());
-        const MedianJob<T> job{{reinterpret_cast<const T*>(buffer), step}, {dst.row(y), dst.step},
-                               {src.size.width, rows}, mask, 1, 1};
+        const MedianJob<T> job{
+            {reinterpret_cast<const T*>(buffer), step}, {dst.row(y), dst.step}, {src.size.width, rows}, mask, 1, 1};
         if (hasNetwork(mask)) {
             for (int32_t k = 0; k < rows; ++k) {
                 T* const to = job.dst.row(k);

@@ -21,7 +21,7 @@ inline QorResult oddMaskCheck(QorImageSize mask) {
     return mask.width < 1 || mask.height < 1 || !odd ? QOR_ERR_MASK_SIZE : QOR_OK;
 }
 
-constexpr int kMostNetworkRows = 32;
+constexpr int kMostNetworkRows = 16;
 
 /// Rows that the network of a mask makes at a time, at most. 5 x 5 puts four rows in order before the first.
 inline int32_t networkRows(QorImageSize mask, int32_t mostOf5x5 = kMostNetworkRows) {
@@ -31,12 +31,14 @@ inline int32_t networkRows(QorImageSize mask, int32_t mostOf5x5 = kMostNetworkRo
 /// `rows` destination rows by the network of a mask. source(k): the first element of row k of the first window;
 /// neighbours are `apart` elements away. Sources may not be destinations.
 template <bool keepAlpha, class T, class Source>
-void medianByNetwork(QorImageSize mask, Source source, T* const* dst, int32_t rows, ptrdiff_t elements, ptrdiff_t apart) {
+void medianByNetwork(QorImageSize mask, Source source, T* const* dst, int32_t rows, ptrdiff_t elements,
+                     ptrdiff_t apart) {
     const T* src[kMostNetworkRows + 4];
     if (mask.width == 1 || mask.height == 1) {
         const int n = mask.width * mask.height;
         for (int k = 0; k < n; ++k) src[k] = mask.width == 1 ? source(k) : source(0) + k * apart;
-        const auto medianOfRows = n == 3 ? kernels::medianOfRows<3, keepAlpha, T> : kernels::medianOfRows<5, keepAlpha, T>;
+        const auto medianOfRows =
+            n == 3 ? kernels::medianOfRows<3, keepAlpha, T> : kernels::medianOfRows<5, keepAlpha, T>;
         return medianOfRows(src, dst[0], elements);
     }
     for (int32_t k = 0; k < rows + mask.height - 1; ++k) src[k] = source(k);
@@ -75,22 +77,26 @@ public:
 
     void run(const MedianJob<uint8_t>& job) const {
         for (int c = 0; c < job.channels; ++c)
-            for (int32_t x = 0; x < job.size.width; x += columns_ - job.mask.width + 1) strip(job, ptrdiff_t{x} * job.apart + c, job.size.width - x);
+            for (int32_t x = 0; x < job.size.width; x += columns_ - job.mask.width + 1)
+                strip(job, ptrdiff_t{x} * job.apart + c, job.size.width - x);
     }
 
 private:
-    static constexpr int kCache = 192 << 10;
+    static constexpr int kCache = 44 << 10;
 
     void strip(const MedianJob<uint8_t>& job, ptrdiff_t at, int32_t width) const {
         const int32_t columns = std::min(columns_, width + job.mask.width - 1);
         Histograms histograms(histograms_, columns, job.mask.width);
         for (int32_t y = 0; y < job.mask.height; ++y) histograms.enter(job.windows.row(y) + at, job.apart);
         for (int32_t y = 0; y < job.size.height; ++y) {
-            if (y > 0) histograms.advance(job.windows.row(y + job.mask.height - 1) + at, job.windows.row(y - 1) + at, job.apart);
+            if (y > 0)
+                histograms.advance(job.windows.row(y + job.mask.height - 1) + at, job.windows.row(y - 1) + at,
+                                   job.apart);
             uint8_t* const to = job.dst.row(y) + at;
-            histograms.medians(job.below(), [=, apart = job.apart](int32_t x, int byte, int32_t) __attribute__((always_inline)) {
-                to[ptrdiff_t{x} * apart] = static_cast<uint8_t>(byte);
-            });
+            histograms.medians(
+                job.below(), [ =, apart = job.apart ](int32_t x, int byte, int32_t) __attribute__((always_inline)) {
+                    to[ptrdiff_t{x} * apart] = static_cast<uint8_t>(byte);
+                });
         }
     }
 
@@ -107,7 +113,7 @@ class OrdinalMedians {
 public:
     /// Sides of the pieces of which tiles are made, surroundings included.
     static int32_t sideOf(int32_t size, int32_t mask) {
-        const int64_t most = std::min(std::max(int64_t{kSide}, 2 * int64_t{mask}), Ordinals::kMostSide);
+        const int64_t most = std::min(std::max(int64_t{kSide}, 3 * int64_t{mask}), Ordinals::kMostSide);
         return static_cast<int32_t>(std::min(int64_t{size} + mask - 1, std::max(most, int64_t{mask})));
     }
     OrdinalMedians(WorkBuffer& memory, const MedianJob<T>& job)
@@ -123,12 +129,13 @@ public:
         for (int c = 0; c < job.channels; ++c)
             for (int32_t y = 0; y < job.size.height; y += height)
                 for (int32_t x = 0; x < job.size.width; x += width)
-                    tile(job, ptrdiff_t{x} * job.apart + c, y, {std::min(width, job.size.width - x), std::min(height, job.size.height - y)});
+                    tile(job, ptrdiff_t{x} * job.apart + c, y,
+                         {std::min(width, job.size.width - x), std::min(height, job.size.height - y)});
     }
 
 private:
     using Rest = typename Bins::Rest;
-    static constexpr int kSide = 192;
+    static constexpr int kSide = 90;
 
     void tile(const MedianJob<T>& job, ptrdiff_t at, int32_t y0, QorImageSize size) {
         const int32_t columns = size.width + job.mask.width - 1, rows = size.height + job.mask.height - 1;
@@ -137,13 +144,16 @@ private:
         for (int32_t y = 0; y < job.mask.height; ++y) histograms.enter(ordinals_.row(y), 1);
         for (int32_t y = 0; y < size.height; ++y) {
             if (y > 0) histograms.advance(ordinals_.row(y + job.mask.height - 1), ordinals_.row(y - 1), 1);
-            histograms.medians(job.below(), [bins = bytes_, rests = rests_](int32_t x, int bin, int32_t rest) __attribute__((always_inline)) {
-                bins[x] = static_cast<uint8_t>(bin);
-                rests[x] = static_cast<Rest>(rest);
-            });
+            histograms.medians(
+                job.below(),
+                [ bins = bytes_, rests = rests_ ](int32_t x, int bin, int32_t rest) __attribute__((always_inline)) {
+                    bins[x] = static_cast<uint8_t>(bin);
+                    rests[x] = static_cast<Rest>(rest);
+                });
             T* const to = job.dst.row(y0 + y) + at;
             for (int32_t x = 0; x < size.width; ++x)
-                to[ptrdiff_t{x} * job.apart] = ordinals_.element(bytes_[x], static_cast<int32_t>(rests_[x]), x, y, job.mask);
+                to[ptrdiff_t{x} * job.apart] =
+                    ordinals_.element(bytes_[x], static_cast<int32_t>(rests_[x]), x, y, job.mask);
         }
     }
 

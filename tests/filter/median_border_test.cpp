@@ -77,9 +77,8 @@ void checkJob(Function function, const Job& job) {
     const TestImage buffer = bufferOf<T>(job);
     auto* const source = src.data<uint8_t>() + inside;
     auto* const target = job.inPlace ? source : dst.data<uint8_t>();
-    ASSERT_EQ(QOR_OK,
-              call(function, reinterpret_cast<const T*>(source), src.step(), reinterpret_cast<T*>(target), dst.step(),
-                   job.roi, job.mask, job.border, constant, buffer.data<uint8_t>()));
+    ASSERT_EQ(QOR_OK, call(function, reinterpret_cast<const T*>(source), src.step(), reinterpret_cast<T*>(target),
+                           dst.step(), job.roi, job.mask, job.border, constant, buffer.data<uint8_t>()));
     QORI_EXPECT_UNCHANGED(dst, expected);
     if (!job.inPlace) {
         QORI_EXPECT_UNCHANGED(src, before);
@@ -102,8 +101,10 @@ void medianBorder(const char* name, Function function) {
         // Every way of sides, at regions around the mask's size in both directions.
         for (int32_t border = 0; border < 32; ++border)
             for (int i = 0; i < 6; ++i)
-                check({mask, {1 + random().below(2 * mask.width + 2), 1 + random().below(2 * mask.height + 2)},
-                       (border & 1) | border >> 1 << 4, i % 2 == 0});
+                check({mask,
+                       {1 + random().below(2 * mask.width + 2), 1 + random().below(2 * mask.height + 2)},
+                       (border & 1) | border >> 1 << 4,
+                       i % 2 == 0});
         for (int width = 1; width <= 70; ++width)
             check({mask, {width, 1 + random().below(24)}, drawBorder(), random().oneIn(2)});
         check({mask, {230, 40}, drawBorder(), true});
@@ -193,7 +194,8 @@ TEST(MedianBorder, ChecksInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_STEP_ALIGN, dst, word(100, -101, ok));
     QORI_EXPECT_STATUS(QOR_ERR_MASK_SIZE, dst, word(0, -100, ok));
     const auto real = [&](int32_t srcStep, int32_t dstStep) {
-        return qoriFilterMedianBorder_32f_C1R(src.data<float>(), srcStep, dst.data<float>(), dstStep, ok, even, 2, 0, b);
+        return qoriFilterMedianBorder_32f_C1R(src.data<float>(), srcStep, dst.data<float>(), dstStep, ok, even, 2, 0,
+                                              b);
     };
     for (int32_t step : {1, 2, 3, 102, -50}) {
         QORI_EXPECT_STATUS(QOR_ERR_STEP_ALIGN, dst, real(step, 100));
@@ -211,7 +213,8 @@ TEST(MedianBorder, QueryChecksInOrder) {
     for (QorImageSize mask : {QorImageSize{2, 3}, {3, 2}, {0, 3}, {3, -1}})
         EXPECT_EQ(QOR_ERR_MASK_SIZE, query({1, 1}, mask, 2, 2, &bytes));
     for (int32_t type : {0, 2, 19, -1}) EXPECT_EQ(QOR_ERR_DATA_TYPE, query({1, 1}, {3, 3}, type, 2, &bytes));
-    for (int32_t channels : {0, 2, 3, 4}) EXPECT_EQ(QOR_ERR_CHANNELS_UNSUPPORTED, query({1, 1}, {3, 3}, 1, channels, &bytes));
+    for (int32_t channels : {0, 2, 3, 4})
+        EXPECT_EQ(QOR_ERR_CHANNELS_UNSUPPORTED, query({1, 1}, {3, 3}, 1, channels, &bytes));
     for (QorImageSize roi : {QorImageSize{1, 1}, {INT32_MAX, INT32_MAX}})
         EXPECT_EQ(QOR_ERR_SIZE, query(roi, {INT32_MAX, INT32_MAX}, 13, 1, &bytes));
     EXPECT_EQ(QOR_ERR_SIZE, query({INT32_MAX, INT32_MAX}, {3, 3}, 1, 1, &bytes));

@@ -76,7 +76,8 @@ void medianBufferSize(const char* name, Function function) {
     for (int32_t channels : {0, 2, 5, -1}) expect(QOR_ERR_CHANNELS_UNSUPPORTED, -1, {20, 30}, {7, 9}, channels);
     expect(QOR_ERR_SIZE, -1, {20, 30}, {INT32_MAX, INT32_MAX}, 1);
     expect(QOR_ERR_SIZE, -1, {20, 30}, {INT32_MAX, 1}, 1);
-    EXPECT_EQ(QOR_ERR_NULL_PTR, call(function, QorImageSize{0, 0}, QorImageSize{0, 0}, 0, static_cast<int32_t*>(nullptr)));
+    EXPECT_EQ(QOR_ERR_NULL_PTR,
+              call(function, QorImageSize{0, 0}, QorImageSize{0, 0}, 0, static_cast<int32_t*>(nullptr)));
     markSwept(name);
 }
 
@@ -119,7 +120,8 @@ template <class T, Layout L, class Function>
 void medianHoriz(const char* name, Function function) {
     for (int reach : {1, 2})
         forShapes(everyNth(windowShapes(), 3), [=](const Shape& shape) {
-            checkShape<T, L>(function, shape, 21 + 20 * reach - 10, {reach, 0, reach, 0}, [](int, int) { return true; });
+            checkShape<T, L>(function, shape, 21 + 20 * reach - 10, {reach, 0, reach, 0},
+                             [](int, int) { return true; });
         });
     expectCodesRefused<T>(function, {31, 51});
     markSwept(name);
@@ -183,7 +185,8 @@ void checkColour(Function function, const Shape& shape, int reach, Palette<T> dr
             const auto& best = seen[reference::colourMedian(seen)];
             for (int c = 0; c < 3; ++c) expected.view<T>(n).set(x, y, c, best.channel[c]);
         }
-    const auto* const inside = reinterpret_cast<const T*>(src.data<uint8_t>() + ptrdiff_t{src.step()} * reach) + reach * n;
+    const auto* const inside =
+        reinterpret_cast<const T*>(src.data<uint8_t>() + ptrdiff_t{src.step()} * reach) + reach * n;
     EXPECT_EQ(QOR_OK, call(function, inside, src.step(), dst.data<T>(), dst.step(), shape.roi(), 11 + 22 * reach));
     QORI_EXPECT_UNCHANGED(dst, expected);
 }
@@ -260,8 +263,8 @@ public:
     }
     void run() {
         const int width = side_ * count_, anchor = side_ / 2;
-        ASSERT_EQ(QOR_OK, qoriFilterMedian_8u_C1R(pixels_.data() + anchor * width + anchor, width, result_.data(), width,
-                                                  {width - side_ + 1, rows_}, {side_, side_}, {anchor, anchor}));
+        ASSERT_EQ(QOR_OK, qoriFilterMedian_8u_C1R(pixels_.data() + anchor * width + anchor, width, result_.data(),
+                                                  width, {width - side_ + 1, rows_}, {side_, side_}, {anchor, anchor}));
     }
     int result(int pattern, int y) const { return result_[static_cast<size_t>((y * count_ + pattern) * side_)]; }
 
@@ -299,7 +302,8 @@ TEST(Median, EveryPatternOf5x5) {
             for (int i = 0; i < 10; ++i) patterns.set(p, 3 + i / 5, i % 5, (rest >> i & 1) != 0);
         patterns.run();
         for (int p = 0; p < kCount; ++p)
-            ASSERT_EQ(std::popcount(static_cast<unsigned>(p)) + std::popcount(rest) > 12 ? 255 : 0, patterns.result(p, 0))
+            ASSERT_EQ(std::popcount(static_cast<unsigned>(p)) + std::popcount(rest) > 12 ? 255 : 0,
+                      patterns.result(p, 0))
                 << "columns " << p << " and " << rest;
     }
 }
@@ -332,8 +336,8 @@ TEST(Median, EveryPatternOfCrosses) {
             for (int i = 0, bit = 0; i < side * side; ++i)
                 if (i / side == reach || i % side == reach)
                     pixels[static_cast<size_t>(i / side * width + p * side + i % side)] = (p >> bit++ & 1) != 0;
-        ASSERT_EQ(QOR_OK, qoriFilterMedianCross_8u_C1R(pixels.data() + reach * width + reach, width, result.data(), width,
-                                                       {width - 2 * reach, 1}, 11 + 22 * reach));
+        ASSERT_EQ(QOR_OK, qoriFilterMedianCross_8u_C1R(pixels.data() + reach * width + reach, width, result.data(),
+                                                       width, {width - 2 * reach, 1}, 11 + 22 * reach));
         for (int p = 0; p < count; ++p)
             ASSERT_EQ(std::popcount(static_cast<unsigned>(p)) > n / 2, result[static_cast<size_t>(p * side)] == 1)
                 << "pattern " << p << " of " << n;

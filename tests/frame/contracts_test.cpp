@@ -98,6 +98,9 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_DATA_TYPE", QOR_ERR_DATA_TYPE},
                                 {"QOR_ERR_ROUND_MODE", QOR_ERR_ROUND_MODE},
                                 {"QOR_ERR_CHANNELS", QOR_ERR_CHANNELS},
+                                {"QOR_ERR_MASK_SIZE", QOR_ERR_MASK_SIZE},
+                                {"QOR_ERR_WEIGHT", QOR_ERR_WEIGHT},
+                                {"QOR_ERR_STEP_ALIGN", QOR_ERR_STEP_ALIGN},
                                 {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
@@ -117,7 +120,9 @@ public:
         const std::string& name = names_[static_cast<size_t>(fault.parameter)];
         for (size_t i = 0; i < checks_.size(); ++i) {
             const std::string& check = checks_[i];
-            const auto is = [&](std::string_view status) { return check.find(status) == check.find("QOR_"); };
+            const auto is = [&](std::string_view status) {
+                return check.find(std::string(status) + ' ') == check.find("QOR_");
+            };
             switch (fault.flaw) {
                 case Flaw::null:
                     if (is("QOR_ERR_NULL_PTR") && (has(check, "a pointer is null") || names(check, name) ||
@@ -128,7 +133,7 @@ public:
                     if (is("QOR_WARN_NOTHING_TO_DO")) return i;
                     [[fallthrough]];
                 case Flaw::negativeSize:
-                    if (is("QOR_ERR_SIZE")) return i;
+                    if (is(name == "maskSize" ? "QOR_ERR_MASK_SIZE" : "QOR_ERR_SIZE")) return i;
                     break;
                 case Flaw::zeroStep:
                     if (is("QOR_ERR_STEP") && (has(check, "a step") || names(check, name))) return i;

@@ -24,7 +24,7 @@ struct WideOf<float> {
 
 template <class W>
 QORI_INLINE Vec<W> distance(const Vec<W>* a, const Vec<W>* b) {
-    const auto difference = [=](int c) __attribute__((always_inline)) -> Vec<W> {
+    const auto difference = [=](int c) __attribute__((always_inline))->Vec<W> {
         if constexpr (std::is_same_v<W, float>) {
             const Vec<W> d = a[c] - b[c];
             return {_mm256_andnot_ps(_mm256_set1_ps(-0.0f), d.v)};
@@ -52,8 +52,8 @@ struct ColourRow {
     }
 };
 
-/// Up to ColourRow::pixels medians of side x side pixels; rows[j] has the windows' row j. The results are whole vectors.
-/// Float sums read the control register.
+/// Up to ColourRow::pixels medians of side x side pixels; rows[j] has the windows' row j. The results are whole
+/// vectors. Float sums read the control register.
 template <int side, class T>
 QORI_NOINLINE void medianColour(const ColourRow<T>* const* rows, ptrdiff_t count, ColourRow<T>& result) {
     using W = Wide<T>;

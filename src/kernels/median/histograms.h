@@ -110,8 +110,8 @@ public:
             Bins::count(fineAt(x, out >> 4), detail::kSteps.from[out & 15], false);
         }
     }
-    /// Medians of the row's windows: bytes with at most `below` elements before them, and how many of the elements equal
-    /// to it come before the median. emit(x, byte, rest).
+    /// Medians of the row's windows: bytes with at most `below` elements before them, and how many of the elements
+    /// equal to it come before the median. emit(x, byte, rest).
     template <class Emit>
     QORI_INLINE void medians(int32_t below, Emit emit) const {
         Bins coarse = Bins::none(), fine[kBins];

@@ -48,8 +48,7 @@ QORI_INLINE Vec<K> medianOf(Vec<K>* a) {
     } else {
         // Three ordered triples: the largest of the first, the middle of the second, the smallest of the last.
         for (int i = 0; i < 9; i += 3) order(a[i], a[i + 1]), order(a[i + 1], a[i + 2]), order(a[i], a[i + 1]);
-        return medianOf3(upper(a[0], upper(a[3], a[6])), medianOf3(a[1], a[4], a[7]),
-                         lower(a[2], lower(a[5], a[8])));
+        return medianOf3(upper(a[0], upper(a[3], a[6])), medianOf3(a[1], a[4], a[7]), lower(a[2], lower(a[5], a[8])));
     }
 }
 

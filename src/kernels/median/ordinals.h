@@ -18,9 +18,9 @@ QORI_INLINE int placeOfBit(uint32_t bits, int n) {
     int place = 0;
     for (int half = 16; half > 0; half /= 2) {
         const int below = __builtin_popcount(bits >> place & ((1u << half) - 1));
-        const bool beyond = n >= below;
-        n -= beyond ? below : 0;
-        place += beyond ? half : 0;
+        const int beyond = ~((n - below) >> 31);  // no branch: it would be taken at random
+        n -= below & beyond;
+        place += half & beyond;
     }
     return place;
 }
@@ -64,7 +64,8 @@ public:
             const T* const row = reinterpret_cast<const T*>(reinterpret_cast<const uint8_t*>(src) + y * step);
             for (int32_t x = 0; x < columns; ++x) {
                 const Word rank = rankOf(row[x * apart]);
-                *to++ = {rank, static_cast<Place>(static_cast<uint32_t>(y) << kCoordinateBits | static_cast<uint32_t>(x))};
+                *to++ = {rank,
+                         static_cast<Place>(static_cast<uint32_t>(y) << kCoordinateBits | static_cast<uint32_t>(x))};
                 for (int pass = 0; pass < kPasses; ++pass) ++counters_[pass * kRadix + digit(rank, pass)];
             }
         }
@@ -81,7 +82,8 @@ public:
     /// Of the bin's elements in the window at (x, y), the one that `rest` others come before.
     QORI_INLINE T element(int bin, int32_t rest, int32_t x, int32_t y, QorImageSize window) const {
         const auto corner = [](int32_t v) { return splat(static_cast<Coordinate>(v)); };
-        const auto fromX = corner(x), fromY = corner(y), lastX = corner(window.width - 1), lastY = corner(window.height - 1);
+        const auto fromX = corner(x), fromY = corner(y), lastX = corner(window.width - 1),
+                   lastY = corner(window.height - 1);
         for (int32_t at = bin * perBin_;; at += kLanes) {
             const auto inside = isAtMost(load(x_ + at) - fromX, lastX) & isAtMost(load(y_ + at) - fromY, lastY);
             uint32_t bits = static_cast<uint32_t>(_mm256_movemask_epi8(inside.v));
@@ -113,7 +115,8 @@ private:
         for (int32_t first = 0, bin = 0; first < count; first += perBin_, ++bin) {
             const int32_t end = std::min(first + perBin_, count);
             for (int32_t i = first; i < end; ++i) {
-                const uint32_t place = sorted_[i].place, x = place & ((1u << kCoordinateBits) - 1), y = place >> kCoordinateBits;
+                const uint32_t place = sorted_[i].place, x = place & ((1u << kCoordinateBits) - 1),
+                               y = place >> kCoordinateBits;
                 bytes_[static_cast<ptrdiff_t>(y) * stride_ + static_cast<ptrdiff_t>(x)] = static_cast<uint8_t>(bin);
                 x_[i] = static_cast<Coordinate>(x);
                 y_[i] = static_cast<Coordinate>(y);

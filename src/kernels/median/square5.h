@@ -9,7 +9,7 @@ namespace qori::kernels {
 namespace detail {
 
 /// Where the strips of a row begin: vectors that are worked on together, whose rows in order fit the first cache.
-constexpr int kStripVectors = 16;
+constexpr int kStripVectors = 32;
 
 /// What strips keep from one pair of destination rows to the next, per vector.
 template <class K>
@@ -74,7 +74,7 @@ QORI_INLINE void beginSquare5(const T* const* src, ptrdiff_t at, ptrdiff_t apart
 /// Rows y and, unless it is the last one, y + 1, at one vector.
 template <bool both, bool keepAlpha, class T, class Count>
 QORI_INLINE void makeSquare5(const T* const* src, T* const* dst, ptrdiff_t at, ptrdiff_t apart, Count count,
-                             Vec<Key<T>> (&oldest)[5], Square5State<Key<T>>& state) {
+                             bool prefetches, Vec<Key<T>> (&oldest)[5], Square5State<Key<T>>& state) {
     using K = Key<T>;
     Vec<K> four[6], next[5], pair[10];
     quintuple(src[4] + at, apart, count, next);
@@ -82,6 +82,7 @@ QORI_INLINE void makeSquare5(const T* const* src, T* const* dst, ptrdiff_t at, p
     middleSix(state.pair, pair, four);
     storeElements<keepAlpha>(dst[0] + at, elementsOf<T>(middleOf11(four, oldest)), count);
     if constexpr (both) {
+        if (prefetches) __builtin_prefetch(src[6] + at), __builtin_prefetch(src[7] + at);
         for (int i = 0; i < 5; ++i) oldest[i] = next[i];
         for (int i = 0; i < 10; ++i) state.pair[i] = pair[i];
         quintuple(src[5] + at, apart, count, next);
@@ -105,21 +106,25 @@ QORI_NOINLINE void medianSquare5(const T* const* src, T* const* dst, int rows, p
             auto* state = states;
             for (ptrdiff_t at = begin; at < end; at += n) make(std::min(at, end - n), *state++);
         };
-        forVectors([&](ptrdiff_t at, auto& state) __attribute__((always_inline)) { detail::beginSquare5(src, at, apart, count, state); });
+        forVectors([&](ptrdiff_t at, auto& state)
+                       __attribute__((always_inline)) { detail::beginSquare5(src, at, apart, count, state); });
         for (int y = 0; y < rows; y += 2)
             forVectors([&](ptrdiff_t at, auto& state) __attribute__((always_inline)) {
                 auto& oldest = state.even[y / 2 % 2];
                 if (y + 1 < rows)
-                    detail::makeSquare5<true, keepAlpha>(src + y, dst + y, at, apart, count, oldest, state);
+                    detail::makeSquare5<true, keepAlpha>(src + y, dst + y, at, apart, count, y + 4 <= rows, oldest,
+                                                         state);
                 else
-                    detail::makeSquare5<false, keepAlpha>(src + y, dst + y, at, apart, count, oldest, state);
+                    detail::makeSquare5<false, keepAlpha>(src + y, dst + y, at, apart, count, y + 4 <= rows, oldest,
+                                                          state);
             });
     };
     if (elements < n) return strip(0, elements, elements);
     constexpr ptrdiff_t width = detail::kStripVectors * n;
     for (ptrdiff_t begin = 0; begin < elements;) {
         // The last strip takes what is left from a whole vector on, so that its last vector may overlap.
-        const ptrdiff_t left = elements - begin, end = left <= width ? elements : begin + (left < width + n ? width - n : width);
+        const ptrdiff_t left = elements - begin,
+                        end = left <= width ? elements : begin + (left < width + n ? width - n : width);
         strip(begin, end, whole);
         begin = end;
     }
