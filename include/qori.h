@@ -3355,8 +3355,9 @@ QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t sr
  *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
  *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
  *  Notes     Masks other than 1 x 1, 3 x 1, 5 x 1, 1 x 3, 1 x 5, 3 x 3 and 5 x 5 take a work area from
- *            qorMalloc for the duration of the call. It and the time per pixel hardly depend on the size of the
- *            mask.
+ *            qorMalloc for the duration of the call; the time per pixel hardly depends on the size of such a
+ *            mask. For elements wider than a byte the area grows with the mask, and there is none for sides
+ *            above 32768.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (a side of the mask even or below 1),
  *            QOR_ERR_ANCHOR (anchor outside the mask), QOR_ERR_NO_MEMORY (no work area); then nothing is

@@ -127,7 +127,7 @@ void runColour(Image<const T> src, Image<T> dst, QorImageSize roi) {
             kernels::medianColour<side>(rows, count, result);
             T* const to = dst.row(y) + ptrdiff_t{x} * n;
             for (int32_t i = 0; i < count; ++i)
-                for (int c = 0; c < 3; ++c) to[i * n + c] = static_cast<T>(result.plane[c][i]);
+                for (int c = 0; c < 3; ++c) kernels::put(to + i * n + c, static_cast<T>(result.plane[c][i]));
         }
     }
 }

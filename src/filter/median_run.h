@@ -21,7 +21,7 @@ inline QorResult oddMaskCheck(QorImageSize mask) {
     return mask.width < 1 || mask.height < 1 || !odd ? QOR_ERR_MASK_SIZE : QOR_OK;
 }
 
-constexpr int kMostNetworkRows = 16;
+constexpr int kMostNetworkRows = 32;
 
 /// Rows that the network of a mask makes at a time, at most. 5 x 5 puts four rows in order before the first.
 inline int32_t networkRows(QorImageSize mask, int32_t mostOf5x5 = kMostNetworkRows) {
@@ -65,7 +65,7 @@ class ByteMedians {
     using Histograms = kernels::ColumnHistograms<Bins>;
 
 public:
-    /// Columns whose counts stay in the second-level cache.
+    /// Columns whose counts stay in the first-level cache, unless the mask alone takes more.
     static int32_t columnsOf(QorImageSize size, QorImageSize mask) {
         const int64_t most = std::max(2 * int64_t{mask.width}, int64_t{kCache / Histograms::kColumnBytes});
         return static_cast<int32_t>(std::min({int64_t{size.width} + mask.width - 1, most, int64_t{INT32_MAX}}));
@@ -77,15 +77,15 @@ public:
 
     void run(const MedianJob<uint8_t>& job) const {
         for (int c = 0; c < job.channels; ++c)
-            for (int32_t x = 0; x < job.size.width; x += columns_ - job.mask.width + 1)
-                strip(job, ptrdiff_t{x} * job.apart + c, job.size.width - x);
+            for (int64_t x = 0; x < job.size.width; x += columns_ - job.mask.width + 1)
+                strip(job, static_cast<ptrdiff_t>(x * job.apart + c), static_cast<int32_t>(job.size.width - x));
     }
 
 private:
     static constexpr int kCache = 44 << 10;
 
     void strip(const MedianJob<uint8_t>& job, ptrdiff_t at, int32_t width) const {
-        const int32_t columns = std::min(columns_, width + job.mask.width - 1);
+        const auto columns = static_cast<int32_t>(std::min(int64_t{columns_}, int64_t{width} + job.mask.width - 1));
         Histograms histograms(histograms_, columns, job.mask.width);
         for (int32_t y = 0; y < job.mask.height; ++y) histograms.enter(job.windows.row(y) + at, job.apart);
         for (int32_t y = 0; y < job.size.height; ++y) {
@@ -113,7 +113,8 @@ class OrdinalMedians {
 public:
     /// Sides of the pieces of which tiles are made, surroundings included.
     static int32_t sideOf(int32_t size, int32_t mask) {
-        const int64_t most = std::min(std::max(int64_t{kSide}, 3 * int64_t{mask}), Ordinals::kMostSide);
+        const int64_t wanted = (sizeof(Coordinate) == 1 ? 3 : 2) * int64_t{mask};
+        const int64_t most = std::min(std::max(int64_t{kSide}, wanted), Ordinals::kMostSide);
         return static_cast<int32_t>(std::min(int64_t{size} + mask - 1, std::max(most, int64_t{mask})));
     }
     OrdinalMedians(WorkBuffer& memory, const MedianJob<T>& job)
@@ -127,15 +128,16 @@ public:
     void run(const MedianJob<T>& job) {
         const int32_t width = columns_ - job.mask.width + 1, height = rows_ - job.mask.height + 1;
         for (int c = 0; c < job.channels; ++c)
-            for (int32_t y = 0; y < job.size.height; y += height)
-                for (int32_t x = 0; x < job.size.width; x += width)
-                    tile(job, ptrdiff_t{x} * job.apart + c, y,
-                         {std::min(width, job.size.width - x), std::min(height, job.size.height - y)});
+            for (int64_t y = 0; y < job.size.height; y += height)
+                for (int64_t x = 0; x < job.size.width; x += width)
+                    tile(job, static_cast<ptrdiff_t>(x * job.apart + c), static_cast<int32_t>(y),
+                         {static_cast<int32_t>(std::min(int64_t{width}, job.size.width - x)),
+                          static_cast<int32_t>(std::min(int64_t{height}, job.size.height - y))});
     }
 
 private:
     using Rest = typename Bins::Rest;
-    static constexpr int kSide = 90;
+    static constexpr int kSide = 90;  // bins of 32 elements, which one comparison of vectors looks through
 
     void tile(const MedianJob<T>& job, ptrdiff_t at, int32_t y0, QorImageSize size) {
         const int32_t columns = size.width + job.mask.width - 1, rows = size.height + job.mask.height - 1;
@@ -152,8 +154,8 @@ private:
                 });
             T* const to = job.dst.row(y0 + y) + at;
             for (int32_t x = 0; x < size.width; ++x)
-                to[ptrdiff_t{x} * job.apart] =
-                    ordinals_.element(bytes_[x], static_cast<int32_t>(rests_[x]), x, y, job.mask);
+                kernels::put(to + ptrdiff_t{x} * job.apart,
+                             ordinals_.element(bytes_[x], static_cast<int32_t>(rests_[x]), x, y, job.mask));
         }
     }
 

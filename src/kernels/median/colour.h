@@ -3,7 +3,7 @@
 #pragma once
 #include <limits>
 
-#include "kernels/vector_math.h"
+#include "order.h"
 
 namespace qori::kernels {
 namespace detail {
@@ -48,7 +48,7 @@ struct ColourRow {
 
     void read(const T* p, ptrdiff_t count, int channels) {
         for (ptrdiff_t i = 0; i < count; ++i)
-            for (int c = 0; c < 3; ++c) plane[c][i] = p[i * channels + c];
+            for (int c = 0; c < 3; ++c) plane[c][i] = get(p + i * channels + c);
     }
 };
 

@@ -114,16 +114,22 @@ public:
     /// equal to it come before the median. emit(x, byte, rest).
     template <class Emit>
     QORI_INLINE void medians(int32_t below, Emit emit) const {
-        Bins coarse = Bins::none(), fine[kBins];
+        Bins coarse = Bins::none(), fine[kBins], current = Bins::none();
         int32_t seen[kBins];  // the window for which fine counts were last right
         for (int32_t& x : seen) x = -width_;
         for (int32_t x = 0; x < width_; ++x) coarse.add(coarse_ + ptrdiff_t{x} * kBins);
-        for (int32_t x = 0;; ++x) {
+        for (int32_t x = 0, last = -1;; ++x) {
             int32_t before, rest;
             const int high = coarse.find(below, &before);
-            bring(fine[high], high, seen[high], x);
-            seen[high] = x;
-            const int low = fine[high].find(below - before, &rest);
+            if (high == last) {
+                current.add(fineAt(x + width_ - 1, high));
+                current.subtract(fineAt(x - 1, high));
+            } else {
+                if (last >= 0) fine[last] = current, seen[last] = x - 1;
+                current = broughtTo(x, fine[high], high, seen[high]);
+                last = high;
+            }
+            const int low = current.find(below - before, &rest);
             emit(x, 16 * high + low, below - before - rest);
             if (x + width_ >= columns_) return;
             coarse.add(coarse_ + ptrdiff_t{x + width_} * kBins);
@@ -137,19 +143,20 @@ private:
         Bins::count(coarse_ + ptrdiff_t{x} * kBins, detail::kSteps.from[value >> 4], enters);
         Bins::count(fineAt(x, value >> 4), detail::kSteps.from[value & 15], enters);
     }
-    /// From the window at `from` to that at `to`, or anew where that is less work.
-    QORI_INLINE void bring(Bins& fine, int high, int32_t from, int32_t to) const {
-        Bins now = fine;
+    /// Fine counts of the window at `from` brought to that at `to`, or made anew where that is less work.
+    QORI_INLINE Bins broughtTo(int32_t to, const Bins& fine, int high, int32_t from) const {
+        Bins now;
         if (2 * (to - from) > width_) {
             now = Bins::none();
             for (int32_t x = to; x < to + width_; ++x) now.add(fineAt(x, high));
         } else {
+            now = fine;
             for (int32_t x = from; x < to; ++x) {
                 now.add(fineAt(x + width_, high));
                 now.subtract(fineAt(x, high));
             }
         }
-        fine = now;
+        return now;
     }
 
     Column *coarse_, *fine_;

@@ -79,6 +79,18 @@ QORI_INLINE Vec<K> upper(Vec<K> a, Vec<K> b) {
         return larger(a, b);
 }
 
+/// Elements in memory of any alignment.
+template <class T>
+QORI_INLINE T get(const T* p) {
+    T element;
+    __builtin_memcpy(&element, p, sizeof element);
+    return element;
+}
+template <class T>
+QORI_INLINE void put(T* p, T element) {
+    __builtin_memcpy(p, &element, sizeof element);
+}
+
 /// One element as an unsigned number of the same order.
 template <class T>
 QORI_INLINE auto rankOf(T element) {

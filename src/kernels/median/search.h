@@ -24,12 +24,12 @@ QORI_NOINLINE void medianBySearch(const T* src, ptrdiff_t step, ptrdiff_t apart,
             for (int32_t y = 0; y < mask.height; ++y) {
                 const T* row = advance(src, y * step) + begin;
                 for (int32_t x = 0; x < mask.width; ++x, row += apart)
-                    for (ptrdiff_t i = 0; i < n; ++i) count[i] += rankOf(row[i]) < tried[i];
+                    for (ptrdiff_t i = 0; i < n; ++i) count[i] += rankOf(get(row + i)) < tried[i];
             }
             for (ptrdiff_t i = 0; i < n; ++i)
                 if (count[i] <= below) found[i] = tried[i];
         }
-        for (ptrdiff_t i = 0; i < n; ++i) dst[begin + i] = elementOf<T>(found[i]);
+        for (ptrdiff_t i = 0; i < n; ++i) put(dst + begin + i, elementOf<T>(found[i]));
     }
 }
 

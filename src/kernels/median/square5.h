@@ -82,7 +82,9 @@ QORI_INLINE void makeSquare5(const T* const* src, T* const* dst, ptrdiff_t at, p
     middleSix(state.pair, pair, four);
     storeElements<keepAlpha>(dst[0] + at, elementsOf<T>(middleOf11(four, oldest)), count);
     if constexpr (both) {
-        if (prefetches) __builtin_prefetch(src[6] + at), __builtin_prefetch(src[7] + at);
+        if (prefetches) {  // strips are too short for the processor to see ahead
+            for (int k = 0; k < 2; ++k) __builtin_prefetch(src[6 + k] + at), __builtin_prefetch(dst[2 + k] + at, 1);
+        }
         for (int i = 0; i < 5; ++i) oldest[i] = next[i];
         for (int i = 0; i < 10; ++i) state.pair[i] = pair[i];
         quintuple(src[5] + at, apart, count, next);
