@@ -55,7 +55,7 @@ void checkJob(Function function, const Job& job) {
     const TestImage dst = job.inPlace ? src : TestImage(kResult, shape, sizeof(T));
     dst.fill<T>(1, AnyValue<T>{});
     src.fill<T>(1, MedianValues<T>{});
-    const T constant = random().value<T>();
+    const T constant = drawQuiet<T>();
     const ptrdiff_t inside = beyond.top * ptrdiff_t{src.step()} + beyond.left * ptrdiff_t{sizeof(T)};
     Snapshot before = src.snapshot(), expected = dst.snapshot();
     const View<T> from = before.view<T>(1);
