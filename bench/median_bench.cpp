@@ -64,7 +64,8 @@ Row rectangle(std::string name, Function function, int side, Best best = {},
                               function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask,
                                        QorPoint2D{side / 2, side / 2});
                           },
-                          size.pixels() > kL2.pixels() ? std::function<void()>{} : plainOf(src, dst, channels, mask),
+                          size.pixels() * side * side > 9 * kL2.pixels() ? std::function<void()>{}
+                                                                         : plainOf(src, dst, channels, mask),
                           {}};
     };
     return {.operation = std::move(name),
