@@ -19,6 +19,7 @@ std::span<const Panel> arithPanels();
 std::span<const Panel> borderPanels();
 std::span<const Panel> filterPanels();
 std::span<const Panel> morphologyPanels();
+std::span<const Panel> medianPanels();
 std::span<const Panel> resizePanels();
 std::span<const Panel> statsPanels();
 std::span<const Panel> tablePanels();

@@ -206,6 +206,16 @@ typedef enum QorBorderMode {
     borderReadRight = 0x80    /**< Flag: columns to the right are read from memory. */
 } QorBorderMode;
 
+/** Masks of fixed shapes: tens are columns, units are rows. */
+typedef enum QorFixedMaskSize {
+    mask1x3 = 13, /**< 1 column of 3 rows. */
+    mask1x5 = 15, /**< 1 column of 5 rows. */
+    mask3x1 = 31, /**< 3 columns of 1 row. */
+    mask3x3 = 33,
+    mask5x1 = 51, /**< 5 columns of 1 row. */
+    mask5x5 = 55
+} QorFixedMaskSize;
+
 /** The line about which an image is reflected; width and height are the source's. */
 typedef enum QorFlipAxis {
     flipHorizontalAxis = 0, /**< Rows reversed: destination row y is source row height - 1 - y. */
@@ -3726,6 +3736,261 @@ QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_AC4R(const float* pSrc, int32_t s
     QorImageSize roiSize, const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
 QORI_API QorResult QORI_CALL qoriLUT_Cubic_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
     const float* const pValues[3], const float* const pLevels[3], const int32_t nLevels[3]);
+
+/* ---- Medians -------------------------------------------------------------------------------------------------- */
+
+/** The median of a rectangle around an anchor, channel by channel.
+ *  Shapes    The window of pixel (x, y) spans columns x - anchor.x to x - anchor.x + maskSize.width - 1 and
+ *            rows y - anchor.y to y - anchor.y + maskSize.height - 1; all of it is read. AC4 keeps the
+ *            destination's channel 3.
+ *  Elements  The median is the element of rank floor(width * height / 2) + 1 in ascending order: one of the
+ *            window's own, bit for bit. Floats are ordered by their bits: -NaN < -infinity < ... < -0 < +0 <
+ *            ... < infinity < NaN, the total order of IEEE 754.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Notes     Masks other than 1 x 1, 3 x 1, 5 x 1, 1 x 3, 1 x 5, 3 x 3 and 5 x 5 take a work area from
+ *            qorMalloc for the duration of the call; the time per pixel hardly depends on the size of such a
+ *            mask. For elements wider than a byte the area grows with the mask, and there is none for sides
+ *            above 32768.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (a side of the mask even or below 1),
+ *            QOR_ERR_ANCHOR (anchor outside the mask), QOR_ERR_NO_MEMORY (no work area); then nothing is
+ *            written.
+ *  Example   const uint8_t *inside = scan + 3 * scanStep + 3;    // three pixels around it
+ *            qoriFilterMedian_8u_C1R(inside, scanStep, out, outStep, (QorImageSize){width - 6, height - 6}, (QorImageSize){7, 7},
+ *                                    (QorPoint2D){3, 3});
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedian_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterMedian_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+
+/** Reports maskSize.width * maskSize.height * 4 bytes, which no function takes: qoriFilterMedian_32f allocates.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (a side of the mask even or below 1), QOR_ERR_CHANNELS_UNSUPPORTED
+ *            (numChannels not 1, 3 or 4), QOR_ERR_SIZE (a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianGetBufferSize_32f(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t numChannels, int32_t* pBufferSize);
+
+/** Reports maskSize.width * maskSize.height * 8 bytes, which no function takes: qoriFilterMedian_64f allocates.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (a side of the mask even or below 1), QOR_ERR_CHANNELS_UNSUPPORTED
+ *            (numChannels not 1, 3 or 4), QOR_ERR_SIZE (a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianGetBufferSize_64f(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t numChannels, int32_t* pBufferSize);
+
+/** The median of 3 or 5 pixels of a row (mask3x1, mask5x1), channel by channel.
+ *  Shapes    The window is centred; one or two pixels left and right of the region are read. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (mask not mask3x1 or mask5x1); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianHoriz_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+
+/** The median of 3 or 5 pixels of a column (mask1x3, mask1x5), channel by channel.
+ *  Shapes    The window is centred; one or two pixels above and below the region are read. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (mask not mask1x3 or mask1x5); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianVert_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+
+/** The median of a pixel and those up to one or two away in its row and its column (mask3x3: 5 pixels, mask5x5:
+ *  9).
+ *  Shapes    One or two pixels around the region are read on every side, corners excepted. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (mask not mask3x3 or mask5x5); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianCross_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+
+/** The colour median of a square: of its 9 or 25 pixels, the one with the smallest sum of distances to the
+ *  others.
+ *  Shapes    mask3x3 or mask5x5, centred: one or two pixels around the region are read on every side. The pixel
+ *            is copied as a whole. AC4 keeps the destination's channel 3 and looks at none of the source's.
+ *  Elements  Distance: |dr| + |dg| + |db|. Integers are summed exactly; 32f in 32-bit float, the three terms of
+ *            a distance from the left, the distances in row order of the other pixels, and a sum that is NaN
+ *            counts as infinite. Of equal sums the first in row order wins.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (mask not mask3x3 or mask5x5); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianColor_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianColor_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianColor_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianColor_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianColor_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterMedianColor_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, int32_t mask);
+
+/** The median of 3 x 3 pixels of which the middle one counts `weight` times.
+ *  Shapes    One pixel around the region is read on every side, up to a weight of 8.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Notes     An even weight is lowered by one, and the result is QOR_WARN_EVEN_WEIGHT. 1 is the plain median;
+ *            from 9 on the centre alone decides, and the source is copied.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_WEIGHT (weight below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianWeightedCenter3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep,
+    uint8_t* pDst, int32_t dstStep, QorImageSize dstRoiSize, int32_t weight);
+
+/* ---- Medians with a border ------------------------------------------------------------------------------------ */
+
+/** Reports how many bytes of work buffer a median with a border takes.
+ *  Elements  dataType: type code of the pixels, 1 (8u), 5 (16u), 7 (16s) or 13 (32f).
+ *  Units     Steps in bytes, of either sign. Sizes in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (a side of the mask even or below 1), QOR_ERR_DATA_TYPE (dataType not 1, 5,
+ *            7 or 13), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1), QOR_ERR_SIZE (a result of 2^31 or
+ *            more); then nothing is written.
+ *  Example   int32_t bytes;   // specks of up to 24 pixels vanish
+ *            const QorImageSize mask = {7, 7};
+ *            qoriFilterMedianBorderGetBufferSize(roi, mask, qor8u, 1, &bytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriFilterMedianBorder_8u_C1R(image, step, image, step, roi, mask, borderReplicate, 0, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianBorderGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pBufferSize);
+
+/** The median of a rectangle centred on each pixel, of odd sides, with a border.
+ *  Shapes    Windows reach floor(width / 2) columns to each side and floor(height / 2) rows above and below.
+ *  Elements  The median is the element of rank floor(width * height / 2) + 1 in ascending order. 32f is ordered
+ *            by its bits: -NaN < -infinity < ... < -0 < +0 < ... < infinity < NaN, the total order of IEEE 754.
+ *  Units     Steps in bytes, of either sign. Sizes in pixels.
+ *  Aliasing  pDst may be pSrc, with equal steps: results are those of a source that is a copy. Otherwise source
+ *            and destination, and pBuffer and either, must not overlap.
+ *  Notes     Each axis follows its own rule: a side whose flag is set is read from memory, the others are
+ *            synthesised; borderReadAll, or all four flags, read everything from memory. Masks with a side of 7
+ *            or more, and those of 3 x 5 and 5 x 3, are done faster with a further work area from qorMalloc;
+ *            where there is none, pBuffer alone serves.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterMedianBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, int32_t border, uint8_t borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterMedianBorder_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, int32_t border, uint16_t borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterMedianBorder_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, int32_t border, int16_t borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterMedianBorder_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize dstRoiSize, QorImageSize maskSize, int32_t border, float borderValue,
+    uint8_t* pBuffer);
 
 /* ---- Image memory --------------------------------------------------------------------------------------------- */
 

@@ -103,6 +103,8 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_DATA_TYPE", QOR_ERR_DATA_TYPE},
                                 {"QOR_ERR_ROUND_MODE", QOR_ERR_ROUND_MODE},
                                 {"QOR_ERR_CHANNELS", QOR_ERR_CHANNELS},
+                                {"QOR_ERR_WEIGHT", QOR_ERR_WEIGHT},
+                                {"QOR_ERR_STEP_ALIGN", QOR_ERR_STEP_ALIGN},
                                 {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
@@ -122,7 +124,9 @@ public:
         const std::string& name = names_[static_cast<size_t>(fault.parameter)];
         for (size_t i = 0; i < checks_.size(); ++i) {
             const std::string& check = checks_[i];
-            const auto is = [&](std::string_view status) { return check.find(status) == check.find("QOR_"); };
+            const auto is = [&](std::string_view status) {
+                return check.find(std::string(status) + ' ') == check.find("QOR_");
+            };
             switch (fault.flaw) {
                 case Flaw::null:
                     if (is("QOR_ERR_NULL_PTR") && (has(check, "a pointer is null") || names(check, name) ||

@@ -201,7 +201,8 @@ T argument(Input& in) {
 bool isStatus(QorResult result) {
     return result == QOR_OK || result == QOR_WARN_DIV_BY_ZERO || result == QOR_WARN_LOG_ZERO ||
            result == QOR_WARN_LOG_NEGATIVE || result == QOR_WARN_NOTHING_TO_DO || result == QOR_WARN_ADJUSTED ||
-           (result <= QOR_ERR_BAD_ARG && result >= QOR_ERR_DIRECTION) || result == QOR_ERR_UNSUPPORTED_MODE;
+           result == QOR_WARN_EVEN_WEIGHT || (result <= QOR_ERR_BAD_ARG && result >= QOR_ERR_DIRECTION) ||
+           result == QOR_ERR_UNSUPPORTED_MODE;
 }
 
 template <class... Arguments>
