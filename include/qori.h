@@ -1825,6 +1825,209 @@ QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C4IR(float* pSrcDst, in
 QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_AC4IR(float* pSrcDst, int32_t srcDstStep,
     QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
 
+/* ---- Box filter around an anchor ------------------------------------------------------------------------------ */
+
+/** The mean of the window of maskSize around each pixel, channel by channel.
+ *  Shapes    The window of (x, y) spans columns x - anchor.x to x - anchor.x + maskSize.width - 1, and rows
+ *            likewise. All of it is read from memory: pSrc points at the region's first pixel inside a larger
+ *            image.
+ *  Elements  8u: the window's sum as a float times the float reciprocal of the area, to nearest, ties to even;
+ *            below 8,000 pixels of odd area that is the exact mean. 16u, 16s: the exact mean to nearest, ties
+ *            to even. 32f, 64f: the sum in the elements' precision, divided by the area: it is made of the
+ *            window's own elements only, by at most width + height additions on the way of each, so that it is
+ *            off by no more than (width + height) * 2^-24 (2^-53) times the sum of their magnitudes wherever
+ *            the window lies, and exact for integers whose magnitudes add up to 2^24 (2^53) at most. AC4 keeps
+ *            the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination.
+ *  Notes     Takes rows of memory from qorMalloc for the duration of the call. The cost per pixel hardly grows
+ *            with the mask.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
+ *            QOR_ERR_ANCHOR (the anchor is outside the mask), QOR_ERR_NO_MEMORY (no work memory); then nothing
+ *            is written.
+ *  Example   const QorImageSize mask = {15, 15};
+ *            const QorPoint2D middle = {7, 7};    // seven pixels around the region exist on every side
+ *            qoriFilterBox_8u_C3R(inside, frameStep, out, outStep, roi, mask, middle);
+ */
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+
+/** The mean of the window of maskSize around each pixel, in place.
+ *  Shapes    The window of (x, y) spans columns x - anchor.x to x - anchor.x + maskSize.width - 1, and rows
+ *            likewise. All of it is read from memory: pSrcDst points at the region's first pixel inside a
+ *            larger image.
+ *  Elements  8u: the window's sum as a float times the float reciprocal of the area, to nearest, ties to even;
+ *            below 8,000 pixels of odd area that is the exact mean. 16u, 16s: the exact mean to nearest, ties
+ *            to even. 32f, 64f: the sum in the elements' precision, divided by the area: it is made of the
+ *            window's own elements only, by at most width + height additions on the way of each, so that it is
+ *            off by no more than (width + height) * 2^-24 (2^-53) times the sum of their magnitudes wherever
+ *            the window lies, and exact for integers whose magnitudes add up to 2^24 (2^53) at most. AC4 keeps
+ *            the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
+ *  Notes     Takes rows of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
+ *            QOR_ERR_ANCHOR (the anchor is outside the mask), QOR_ERR_NO_MEMORY (no work memory); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+
+/* ---- Box filter with a border --------------------------------------------------------------------------------- */
+
+/** Reports how many bytes the buffer of a box filter with a border takes, at any alignment.
+ *  Elements  dataType: type code of the pixels, 1 (8u), 5 (16u), 7 (16s) or 13 (32f). numChannels: 1, 3 or 4,
+ *            which AC4 has too.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels.
+ *  Aliasing  pBufferSize must not be null.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (a side of the mask below 1), QOR_ERR_DATA_TYPE (another type code),
+ *            QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_SIZE (a result of 2^31 or more);
+ *            then nothing is written.
+ *  Example   int32_t bytes;
+ *            const QorImageSize mask = {9, 9};
+ *            qoriFilterBoxBorderGetBufferSize(roi, mask, 1, 3, &bytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriFilterBoxBorder_8u_C3R(src, srcStep, dst, dstStep, roi, mask, borderReplicate, NULL, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriFilterBoxBorderGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pBufferSize);
+
+/** The mean of the centred window of maskSize around each pixel, channel by channel, with a border.
+ *  Shapes    The window of (x, y) begins floor((width - 1) / 2) columns to the left and floor((height - 1) / 2)
+ *            rows above: an even one reaches further to the right and below. borderValue: one value per
+ *            processed channel, read for borderConstant only; where sides are open it may be null, for zeros.
+ *  Elements  8u: the window's sum as a float times the float reciprocal of the area, to nearest, ties to even;
+ *            below 8,000 pixels of odd area that is the exact mean. 16u, 16s: the exact mean to nearest, ties
+ *            to even. 32f: the sum divided by the area: it is made of the window's own elements only, by at
+ *            most width + height additions on the way of each, so that it is off by no more than (width +
+ *            height) * 2^-24 times the sum of their magnitudes wherever the window lies, and exact for integers
+ *            whose magnitudes add up to 2^24 at most. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination. pBuffer, of any alignment, must not overlap anything.
+ *  Notes     Each axis follows its own rule: a side whose flag is set is read from memory, the others are
+ *            synthesised. borderReadAll, or all four flags, read everything from memory.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below
+ *            1), QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
+ *            QOR_ERR_NULL_PTR (borderValue is null and border is borderConstant without flags), QOR_ERR_BORDER
+ *            (the kind of border is neither borderConstant nor borderReplicate, and a pixel has to be
+ *            synthesised); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float borderValue[3],
+    uint8_t* pBuffer);
+
 /* ---- Convert -------------------------------------------------------------------------------------------------- */
 
 /** Converts to a wider type, exactly.
