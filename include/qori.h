@@ -206,6 +206,16 @@ typedef enum QorBorderMode {
     borderReadRight = 0x80    /**< Flag: columns to the right are read from memory. */
 } QorBorderMode;
 
+/** Masks of fixed shape: width, then height. */
+typedef enum QorFixedMaskSize {
+    mask1x3 = 13, /**< One column. */
+    mask1x5 = 15, /**< One column. */
+    mask3x1 = 31, /**< One row. */
+    mask3x3 = 33,
+    mask5x1 = 51, /**< One row. */
+    mask5x5 = 55
+} QorFixedMaskSize;
+
 /** The line about which an image is reflected; width and height are the source's. */
 typedef enum QorFlipAxis {
     flipHorizontalAxis = 0, /**< Rows reversed: destination row y is source row height - 1 - y. */
@@ -257,6 +267,11 @@ typedef struct QorLibraryVersion {
  *  address. It may be copied to a block whose address is equal modulo 64. Once filled it is only read: any number of
  *  threads may use it at once. It is trusted memory: see Plans above. */
 typedef struct QorLinearFilterPlan QorLinearFilterPlan;
+
+/** Weights of an adaptive threshold, in the caller's memory: as many bytes as qoriThresholdAdaptiveGaussGetBufferSize
+ *  reports, at any address. It may be copied to a block whose address is equal modulo 8. Once filled it is only read:
+ *  any number of threads may use it at once. It is trusted memory: see Plans above. */
+typedef struct QorAdaptiveGaussSpec QorAdaptiveGaussSpec;
 
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
@@ -3337,6 +3352,56 @@ QORI_API QorResult QORI_CALL qoriFilterBorder_32f_C4R(const float* pSrc, int32_t
     QorImageSize dstRoiSize, int32_t border, const float* borderValue, const QorLinearFilterPlan* pSpec,
     uint8_t* pBuffer);
 
+/* ---- Gauss filter --------------------------------------------------------------------------------------------- */
+
+/** The mean of 3 x 3 or 5 x 5 pixels with Gaussian weights, channel by channel.
+ *  Shapes    mask: mask3x3 or mask5x5 of QorFixedMaskSize. All neighbours are read from memory: pSrc points at
+ *            the region's first pixel inside an image, with one pixel around the region, or two.
+ *  Elements  3 x 3: the products of (1, 2, 1) by (1, 2, 1), divided by 16. 5 x 5: rows (2, 7, 12, 7, 2), (7,
+ *            31, 52, 31, 7), (12, 52, 127, 52, 12) and back, divided by 571. Integers: the exact quotient to
+ *            nearest, ties to even. 32f: sums in single precision, divided. AC4 keeps the destination's channel
+ *            3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Notes     Takes rows of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (mask is neither mask3x3 nor mask5x5),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ *  Example   qoriFilterGauss_8u_C1R(frame + frameStep + 1, frameStep, out, outStep, (QorImageSize){width - 2, height - 2}, mask3x3);
+ */
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+
 /* ---- Histograms ----------------------------------------------------------------------------------------------- */
 
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1].
@@ -5701,12 +5766,184 @@ QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_AC4IR(float* pSrcDst, 
     QorImageSize roiSize, const float thresholdLT[3], const float valueLT[3], const float thresholdGT[3],
     const float valueGT[3]);
 
+/* ---- Adaptive thresholds -------------------------------------------------------------------------------------- */
+
+/** Reports how many bytes the buffer of an adaptive threshold by means takes, at any alignment.
+ *  Elements  dataType: 1 (8u). numChannels: 1.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_DATA_TYPE
+ *            (dataType not 1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1), QOR_ERR_SIZE (a result of 2^31
+ *            or more); then nothing is written.
+ *  Example   int32_t bytes;   // black text on a page in uneven light: 10 below the mean of 31 x 31
+ *            const QorImageSize mask = {31, 31};
+ *            qoriThresholdAdaptiveBoxGetBufferSize(roi, mask, 1, 1, &bytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriThresholdAdaptiveBox_8u_C1R(src, srcStep, dst, dstStep, roi, mask, 10, 255, 0, borderReplicate, 0, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveBoxGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pBufferSize);
+
+/** valGT where the source is greater than the mean of the square around it minus delta, else valLE.
+ *  Shapes    maskSize: a square of odd side, centred.
+ *  Elements  The comparison is exact: of the integer sum of the square with the pixel and delta times the area.
+ *            delta above 255 fills with valGT and delta of -255 or less with valLE; so does a mask of one pixel
+ *            for delta above 0 and others. No pixel is read then.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination. pBuffer must not overlap anything.
+ *  Notes     A side whose flag is set in borderType is read from memory, the others are synthesised, as
+ *            constants of borderValue or from the nearest pixel.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_BORDER (the
+ *            kind of borderType is not borderConstant, borderReplicate or borderReadAll); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveBox_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, float delta, uint8_t valGT, uint8_t valLE,
+    int32_t borderType, uint8_t borderValue, uint8_t* pBuffer);
+
+/** In place, valGT where a pixel is greater than the mean of the square around it minus delta, else valLE.
+ *  Shapes    maskSize: a square of odd side, centred.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  Results are those of a source that is a copy. pBuffer must not overlap the image.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_BORDER (the
+ *            kind of borderType is not borderConstant, borderReplicate or borderReadAll); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveBox_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, QorImageSize maskSize, float delta, uint8_t valGT, uint8_t valLE, int32_t borderType,
+    uint8_t borderValue, uint8_t* pBuffer);
+
+/** Reports how many bytes the weights and the buffer of an adaptive threshold by weighted means take, at any
+ *  alignment.
+ *  Elements  dataType: 1 (8u). numChannels: 1.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_DATA_TYPE
+ *            (dataType not 1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1), QOR_ERR_SIZE (a result of 2^31
+ *            or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGaussGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pSpecSize, int32_t* pBufferSize);
+
+/** Makes the weights of an adaptive threshold.
+ *  Elements  w(k) = exp(-k^2 / (2 sigma^2)) for k from -maskSize / 2 to maskSize / 2, scaled to a sum of 1. A
+ *            sigma of 0 or less stands for 0.3 ((maskSize - 1) / 2 - 1) + 0.8. dataType: 1 (8u). numChannels:
+ *            1.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_DATA_TYPE
+ *            (dataType not 1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1); then nothing is written.
+ *  Example   int32_t specBytes, bytes;
+ *            const QorImageSize mask = {15, 15};
+ *            qoriThresholdAdaptiveGaussGetBufferSize(roi, mask, 1, 1, &specBytes, &bytes);
+ *            QorAdaptiveGaussSpec* spec = malloc(specBytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriThresholdAdaptiveGaussInit(roi, mask, 1, 1, 0, spec);
+ *            qoriThresholdAdaptiveGauss_8u_C1R(src, srcStep, dst, dstStep, roi, 5, 255, 0, borderReplicate, 0, spec, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGaussInit(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, float sigma, QorAdaptiveGaussSpec* pSpec);
+
+/** valGT where the source is greater than the weighted mean of the square around it minus delta, else valLE.
+ *  Shapes    The square is that of the specification, whose region may be another.
+ *  Elements  Means in single precision: rows first, each a chain of fused multiply-adds from the left, then
+ *            columns from the top; delta is then subtracted. delta above 255 fills with valGT and delta of -255
+ *            or less with valLE; so does a mask of one pixel for delta above 0 and others. No pixel is read
+ *            then.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination. pBuffer must not overlap anything.
+ *  Notes     A side whose flag is set in borderType is read from memory, the others are synthesised, as
+ *            constants of borderValue or from the nearest pixel.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_BORDER (the kind of borderType is not borderConstant, borderReplicate or
+ *            borderReadAll), QOR_ERR_CONTEXT (pSpec has not been filled); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGauss_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, float delta, uint8_t valGT, uint8_t valLE, int32_t borderType,
+    uint8_t borderValue, const QorAdaptiveGaussSpec* pSpec, uint8_t* pBuffer);
+
+/** In place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else
+ *  valLE.
+ *  Shapes    The square is that of the specification, whose region may be another.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  Results are those of a source that is a copy. pBuffer must not overlap the image.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_BORDER (the kind of borderType is not borderConstant, borderReplicate or
+ *            borderReadAll), QOR_ERR_CONTEXT (pSpec has not been filled); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGauss_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, float delta, uint8_t valGT, uint8_t valLE, int32_t borderType, uint8_t borderValue,
+    const QorAdaptiveGaussSpec* pSpec, uint8_t* pBuffer);
+
 /* ---- Version -------------------------------------------------------------------------------------------------- */
 
 /** Returns the version record of the library.
  *  Returns   The same pointer on every call, never null. The record is constant: do not modify or free it.
  */
 QORI_API const QorLibraryVersion* QORI_CALL qoriGetLibVersion(void);
+
+/* ---- Window sums ---------------------------------------------------------------------------------------------- */
+
+/** dst(x, y) = the sum of src(x - anchor, y) to src(x - anchor + maskSize - 1, y), channel by channel.
+ *  Shapes    All neighbours are read from memory: anchor pixels before each row of the region, maskSize - 1 -
+ *            anchor behind it.
+ *  Elements  Exact sums, rounded once to 32-bit float: to nearest, ties to even. Up to 2^24 they are exact.
+ *  Units     Steps in bytes, of any sign and alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ *  Example   qoriSumWindowRow_8u32f_C1R(src, srcStep, sums, sumsStep, roi, 9, 4);   // four pixels to either side
+ */
+QORI_API QorResult QORI_CALL qoriSumWindowRow_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C4R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+
+/** dst(x, y) = the sum of src(x, y - anchor) to src(x, y - anchor + maskSize - 1), channel by channel.
+ *  Shapes    All neighbours are read from memory: anchor rows above the region, maskSize - 1 - anchor below it.
+ *  Elements  Exact sums, rounded once to 32-bit float: to nearest, ties to even. Up to 2^24 they are exact.
+ *  Units     Steps in bytes, of any sign and alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Notes     Takes a row of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_MASK_SIZE (maskSize below 1),
+ *            QOR_ERR_ANCHOR (anchor negative or not below maskSize), QOR_OK (width or height below 1: nothing
+ *            is written), QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16s32f_C4R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
 
 #ifdef __cplusplus
 }

@@ -72,7 +72,10 @@ QorResult filterBoxBorder(Image<const T> src, Image<T> dst, QorImageSize roi, Qo
     const Reach reach = reachOf(mask);
     if (QorResult r = kindCheck(border, reach)) return r;
     const BorderPixel<T, layout> pixel(borderValue);
-    const BoxJob<T, layout> job{imageOf<T, layout>(src, roi, BorderRule::of(border, pixel.value)), dst, mask, reach};
+    BorderRule rule = BorderRule::of(border, pixel.value);
+    rule.open.top |= reach.top == 0;  // a single row needs no row of constants
+    rule.open.bottom |= reach.bottom == 0;
+    const BoxJob<T, layout> job{imageOf<T, layout>(src, roi, rule), dst, mask, reach};
     const BoxBuffer buffer{memory, bufferBytes(roi, mask, channels(layout))};
     if constexpr (sizeof(T) == 1)
         if (mask.width == 3 && mask.height == 3 && square(job, buffer)) return QOR_OK;

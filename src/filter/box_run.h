@@ -70,7 +70,7 @@ public:
 private:
     static WindowNeeds needs(const BoxJob<T, layout>& job) {
         return {.reach = job.reach,
-                .rowsLeft = ColumnSums<S, T, n>::kRowsLeft,
+                .rowsLeft = ColumnSums<S, T, n>::rowsLeft(job.reach),
                 .place = job.inPlace() ? Place::inOrder : Place::apart};
     }
     static BlockLayout behindWindow(const BoxJob<T, layout>& job, int64_t unit) {
@@ -196,9 +196,9 @@ QorResult box(const BoxJob<T, layout>& job, const BoxBuffer* buffer) {
         return runBox<T>(job, Quotient<T>(area), buffer);
     } else if constexpr (sizeof(T) == 1) {
         constexpr int32_t kSigned = INT16_MAX / 255;  // 128 rows
-        if (job.mask.height <= kSigned) return runBox<uint16_t>(job, FloatMean(area), buffer);
-        if (area <= INT32_MAX / 255) return runBox<uint32_t>(job, FloatMean(area), buffer);
-        return runBox<double>(job, FloatMean(area), buffer);
+        if (area > INT32_MAX / 255) return runBox<double>(job, FloatMean(area), buffer);
+        if (job.mask.height > kSigned) return runBox<uint32_t>(job, FloatMean(area), buffer);
+        return runBox<uint16_t>(job, FloatMean(area), buffer);
     } else {
         if (area <= UINT32_MAX / UINT16_MAX) return runBox<uint32_t>(job, WordMean<T>(area), buffer);
         return runBox<double>(job, WordMean<T>(area), buffer);

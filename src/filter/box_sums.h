@@ -13,20 +13,22 @@
 
 namespace qori::filter {
 
-/// Element sums of type S of windows `height` rows high over pixels of n elements of T. The rows that a RowWindow needs
-/// for them: kRowsLeft above the windows.
+/// Element sums of type S of the columns of windows over pixels of n elements of T.
 template <class S, class T, int n>
 class ColumnSums {
 public:
     static constexpr bool isFloat = std::is_floating_point_v<T>;
-    static constexpr int32_t kRowsLeft = isFloat ? 0 : 1;
+
+    /// Rows that a RowWindow has to keep above the windows. Few rows are added up each time.
+    static int32_t rowsLeft(Reach reach) { return isFloat || reach.rows() < kAddedRows ? 0 : 1; }
 
     ColumnSums(const RowWindow& window, Reach reach, BlockLayout& layout)
         : reach_(reach), height_(reach.rows() + 1), columns_(reach.columns()) {
         for (int32_t i = 0; i < window.parts(); ++i) {
             const int64_t elements = (int64_t{window.part(i).width} + columns_) * n;
             const int64_t bytes = elements * static_cast<int64_t>(sizeof(S));
-            constexpr int64_t kPixel = n * static_cast<int64_t>(sizeof(S));
+            // Running windows read zeros in the pixel before the first.
+            constexpr int64_t kPixel = std::is_floating_point_v<S> ? 0 : n * static_cast<int64_t>(sizeof(S));
             sums_[i] = layout.add(bytes + kPixel) + kPixel;
             if (!inBlocks()) continue;
             entered_[i] = layout.add(bytes);
@@ -35,18 +37,21 @@ public:
     }
     void bind(uint8_t* memory) { memory_ = memory; }
 
-    /// Sums of the columns that the part's windows of row y see; zeros in the pixel before them. Rows come in order.
+    /// Sums of the columns that the part's windows of row y see; of integers, zeros in the pixel before them. Rows come in
+    /// order.
     S* makeRow(const WindowPart& part, int32_t y) {
         S* const sums = at(sums_[part.index]);
         const ptrdiff_t elements = (ptrdiff_t{part.width} + columns_) * n;
+        if constexpr (!std::is_floating_point_v<S>)
+            if (y == 0)
+                for (int i = 1; i <= n; ++i) sums[-i] = 0;
         if constexpr (isFloat) {
             if (inBlocks())
                 addBlock(part, y, sums, elements);
             else
                 addRows(part, y, sums, elements);
-        } else if (y == 0) {
-            for (int i = 1; i <= n; ++i) sums[-i] = 0;
-            addRows(part, 0, sums, elements);
+        } else if (y == 0 || rowsLeft(reach_) == 0) {
+            addRows(part, y, sums, elements);
         } else {
             kernels::slideRow(sums, part.row<T>(y + reach_.bottom), part.row<T>(y - reach_.top - 1), elements);
         }
@@ -54,6 +59,8 @@ public:
     }
 
 private:
+    static constexpr int32_t kAddedRows = 3;
+
     bool inBlocks() const { return isFloat && height_ > kernels::kMostTerms; }
     S* at(int64_t offset) const { return reinterpret_cast<S*>(memory_ + static_cast<ptrdiff_t>(offset)); }
 
