@@ -21,15 +21,9 @@ QorResult check(QorImageSize roi, QorImageSize mask, QorPoint2D anchor, Images..
 /// Bytes in 3 x 3 around their middle have a kernel of their own.
 template <Layout layout>
 QorResult square(const BoxJob<uint8_t, layout>& job) {
-    const Place place = job.inPlace() ? Place::inOrder : Place::apart;
-    BlockLayout pieces;
-    pieces.add(RowWindow::bytes(job.src, SquareRun::needs(place)));
-    const int64_t sums = pieces.add(SquareRun::bytes(job.src.size.width, channels(layout)));
-    const WorkMemory memory(pieces.bytes() + kBlockAlignment);
+    const WorkMemory memory(RowWindow::bytes(job.src, squareNeeds(job.inPlace())) + kBlockAlignment);
     if (QorResult r = memory.check()) return r;
-    auto* const start = memory.template begin<uint8_t>();
-    SquareRun::run<kernels::Square::ones, layout>(job.src, job.dst, kernels::ExactMean<9>{}, place, start,
-                                                  start + static_cast<ptrdiff_t>(sums));
+    runSquare<kernels::Square::ones, layout>(job.src, job.dst, job.inPlace(), memory.template begin<uint8_t>());
     return QOR_OK;
 }
 

@@ -50,17 +50,6 @@ struct BorderPixel {
     }
 };
 
-/// False where the buffer is too small for it.
-template <Layout layout>
-bool square(const BoxJob<uint8_t, layout>& job, const BoxBuffer& buffer) {
-    const Place place = job.inPlace() ? Place::inOrder : Place::apart;
-    const int64_t window = RowWindow::bytes(job.src, SquareRun::needs(place));
-    if (window + SquareRun::bytes(job.src.size.width, channels(layout)) > buffer.bytes) return false;
-    SquareRun::run<kernels::Square::ones, layout>(job.src, job.dst, kernels::ExactMean<9>{}, place, buffer.memory,
-                                                  buffer.memory + static_cast<ptrdiff_t>(window));
-    return true;
-}
-
 template <class T, Layout layout>
 QorResult filterBoxBorder(Image<const T> src, Image<T> dst, QorImageSize roi, QorImageSize mask, int32_t mode,
                           const T* borderValue, uint8_t* memory) {
@@ -78,7 +67,10 @@ QorResult filterBoxBorder(Image<const T> src, Image<T> dst, QorImageSize roi, Qo
     const BoxJob<T, layout> job{imageOf<T, layout>(src, roi, rule), dst, mask, reach};
     const BoxBuffer buffer{memory, bufferBytes(roi, mask, channels(layout))};
     if constexpr (sizeof(T) == 1)
-        if (mask.width == 3 && mask.height == 3 && square(job, buffer)) return QOR_OK;
+        if (mask.width == 3 && mask.height == 3) {
+            runSquare<kernels::Square::ones, layout>(job.src, dst, job.inPlace(), memory);
+            return QOR_OK;
+        }
     return underDefaultControl([&] { return box(job, &buffer); });
 }
 

@@ -5,7 +5,7 @@
 #include "box_chain.h"
 #include "box_sums.h"
 #include "kernels/box/across.h"
-#include "kernels/box/square.h"
+#include "strips.h"
 
 namespace qori::filter {
 
@@ -164,25 +164,36 @@ struct BoxBuffer {
     int64_t bytes;
 };
 
-/// Runs in the roomiest of its forms that the buffer holds: pieces aligned or not, with the chain's rows or without.
+/// Runs in the roomiest of its forms that the memory holds: pieces aligned or not, with the chain's rows or without.
+template <class S, class T, Layout layout, class Rule>
+void runStrip(const BoxJob<T, layout>& job, Rule rule, BoxBuffer buffer) {
+    using Run = BoxRun<S, T, layout, Rule>;
+    const auto bytesOf = [&](int64_t unit, bool chained) { return Run(job, rule, unit, chained, nullptr).bytes(); };
+    uint8_t* const start = blockStart(buffer.memory);
+    if (bytesOf(kBlockAlignment, Run::hasChain) <= buffer.bytes - (start - buffer.memory))
+        Run(job, rule, kBlockAlignment, Run::hasChain, start).run();
+    else
+        Run(job, rule, 1, Run::hasChain && bytesOf(1, true) <= buffer.bytes, buffer.memory).run();
+}
+
 template <class S, class T, Layout layout, class Rule>
 QorResult runBox(const BoxJob<T, layout>& job, Rule rule, const BoxBuffer* buffer) {
     using Run = BoxRun<S, T, layout, Rule>;
-    constexpr bool hasChain = Run::hasChain;
-    constexpr int64_t kAligned = 64;
-    const auto bytesOf = [&](int64_t unit, bool chained) { return Run(job, rule, unit, chained, nullptr).bytes(); };
-    if (buffer == nullptr) {
-        const WorkMemory memory(bytesOf(kAligned, hasChain) + kAligned);
-        if (QorResult r = memory.check()) return r;
-        Run(job, rule, kAligned, hasChain, memory.begin<uint8_t>()).run();
+    const auto runAll = [&](BoxBuffer memory) {
+        if (job.inPlace()) return runStrip<S>(job, rule, memory);
+        forStrips(job.src, job.dst, [&](const BorderedImage& src, Image<T> dst) {
+            runStrip<S>(BoxJob<T, layout>{src, dst, job.mask, job.reach}, rule, memory);
+        });
+    };
+    if (buffer != nullptr) {
+        runAll(*buffer);
         return QOR_OK;
     }
-    uint8_t* const start = blockStart(buffer->memory);
-    const int64_t aligned = buffer->bytes - (start - buffer->memory);
-    if (bytesOf(kAligned, hasChain) <= aligned)
-        Run(job, rule, kAligned, hasChain, start).run();
-    else
-        Run(job, rule, 1, hasChain && bytesOf(1, true) <= buffer->bytes, buffer->memory).run();
+    // As for the whole width, which no strip exceeds.
+    const int64_t bytes = Run(job, rule, kBlockAlignment, Run::hasChain, nullptr).bytes() + kBlockAlignment;
+    const WorkMemory memory(bytes);
+    if (QorResult r = memory.check()) return r;
+    runAll({memory.template begin<uint8_t>(), bytes - kBlockAlignment});
     return QOR_OK;
 }
 

@@ -2,6 +2,7 @@
 // Gauss filters of 3 x 3 and 5 x 5; neighbours are read from memory.
 #include "frame/checks.h"
 #include "frame/float_control.h"
+#include "frame/plan.h"
 #include "kernels/gauss/gauss.h"
 #include "square_run.h"
 
@@ -23,6 +24,11 @@ auto meanOf(int64_t total) {
 }
 
 template <class T, Layout layout>
+BorderedImage imageOf(Image<const T> src, QorImageSize roi) {
+    return {asBytes(src.data), src.step, roi, pixelSize<T, layout>, BorderRule::readAll()};
+}
+
+template <class T, Layout layout>
 QorResult gauss5x5(Image<const T> src, Image<T> dst, QorImageSize roi) {
     constexpr int n = channels(layout), kReach = 2;
     const int64_t seen = (int64_t{roi.width} + 2 * kReach) * n;
@@ -33,16 +39,18 @@ QorResult gauss5x5(Image<const T> src, Image<T> dst, QorImageSize roi) {
     if (QorResult r = memory.check()) return r;
     GaussRows<SumOf<T>> sums;
     for (int c = 0; c < 3; ++c) sums.column[c] = tableOf<SumOf<T>>(memory.template begin<uint8_t>(), at[c]);
-    for (int32_t y = 0; y < roi.height; ++y) {
-        const T* rows[5];
-        for (int k = 0; k < 5; ++k) rows[k] = src.row(y + k - kReach) - kReach * n;
-        sumGaussRows(rows, sums, static_cast<ptrdiff_t>(seen));
-        const ptrdiff_t elements = ptrdiff_t{roi.width} * n;
-        if constexpr (sizeof(T) == 1)
-            acrossGauss<n, layout == Layout::AC4>(sums, dst.row(y), elements, GaussMeanOfBytes{});
-        else
-            acrossGauss<n, layout == Layout::AC4>(sums, dst.row(y), elements, meanOf<T>(kGaussTotal));
-    }
+    forStrips(imageOf<T, layout>(src, roi), dst, [&](const BorderedImage& strip, Image<T> to) {
+        const ptrdiff_t elements = ptrdiff_t{strip.size.width} * n;
+        for (int32_t y = 0; y < strip.size.height; ++y) {
+            const T* rows[5];
+            for (int k = 0; k < 5; ++k) rows[k] = reinterpret_cast<const T*>(strip.pixel(-kReach, y + k - kReach));
+            sumGaussRows(rows, sums, elements + 2 * kReach * n);
+            if constexpr (sizeof(T) == 1)
+                acrossGauss<n, layout == Layout::AC4>(sums, to.row(y), elements, GaussMeanOfBytes{});
+            else
+                acrossGauss<n, layout == Layout::AC4>(sums, to.row(y), elements, meanOf<T>(kGaussTotal));
+        }
+    });
     return QOR_OK;
 }
 
@@ -50,21 +58,23 @@ template <class T, Layout layout>
 QorResult gauss3x3(Image<const T> src, Image<T> dst, QorImageSize roi) {
     constexpr int n = channels(layout);
     if constexpr (sizeof(T) == 1) {
-        const BorderedImage image{asBytes(src.data), src.step, roi, n, BorderRule::readAll()};
-        const WorkMemory memory(SquareRun::bytes(roi.width, n) + kBlockAlignment);
+        // No memory is needed, but a call that can have none answers as its kin do.
+        const WorkMemory memory(kBlockAlignment);
         if (QorResult r = memory.check()) return r;
-        SquareRun::run<Square::binomial, layout>(image, dst, SixteenthOfBytes{}, Place::apart, nullptr,
-                                                 memory.template begin<uint8_t>());
+        runSquare<Square::binomial, layout>(imageOf<T, layout>(src, roi), dst, false, nullptr);
     } else {
         const int64_t seen = (int64_t{roi.width} + 2) * n;
         const WorkMemory memory(seen * elementBytes<SumOf<T>> + kBlockAlignment);
         if (QorResult r = memory.check()) return r;
         auto* const sums = memory.template begin<SumOf<T>>();
-        for (int32_t y = 0; y < roi.height; ++y) {
-            sumBinomialRows(src.row(y - 1) - n, src.row(y) - n, src.row(y + 1) - n, sums, static_cast<ptrdiff_t>(seen));
-            acrossThree<Square::binomial, n, layout == Layout::AC4>(sums, dst.row(y), ptrdiff_t{roi.width} * n,
-                                                                    meanOf<T>(16));
-        }
+        forStrips(imageOf<T, layout>(src, roi), dst, [&](const BorderedImage& strip, Image<T> to) {
+            const ptrdiff_t elements = ptrdiff_t{strip.size.width} * n;
+            for (int32_t y = 0; y < strip.size.height; ++y) {
+                const auto row = [&](int32_t k) { return reinterpret_cast<const T*>(strip.pixel(-1, y + k)); };
+                sumBinomialRows(row(-1), row(0), row(1), sums, elements + 2 * n);
+                acrossBinomial<n, layout == Layout::AC4>(sums, to.row(y), elements, meanOf<T>(16));
+            }
+        });
     }
     return QOR_OK;
 }

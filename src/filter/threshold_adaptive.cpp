@@ -158,23 +158,47 @@ QorResult adaptiveBox(Image<const uint8_t> src, Image<uint8_t> dst, QorImageSize
     });
 }
 
-/// Rows are weighed as they enter, into a ring of as many as the window has; then columns of the ring.
+/// Memory of the Gauss form: the row window's, a ring of weighed rows, and a row as floats.
+class GaussMemory {
+public:
+    /// Makes `rows` rows at a time.
+    GaussMemory(const AdaptiveJob& job, int32_t rows) : needs(job.needs), slots(job.mask + rows - 1) {
+        needs.rowsAtOnce = rows;
+        pieces_.add(RowWindow::bytes(job.src, needs));
+        ring = pieces_.add(int64_t{slots} * job.src.size.width * elementBytes<float>);
+        line = pieces_.add((int64_t{job.src.size.width} + job.mask - 1) * elementBytes<float>);
+    }
+    int64_t bytes() const { return pieces_.bytes(); }
+
+    WindowNeeds needs;
+    int32_t slots;  ///< Rows of the ring: as many as the windows of the rows made at a time have.
+    int64_t ring = 0, line = 0;
+
+private:
+    BlockLayout pieces_{1};
+};
+
+/// Rows are weighed as they enter; then columns of the ring, two rows at a time where the buffer holds so many.
 void compareGauss(const AdaptiveJob& job, const float* weights, uint8_t* buffer) {
-    BlockLayout pieces(1);
-    pieces.add(RowWindow::bytes(job.src, job.needs));
-    RowWindow window(job.src, job.needs, buffer);
-    const ptrdiff_t taps = job.mask, width = job.src.size.width;
-    auto* const rows = tableOf<float>(buffer, pieces.add(int64_t{taps} * width * elementBytes<float>));
-    auto* const line = tableOf<float>(buffer, pieces.bytes());
-    const kernels::FloatRing ring{rows, rows + taps * width, width};
-    window.forEach([&](const WindowPart& part, int32_t y, int32_t) {
-        const auto slotOf = [&](int32_t row) { return rows + (row + job.reach) % taps * width + part.x; };
-        for (int32_t row = y == 0 ? -job.reach : y + job.reach; row <= y + job.reach; ++row) {
+    GaussMemory memory(job, 2);
+    if (memory.bytes() > bufferBytes(job.src.size, job.mask)) memory = GaussMemory(job, 1);
+    RowWindow window(job.src, memory.needs, buffer);
+    const ptrdiff_t taps = job.mask, width = job.src.size.width, slots = memory.slots;
+    auto* const ring = tableOf<float>(buffer, memory.ring);
+    auto* const line = tableOf<float>(buffer, memory.line);
+    window.forEach([&](const WindowPart& part, int32_t y, int32_t rows) {
+        const auto slotOf = [&](int32_t row) { return ring + (row + job.reach) % slots * width + part.x; };
+        const int32_t last = y + rows - 1 + job.reach;
+        for (int32_t row = y == 0 ? -job.reach : y + job.reach; row <= last; ++row) {
             kernels::floatsOfBytes(part.row(row), line, part.width + taps - 1);
             kernels::weighAlong(line, weights, taps, slotOf(row), part.width);
         }
-        kernels::compareWeighed(part.row(y) + job.reach, ring, slotOf(y - job.reach), weights, taps, job.rule.delta,
-                                job.dst.row(y) + part.x, job.rule.values(), part.width);
+        // Of a last row without another below it, what is made in its place gives way.
+        const uint8_t* const src[] = {part.row(y) + job.reach, part.row(y + rows - 1) + job.reach};
+        uint8_t* const dst[] = {job.dst.row(y) + part.x, job.dst.row(y + rows - 1) + part.x};
+        const kernels::FloatRing rowsOfRing{ring + part.x, ring + part.x + slots * width, width};
+        kernels::compareWeighed(src, rowsOfRing, slotOf(y - job.reach), weights, taps, job.rule.delta, dst,
+                                job.rule.values(), part.width);
     });
 }
 

@@ -95,7 +95,7 @@ void checkBox(const Job& job) {
             for (int j = -reach; j <= reach; ++j)
                 for (int i = -reach; i <= reach; ++i) sum += pixels.at(x + i, y + j);
             const int64_t area = int64_t{job.mask} * job.mask;
-            return pixels.at(x, y) * area > sum - static_cast<long double>(job.delta) * area;
+            return static_cast<long double>(sum - pixels.at(x, y) * area) < static_cast<long double>(job.delta) * area;
         },
         [&](const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t dstStep, uint8_t value, uint8_t* buffer) {
             if (job.inPlace && random().oneIn(2))
@@ -126,7 +126,7 @@ void checkGauss(const Job& job, float sigma) {
             for (int j = 0; j < job.mask; ++j) {
                 float along = 0;
                 for (int i = 0; i < job.mask; ++i)
-                    along = std::fma(weights[static_cast<size_t>(i)], float{pixels.at(x + i - reach, y + j - reach)} + 0, along);
+                    along = std::fma(weights[static_cast<size_t>(i)], static_cast<float>(pixels.at(x + i - reach, y + j - reach)), along);
                 mean = std::fma(weights[static_cast<size_t>(j)], along, mean);
             }
             return static_cast<float>(pixels.at(x, y)) > mean - job.delta;
