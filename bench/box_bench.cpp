@@ -13,7 +13,8 @@ class Rimmed {
 public:
     Rimmed(Size size, int channels)
         : left_(64 * kRim),
-          image_({size.width + 2 * left_ / channels / static_cast<int>(sizeof(T)) + 1, size.height + 2 * kRim}, channels) {}
+          image_({size.width + 2 * left_ / channels / static_cast<int>(sizeof(T)) + 1, size.height + 2 * kRim},
+                 channels) {}
     T* data() const { return row(0); }
     T* row(int y) const { return image_.row(y + kRim) + left_ / static_cast<int>(sizeof(T)); }
     int32_t step() const { return image_.step(); }
@@ -80,10 +81,9 @@ Row inPlace(std::string name, Function function, Apart apart, int side) {
             const Image<T> dst(size, channels);
             const QorImageSize mask{side, side};
             const QorPoint2D anchor{side / 2, side / 2};
-            return Contenders{
-                [=] { function(image.data(), image.step(), size.roi(), mask, anchor); },
-                {},
-                [=] { apart(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask, anchor); }};
+            return Contenders{[=] { function(image.data(), image.step(), size.roi(), mask, anchor); },
+                              {},
+                              [=] { apart(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask, anchor); }};
         },
         "not in place");
 }
@@ -109,8 +109,7 @@ Row gauss(std::string name, Function function, int32_t mask, Best best = {}) {
     return rowOf<T>(std::move(name), channels, best, [=](Size size) {
         const Rimmed<T> src(size, channels);
         const Image<T> dst(size, channels);
-        return Contenders{
-            [=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask); }, {}, {}};
+        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask); }, {}, {}};
     });
 }
 

@@ -50,8 +50,8 @@ Picture adaptiveBesideOtsu(const Picture& photo) {
     require(qoriThresholdAdaptiveBoxGetBufferSize(right, mask, 1, 1, &bytes));
     const auto buffer = std::make_unique<uint8_t[]>(static_cast<size_t>(bytes));
     const ptrdiff_t x = size.width / 2;
-    require(qoriThresholdAdaptiveBox_8u_C1R(grey.data() + x, grey.step(), binary.data() + x, binary.step(), right, mask, 6,
-                                            255, 0, borderReplicate, 0, buffer.get()));
+    require(qoriThresholdAdaptiveBox_8u_C1R(grey.data() + x, grey.step(), binary.data() + x, binary.step(), right, mask,
+                                            6, 255, 0, borderReplicate, 0, buffer.get()));
     Picture out(size, 3);
     require(qoriDup_8u_C1C3R(binary.data(), binary.step(), out.data(), out.step(), size));
     return out;

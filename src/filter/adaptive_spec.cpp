@@ -14,10 +14,11 @@ double powerOfTwo(int n) {
     return power;
 }
 
-/// e^x for x <= 0, to a few units in the last place: x = n ln 2 + r with |r| <= ln 2 / 2, whose Taylor series ends below
-/// 2^-57 after 13 terms.
+/// e^x for x <= 0, to a few units in the last place: x = n ln 2 + r with |r| <= ln 2 / 2, whose Taylor series ends
+/// below 2^-57 after 13 terms.
 double exponential(double x) {
-    constexpr double kLn2High = 0.693147180369123816490, kLn2Low = 1.90821492927058770002e-10, kLog2 = 1.4426950408889634;
+    constexpr double kLn2High = 0.693147180369123816490, kLn2Low = 1.90821492927058770002e-10,
+                     kLog2 = 1.4426950408889634;
     if (!(x > -745.2)) return x == x ? 0 : x;
     const int n = static_cast<int>(x * kLog2 - 0.5);
     const double r = x - n * kLn2High - n * kLn2Low;
@@ -49,8 +50,7 @@ void fillAdaptiveSpec(QorAdaptiveGaussSpec* block, int32_t maskSize, float sigma
     const int32_t reach = maskSize / 2;
     double total = 1;
     for (int32_t k = 1; k <= reach; ++k) total += 2 * weightAt(k, sigma);
-    for (int32_t k = -reach; k <= reach; ++k)
-        weights[k + reach] = static_cast<float>(weightAt(k, sigma) * (1 / total));
+    for (int32_t k = -reach; k <= reach; ++k) weights[k + reach] = static_cast<float>(weightAt(k, sigma) * (1 / total));
 }
 
 const AdaptiveSpec* adaptiveSpecOf(const QorAdaptiveGaussSpec* block) {

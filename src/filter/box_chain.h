@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-// How a wide window of floats is added up from narrower ones: a chain of passes of a few terms each, every term a row of
-// sums moved by some pixels. No term is ever taken away, so that errors depend on the window's own elements only, and
-// the additions per pixel grow with the logarithm of the width.
+// How a wide window of floats is added up from narrower ones: a chain of passes of a few terms each, every term a row
+// of sums moved by some pixels. No term is ever taken away, so that errors depend on the window's own elements only,
+// and the additions per pixel grow with the logarithm of the width.
 #pragma once
 #include <algorithm>
 #include <cstdint>

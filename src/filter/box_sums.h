@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Sums of a window's columns from row to row, per part of a region, and the memory that they take.
 //
-// Integers: what enters is added, what leaves is taken away, exactly. Floats: rows are added up in blocks as high as the
-// window. A window is the end of one block, summed from below when the block was entered, and the beginning of the next,
-// summed from above as its rows enter (M. van Herk, A fast algorithm for local minimum and maximum filters on rectangular
-// and octagonal kernels, Pattern Recognition Letters 13, 1992, here with sums): two additions per row, each sum of at
-// most `height` elements and of the window's own alone.
+// Integers: what enters is added, what leaves is taken away, exactly. Floats: rows are added up in blocks as high as
+// the window. A window is the end of one block, summed from below when the block was entered, and the beginning of the
+// next, summed from above as its rows enter (M. van Herk, A fast algorithm for local minimum and maximum filters on
+// rectangular and octagonal kernels, Pattern Recognition Letters 13, 1992, here with sums): two additions per row, each
+// sum of at most `height` elements and of the window's own alone.
 #pragma once
 #include "frame/plan.h"
 #include "frame/row_window.h"
@@ -37,8 +37,8 @@ public:
     }
     void bind(uint8_t* memory) { memory_ = memory; }
 
-    /// Sums of the columns that the part's windows of row y see; of integers, zeros in the pixel before them. Rows come in
-    /// order.
+    /// Sums of the columns that the part's windows of row y see; of integers, zeros in the pixel before them. Rows come
+    /// in order.
     S* makeRow(const WindowPart& part, int32_t y) {
         S* const sums = at(sums_[part.index]);
         const ptrdiff_t elements = (ptrdiff_t{part.width} + columns_) * n;

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Gauss filters of 3 x 3 and 5 x 5; neighbours are read from memory.
+#include "kernels/gauss/gauss.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "frame/plan.h"
-#include "kernels/gauss/gauss.h"
 #include "square_run.h"
 
 namespace qori::filter {
@@ -13,7 +13,8 @@ using namespace kernels;
 
 /// Words in unsigned sums of 32 bits, floats in their own precision.
 template <class T>
-using SumOf = std::conditional_t<std::is_same_v<T, float>, float, std::conditional_t<sizeof(T) == 1, uint16_t, uint32_t>>;
+using SumOf =
+    std::conditional_t<std::is_same_v<T, float>, float, std::conditional_t<sizeof(T) == 1, uint16_t, uint32_t>>;
 
 template <class T>
 auto meanOf(int64_t total) {

@@ -105,7 +105,8 @@ void sweepBordered(const char* name, Function function) {
                 for (int maskHeight : {1, 2, 3, 4, 5, 8, 9, 10})
                     checkBordered<T, L>({.width = width, .height = height}, {maskWidth, maskHeight},
                                         borderConstant | random().below(2), random().oneIn(2), function);
-    for (const QorImageSize mask : {QorImageSize{61, 1}, QorImageSize{61, 2}, QorImageSize{2, 61}, QorImageSize{130, 3}})
+    for (const QorImageSize mask :
+         {QorImageSize{61, 1}, QorImageSize{61, 2}, QorImageSize{2, 61}, QorImageSize{130, 3}})
         for (int width : {1, 60, 61, 63, 150})
             checkBordered<T, L>({.width = width, .height = 1 + random().below(3)}, mask, borderReplicate,
                                 random().oneIn(2), function);

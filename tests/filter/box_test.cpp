@@ -6,7 +6,8 @@ namespace {
 
 template <class T, Layout L, Kind kind, class Function>
 void checkBox(const Shape& shape, QorImageSize mask, QorPoint2D anchor, Function function) {
-    SCOPED_TRACE(testing::Message() << "mask " << mask.width << "x" << mask.height << " at " << anchor.x << "," << anchor.y);
+    SCOPED_TRACE(testing::Message() << "mask " << mask.width << "x" << mask.height << " at " << anchor.x << ","
+                                    << anchor.y);
     checkWindow<T, T, L, kind>(
         shape, Around::ofMask(mask, anchor),
         [=](const T* src, int32_t srcStep, T* dst, int32_t dstStep, QorImageSize roi) {
@@ -15,9 +16,7 @@ void checkBox(const Shape& shape, QorImageSize mask, QorPoint2D anchor, Function
             else
                 return call(function, src, srcStep, dst, dstStep, roi, mask, anchor);
         },
-        [=](auto pixel) {
-            return boxMean<T>(mask, [=](int i, int j) { return pixel(i - anchor.x, j - anchor.y); });
-        },
+        [=](auto pixel) { return boxMean<T>(mask, [=](int i, int j) { return pixel(i - anchor.x, j - anchor.y); }); },
         drawExact<T>);
 }
 
@@ -35,8 +34,8 @@ void sweepBox(const char* name, Function function) {
     for (const QorImageSize mask : masks)
         for (int width : {1, 15, 33, 70}) {
             const Shape shape{.width = width, .height = 1 + random().below(12), .padding = 3, .atBegin = width == 33};
-            for (const QorPoint2D anchor : {QorPoint2D{0, 0}, QorPoint2D{mask.width - 1, mask.height - 1},
-                                            drawAnchor(mask)})
+            for (const QorPoint2D anchor :
+                 {QorPoint2D{0, 0}, QorPoint2D{mask.width - 1, mask.height - 1}, drawAnchor(mask)})
                 checkBox<T, L, kind>(shape, mask, anchor, function);
         }
     // Several blocks of columns, and more rows than a block of the window's height.
@@ -71,7 +70,8 @@ void filterBoxInPlace(const char* name, Function function) {
 void checkEverySum(QorImageSize mask, int64_t multiplier, int shift) {
     const int area = mask.width * mask.height, sums = 255 * area + 1;
     // Windows beside each other that share no column.
-    const TestImage src(0, {.width = sums * mask.width, .height = mask.height}, 1), dst(1, {.width = sums * mask.width}, 1);
+    const TestImage src(0, {.width = sums * mask.width, .height = mask.height}, 1),
+        dst(1, {.width = sums * mask.width}, 1);
     const View<uint8_t> pixels = src.view<uint8_t>(1);
     for (int sum = 0; sum < sums; ++sum) {
         int left = sum;
@@ -114,21 +114,24 @@ TEST(Box, BytesRoundEverySumOfTheSquare) {
             src.view<uint8_t>(1).set(3 * sum + i % 3, i / 3, 0, static_cast<uint8_t>(std::min(left, 255)));
             left -= std::min(left, 255);
         }
-    EXPECT_EQ(QOR_OK, call(qoriFilterBox_8u_C1R, src.data<const uint8_t>() + src.step() + 1, src.step(), dst.data<uint8_t>(),
-                           dst.step(), QorImageSize{kSums * 3 - 2, 1}, QorImageSize{3, 3}, QorPoint2D{1, 1}));
+    EXPECT_EQ(QOR_OK,
+              call(qoriFilterBox_8u_C1R, src.data<const uint8_t>() + src.step() + 1, src.step(), dst.data<uint8_t>(),
+                   dst.step(), QorImageSize{kSums * 3 - 2, 1}, QorImageSize{3, 3}, QorPoint2D{1, 1}));
     int wrong = 0;
-    for (int sum = 0; sum < kSums; ++sum) wrong += dst.view<uint8_t>(1).get(3 * sum, 0) != (sum * 29128 + (1 << 17)) >> 18;
+    for (int sum = 0; sum < kSums; ++sum)
+        wrong += dst.view<uint8_t>(1).get(3 * sum, 0) != (sum * 29128 + (1 << 17)) >> 18;
     EXPECT_EQ(0, wrong);
 }
 
 /// Sums beyond 2^24, 2^31 and 2^32: single windows of a constant with one other element.
 template <class T, class Function>
 void checkLarge(Function function, QorImageSize mask, T value) {
-    const TestImage src(0, {.width = mask.width + 1, .height = mask.height}, sizeof(T)), dst(1, {.width = 2}, sizeof(T));
+    const TestImage src(0, {.width = mask.width + 1, .height = mask.height}, sizeof(T)),
+        dst(1, {.width = 2}, sizeof(T));
     src.fill<T>(1, [=] { return value; });
     src.view<T>(1).set(0, 0, 0, static_cast<T>(value - 1));
-    EXPECT_EQ(QOR_OK, call(function, src.data<const T>(), src.step(), dst.data<T>(), dst.step(), QorImageSize{2, 1}, mask,
-                           QorPoint2D{0, 0}));
+    EXPECT_EQ(QOR_OK, call(function, src.data<const T>(), src.step(), dst.data<T>(), dst.step(), QorImageSize{2, 1},
+                           mask, QorPoint2D{0, 0}));
     const int64_t area = int64_t{mask.width} * mask.height;
     EXPECT_EQ(reference::meanOf<T>(value * area - 1, area), dst.view<T>(1).get(0, 0)) << area;
     EXPECT_EQ(reference::meanOf<T>(value * area, area), dst.view<T>(1).get(1, 0)) << area;
@@ -172,7 +175,8 @@ TEST(Box, WordsRoundTiesToEven) {
 template <class T, class Function>
 void checkDrift(Function function, QorImageSize mask, int width, int height) {
     const int columns = width + mask.width - 1, rows = height + mask.height - 1;
-    const TestImage src(0, {.width = columns, .height = rows}, sizeof(T)), dst(1, {.width = width, .height = height}, sizeof(T));
+    const TestImage src(0, {.width = columns, .height = rows}, sizeof(T)),
+        dst(1, {.width = width, .height = height}, sizeof(T));
     src.fill<T>(1, [] {
         const T value = drawPixel<T>();
         return random().oneIn(400) ? value * T(1e30) : value;
@@ -207,8 +211,8 @@ TEST(Box, FloatsForgetWhatHasLeft) {
     src.view<float>(1).set(40, 30, 0, std::numeric_limits<float>::quiet_NaN());
     src.view<float>(1).set(80, 20, 0, std::numeric_limits<float>::infinity());
     for (const QorImageSize mask : {QorImageSize{11, 11}, QorImageSize{3, 3}}) {
-        EXPECT_EQ(QOR_OK, call(qoriFilterBox_32f_C1R, src.data<const float>(), src.step(), dst.data<float>(), dst.step(),
-                               QorImageSize{110, 50}, mask, QorPoint2D{0, 0}));
+        EXPECT_EQ(QOR_OK, call(qoriFilterBox_32f_C1R, src.data<const float>(), src.step(), dst.data<float>(),
+                               dst.step(), QorImageSize{110, 50}, mask, QorPoint2D{0, 0}));
         const auto sees = [&](int x, int y, int px, int py) {
             return x <= px && px < x + mask.width && y <= py && py < y + mask.height;
         };

@@ -70,7 +70,8 @@ TEST(Gauss, BytesRoundEverySum) {
             for (int k = 0; k < kAtOnce; ++k) {
                 // Greedily: large weights first, then what the small ones make up.
                 int left = std::min(begin + k, sums - 1);
-                for (int i : {12, 7, 11, 13, 17, 6, 8, 16, 18, 2, 10, 14, 22, 1, 3, 5, 9, 15, 19, 21, 23, 0, 4, 20, 24}) {
+                for (int i :
+                     {12, 7, 11, 13, 17, 6, 8, 16, 18, 2, 10, 14, 22, 1, 3, 5, 9, 15, 19, 21, 23, 0, 4, 20, 24}) {
                     if (side == 3 && i > 8) continue;
                     static constexpr int order3[] = {4, 1, 3, 5, 7, 0, 2, 6, 8};
                     const int at = side == 3 ? order3[i] : i;
@@ -101,7 +102,8 @@ TEST(Gauss, BytesRoundEverySum) {
 
 TEST(Gauss, FloatsOfAnyValue) {
     constexpr int kWidth = 150, kHeight = 9;
-    const TestImage src(0, {.width = kWidth + 4, .height = kHeight + 4}, 4), dst(1, {.width = kWidth, .height = kHeight}, 4);
+    const TestImage src(0, {.width = kWidth + 4, .height = kHeight + 4}, 4),
+        dst(1, {.width = kWidth, .height = kHeight}, 4);
     src.fill<float>(1, drawPixel<float>);
     const float* const s = src.data<float>() + 2 * (kWidth + 4) + 2;
     for (int32_t mask : {mask3x3, mask5x5}) {
@@ -120,7 +122,8 @@ TEST(Gauss, FloatsOfAnyValue) {
                         magnitudes += std::abs(static_cast<long double>(pixel(i, j))) * weight;
                     }
                 const long double total = reach == 1 ? 16 : 571;
-                wrong += !(std::abs(dst.view<float>(1).get(x, y) - sum / total) <= 10 * kUnit<float> * magnitudes / total);
+                wrong +=
+                    !(std::abs(dst.view<float>(1).get(x, y) - sum / total) <= 10 * kUnit<float> * magnitudes / total);
             }
         EXPECT_EQ(0, wrong) << mask;
     }

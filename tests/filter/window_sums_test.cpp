@@ -32,7 +32,8 @@ void sweepSums(const char* name, Function function) {
         for (int anchor : {0, size - 1, random().below(size)})
             checkWindowSum<S, L, along>({.width = 37, .height = 3}, size, anchor, function);
     // Rows from the last to the first, in both images.
-    for (int size : {1, 7}) checkWindowSum<S, L, along>({.width = 19, .height = 5, .flipped = true}, size, size / 2, function);
+    for (int size : {1, 7})
+        checkWindowSum<S, L, along>({.width = 19, .height = 5, .flipped = true}, size, size / 2, function);
 
     const TestImage src(0, {.width = 9, .height = 9}, 8), dst(1, {.width = 4, .height = 4}, 16);
     const S *s = src.data<S>(), *noSource = nullptr;
@@ -40,7 +41,8 @@ void sweepSums(const char* name, Function function) {
     constexpr bool checksSize = along && std::is_same_v<S, uint16_t>;
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, call(function, noSource, 0, d, 0, QorImageSize{0, 0}, 0, 0));
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, call(function, s, 0, none, 0, QorImageSize{0, 0}, 0, 0));
-    for (const QorImageSize empty : {QorImageSize{0, 1}, QorImageSize{1, 0}, QorImageSize{-1, 1}, QorImageSize{1, INT32_MIN}}) {
+    for (const QorImageSize empty :
+         {QorImageSize{0, 1}, QorImageSize{1, 0}, QorImageSize{-1, 1}, QorImageSize{1, INT32_MIN}}) {
         QORI_EXPECT_STATUS(checksSize ? QOR_ERR_SIZE : QOR_ERR_MASK_SIZE, dst, call(function, s, 0, d, 0, empty, 0, 0));
         QORI_EXPECT_STATUS(checksSize ? QOR_ERR_SIZE : QOR_ERR_ANCHOR, dst, call(function, s, 0, d, 0, empty, 3, 3));
         QORI_EXPECT_STATUS(checksSize ? QOR_ERR_SIZE : QOR_OK, dst, call(function, s, 0, d, 0, empty, 3, 2));
@@ -74,12 +76,14 @@ TEST(WindowSums, LongWindows) {
     const auto check = [](auto along, auto down, auto largest) {
         using S = decltype(largest);
         for (int size : {257, 65'537, 65'539, 140'001}) {
-            const TestImage row(0, {.width = size + 2}, sizeof(S)), column(1, {.width = 1, .height = size + 2}, sizeof(S));
+            const TestImage row(0, {.width = size + 2}, sizeof(S)),
+                column(1, {.width = 1, .height = size + 2}, sizeof(S));
             row.fill<S>(1, [=] { return static_cast<S>(largest - random().below(2)); });
             for (int i = 0; i < size + 2; ++i) column.view<S>(1).set(0, i, 0, row.view<S>(1).get(i, 0));
             float sums[3], sumsDown[3];
             EXPECT_EQ(QOR_OK, call(along, row.data<const S>(), row.step(), +sums, 12, QorImageSize{3, 1}, size, 0));
-            EXPECT_EQ(QOR_OK, call(down, column.data<const S>(), column.step(), +sumsDown, 4, QorImageSize{1, 3}, size, 0));
+            EXPECT_EQ(QOR_OK,
+                      call(down, column.data<const S>(), column.step(), +sumsDown, 4, QorImageSize{1, 3}, size, 0));
             int64_t sum = 0;
             for (int i = 0; i < size - 1; ++i) sum += row.view<S>(1).get(i, 0);
             for (int x = 0; x < 3; ++x) {

@@ -76,11 +76,12 @@ template <int terms, class S, class T>
 QORI_NOINLINE void sumTerms(const T* const* term, S* sums, ptrdiff_t elements) {
     const T* from[terms];
     for (int k = 0; k < terms; ++k) from[k] = term[k];
-    forVectors<S>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        Vec<S> sum = loadAs<S>(from[0] + i, count);
-        for (int k = 1; k < terms; ++k) sum = sum + loadAs<S>(from[k] + i, count);
-        storeUpTo(sums + i, sum, count);
-    });
+    forVectors<S>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            Vec<S> sum = loadAs<S>(from[0] + i, count);
+            for (int k = 1; k < terms; ++k) sum = sum + loadAs<S>(from[k] + i, count);
+            storeUpTo(sums + i, sum, count);
+        });
 }
 
 /// count: 1 to kMostTerms.
@@ -101,29 +102,32 @@ void sumTerms(const T* const* term, int count, S* sums, ptrdiff_t elements) {
 /// sums += row.
 template <class S, class T>
 QORI_NOINLINE void addRow(S* sums, const T* row, ptrdiff_t elements) {
-    forVectors<S>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        storeUpTo(sums + i, loadUpTo(sums + i, count) + loadAs<S>(row + i, count), count);
-    });
+    forVectors<S>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            storeUpTo(sums + i, loadUpTo(sums + i, count) + loadAs<S>(row + i, count), count);
+        });
 }
 
 /// sums += entering - leaving; integers, where this is exact.
 template <class S, class T>
 QORI_NOINLINE void slideRow(S* sums, const T* entering, const T* leaving, ptrdiff_t elements) {
-    forVectors<S>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        const Vec<S> change = loadAs<S>(entering + i, count) - loadAs<S>(leaving + i, count);
-        storeUpTo(sums + i, loadUpTo(sums + i, count) + change, count);
-    });
+    forVectors<S>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            const Vec<S> change = loadAs<S>(entering + i, count) - loadAs<S>(leaving + i, count);
+            storeUpTo(sums + i, loadUpTo(sums + i, count) + change, count);
+        });
 }
 
 /// sums += entering, total = sums + rest.
 template <class S, class T>
 QORI_NOINLINE void addRowTo(S* sums, const T* entering, const S* rest, S* total, bool isFirst, ptrdiff_t elements) {
-    forVectors<S>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        Vec<S> sum = loadAs<S>(entering + i, count);
-        if (!isFirst) sum = loadUpTo(sums + i, count) + sum;
-        storeUpTo(sums + i, sum, count);
-        storeUpTo(total + i, sum + loadUpTo(rest + i, count), count);
-    });
+    forVectors<S>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            Vec<S> sum = loadAs<S>(entering + i, count);
+            if (!isFirst) sum = loadUpTo(sums + i, count) + sum;
+            storeUpTo(sums + i, sum, count);
+            storeUpTo(total + i, sum + loadUpTo(rest + i, count), count);
+        });
 }
 
 /// Element i of a vector's `channels` interleaved running sums: the sum of all elements of its channel up to it.

@@ -110,7 +110,8 @@ struct WordMean {
             const __m256d fine = _mm256_fmadd_pd(sum, r, _mm256_set1_pd(0x1p32));
             return _mm256_castpd_ps(_mm256_add_pd(fine, _mm256_set1_pd(0x1p52 - 0x1p32)));
         };
-        const __m256 low = half(_mm256_unpacklo_epi32(s.v, exponent)), high = half(_mm256_unpackhi_epi32(s.v, exponent));
+        const __m256 low = half(_mm256_unpacklo_epi32(s.v, exponent)),
+                     high = half(_mm256_unpackhi_epi32(s.v, exponent));
         return _mm256_castps_si256(_mm256_shuffle_ps(low, high, 0x88));
     }
     /// Sums of doubles are integers below 2^53, whose quotients are rounded once: what is no tie stays 2^-37 from the

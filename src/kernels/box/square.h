@@ -47,12 +47,13 @@ QORI_INLINE WordPair squareRow(const uint8_t* p, ptrdiff_t count) {
         return {{even + Vec<uint16_t>{_mm256_and_si256(left, _mm256_set1_epi16(0xFF))},
                  odd + Vec<uint16_t>{_mm256_srli_epi16(right, 8)}}};
     } else {
+        // The middle and its left neighbour in one product; the right one is added.
         const __m256i zero = _mm256_setzero_si256();
-        const auto sum = [&](__m256i sides, __m256i own) __attribute__((always_inline)) {
-            return Vec<uint16_t>{weighed<1, 1>(sides)} + Vec<uint16_t>{middle == 1 ? own : _mm256_add_epi16(own, own)};
+        const auto sum = [](__m256i pairs, __m256i others) __attribute__((always_inline)) {
+            return Vec<uint16_t>{weighed<middle, 1>(pairs)} + Vec<uint16_t>{others};
         };
-        return {{sum(_mm256_unpacklo_epi8(left, right), _mm256_unpacklo_epi8(at, zero)),
-                 sum(_mm256_unpackhi_epi8(left, right), _mm256_unpackhi_epi8(at, zero))}};
+        return {{sum(_mm256_unpacklo_epi8(at, left), _mm256_unpacklo_epi8(right, zero)),
+                 sum(_mm256_unpackhi_epi8(at, left), _mm256_unpackhi_epi8(right, zero))}};
     }
 }
 

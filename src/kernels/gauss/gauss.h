@@ -2,7 +2,8 @@
 // Gauss of 5 x 5, and of 3 x 3 for elements of 16 bits and more: rows first, then columns.
 //
 //      2   7  12   7   2
-//      7  31  52  31   7     The rows' sums are made three times, with the weights of the middle column, of those beside
+//      7  31  52  31   7     The rows' sums are made three times, with the weights of the middle column, of those
+//      beside
 //     12  52 127  52  12     it and of those at the edge: (12, 52, 127, 52, 12), (7, 31, 52, 31, 7), (2, 7, 12, 7, 2).
 //      7  31  52  31   7     Bytes: at most 255 * 255, 128 * 255 and 30 * 255, which 16 bits hold.
 //      2   7  12   7   2     Words: 571 * 65,535 in all, which 32 bits hold.
@@ -50,36 +51,38 @@ struct GaussRows {
 /// src: five rows from two above to two below.
 QORI_NOINLINE inline void sumGaussRows(const uint8_t* const* src, GaussRows<uint16_t> sums, ptrdiff_t elements) {
     const uint8_t* const row[] = {src[0], src[1], src[2], src[3], src[4]};
-    forVectors<uint8_t>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        __m256i r[5];
-        for (int k = 0; k < 5; ++k) r[k] = detail::loadForPairs(row[k] + i, count);
-        const __m256i zero = _mm256_setzero_si256();
-        const __m256i edge[] = {_mm256_unpacklo_epi8(r[0], r[4]), _mm256_unpackhi_epi8(r[0], r[4])};
-        const __m256i beside[] = {_mm256_unpacklo_epi8(r[1], r[3]), _mm256_unpackhi_epi8(r[1], r[3])};
-        const __m256i at[] = {_mm256_unpacklo_epi8(r[2], zero), _mm256_unpackhi_epi8(r[2], zero)};
-        for (int c = 0; c < 3; ++c)
-            for (int half = 0; half < 2; ++half) {
-                const GaussColumn w = kGaussColumns[c];
-                const __m256i sum = _mm256_add_epi16(
-                    _mm256_add_epi16(detail::weigh(edge[half], w.edge, w.edge), detail::weigh(at[half], w.at, 0)),
-                    detail::weigh(beside[half], w.beside, w.beside));
-                storeUpTo(sums.column[c] + i + 16 * half, Vec<uint16_t>{sum}, count - 16 * half);
-            }
-    });
+    forVectors<uint8_t>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            __m256i r[5];
+            for (int k = 0; k < 5; ++k) r[k] = detail::loadForPairs(row[k] + i, count);
+            const __m256i zero = _mm256_setzero_si256();
+            const __m256i edge[] = {_mm256_unpacklo_epi8(r[0], r[4]), _mm256_unpackhi_epi8(r[0], r[4])};
+            const __m256i beside[] = {_mm256_unpacklo_epi8(r[1], r[3]), _mm256_unpackhi_epi8(r[1], r[3])};
+            const __m256i at[] = {_mm256_unpacklo_epi8(r[2], zero), _mm256_unpackhi_epi8(r[2], zero)};
+            for (int c = 0; c < 3; ++c)
+                for (int half = 0; half < 2; ++half) {
+                    const GaussColumn w = kGaussColumns[c];
+                    const __m256i sum = _mm256_add_epi16(
+                        _mm256_add_epi16(detail::weigh(edge[half], w.edge, w.edge), detail::weigh(at[half], w.at, 0)),
+                        detail::weigh(beside[half], w.beside, w.beside));
+                    storeUpTo(sums.column[c] + i + 16 * half, Vec<uint16_t>{sum}, count - 16 * half);
+                }
+        });
 }
 
 template <class S, class T>
 QORI_NOINLINE void sumGaussRows(const T* const* src, GaussRows<S> sums, ptrdiff_t elements) {
     const T* const row[] = {src[0], src[1], src[2], src[3], src[4]};
-    forVectors<S>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        using detail::times;
-        const Vec<S> edge = loadAs<S>(row[0] + i, count) + loadAs<S>(row[4] + i, count);
-        const Vec<S> beside = loadAs<S>(row[1] + i, count) + loadAs<S>(row[3] + i, count);
-        const Vec<S> at = loadAs<S>(row[2] + i, count);
-        storeUpTo(sums.column[0] + i, times<12>(edge) + times<52>(beside) + times<127>(at), count);
-        storeUpTo(sums.column[1] + i, times<7>(edge) + times<31>(beside) + times<52>(at), count);
-        storeUpTo(sums.column[2] + i, times<2>(edge) + times<7>(beside) + times<12>(at), count);
-    });
+    forVectors<S>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            using detail::times;
+            const Vec<S> edge = loadAs<S>(row[0] + i, count) + loadAs<S>(row[4] + i, count);
+            const Vec<S> beside = loadAs<S>(row[1] + i, count) + loadAs<S>(row[3] + i, count);
+            const Vec<S> at = loadAs<S>(row[2] + i, count);
+            storeUpTo(sums.column[0] + i, times<12>(edge) + times<52>(beside) + times<127>(at), count);
+            storeUpTo(sums.column[1] + i, times<7>(edge) + times<31>(beside) + times<52>(at), count);
+            storeUpTo(sums.column[2] + i, times<2>(edge) + times<7>(beside) + times<12>(at), count);
+        });
 }
 
 /// Bytes: sum / 571 to nearest; 571 is odd and leaves no ties. The float product is off by less than 255 * 2^-23 =
@@ -111,46 +114,50 @@ private:
 template <int channels, bool keepAlpha, class T, class S, class Rule>
 QORI_NOINLINE void acrossGauss(GaussRows<S> sums, T* dst, ptrdiff_t elements, Rule rule) {
     constexpr int vectors = kSumVectors<S, T>;
-    forVectors<T>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        Vec<S> middle[vectors], beside[vectors], edge[vectors];
-        for (int v = 0; v < vectors; ++v) {
-            const ptrdiff_t rest = count - v * Vec<S>::lanes, at = i + v * Vec<S>::lanes;
-            middle[v] = loadUpTo(sums.column[0] + at + 2 * channels, rest);
-            beside[v] = loadUpTo(sums.column[1] + at + channels, rest) + loadUpTo(sums.column[1] + at + 3 * channels, rest);
-            edge[v] = loadUpTo(sums.column[2] + at, rest) + loadUpTo(sums.column[2] + at + 4 * channels, rest);
-        }
-        if constexpr (std::is_same_v<Rule, GaussMeanOfBytes>) {
-            storeMeans<keepAlpha>(dst + i, rule(middle, beside, edge), count);
-        } else {
-            for (int v = 0; v < vectors; ++v) middle[v] = middle[v] + (beside[v] + edge[v]);
-            storeMeans<keepAlpha>(dst + i, rule(middle, i, count), count);
-        }
-    });
+    forVectors<T>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            Vec<S> middle[vectors], beside[vectors], edge[vectors];
+            for (int v = 0; v < vectors; ++v) {
+                const ptrdiff_t rest = count - v * Vec<S>::lanes, at = i + v * Vec<S>::lanes;
+                middle[v] = loadUpTo(sums.column[0] + at + 2 * channels, rest);
+                beside[v] =
+                    loadUpTo(sums.column[1] + at + channels, rest) + loadUpTo(sums.column[1] + at + 3 * channels, rest);
+                edge[v] = loadUpTo(sums.column[2] + at, rest) + loadUpTo(sums.column[2] + at + 4 * channels, rest);
+            }
+            if constexpr (std::is_same_v<Rule, GaussMeanOfBytes>) {
+                storeMeans<keepAlpha>(dst + i, rule(middle, beside, edge), count);
+            } else {
+                for (int v = 0; v < vectors; ++v) middle[v] = middle[v] + (beside[v] + edge[v]);
+                storeMeans<keepAlpha>(dst + i, rule(middle, i, count), count);
+            }
+        });
 }
 
 /// sums = above + 2 * at + below.
 template <class S, class T>
 QORI_NOINLINE void sumBinomialRows(const T* above, const T* at, const T* below, S* sums, ptrdiff_t elements) {
-    forVectors<S>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        const Vec<S> middle = loadAs<S>(at + i, count);
-        storeUpTo(sums + i, loadAs<S>(above + i, count) + loadAs<S>(below + i, count) + middle + middle, count);
-    });
+    forVectors<S>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            const Vec<S> middle = loadAs<S>(at + i, count);
+            storeUpTo(sums + i, loadAs<S>(above + i, count) + loadAs<S>(below + i, count) + middle + middle, count);
+        });
 }
 
 /// dst[i] = rule of sums[i] + 2 * sums[i + channels] + sums[i + 2 * channels].
 template <int channels, bool keepAlpha, class T, class S, class Rule>
 QORI_NOINLINE void acrossBinomial(const S* sums, T* dst, ptrdiff_t elements, Rule rule) {
     constexpr int vectors = kSumVectors<S, T>;
-    forVectors<T>(elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-        Vec<S> total[vectors];
-        for (int v = 0; v < vectors; ++v) {
-            const ptrdiff_t rest = count - v * Vec<S>::lanes;
-            const S* const from = sums + i + v * Vec<S>::lanes;
-            const Vec<S> middle = loadUpTo(from + channels, rest);
-            total[v] = loadUpTo(from, rest) + loadUpTo(from + 2 * channels, rest) + middle + middle;
-        }
-        storeMeans<keepAlpha>(dst + i, rule(total, i, count), count);
-    });
+    forVectors<T>(
+        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+            Vec<S> total[vectors];
+            for (int v = 0; v < vectors; ++v) {
+                const ptrdiff_t rest = count - v * Vec<S>::lanes;
+                const S* const from = sums + i + v * Vec<S>::lanes;
+                const Vec<S> middle = loadUpTo(from + channels, rest);
+                total[v] = loadUpTo(from, rest) + loadUpTo(from + 2 * channels, rest) + middle + middle;
+            }
+            storeMeans<keepAlpha>(dst + i, rule(total, i, count), count);
+        });
 }
 
 }  // namespace qori::kernels
