@@ -1990,9 +1990,9 @@ QORI_API QorResult QORI_CALL qoriFilterBoxBorderGetBufferSize(QorImageSize roiSi
  *            synthesised. borderReadAll, or all four flags, read everything from memory.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below
  *            1), QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
- *            QOR_ERR_NULL_PTR (borderValue is null and border is borderConstant without flags), QOR_ERR_BORDER
- *            (the kind of border is neither borderConstant nor borderReplicate, and a pixel has to be
- *            synthesised); then nothing is written.
+ *            QOR_ERR_NULL_PTR (no border value, and borderConstant without flags), QOR_ERR_BORDER (the kind of
+ *            border is neither borderConstant nor borderReplicate, and a pixel has to be synthesised); then
+ *            nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
     int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t* borderValue,

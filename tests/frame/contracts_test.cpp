@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Null pointers, sizes and steps below 1, alone and in pairs, for every export: the status is the one that the header
 // lists first, and nothing is written. Arguments are made from the prototypes, expectations from the header's words.
+#include <algorithm>
 #include <cstring>
 #include <string>
 #include <string_view>
@@ -98,7 +99,10 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_DATA_TYPE", QOR_ERR_DATA_TYPE},
                                 {"QOR_ERR_ROUND_MODE", QOR_ERR_ROUND_MODE},
                                 {"QOR_ERR_CHANNELS", QOR_ERR_CHANNELS},
-                                {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED}};
+                                {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED},
+                                {"QOR_ERR_MASK_SIZE", QOR_ERR_MASK_SIZE},
+                                {"QOR_ERR_ANCHOR", QOR_ERR_ANCHOR},
+                                {"QOR_ERR_BORDER", QOR_ERR_BORDER}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
 
@@ -128,7 +132,7 @@ public:
                     if (is("QOR_WARN_NOTHING_TO_DO")) return i;
                     [[fallthrough]];
                 case Flaw::negativeSize:
-                    if (is("QOR_ERR_SIZE")) return i;
+                    if (is(name == "maskSize" && hasMaskCheck() ? "QOR_ERR_MASK_SIZE" : "QOR_ERR_SIZE")) return i;
                     break;
                 case Flaw::zeroStep:
                     if (is("QOR_ERR_STEP") && (has(check, "a step") || names(check, name))) return i;
@@ -189,6 +193,9 @@ private:
             if (name == status.name) return status.value;
         ADD_FAILURE() << "unknown status in \"" << text << '"';
         return QOR_OK;
+    }
+    bool hasMaskCheck() const {
+        return std::any_of(checks_.begin(), checks_.end(), [](auto& check) { return has(check, "QOR_ERR_MASK_SIZE"); });
     }
     bool isStep(int i) const {
         const std::string& name = names_[static_cast<size_t>(i)];
