@@ -35,7 +35,7 @@ T boxMean(QorImageSize mask, Fetch pixel) {
         for (int i = 0; i < mask.width; ++i) sum.add(pixel(i, j));
     const int64_t area = int64_t{mask.width} * mask.height;
     if constexpr (std::is_floating_point_v<T>)
-        return static_cast<T>(sum.value) / static_cast<T>(area);
+        return static_cast<T>(sum.value) / static_cast<T>(mask.width * mask.height);
     else
         return reference::meanOf<T>(sum.value, area);
 }

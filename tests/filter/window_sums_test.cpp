@@ -16,7 +16,7 @@ void checkWindowSum(const Shape& shape, int maskSize, int anchor, Function funct
         [=](auto pixel) {
             int64_t sum = 0;
             for (int k = -before; k <= behind; ++k) sum += along ? pixel(k, 0) : pixel(0, k);
-            return static_cast<float>(sum);
+            return reference::toFloat(sum);
         });
 }
 
@@ -88,8 +88,8 @@ TEST(WindowSums, LongWindows) {
             for (int i = 0; i < size - 1; ++i) sum += row.view<S>(1).get(i, 0);
             for (int x = 0; x < 3; ++x) {
                 sum += row.view<S>(1).get(x + size - 1, 0);
-                EXPECT_EQ(static_cast<float>(sum), sums[x]) << size;
-                EXPECT_EQ(static_cast<float>(sum), sumsDown[x]) << size;
+                EXPECT_EQ(reference::toFloat(sum), sums[x]) << size;
+                EXPECT_EQ(reference::toFloat(sum), sumsDown[x]) << size;
                 sum -= row.view<S>(1).get(x, 0);
             }
         }

@@ -8,12 +8,19 @@
 
 namespace qori::test::reference {
 
+/// Rounded once, by way of a double that is exact below 2^51. In halves: GCC 12 for 32-bit Windows fails on conversions
+/// from 64 bits where the stack is aligned to 4.
+inline float toFloat(int64_t sum) {
+    const double high = static_cast<int32_t>(sum >> 20), low = static_cast<int32_t>(sum & 0xFFFFF);
+    return static_cast<float>(high * 0x1p20 + low);
+}
+
 /// The mean of integers: bytes by a float product, words exactly, to nearest, ties to even.
 template <class T>
 T meanOf(int64_t sum, int64_t area) {
     if constexpr (sizeof(T) == 1) {
-        const volatile float reciprocal = 1.0f / static_cast<float>(area);
-        const volatile float mean = static_cast<float>(sum) * reciprocal;
+        const volatile float reciprocal = 1.0f / toFloat(area);
+        const volatile float mean = toFloat(sum) * reciprocal;
         return static_cast<T>(std::nearbyint(mean));
     } else {
         int64_t whole = sum / area, rest = sum % area;
