@@ -33,7 +33,7 @@ public:
     static constexpr int n = channels(layout);
     static constexpr bool keepAlpha = layout == Layout::AC4;
     static constexpr bool isFloat = std::is_floating_point_v<T>;
-    /// Windows that are added up element by element. Measured, a wider one is quicker running.
+    /// Windows up to this width are added up element by element, wider ones run.
     static constexpr int32_t kAdded = sizeof(S) == 2 ? 7 : 3;
     static constexpr bool hasChain = std::is_floating_point_v<S>;
 
