@@ -1,4 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <memory>
+
 #include "panels.h"
 
 namespace demo {
@@ -38,9 +40,27 @@ Picture zebra(const Picture& photo) {
     return out;
 }
 
+/// Otsu's threshold on the left; on the right, what is not 6 levels below the mean of 31 x 31.
+Picture adaptiveBesideOtsu(const Picture& photo) {
+    const QorImageSize size = photo.size(), mask{31, 31}, right{size.width - size.width / 2, size.height};
+    const Picture binary = otsuMask(photo);
+    Picture grey(size, 1);
+    require(qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), grey.data(), grey.step(), size));
+    int32_t bytes;
+    require(qoriThresholdAdaptiveBoxGetBufferSize(right, mask, 1, 1, &bytes));
+    const auto buffer = std::make_unique<uint8_t[]>(static_cast<size_t>(bytes));
+    const ptrdiff_t x = size.width / 2;
+    require(qoriThresholdAdaptiveBox_8u_C1R(grey.data() + x, grey.step(), binary.data() + x, binary.step(), right, mask,
+                                            6, 255, 0, borderReplicate, 0, buffer.get()));
+    Picture out(size, 3);
+    require(qoriDup_8u_C1C3R(binary.data(), binary.step(), out.data(), out.step(), size));
+    return out;
+}
+
 constexpr Panel kPanels[] = {
     {"Otsu mask, the photograph in its left half", "ComputeThreshold_Otsu C1, Threshold C1, Copy C3M", brightParts},
     {"Channels below 64 and above 192 replaced", "Threshold_LTValGTVal C3", zebra},
+    {"Otsu's threshold beside an adaptive one", "ThresholdAdaptiveBox C1", adaptiveBesideOtsu},
 };
 
 }  // namespace

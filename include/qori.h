@@ -268,6 +268,11 @@ typedef struct QorLibraryVersion {
  *  threads may use it at once. It is trusted memory: see Plans above. */
 typedef struct QorLinearFilterPlan QorLinearFilterPlan;
 
+/** Weights of an adaptive threshold, in the caller's memory: as many bytes as qoriThresholdAdaptiveGaussGetBufferSize
+ *  reports, at any address. It may be copied to a block whose address is equal modulo 8. Once filled it is only read:
+ *  any number of threads may use it at once. It is trusted memory: see Plans above. */
+typedef struct QorAdaptiveGaussSpec QorAdaptiveGaussSpec;
+
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
 /** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
@@ -1835,6 +1840,209 @@ QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_C4IR(float* pSrcDst, in
 QORI_API QorResult QORI_CALL qoriCopyReplicateBorder_32f_AC4IR(float* pSrcDst, int32_t srcDstStep,
     QorImageSize srcRoiSize, QorImageSize dstRoiSize, int32_t topBorderHeight, int32_t leftBorderWidth);
 
+/* ---- Box filter around an anchor ------------------------------------------------------------------------------ */
+
+/** The mean of the window of maskSize around each pixel, channel by channel.
+ *  Shapes    The window of (x, y) spans columns x - anchor.x to x - anchor.x + maskSize.width - 1, and rows
+ *            likewise. All of it is read from memory: pSrc points at the region's first pixel inside a larger
+ *            image.
+ *  Elements  8u: the window's sum as a float times the float reciprocal of the area, to nearest, ties to even;
+ *            below 8,000 pixels of odd area that is the exact mean. 16u, 16s: the exact mean to nearest, ties
+ *            to even. 32f, 64f: the sum in the elements' precision, divided by the area: it is made of the
+ *            window's own elements only, by at most width + height additions on the way of each, so that it is
+ *            off by no more than (width + height) * 2^-24 (2^-53) times the sum of their magnitudes wherever
+ *            the window lies, and exact for integers whose magnitudes add up to 2^24 (2^53) at most. AC4 keeps
+ *            the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination.
+ *  Notes     Takes rows of memory from qorMalloc for the duration of the call. The cost per pixel hardly grows
+ *            with the mask.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
+ *            QOR_ERR_ANCHOR (the anchor is outside the mask), QOR_ERR_NO_MEMORY (no work memory); then nothing
+ *            is written.
+ *  Example   const QorImageSize mask = {15, 15};
+ *            const QorPoint2D middle = {7, 7};    // seven pixels around the region exist on every side
+ *            qoriFilterBox_8u_C3R(inside, frameStep, out, outStep, roi, mask, middle);
+ */
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst, int32_t dstStep,
+    QorImageSize roiSize, QorImageSize maskSize, QorPoint2D anchor);
+
+/** The mean of the window of maskSize around each pixel, in place.
+ *  Shapes    The window of (x, y) spans columns x - anchor.x to x - anchor.x + maskSize.width - 1, and rows
+ *            likewise. All of it is read from memory: pSrcDst points at the region's first pixel inside a
+ *            larger image.
+ *  Elements  8u: the window's sum as a float times the float reciprocal of the area, to nearest, ties to even;
+ *            below 8,000 pixels of odd area that is the exact mean. 16u, 16s: the exact mean to nearest, ties
+ *            to even. 32f, 64f: the sum in the elements' precision, divided by the area: it is made of the
+ *            window's own elements only, by at most width + height additions on the way of each, so that it is
+ *            off by no more than (width + height) * 2^-24 (2^-53) times the sum of their magnitudes wherever
+ *            the window lies, and exact for integers whose magnitudes add up to 2^24 (2^53) at most. AC4 keeps
+ *            the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes and the anchor in pixels.
+ *  Aliasing  Results are those of a source that is a copy; pixels around the region are only read.
+ *  Notes     Takes rows of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
+ *            QOR_ERR_ANCHOR (the anchor is outside the mask), QOR_ERR_NO_MEMORY (no work memory); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C3IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_C4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_8u_AC4IR(uint8_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C1IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C3IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_C4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16u_AC4IR(uint16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C1IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C3IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_C4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_16s_AC4IR(int16_t* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C1IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C3IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_C4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+QORI_API QorResult QORI_CALL qoriFilterBox_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, QorImageSize roiSize,
+    QorImageSize maskSize, QorPoint2D anchor);
+
+/* ---- Box filter with a border --------------------------------------------------------------------------------- */
+
+/** Reports how many bytes the buffer of a box filter with a border takes, at any alignment.
+ *  Elements  dataType: type code of the pixels, 1 (8u), 5 (16u), 7 (16s) or 13 (32f). numChannels: 1, 3 or 4,
+ *            which AC4 has too.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels.
+ *  Aliasing  pBufferSize must not be null.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (a side of the mask below 1), QOR_ERR_DATA_TYPE (another type code),
+ *            QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_SIZE (a result of 2^31 or more);
+ *            then nothing is written.
+ *  Example   int32_t bytes;
+ *            const QorImageSize mask = {9, 9};
+ *            qoriFilterBoxBorderGetBufferSize(roi, mask, 1, 3, &bytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriFilterBoxBorder_8u_C3R(src, srcStep, dst, dstStep, roi, mask, borderReplicate, NULL, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriFilterBoxBorderGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pBufferSize);
+
+/** The mean of the centred window of maskSize around each pixel, channel by channel, with a border.
+ *  Shapes    The window of (x, y) begins floor((width - 1) / 2) columns to the left and floor((height - 1) / 2)
+ *            rows above: an even one reaches further to the right and below. borderValue: one value per
+ *            processed channel, read for borderConstant only; where sides are open it may be null, for zeros.
+ *  Elements  8u: the window's sum as a float times the float reciprocal of the area, to nearest, ties to even;
+ *            below 8,000 pixels of odd area that is the exact mean. 16u, 16s: the exact mean to nearest, ties
+ *            to even. 32f: the sum divided by the area: it is made of the window's own elements only, by at
+ *            most width + height additions on the way of each, so that it is off by no more than (width +
+ *            height) * 2^-24 times the sum of their magnitudes wherever the window lies, and exact for integers
+ *            whose magnitudes add up to 2^24 at most. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination. pBuffer, of any alignment, must not overlap anything.
+ *  Notes     Each axis follows its own rule: a side whose flag is set is read from memory, the others are
+ *            synthesised. borderReadAll, or all four flags, read everything from memory.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below
+ *            1), QOR_ERR_SIZE (width or height below 1), QOR_ERR_MASK_SIZE (a side of the mask below 1),
+ *            QOR_ERR_NULL_PTR (no border value, and borderConstant without flags), QOR_ERR_BORDER (the kind of
+ *            border is neither borderConstant nor borderReplicate, and a pixel has to be synthesised); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint8_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const int16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const uint16_t borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float* borderValue,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float borderValue[3],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float borderValue[4],
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFilterBoxBorder_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, int32_t border, const float borderValue[3],
+    uint8_t* pBuffer);
+
 /* ---- Convert -------------------------------------------------------------------------------------------------- */
 
 /** Converts to a wider type, exactly.
@@ -3247,6 +3455,56 @@ QORI_API QorResult QORI_CALL qoriFilterMax_32f_C4R(const float* pSrc, int32_t sr
     QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
 QORI_API QorResult QORI_CALL qoriFilterMax_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
     QorImageSize dstRoiSize, QorImageSize maskSize, QorPoint2D anchor);
+
+/* ---- Gauss filter --------------------------------------------------------------------------------------------- */
+
+/** The mean of 3 x 3 or 5 x 5 pixels with Gaussian weights, channel by channel.
+ *  Shapes    mask: mask3x3 or mask5x5 of QorFixedMaskSize. All neighbours are read from memory: pSrc points at
+ *            the region's first pixel inside an image, with one pixel around the region, or two.
+ *  Elements  3 x 3: the products of (1, 2, 1) by (1, 2, 1), divided by 16. 5 x 5: rows (2, 7, 12, 7, 2), (7,
+ *            31, 52, 31, 7), (12, 52, 127, 52, 12) and back, divided by 571. Integers: the exact quotient to
+ *            nearest, ties to even. 32f: sums in single precision, divided. AC4 keeps the destination's channel
+ *            3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Notes     Takes rows of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_MASK_SIZE (mask is neither mask3x3 nor mask5x5),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ *  Example   qoriFilterGauss_8u_C1R(frame + frameStep + 1, frameStep, out, outStep, (QorImageSize){width - 2, height - 2}, mask3x3);
+ */
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_8u_AC4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16s_AC4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_16u_AC4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
+QORI_API QorResult QORI_CALL qoriFilterGauss_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize, int32_t mask);
 
 /* ---- Histograms ----------------------------------------------------------------------------------------------- */
 
@@ -6433,12 +6691,184 @@ QORI_API QorResult QORI_CALL qoriThreshold_LTValGTVal_32f_AC4IR(float* pSrcDst, 
     QorImageSize roiSize, const float thresholdLT[3], const float valueLT[3], const float thresholdGT[3],
     const float valueGT[3]);
 
+/* ---- Adaptive thresholds -------------------------------------------------------------------------------------- */
+
+/** Reports how many bytes the buffer of an adaptive threshold by means takes, at any alignment.
+ *  Elements  dataType: 1 (8u). numChannels: 1.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_DATA_TYPE
+ *            (dataType not 1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1), QOR_ERR_SIZE (a result of 2^31
+ *            or more); then nothing is written.
+ *  Example   int32_t bytes;   // black text on a page in uneven light: 10 below the mean of 31 x 31
+ *            const QorImageSize mask = {31, 31};
+ *            qoriThresholdAdaptiveBoxGetBufferSize(roi, mask, 1, 1, &bytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriThresholdAdaptiveBox_8u_C1R(src, srcStep, dst, dstStep, roi, mask, 10, 255, 0, borderReplicate, 0, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveBoxGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pBufferSize);
+
+/** valGT where the source is greater than the mean of the square around it minus delta, else valLE.
+ *  Shapes    maskSize: a square of odd side, centred.
+ *  Elements  The comparison is exact: of the integer sum of the square with the pixel and delta times the area.
+ *            delta above 255 fills with valGT and delta of -255 or less with valLE; so does a mask of one pixel
+ *            for delta above 0 and others. No pixel is read then.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination. pBuffer must not overlap anything.
+ *  Notes     A side whose flag is set in borderType is read from memory, the others are synthesised, as
+ *            constants of borderValue or from the nearest pixel.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_BORDER (the
+ *            kind of borderType is not borderConstant, borderReplicate or borderReadAll); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveBox_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, QorImageSize maskSize, float delta, uint8_t valGT, uint8_t valLE,
+    int32_t borderType, uint8_t borderValue, uint8_t* pBuffer);
+
+/** In place, valGT where a pixel is greater than the mean of the square around it minus delta, else valLE.
+ *  Shapes    maskSize: a square of odd side, centred.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  Results are those of a source that is a copy. pBuffer must not overlap the image.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_BORDER (the
+ *            kind of borderType is not borderConstant, borderReplicate or borderReadAll); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveBox_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, QorImageSize maskSize, float delta, uint8_t valGT, uint8_t valLE, int32_t borderType,
+    uint8_t borderValue, uint8_t* pBuffer);
+
+/** Reports how many bytes the weights and the buffer of an adaptive threshold by weighted means take, at any
+ *  alignment.
+ *  Elements  dataType: 1 (8u). numChannels: 1.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_DATA_TYPE
+ *            (dataType not 1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1), QOR_ERR_SIZE (a result of 2^31
+ *            or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGaussGetBufferSize(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, int32_t* pSpecSize, int32_t* pBufferSize);
+
+/** Makes the weights of an adaptive threshold.
+ *  Elements  w(k) = exp(-k^2 / (2 sigma^2)) for k from -maskSize / 2 to maskSize / 2, scaled to a sum of 1. A
+ *            sigma of 0 or less stands for 0.3 ((maskSize - 1) / 2 - 1) + 0.8. dataType: 1 (8u). numChannels:
+ *            1.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_MASK_SIZE (sides of the mask that are unequal, below 1 or even), QOR_ERR_DATA_TYPE
+ *            (dataType not 1), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1); then nothing is written.
+ *  Example   int32_t specBytes, bytes;
+ *            const QorImageSize mask = {15, 15};
+ *            qoriThresholdAdaptiveGaussGetBufferSize(roi, mask, 1, 1, &specBytes, &bytes);
+ *            QorAdaptiveGaussSpec* spec = malloc(specBytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriThresholdAdaptiveGaussInit(roi, mask, 1, 1, 0, spec);
+ *            qoriThresholdAdaptiveGauss_8u_C1R(src, srcStep, dst, dstStep, roi, 5, 255, 0, borderReplicate, 0, spec, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGaussInit(QorImageSize roiSize, QorImageSize maskSize,
+    int32_t dataType, int32_t numChannels, float sigma, QorAdaptiveGaussSpec* pSpec);
+
+/** valGT where the source is greater than the weighted mean of the square around it minus delta, else valLE.
+ *  Shapes    The square is that of the specification, whose region may be another.
+ *  Elements  Means in single precision: rows first, each a chain of fused multiply-adds from the left, then
+ *            columns from the top; delta is then subtracted. delta above 255 fills with valGT and delta of -255
+ *            or less with valLE; so does a mask of one pixel for delta above 0 and others. No pixel is read
+ *            then.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  pSrc == pDst with equal steps works in place. Otherwise the source, with the neighbours that are
+ *            read, must not overlap the destination. pBuffer must not overlap anything.
+ *  Notes     A side whose flag is set in borderType is read from memory, the others are synthesised, as
+ *            constants of borderValue or from the nearest pixel.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_BORDER (the kind of borderType is not borderConstant, borderReplicate or
+ *            borderReadAll), QOR_ERR_CONTEXT (pSpec has not been filled); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGauss_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, float delta, uint8_t valGT, uint8_t valLE, int32_t borderType,
+    uint8_t borderValue, const QorAdaptiveGaussSpec* pSpec, uint8_t* pBuffer);
+
+/** In place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else
+ *  valLE.
+ *  Shapes    The square is that of the specification, whose region may be another.
+ *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
+ *  Aliasing  Results are those of a source that is a copy. pBuffer must not overlap the image.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_BORDER (the kind of borderType is not borderConstant, borderReplicate or
+ *            borderReadAll), QOR_ERR_CONTEXT (pSpec has not been filled); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGauss_8u_C1IR(uint8_t* pSrcDst, int32_t srcDstStep,
+    QorImageSize roiSize, float delta, uint8_t valGT, uint8_t valLE, int32_t borderType, uint8_t borderValue,
+    const QorAdaptiveGaussSpec* pSpec, uint8_t* pBuffer);
+
 /* ---- Version -------------------------------------------------------------------------------------------------- */
 
 /** Returns the version record of the library.
  *  Returns   The same pointer on every call, never null. The record is constant: do not modify or free it.
  */
 QORI_API const QorLibraryVersion* QORI_CALL qoriGetLibVersion(void);
+
+/* ---- Window sums ---------------------------------------------------------------------------------------------- */
+
+/** dst(x, y) = the sum of src(x - anchor, y) to src(x - anchor + maskSize - 1, y), channel by channel.
+ *  Shapes    All neighbours are read from memory: anchor pixels before each row of the region, maskSize - 1 -
+ *            anchor behind it.
+ *  Elements  Exact sums, rounded once to 32-bit float: to nearest, ties to even. Up to 2^24 they are exact.
+ *  Units     Steps in bytes, of any sign and alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Returns   QOR_OK; in this order ; then nothing is written.
+ *  Example   qoriSumWindowRow_8u32f_C1R(src, srcStep, sums, sumsStep, roi, 9, 4);   // four pixels to either side
+ */
+QORI_API QorResult QORI_CALL qoriSumWindowRow_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C4R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+
+/** dst(x, y) = the sum of src(x, y - anchor) to src(x, y - anchor + maskSize - 1), channel by channel.
+ *  Shapes    All neighbours are read from memory: anchor rows above the region, maskSize - 1 - anchor below it.
+ *  Elements  Exact sums, rounded once to 32-bit float: to nearest, ties to even. Up to 2^24 they are exact.
+ *  Units     Steps in bytes, of any sign and alignment; roiSize, maskSize and anchor in pixels.
+ *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
+ *  Notes     Takes a row of memory from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_MASK_SIZE (maskSize below 1),
+ *            QOR_ERR_ANCHOR (anchor negative or not below maskSize), QOR_OK (width or height below 1: nothing
+ *            is written), QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
+QORI_API QorResult QORI_CALL qoriSumWindowColumn_16s32f_C4R(const int16_t* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t maskSize, int32_t anchor);
 
 #ifdef __cplusplus
 }

@@ -88,6 +88,10 @@ public:
         return RowWindow(image, needs, nullptr).bytes_;
     }
 
+    /// For state that an operation keeps per part; its rows exist while groups are made.
+    int32_t parts() const { return parts_; }
+    const WindowPart& part(int32_t index) const { return part_[index]; }
+
     /// Calls make(const WindowPart&, y, rows) for each part of each group of rows, from the top.
     template <class Make>
     void forEach(Make make) {

@@ -105,6 +105,7 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_CHANNELS", QOR_ERR_CHANNELS},
                                 {"QOR_ERR_WEIGHT", QOR_ERR_WEIGHT},
                                 {"QOR_ERR_STEP_ALIGN", QOR_ERR_STEP_ALIGN},
+                                {"QOR_ERR_BORDER", QOR_ERR_BORDER},
                                 {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
@@ -137,7 +138,7 @@ public:
                     if (is("QOR_WARN_NOTHING_TO_DO")) return i;
                     [[fallthrough]];
                 case Flaw::negativeSize:
-                    if (is(hasOwnStatus(name) ? "QOR_ERR_MASK_SIZE" : "QOR_ERR_SIZE")) return i;
+                    if (is(name == "maskSize" && hasMaskCheck() ? "QOR_ERR_MASK_SIZE" : "QOR_ERR_SIZE")) return i;
                     break;
                 case Flaw::zeroStep:
                     if (is("QOR_ERR_STEP") && (has(check, "a step") || names(check, name))) return i;
@@ -199,11 +200,8 @@ private:
         ADD_FAILURE() << "unknown status in \"" << text << '"';
         return QOR_OK;
     }
-    /// Whether the size of a mask is refused otherwise than those of regions.
-    bool hasOwnStatus(const std::string& size) const {
-        return std::any_of(checks_.begin(), checks_.end(), [&](const std::string& check) {
-            return has(check, "QOR_ERR_MASK_SIZE") && names(check, size);
-        });
+    bool hasMaskCheck() const {
+        return std::any_of(checks_.begin(), checks_.end(), [](auto& check) { return has(check, "QOR_ERR_MASK_SIZE"); });
     }
     bool isStep(int i) const {
         const std::string& name = names_[static_cast<size_t>(i)];
