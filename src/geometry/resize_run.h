@@ -65,7 +65,6 @@ public:
         source_ = &source;
         bytes_ = (source.columns.last - source.columns.first + 1) * channels * elementBytes<T>;
     }
-    int32_t bytes() const { return bytes_ < kernels::Gather::kLane ? kernels::Gather::kLane : bytes_; }
     const uint8_t* row(int32_t index) const {
         const uint8_t* row = asBytes(source_->at(index, source_->columns.first));
         if (bytes_ >= kernels::Gather::kLane) return row;
@@ -79,6 +78,14 @@ private:
     int32_t bytes_ = 0;
 };
 
+/// Where the columns of a tile come from in the rows of GatherRows.
+template <class T, int channels>
+kernels::Picks columnPicks(const TileSource<T, channels>& source) {
+    const Axis& axis = source.plan.horizontal;
+    return {source.plan.template table<int32_t>(axis.indexTable) + source.tile.x, source.tile.width,
+            source.columns.first, source.columns.last};
+}
+
 template <class T, int channels>
 class NearestTile {
 public:
@@ -86,14 +93,14 @@ public:
         : source_{plan, tile},
           rows_(buffer),
           rowBytes_(ptrdiff_t{tile.width} * kPixel),
-          tables_(buffer.take<uint8_t>(2 * ((int64_t{tile.width} * kPixel + 31) / 32) * kernels::Gather::kLaneBytes)) {}
+          tables_(buffer.take<uint8_t>(kernels::gatherTableBytes(tile.width, kPixel))) {}
 
     void run(Image<const T> src, Image<T> dst, OpenSides) {
         source_.open(src, {});
         rows_.open(source_);
-        const kernels::Gather gather = buildTables();
         const Axis& axis = source_.plan.vertical;
         const Tile& tile = source_.tile;
+        const kernels::Gather gather = kernels::buildGather(tables_, columnPicks(source_), kPixel, tile.height);
         const bool rowsApart = dst.step >= rowBytes_ || dst.step <= -rowBytes_;
         for (int32_t y = 0; y < tile.height; ++y) {
             const int32_t index = source_.plan.index(axis, tile.y + y);
@@ -102,30 +109,16 @@ public:
             if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1))
                 repeatRow(to, asBytes(dst.row(y - 1)));
             else
-                kernels::gatherRow(gather, rows_.row(index), asBytes(source_.at(later, source_.columns.first)), to,
-                                   rowBytes_, elementBytes<T>);
+                kernels::gatherRow(gather, rows_.row(index), asBytes(source_.at(later, source_.columns.first)), to);
         }
     }
 
 private:
     static constexpr int kPixel = channels * elementBytes<T>;
 
-    ptrdiff_t groups() const { return (rowBytes_ + 31) / 32; }
-
     void repeatRow(uint8_t* to, const uint8_t* from) const {
         for (ptrdiff_t i = 0; i < rowBytes_; i += 32)
             storeUpTo(to + i, loadUpTo(from + i, rowBytes_ - i), rowBytes_ - i);
-    }
-
-    kernels::Gather buildTables() const {
-        const ResizePlan& plan = source_.plan;
-        auto* offsets = reinterpret_cast<int32_t*>(tables_);
-        for (int32_t x = 0; x < source_.tile.width; ++x) {
-            const int32_t from = (plan.index(plan.horizontal, source_.tile.x + x) - source_.columns.first) * kPixel;
-            for (int b = 0; b < kPixel; ++b) *offsets++ = from + b;
-        }
-        for (ptrdiff_t i = rowBytes_; i < 32 * groups(); ++i, ++offsets) *offsets = offsets[-1];
-        return kernels::buildGather(tables_, groups(), rows_.bytes());
     }
 
     TileSource<T, channels> source_;

@@ -95,6 +95,41 @@ TYPED_TEST(ResizeWays, ChannelsBecomeWhatTheirPlanesBecome) {
             }
 }
 
+/// Rows of nearest pixels by tables and without, and tables whose later lanes span more than the first ones do.
+template <class T, class Operation>
+void expectNearest(Operation operation, int channels, int32_t width, int32_t height) {
+    constexpr int32_t kWidth = 3'000;
+    const QorImageSize from{kWidth, 1}, to{width, height};
+    Pixels<T> src{from, channels};
+    for (T& element : src.elements) element = drawPixel<T>();
+    const QorResizePlan* plan = makePlan<T>({.interpolation = interpNearest}, from, to);
+    int32_t bytes = 0;
+    EXPECT_EQ(QOR_OK, call(Exports<T>::getBufferSize, plan, to, channels, &bytes));
+    const TestImage buffer = block(kBuffer, bytes, 0);
+    Pixels<T> dst{to, channels};
+    EXPECT_EQ(QOR_OK, call(operation, src.elements.data(), src.step(), dst.elements.data(), dst.step(),
+                           QorPoint2D{0, 0}, to, plan, buffer.template data<uint8_t>()));
+    for (int y = 0; y < height; ++y)
+        for (int x = 0; x < width; ++x)
+            for (int c = 0; c < channels; ++c)
+                ASSERT_EQ(src.at(static_cast<int>((x + 0.5) * kWidth / width - 1e-10), 0, c), dst.at(x, y, c))
+                    << "width " << width << ", height " << height << ", " << x << ", channel " << c;
+}
+
+TEST(Resize, NearestIsTheSameWithTablesAndWithout) {
+    for (int32_t width = 40; width < 9'000; width += 1 + width / 23)
+        for (int32_t height : {1, 3, 4, 7}) {
+            expectNearest<uint8_t>(qoriResizeNearest_8u_C1R, 1, width, height);
+            expectNearest<uint8_t>(qoriResizeNearest_8u_C3R, 3, width, height);
+            expectNearest<uint8_t>(qoriResizeNearest_8u_C4R, 4, width, height);
+            expectNearest<uint16_t>(qoriResizeNearest_16u_C1R, 1, width, height);
+            expectNearest<uint16_t>(qoriResizeNearest_16u_C3R, 3, width, height);
+            expectNearest<uint16_t>(qoriResizeNearest_16u_C4R, 4, width, height);
+            expectNearest<float>(qoriResizeNearest_32f_C3R, 3, width, height);
+            expectNearest<float>(qoriResizeNearest_32f_C4R, 4, width, height);
+        }
+}
+
 /// Enlarging by 64 meets every odd multiple of 1/128 in both directions, and 64 rows between the same two.
 TEST(Resize, LinearIsExactAtShortWeights) {
     const QorImageSize from{23, 4}, to{23 * 64, 4 * 64};

@@ -18,6 +18,10 @@ void linearRow8u(const Gather& gather, LinearRow row, const int16_t* weights, bo
 /// whether.
 bool makeCoarse(int16_t* weights, ptrdiff_t count);
 
+/// Lists the horizontal weights for it: pairs (16384 - w, w), one for each pixel, become -2w for each element, in
+/// linearOrder() and up to a multiple of 32.
+void listLinearWeights(const int32_t* pairs, int32_t count, int channels, int16_t* weights);
+
 /// The vertical pass: dst = (h0 * (16384 - w) + h1 * w + 0x80000) >> 20. Rows are in the order of linearOrder() and
 /// hold whole blocks of 32 elements.
 void linearColumn8u(const int16_t* h0, const int16_t* h1, int32_t w, uint8_t* dst, ptrdiff_t elements);
