@@ -89,17 +89,14 @@ public:
 
     void list(const TileSource<T, channels>& source) {
         const ResizePlan& plan = source.plan;
-        const Axis& axis = plan.horizontal;
-        const auto* table = plan.table<float>(axis.weightTable);
-        weights = pairs_ != nullptr ? pairs_ : table;
-        const int32_t period = plan.columnPeriod;
-        for (int32_t x = 0; x < source.tile.width; ++x) {
-            const int32_t position = source.tile.x + x, at = pairs_ != nullptr ? x : position;
-            pixels[x] = {plan.firstTap(axis, position), (period > 0 ? at % period : at) * plan.columnTaps};
-            if (pairs_ == nullptr) continue;
-            pairs_[2 * x] = 1 - table[position];
-            pairs_[2 * x + 1] = table[position];
+        const auto* table = plan.table<float>(plan.horizontal.weightTable);
+        const int32_t x = source.tile.x, width = source.tile.width;
+        weights = table;
+        if (pairs_ != nullptr) {
+            kernels::pairFractions(table + x, width, pairs_);
+            weights = pairs_;
         }
+        listColumns(plan, x, pairs_ != nullptr ? 0 : x, plan.columnTaps, plan.columnPeriod, width, pixels);
     }
 
     kernels::PixelTaps* pixels;
@@ -217,7 +214,7 @@ public:
         reached_ = Reached(source_.columns, first, pixels[width - 1].first + filter_.taps - 1);
         const ptrdiff_t behind = source_.columns.last - reached_.from + 1 - reached_.columns;
         isWhole_ = reached_.left == 0 && reached_.right == 0 && behind * channels >= kernels::LineFilter::kOverrun;
-        kernels::listLine(filter_, pixels, width, taps_.weights, first);
+        kernels::listLine(filter_, pixels, width, taps_.weights, source_.plan.columnPeriod, first);
     }
     void filterNext(RowSequence& sequence, Ring& ring) {
         const int32_t row = sequence.next();

@@ -55,6 +55,25 @@ struct TileSource {
     }
 };
 
+/// Lists the columns from `position` on with the first weights at `begin` of sets of `taps`, which repeat after
+/// `period` columns, or never where that is 0. Super-sampling has sets of one period only.
+inline void listColumns(const ResizePlan& plan, int32_t position, int32_t begin, int32_t taps, int32_t period,
+                        int32_t width, kernels::PixelTaps* pixels) {
+    const Axis& axis = plan.horizontal;
+    const auto* indices = plan.table<int32_t>(axis.indexTable);
+    if (plan.interpolation != interpSuper) {
+        // Periods are powers of two where positions repeat exactly; else there are weights for every column.
+        const int32_t before = plan.halfWidth - 1, mask = (period & (period - 1)) == 0 ? period - 1 : -1;
+        for (int32_t x = 0; x < width; ++x) pixels[x] = {indices[position + x] - before, ((begin + x) & mask) * taps};
+        return;
+    }
+    int32_t origin = position / axis.targetReduced * axis.sourceReduced, set = begin % axis.targetReduced;
+    for (int32_t x = 0; x < width; ++x) {
+        pixels[x] = {origin + indices[set], set * taps};
+        if (++set == axis.targetReduced) set = 0, origin += axis.sourceReduced;
+    }
+}
+
 /// Rows for the gathering kernels, which want 16 bytes at least: shorter ones are copied.
 template <class T, int channels>
 class GatherRows {

@@ -48,10 +48,8 @@ private:
     void listStrip(int32_t x, int32_t width) {
         const ResizePlan& plan = source_.plan;
         const Axis& axis = plan.horizontal;
-        for (int32_t i = 0; i < width; ++i) {
-            const int32_t position = source_.tile.x + x + i;
-            pixels_[i] = {plan.firstTap(axis, position), plan.weightSet(axis, position) * plan.columnTaps};
-        }
+        const int32_t position = source_.tile.x + x;
+        listColumns(plan, position, position, plan.columnTaps, plan.columnPeriod, width, pixels_);
         const int32_t first = pixels_[0].first, last = pixels_[width - 1].first + plan.columnTaps - 1;
         const Range& legal = source_.columns;
         const int32_t from = legal.clamp(first), to = legal.clamp(last);
@@ -59,7 +57,8 @@ private:
         left_ = from - first;
         right_ = last - to;
         elements_ = ptrdiff_t{to - from + 1} * channels;
-        kernels::listWords(filter_, pixels_, width, plan.table<float>(axis.weightTable), plan.columnTaps, scale(axis),
+        kernels::listWords(filter_, pixels_, width,
+                           {plan.table<float>(axis.weightTable), plan.columnTaps, scale(axis), plan.columnPeriod},
                            first);
     }
 

@@ -69,10 +69,11 @@ TYPED_TEST(ResizeWays, ChannelsBecomeWhatTheirPlanesBecome) {
                               {.interpolation = interpCubic, .b = 1.0f / 3, .c = 1.0f / 3},
                               {.interpolation = interpLanczos, .lobes = 2},
                               {.interpolation = interpLanczos, .lobes = 3}};
-    const QorImageSize sizes[][2] = {{{90, 30}, {60, 20}},  {{97, 31}, {61, 23}}, {{40, 12}, {97, 31}},
-                                     {{80, 9}, {20, 9}},    {{7, 6}, {33, 7}},    {{33, 17}, {2, 3}},
-                                     {{64, 8}, {64, 16}},   {{6, 70}, {1, 9}},    {{1400, 7}, {2350, 9}},
-                                     {{5000, 9}, {2811, 6}}};
+    const QorImageSize sizes[][2] = {{{90, 30}, {60, 20}},   {{97, 31}, {61, 23}},  {{40, 12}, {97, 31}},
+                                     {{80, 9}, {20, 9}},     {{7, 6}, {33, 7}},     {{33, 17}, {2, 3}},
+                                     {{64, 8}, {64, 16}},    {{6, 70}, {1, 9}},     {{1400, 7}, {2350, 9}},
+                                     {{5000, 9}, {2811, 6}}, {{960, 6}, {1920, 7}}, {{1920, 6}, {1280, 5}},
+                                     {{2100, 7}, {1200, 3}}};
     for (const Method& m : methods)
         for (const auto& [from, to] : sizes)
             for (int channels : {3, 4}) {

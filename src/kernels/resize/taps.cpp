@@ -2,30 +2,10 @@
 #include "taps.h"
 
 #include "floats.h"
+#include "turn.h"
 
 namespace qori::kernels {
 namespace {
-
-/// Within each half, rows become columns: v[j] holds element j of all four in its low half, element 4 + j in its high.
-QORI_INLINE void turnQuads(__m256 v[4]) {
-    const __m256 a = _mm256_unpacklo_ps(v[0], v[1]), b = _mm256_unpackhi_ps(v[0], v[1]);
-    const __m256 c = _mm256_unpacklo_ps(v[2], v[3]), d = _mm256_unpackhi_ps(v[2], v[3]);
-    v[0] = _mm256_shuffle_ps(a, c, 0x44);
-    v[1] = _mm256_shuffle_ps(a, c, 0xEE);
-    v[2] = _mm256_shuffle_ps(b, d, 0x44);
-    v[3] = _mm256_shuffle_ps(b, d, 0xEE);
-}
-
-/// Turns four elements of eight rows, given as four vectors of a row each half, into vectors of a column each.
-QORI_INLINE void turnFloats(const float* const rows[kTapRows], ptrdiff_t at, float* out) {
-    __m256 v[4];
-    for (int j = 0; j < 4; ++j) {
-        const __m256 upper = _mm256_castps128_ps256(_mm_loadu_ps(rows[j] + at));
-        v[j] = _mm256_insertf128_ps(upper, _mm_loadu_ps(rows[4 + j] + at), 1);
-    }
-    turnQuads(v);
-    for (int j = 0; j < 4; ++j) _mm256_storeu_ps(out + 8 * j, v[j]);
-}
 
 /// Turns n (1 to 8) elements of eight rows into as many vectors; the vectors behind them are written too.
 template <class T>
@@ -232,6 +212,20 @@ auto chooseSum(int32_t taps) {
 constexpr int32_t kMostColumns = 128;
 
 }  // namespace
+
+void pairFractions(const float* fractions, int32_t count, float* pairs) {
+    int32_t i = 0;
+    for (; i + 8 <= count; i += 8) {
+        const __m256 second = _mm256_loadu_ps(fractions + i), first = _mm256_sub_ps(_mm256_set1_ps(1), second);
+        const __m256 low = _mm256_unpacklo_ps(first, second), high = _mm256_unpackhi_ps(first, second);
+        _mm256_storeu_ps(pairs + 2 * i, _mm256_permute2f128_ps(low, high, 0x20));
+        _mm256_storeu_ps(pairs + 2 * i + 8, _mm256_permute2f128_ps(low, high, 0x31));
+    }
+    for (; i < count; ++i) {
+        pairs[2 * i] = 1 - fractions[i];
+        pairs[2 * i + 1] = fractions[i];
+    }
+}
 
 int32_t tapGroup(double ratio, int32_t taps) {
     if (ratio > 2.0 * taps) return 1;

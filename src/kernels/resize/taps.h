@@ -19,6 +19,9 @@ struct PixelTaps {
     int32_t weights;  ///< Where its weights begin.
 };
 
+/// Weights of two taps: pairs of 1 - f and f.
+void pairFractions(const float* fractions, int32_t count, float* pairs);
+
 struct RowFilter {
     const PixelTaps* pixels;
     const float* weights;
