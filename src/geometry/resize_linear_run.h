@@ -21,9 +21,10 @@ public:
     void run(Image<const uint8_t> src, Image<uint8_t> dst, OpenSides open) {
         source_.open(src, open);
         rows_.open(source_);
-        const kernels::Gather gather = buildTables();
-        const bool coarse = kernels::makeCoarse(weights_, padded_);
         const ResizePlan& plan = source_.plan;
+        kernels::Gather gather = kernels::buildPairs(tables_, columnPicks(source_), channels);
+        const auto* pairs = plan.table<int32_t>(plan.horizontal.weightTable) + source_.tile.x;
+        const bool coarse = kernels::listLinearWeights(gather, pairs, weights_);
         const auto* weights = plan.table<int32_t>(plan.vertical.weightTable) + source_.tile.y;
         const int32_t height = source_.tile.height;
         const bool enlarges = plan.vertical.ratio() < 1;
@@ -57,15 +58,6 @@ private:
         const int32_t position = source_.tile.y + y, index = plan.index(plan.vertical, position);
         const bool needsSecond = plan.table<int32_t>(plan.vertical.weightTable)[position] != 0;
         return {source_.rows.clamp(index), source_.rows.clamp(index + needsSecond)};
-    }
-
-    kernels::Gather buildTables() const {
-        const ResizePlan& plan = source_.plan;
-        const auto* pairs = plan.table<int32_t>(plan.horizontal.weightTable) + source_.tile.x;
-        kernels::listLinearWeights(pairs, source_.tile.width, channels, weights_);
-        kernels::Gather gather = kernels::buildPairs(tables_, columnPicks(source_), channels);
-        kernels::compareWeights(gather, weights_);
-        return gather;
     }
 
     TileSource<uint8_t, channels> source_;

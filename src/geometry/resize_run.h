@@ -101,8 +101,9 @@ private:
 template <class T, int channels>
 kernels::Picks columnPicks(const TileSource<T, channels>& source) {
     const Axis& axis = source.plan.horizontal;
+    const int32_t period = axis.targetReduced;  // of positions exactly where it is a power of two
     return {source.plan.template table<int32_t>(axis.indexTable) + source.tile.x, source.tile.width,
-            source.columns.first, source.columns.last};
+            source.columns.first, source.columns.last, (period & (period - 1)) == 0 ? period : 0};
 }
 
 template <class T, int channels>

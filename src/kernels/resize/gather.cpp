@@ -147,21 +147,28 @@ private:
     }
 };
 
-/// Masks and bases by the number of windows, 0 to make none. Returns how many bytes a lane spans at most; what spans
+/// Masks and bases of the groups from `begin`, where a round begins, to before `end`, by the number of windows, 0 to
+/// make none. Returns how many bytes a lane spans at most; what spans
 /// more than the windows hold is not done right.
 template <Kind kind, int pixelBytes>
-QORI_NOINLINE int32_t makeLanes(const Gather& gather, uint8_t* masks, int32_t* bases) {
+QORI_NOINLINE int32_t makeLanes(const Gather& gather, ptrdiff_t begin, ptrdiff_t end) {
     constexpr Kind kInside = kind == Kind::pairs ? Kind::insidePairs : kind;
     constexpr const Round &round = kRound<kind, pixelBytes>, &inside = kRound<kInside, pixelBytes>;
     constexpr int32_t kRead = kind == Kind::bytes ? 16 : 8;
     const Picks picks = gather.picks;
     const int32_t rowBytes = (picks.last - picks.first + 1) * pixelBytes;
-    Lanes lanes{picks, gather.windows, rowBytes > kLane ? rowBytes - kLane : 0, masks, bases, zero<uint8_t>()};
+    const ptrdiff_t made = begin * gather.windows;
+    Lanes lanes{picks,
+                gather.windows,
+                rowBytes > kLane ? rowBytes - kLane : 0,
+                gather.masks + 2 * kLane * made,
+                gather.bases + 2 * made,
+                zero<uint8_t>()};
     int32_t clear = 0, clearEnd = picks.count;  // pixels that need no clamping
     while (kind == Kind::pairs && clear < clearEnd && picks.indices[clear] < picks.first) ++clear;
     while (kind == Kind::pairs && clear < clearEnd && picks.indices[clearEnd - 1] >= picks.last) --clearEnd;
-    int32_t pixel = 0, phase = 0;
-    for (ptrdiff_t g = 0; g < gather.groups; ++g) {
+    int32_t pixel = static_cast<int32_t>(begin / round.groups) * round.pixels, phase = 0;
+    for (ptrdiff_t g = begin; g < end; ++g) {
         const int32_t* const at = round.of[phase].pixel;
         if (clear <= pixel + at[0] && pixel + at[1] + kRead <= clearEnd) {
             const int32_t* const indices[2] = {picks.indices + pixel + at[0], picks.indices + pixel + at[1]};
@@ -178,21 +185,46 @@ QORI_NOINLINE int32_t makeLanes(const Gather& gather, uint8_t* masks, int32_t* b
     return lanes.span();
 }
 
+/// The groups before this one are alike by the period from the third on: all their pixels are there, need no clamping
+/// and have whole windows behind them. Groups of pairs go by twos, which are of 32 elements.
+ptrdiff_t periodicEnd(const Gather& gather) {
+    const Picks& picks = gather.picks;
+    const int32_t pixels = 32 / gather.pixelBytes;
+    if (gather.pixelBytes % 3 == 0 || picks.period <= 0 || pixels % picks.period != 0) return 0;
+    ptrdiff_t twos = picks.count / pixels;
+    const auto isWhole = [&](int32_t index) {
+        return index < picks.last && (picks.last - index + 1) * gather.pixelBytes >= kLane;
+    };
+    while (twos > 0 && !isWhole(picks.indices[twos * pixels - 1])) --twos;
+    return 2 * twos;
+}
+
 /// By as many windows as the first groups take, or more where a later one needs them.
 template <Kind kind, int pixelBytes>
 Gather build(uint8_t* memory, const Picks& picks, ptrdiff_t groups) {
     constexpr ptrdiff_t kProbed = 16;
     auto* const bases = reinterpret_cast<int32_t*>(memory + 2 * groups * kLane * Gather::kMostWindows);
-    Gather gather{picks, pixelBytes, 0, groups < kProbed ? groups : kProbed, bases, memory};
-    int32_t span = makeLanes<kind, pixelBytes>(gather, memory, bases);
-    gather.groups = groups;
+    Gather gather{picks, pixelBytes, 0, groups, bases, memory};
+    int32_t span = makeLanes<kind, pixelBytes>(gather, 0, groups < kProbed ? groups : kProbed);
+    if constexpr (kind == Kind::pairs) {
+        const ptrdiff_t end = span <= kLane ? periodicEnd(gather) : 0;
+        if (end > kProbed) {
+            gather.windows = 1;
+            makeLanes<kind, pixelBytes>(gather, 0, Gather::kListed);
+            makeLanes<kind, pixelBytes>(gather, end, groups);
+            gather.stride = bases[8] - bases[4];
+            gather.alikeEnd = end;
+            gather.isPeriodic = true;
+            return gather;
+        }
+    }
     while (span > gather.windows * kLane) {
         gather.windows = (span + kLane - 1) / kLane;
         if (gather.windows > Gather::kMostWindows) {
             gather.windows = 0;
             break;
         }
-        span = makeLanes<kind, pixelBytes>(gather, memory, bases);
+        span = makeLanes<kind, pixelBytes>(gather, 0, groups);
     }
     return gather;
 }
@@ -265,14 +297,8 @@ Gather buildPairs(uint8_t* memory, const Picks& picks, int channels) {
     Gather gather = channels == 1   ? build<Kind::pairs, 1>(memory, picks, groups)
                     : channels == 3 ? build<Kind::pairs, 3>(memory, picks, groups)
                                     : build<Kind::pairs, 4>(memory, picks, groups);
-    if (gather.windows == 1) findAlike(gather);
+    if (gather.windows == 1 && !gather.isPeriodic) findAlike(gather);
     return gather;
-}
-
-void compareWeights(Gather& gather, const int16_t* weights) {
-    ptrdiff_t g = 4;
-    while (g < gather.alikeEnd && isSame(weights + 16 * g, weights + 16 * g - 32)) ++g;
-    if (g < gather.alikeEnd) gather.alikeEnd = g;
 }
 
 void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst) {

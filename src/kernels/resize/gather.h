@@ -13,6 +13,7 @@ struct Picks {
     const int32_t* indices;  ///< Of the source, one per pixel of the result, ascending.
     int32_t count;
     int32_t first, last;  ///< Indices that may be read, others stand for the nearest; rows are given from the first on.
+    int32_t period;       ///< Pixels after which indices go on by one step and weights repeat, or 0 where not known.
 
     int32_t clamp(int32_t index) const { return index < first ? first : index > last ? last : index; }
 };
@@ -31,14 +32,17 @@ struct Gather {
 
     Picks picks{};
     int32_t pixelBytes = 0;
-    int32_t windows = 0;             ///< Per lane; 0 to move pixels one by one.
-    ptrdiff_t groups = 0;            ///< Pairs of lanes.
-    const int32_t* bases = nullptr;  ///< Per group and window: starts of both lanes' loads.
-    const uint8_t* masks = nullptr;  ///< Per group and window: 32 shuffle indices, negative for another window's bytes.
+    int32_t windows = 0;       ///< Per lane; 0 to move pixels one by one.
+    ptrdiff_t groups = 0;      ///< Pairs of lanes.
+    int32_t* bases = nullptr;  ///< Per group and window: starts of both lanes' loads.
+    uint8_t* masks = nullptr;  ///< Per group and window: 32 shuffle indices, negative for another window's bytes.
     /// Groups from the third to before this one have the masks of the groups two before them, and bases `stride` bytes
     /// behind theirs: at simple ratios all but those at the ends. Known for one window only.
     ptrdiff_t alikeEnd = 0;
     ptrdiff_t stride = 0;
+    /// By the period: of the alike groups there are tables for those before kListed only.
+    bool isPeriodic = false;
+    static constexpr ptrdiff_t kListed = 6;
 };
 
 /// Bytes of the tables for a row of so many pixels.
@@ -50,7 +54,8 @@ constexpr int64_t gatherTableBytes(int64_t pixels, int pixelBytes) {
 /// 16 bytes and indices that need no clamping. `memory` is 32-byte aligned and holds gatherTableBytes().
 Gather buildGather(uint8_t* memory, const Picks& picks, int pixelBytes, int32_t rows);
 /// Tables for pairs of bytes: each element of a pixel and its neighbour's of the next index, in linearOrder() and up
-/// to a multiple of 32 pairs. `memory` holds kLaneBytes for each lane.
+/// to a multiple of 32 pairs. `memory` holds kLaneBytes for each lane. Of groups that are alike by the period only the
+/// first are made.
 Gather buildPairs(uint8_t* memory, const Picks& picks, int channels);
 
 /// 32 bytes of the result; base and mask move on to the next group.
@@ -68,8 +73,5 @@ QORI_INLINE Bytes gatherGroup(const uint8_t* row, const int32_t*& base, const ui
 
 /// Makes a row of pixels. `later` is the memory of a row that will be needed soon; it is asked for, not read.
 void gatherRow(const Gather& gather, const uint8_t* row, const uint8_t* later, uint8_t* dst);
-
-/// Leaves alike only those groups that have the 16 weights of the group two before them, too.
-void compareWeights(Gather& gather, const int16_t* weights);
 
 }  // namespace qori::kernels
