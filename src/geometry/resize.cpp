@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "frame/checks.h"
 #include "frame/float_control.h"
+#include "lanczos_table.h"
 #include "resize_columns_run.h"
 #include "resize_half_run.h"
 #include "resize_linear_run.h"
@@ -198,7 +199,8 @@ QorResult initCubic(QorImageSize src, QorImageSize dst, float b, float c, QorRes
                     bool antialiasing) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 4))) return r;
     const auto fillCubic = [=](ResizePlan* block) {
-        const Filter filter{Filter::Shape::cubic, 2, static_cast<double>(b), static_cast<double>(c)};
+        const kernels::Filter filter{
+            kernels::Filter::Shape::cubic, kernels::Cubic::kSupport, {static_cast<double>(b), static_cast<double>(c)}};
         fillFiltered(block, src, dst, filter, antialiasing);
     };
     return fill(fillCubic, pPlan);
@@ -210,7 +212,7 @@ QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorRes
     if (lobes != 2 && lobes != 3) return QOR_ERR_UNSUPPORTED_MODE;
     const auto support = static_cast<int32_t>(lobes);
     if (QorResult r = sourceCheck(src, 2 * support)) return r;
-    return fill(fillFiltered, pPlan, src, dst, Filter{Filter::Shape::lanczos, support}, antialiasing);
+    return fill(fillFiltered, pPlan, src, dst, lanczosFilter(support), antialiasing);
 }
 
 QorResult resizeCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
@@ -230,7 +232,7 @@ QorResult resizeSuperInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPl
 
 QorResult resizeAntialiasingLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan, uint8_t* pInitBuf) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 2))) return r;
-    return fill(fillFiltered, pPlan, src, dst, Filter{Filter::Shape::linear, 1}, true);
+    return fill(fillFiltered, pPlan, src, dst, kernels::Filter{kernels::Filter::Shape::linear, 1}, true);
 }
 
 QorResult resizeAntialiasingCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
