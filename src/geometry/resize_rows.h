@@ -53,7 +53,7 @@ inline bool hasLongRows(const ResizePlan& plan) { return plan.rowTaps > kernels:
 
 /// Whether two destination rows share source rows, or nearly so, and are made together.
 inline bool makesPairs(const ResizePlan& plan) {
-    const int32_t most = plan.isPadded(plan.vertical) ? kernels::kAscendingTaps : kernels::kChainTaps;
+    const int32_t most = plan.interpolation == interpSuper ? kernels::kAscendingTaps : kernels::kPairedTaps;
     return plan.vertical.ratio() <= plan.rowTaps && plan.rowTaps <= most;
 }
 

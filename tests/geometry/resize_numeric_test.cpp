@@ -244,9 +244,10 @@ void expectConstant(const Method& m, QorImageSize src, QorImageSize dst, T value
 }
 
 TEST(ResizeNumbers, ConstantsStay) {
-    constexpr int kRatios[][2] = {{3, 2},   {7, 4},   {2, 1},   {5, 2},   {8, 3},    {3, 1},   {4, 1},  {5, 1},
-                                  {8, 1},   {11, 1},  {13, 1},  {16, 1},  {24, 1},   {33, 1},  {64, 1}, {100, 1},
-                                  {128, 1}, {129, 1}, {288, 1}, {352, 1}, {1001, 3}, {3000, 1}};
+    constexpr int kRatios[][2] = {{3, 2},    {7, 4},   {2, 1},   {5, 2},   {8, 3},   {3, 1},   {4, 1},
+                                  {5, 1},    {8, 1},   {11, 1},  {13, 1},  {16, 1},  {24, 1},  {33, 1},
+                                  {64, 1},   {100, 1}, {128, 1}, {129, 1}, {288, 1}, {352, 1}, {1001, 3},
+                                  {3000, 1}, {31, 4},  {43, 4},  {23, 2},  {47, 4}};
     for (const Method& m : reducingMethods())
         for (const auto& r : kRatios) {
             const int times = r[0] / r[1] > 200 ? 1 : 12 / r[0] + 1;

@@ -81,10 +81,11 @@ QORI_INLINE void turnColumns(const RowFilter& filter, const T* const rows[kTapRo
 
 /// One pixel of eight rows. `taps` 0 is any number that a chain holds.
 template <int channels, int taps>
-QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t count, float* out) {
+QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t count, int32_t oneByOne, float* out) {
     __m256 sum[channels];
     sumChain<channels>(
-        weights, taps > 0 ? taps : count, [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); }, sum);
+        weights, taps > 0 ? taps : count, [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); }, sum,
+        taps > 0 ? kPairedTaps : oneByOne);
     for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, sum[c]);
 }
 
@@ -105,6 +106,8 @@ QORI_INLINE void sumPhase(const RowFilter& filter, const PixelTaps* pixels, int3
         }
     }
 }
+
+bool isOfSuper(const RowFilter& filter) { return filter.scale != 1; }
 
 /// The taps of a pixel, of which the last may be none.
 QORI_INLINE int32_t tapsOf(const RowFilter& filter, const float* weights) {
@@ -148,11 +151,11 @@ QORI_NOINLINE void sumGroup(const RowFilter& filter, const PixelTaps* pixels, in
     } else if (filter.isPadded && filter.taps <= kAscendingTaps) {
         return sumPaddedGroup<channels>(filter, pixels, count, out);
     }
-    const int32_t origin = pixels[0].first;
+    const int32_t origin = pixels[0].first, oneByOne = isOfSuper(filter) ? kAscendingTaps : kPairedTaps;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
         const float* const weights = filter.weights + pixels[i].weights;
         sumTaps<channels, taps>(filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels), weights,
-                                tapsOf(filter, weights), out);
+                                tapsOf(filter, weights), oneByOne, out);
     }
 }
 
@@ -195,9 +198,10 @@ QORI_NOINLINE void sumPieces(const RowFilter& filter, const T* const rows[kTapRo
 }
 
 template <int channels>
-auto chooseSum(int32_t taps) {
-    if (taps > kChainTaps) return sumLongGroup<channels>;
-    switch (taps) {
+auto chooseSum(const RowFilter& filter) {
+    if (filter.taps > kChainTaps) return sumLongGroup<channels>;
+    if (filter.taps > kAscendingTaps && isOfSuper(filter)) return sumGroup<channels, 0>;
+    switch (filter.taps) {
         case 2: return sumGroup<channels, 2>;
         case 4: return sumGroup<channels, 4>;
         case 6: return sumGroup<channels, 6>;
@@ -242,7 +246,7 @@ int64_t tapColumnFloats(double ratio, int32_t taps, int channels) {
 
 template <class T, int channels>
 void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* const out[kTapRows]) {
-    const auto sum = chooseSum<channels>(filter.taps);
+    const auto sum = chooseSum<channels>(filter);
     const bool inPieces = filter.group == 1 && filter.taps > kPieceColumns;
     constexpr ptrdiff_t pixel = 8 * channels;
     for (int32_t x = 0; x < filter.width; x += kTapChunk) {
