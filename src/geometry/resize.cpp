@@ -3,6 +3,7 @@
 #include "frame/float_control.h"
 #include "lanczos_table.h"
 #include "resize_columns_run.h"
+#include "resize_doubles_run.h"
 #include "resize_half_run.h"
 #include "resize_linear_run.h"
 #include "resize_quads_run.h"
@@ -55,20 +56,11 @@ QorResult kindSizeCheck(QorImageSize src, QorImageSize dst, int32_t interpolatio
     }
 }
 
-QorResult offsetCheck(const ResizePlan& plan, int32_t x, int32_t y) {
-    const bool inside = x >= 0 && y >= 0 && x < plan.horizontal.targetLength && y < plan.vertical.targetLength;
-    return inside ? QOR_OK : QOR_ERR_OUT_OF_RANGE;
-}
+QorImageSize targetOf(const ResizePlan& plan) { return {plan.horizontal.targetLength, plan.vertical.targetLength}; }
 
 QorResult trimWarning(const ResizePlan& plan, QorImageSize tile) {
     const bool exceeds = tile.width > plan.horizontal.targetLength || tile.height > plan.vertical.targetLength;
     return exceeds ? QOR_WARN_ADJUSTED : QOR_OK;
-}
-
-int32_t smaller(int32_t a, int32_t b) { return a < b ? a : b; }
-
-Tile trimmed(const ResizePlan& plan, int32_t x, int32_t y, int32_t width, int32_t height) {
-    return {x, y, smaller(width, plan.horizontal.targetLength - x), smaller(height, plan.vertical.targetLength - y)};
 }
 
 // --- queries --------------------------------------------------------------------------------------------------------
@@ -135,7 +127,7 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (QorResult r = sizeCheck(dst)) return r;
     int64_t bytes = 0;
     underDefaultControl([&] {  // as in the operation
-        bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
+        bytes = bufferBytes<T>(plan, trimmedTile({0, 0}, dst, targetOf(plan)), numChannels);
         return QOR_OK;
     });
     if (QorResult r = reportSize(bytes, pBufSize)) return r;
@@ -153,7 +145,7 @@ QorResult resizeGetSrcOffset(const QorResizePlan* pPlan, QorPoint2D dstOffset, Q
     if (QorResult r = nullCheck(pPlan, pSrcOffset)) return r;
     const ResizePlan& plan = *planOf(pPlan);
     if (QorResult r = tagCheck(&plan)) return r;
-    if (QorResult r = offsetCheck(plan, dstOffset.x, dstOffset.y)) return r;
+    if (QorResult r = offsetCheck(dstOffset, targetOf(plan))) return r;
     *pSrcOffset = {sourceOffset(plan.horizontal, dstOffset.x), sourceOffset(plan.vertical, dstOffset.y)};
     return QOR_OK;
 }
@@ -164,8 +156,8 @@ QorResult resizeGetSrcRoi(const QorResizePlan* pPlan, QorImageRect dst, QorImage
         return r;
     const ResizePlan& plan = *planOf(pPlan);
     if (QorResult r = tagCheck(&plan)) return r;
-    if (QorResult r = offsetCheck(plan, dst.x, dst.y)) return r;
-    const Tile tile = trimmed(plan, dst.x, dst.y, dst.width, dst.height);
+    if (QorResult r = offsetCheck({dst.x, dst.y}, targetOf(plan))) return r;
+    const Tile tile = trimmedTile({dst.x, dst.y}, {dst.width, dst.height}, targetOf(plan));
     const Range columns = tapRange(plan, plan.horizontal, tile.x, tile.width, false, false);
     const Range rows = tapRange(plan, plan.vertical, tile.y, tile.height, false, false);
     *pSrcRect = {columns.first, rows.first, columns.last - columns.first + 1, rows.last - rows.first + 1};
@@ -251,7 +243,7 @@ template <class T>
 QorResult tileCheck(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan,
                     uint8_t* pBuffer) {
     if (QorResult r = firstOf(nullCheck(src, dst, pPlan, pBuffer), emptyCheck(size))) return r;
-    return firstOf(tagCheck(planOf(pPlan)), sizeCheck(size), offsetCheck(*planOf(pPlan), offset.x, offset.y));
+    return firstOf(tagCheck(planOf(pPlan)), sizeCheck(size), offsetCheck(offset, targetOf(*planOf(pPlan))));
 }
 
 /// Antialiasing serves any interpolation.
@@ -272,19 +264,13 @@ QorResult borderCheck(Border border) {
     return kind == borderReplicate || kind == borderReadAll ? QOR_OK : QOR_ERR_UNSUPPORTED_MODE;
 }
 
-OpenSides openSides(Border border) {
-    const bool all = (border.type & 7) == borderReadAll;
-    const auto open = [=](int32_t flag) { return all || (border.type & flag) != 0; };
-    return {open(borderReadTop), open(borderReadBottom), open(borderReadLeft), open(borderReadRight)};
-}
-
 template <class T, int channels>
 QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, OpenSides open,
                   const QorResizePlan* pPlan, uint8_t* pBuffer) {
     const ResizePlan& plan = *planOf(pPlan);
     return underDefaultControl([&] {
         WorkBuffer buffer(pBuffer);
-        const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);
+        const Tile tile = trimmedTile(offset, size, targetOf(plan));
         withWay<T, channels>(plan, [&]<class Way>() { Way(plan, tile, buffer).run(src, dst, open); });
         return trimWarning(plan, size);
     });
@@ -306,7 +292,7 @@ QorResult resizeBordered(Image<const T> src, Image<T> dst, QorPoint2D offset, Qo
     if (QorResult r = tileCheck(src, dst, offset, size, pPlan, pBuffer)) return r;
     constexpr bool antialiasing = interpolation == kAnyAntialiasing;
     if (QorResult r = firstOf(planCheck(*planOf(pPlan), interpolation, antialiasing), borderCheck(border))) return r;
-    return runTile<T, channels>(src, dst, offset, size, openSides(border), pPlan, pBuffer);
+    return runTile<T, channels>(src, dst, offset, size, openSides(border.type), pPlan, pBuffer);
 }
 
 template <class T, int channels>

@@ -5,25 +5,9 @@
 #include "kernels/resize/gather.h"
 #include "kernels/resize/taps.h"
 #include "resize_plan.h"
+#include "tile.h"
 
 namespace qori::geometry {
-
-/// The part of a tile inside the destination, in destination pixels.
-struct Tile {
-    int32_t x, y, width, height;
-};
-
-/// Source indices first..last.
-struct Range {
-    int32_t first, last;
-
-    int32_t clamp(int32_t index) const { return index < first ? first : index > last ? last : index; }
-};
-
-/// Sides beyond which the source goes on in memory.
-struct OpenSides {
-    bool top = false, bottom = false, left = false, right = false;
-};
 
 /// Indices that `count` positions are made of, within the source except on open sides. Every other index is as good as
 /// the nearest of these.
@@ -185,89 +169,6 @@ private:
 
     H* rows_[2];
     int32_t indices_[2] = {kNone, kNone};
-};
-
-/// Linear 64f: the fractions are found again from the stored indices, as the plan holds them in single precision only.
-template <int channels>
-class DoubleLinearTile {
-public:
-    DoubleLinearTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
-        : source_{plan, tile},
-          elements_(ptrdiff_t{tile.width} * channels),
-          padded_(static_cast<ptrdiff_t>(roundUp(elements_, kLanes))),
-          fractions_(buffer.take<double>(padded_)),
-          places_{buffer.take<int32_t>(padded_), buffer.take<int32_t>(padded_)},
-          pair_(buffer, padded_) {}
-
-    void run(Image<const double> src, Image<double> dst, OpenSides open) {
-        source_.open(src, open);
-        listElements();
-        const ResizePlan& plan = source_.plan;
-        const Tile& tile = source_.tile;
-        for (int32_t y = 0; y < tile.height; ++y) {
-            const int32_t index = plan.index(plan.vertical, tile.y + y);
-            const int32_t first = source_.rows.clamp(index), second = source_.rows.clamp(index + 1);
-            pair_.provide(first, second, [&](int32_t row, double* out) { filterRow(row, out); });
-            mix(pair_.first(), pair_.second(first == second), fraction(plan.vertical, tile.y + y), dst.row(y));
-        }
-    }
-
-private:
-    static constexpr int kLanes = 4;
-
-    double fraction(const Axis& axis, int32_t position) const {
-        return __builtin_fma(position + 0.5, axis.ratio(), -0.5) - source_.plan.index(axis, position);
-    }
-
-    /// Where each element's neighbours lie in a row, in bytes from its first legal column; those behind the last repeat
-    /// it.
-    void listElements() const {
-        const Range& legal = source_.columns;
-        const Axis& axis = source_.plan.horizontal;
-        ptrdiff_t i = 0;
-        for (int32_t x = 0; x < source_.tile.width; ++x) {
-            const int32_t index = source_.plan.index(axis, source_.tile.x + x);
-            const double f = fraction(axis, source_.tile.x + x);
-            for (int c = 0; c < channels; ++c, ++i) {
-                fractions_[i] = f;
-                for (int k = 0; k < 2; ++k)
-                    places_[k][i] = ((legal.clamp(index + k) - legal.first) * channels + c) * elementBytes<double>;
-            }
-        }
-        for (; i < padded_; ++i) {
-            fractions_[i] = fractions_[i - 1];
-            for (int32_t* places : places_) places[i] = places[i - 1];
-        }
-    }
-
-    void filterRow(int32_t row, double* out) const {
-        const auto* from = asBytes(source_.at(row, source_.columns.first));
-        const auto pick = [from](const int32_t* places) {
-            if constexpr (channels == kLanes) return load(reinterpret_cast<const double*>(from + *places)).v;
-            double p[kLanes];
-            for (double& element : p) __builtin_memcpy(&element, from + *places++, sizeof(double));
-            return _mm256_setr_pd(p[0], p[1], p[2], p[3]);
-        };
-        for (ptrdiff_t i = 0; i < padded_; i += kLanes) {
-            const __m256d f = _mm256_loadu_pd(fractions_ + i), rest = _mm256_sub_pd(_mm256_set1_pd(1), f);
-            const __m256d sum = _mm256_mul_pd(rest, pick(places_[0] + i));
-            _mm256_storeu_pd(out + i, _mm256_fmadd_pd(f, pick(places_[1] + i), sum));
-        }
-    }
-
-    void mix(const double* h0, const double* h1, double fraction, double* dst) const {
-        const __m256d second = _mm256_set1_pd(fraction), first = _mm256_set1_pd(1 - fraction);
-        for (ptrdiff_t i = 0; i < elements_; i += kLanes) {
-            const __m256d sum = _mm256_mul_pd(first, _mm256_loadu_pd(h0 + i));
-            storeUpTo(dst + i, Vec<double>{_mm256_fmadd_pd(second, _mm256_loadu_pd(h1 + i), sum)}, elements_ - i);
-        }
-    }
-
-    TileSource<double, channels> source_;
-    ptrdiff_t elements_, padded_;
-    double* fractions_;
-    int32_t* places_[2];
-    RowPair<double> pair_;
 };
 
 }  // namespace qori::geometry
