@@ -74,9 +74,28 @@ inline double rowScale(const ResizePlan& plan) {
     return 1 / ((plan.columnTaps > kernels::kChainTaps ? 1 : plan.horizontal.ratio()) * plan.vertical.ratio());
 }
 
+/// The next rows of a sequence that is not done, and where they go. Where there are fewer, the last is done again.
+template <class T, int channels, size_t rows>
+void takeRows(const TileSource<T, channels>& source, RowSequence& sequence, Ring& ring, const T* (&from)[rows],
+              float* (&to)[rows]) {
+    int32_t row = 0;
+    for (size_t i = 0; i < rows; ++i) {
+        const bool isNew = i == 0 || !sequence.done();
+        if (isNew) row = sequence.next();
+        from[i] = source.at(row, 0);
+        to[i] = isNew ? ring.next() : to[i - 1];
+    }
+}
+
 inline int32_t wholeChunks(int32_t pixels) {
     const int32_t chunks = pixels / kernels::kTapChunk * kernels::kTapChunk;
     return chunks > 0 ? chunks : kernels::kTapChunk;
+}
+
+/// Strips of so many pixels that their filtered rows stay in the second-level cache.
+inline int32_t ringPixels(const ResizePlan& plan, int32_t atOnce, int channels) {
+    constexpr int32_t kRingFloats = 24576;
+    return wholeChunks(kRingFloats / (rowsInUse(plan) + atOnce - 1) / channels);
 }
 
 /// The taps of a tile's columns one by one.
@@ -117,11 +136,7 @@ public:
               kernels::tapColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps, channels))),
           results_(buffer.take<float>(8 * kernels::kTapChunk * channels)) {}
 
-    /// Such that the filtered rows of a strip stay in the second-level cache.
-    int32_t stripPixels() const {
-        constexpr int32_t kRingFloats = 24576;
-        return wholeChunks(kRingFloats / (rowsInUse(source_.plan) + kAtOnce - 1) / channels);
-    }
+    int32_t stripPixels() const { return ringPixels(source_.plan, kAtOnce, channels); }
     static constexpr int32_t kAtOnce = kernels::kTapRows;
 
     void begin() { taps_.list(source_); }
@@ -139,21 +154,11 @@ public:
                    columnScale(plan),
                    columns_,
                    results_};
-        newest_ = INT32_MIN;
     }
-    /// There is a row left. Where there are fewer than eight, the last is done again.
     void filterNext(RowSequence& sequence, Ring& ring) {
-        const T* rows[kernels::kTapRows];
-        float* out[kernels::kTapRows];
-        for (int32_t i = 0; i < kernels::kTapRows; ++i) {
-            if (i == 0 || !sequence.done()) {
-                newest_ = sequence.next();
-                out[i] = ring.next();
-            } else {
-                out[i] = out[i - 1];
-            }
-            rows[i] = source_.at(newest_, 0);
-        }
+        const T* rows[kAtOnce];
+        float* out[kAtOnce];
+        takeRows(source_, sequence, ring, rows, out);
         kernels::filterRows<T, channels>(filter_, rows, out);
     }
 
@@ -162,20 +167,6 @@ private:
     ColumnTaps<T, channels> taps_;
     float *columns_, *results_;
     kernels::RowFilter filter_{};
-    int32_t newest_ = 0;
-};
-
-/// The source columns that the taps of a strip reach.
-struct Reached {
-    int32_t from;         ///< The first that is legal.
-    int32_t left, right;  ///< So many outside the legal ones, at either end.
-    ptrdiff_t columns;    ///< Legal ones.
-
-    Reached(const Range& legal, int32_t first, int32_t last)
-        : from(legal.clamp(first)),
-          left(from - first),
-          right(last - legal.clamp(last)),
-          columns(last - right - from + 1) {}
 };
 
 /// Enlargements and small reductions: rows as lines of floats.

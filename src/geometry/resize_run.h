@@ -39,6 +39,19 @@ struct TileSource {
     }
 };
 
+/// The source columns that the taps of a strip reach.
+struct Reached {
+    int32_t from;         ///< The first that is legal.
+    int32_t left, right;  ///< So many outside the legal ones, at either end.
+    ptrdiff_t columns;    ///< Legal ones.
+
+    Reached(const Range& legal, int32_t first, int32_t last)
+        : from(legal.clamp(first)),
+          left(from - first),
+          right(last - legal.clamp(last)),
+          columns(last - right - from + 1) {}
+};
+
 /// Lists the columns from `position` on with the first weights at `begin` of sets of `taps`, which repeat after
 /// `period` columns, or never where that is 0. Super-sampling has sets of one period only.
 inline void listColumns(const ResizePlan& plan, int32_t position, int32_t begin, int32_t taps, int32_t period,
