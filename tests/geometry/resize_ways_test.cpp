@@ -96,6 +96,31 @@ TYPED_TEST(ResizeWays, ChannelsBecomeWhatTheirPlanesBecome) {
             }
 }
 
+/// Rows of alike groups of linear 8u, which end where their memory does.
+TEST(Resize, LinearRowsOfSimpleRatiosStayInTheirRows) {
+    constexpr QorImageSize kSizes[][2] = {
+        {{300, 2}, {600, 3}}, {{451, 2}, {902, 3}}, {{450, 3}, {600, 2}}, {{333, 2}, {1332, 4}}, {{903, 3}, {602, 2}}};
+    const Method m{.interpolation = interpLinear};
+    for (const auto& [from, to] : kSizes)
+        for (int channels : {1, 3, 4}) {
+            Pixels<uint8_t> src{from, channels};
+            for (uint8_t& element : src.elements) element = drawPixel<uint8_t>();
+            const Pixels<uint8_t> expected = resized(m, src, to, to.width);
+            const auto bytes = static_cast<int>(src.elements.size());
+            const TestImage guarded = block(kSrc, bytes, 0);
+            std::copy(src.elements.begin(), src.elements.end(), guarded.data<uint8_t>());
+            const QorResizePlan* plan = makePlan<uint8_t>(m, from, to);
+            int32_t size = 0;
+            ASSERT_EQ(QOR_OK, call(qoriResizeGetBufferSize_8u, plan, to, channels, &size));
+            const TestImage buffer = block(kBuffer, size, 0);
+            Pixels<uint8_t> dst{to, channels};
+            ASSERT_EQ(QOR_OK, operate<uint8_t>(Operations<uint8_t>::of(m, channels), guarded.data<uint8_t>(),
+                                               src.step(), dst.elements.data(), dst.step(), {0, 0}, to, borderReplicate,
+                                               plan, buffer.data<uint8_t>()));
+            EXPECT_EQ(expected.elements, dst.elements) << describe({m, from, to}) << ", channels " << channels;
+        }
+}
+
 /// Rows of nearest pixels by tables and without, and tables whose later lanes span more than the first ones do.
 template <class T, class Operation>
 void expectNearest(Operation operation, int channels, int32_t width, int32_t height) {
