@@ -177,7 +177,8 @@ public:
         return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps, channels);
     }
 
-    LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer) : source_(source), taps_(source, buffer) {
+    LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer, int32_t stripElements = 2048)
+        : source_(source), taps_(source, buffer), stripPixels_(wholeChunks(stripElements / channels)) {
         const int64_t pixels = source.tile.width < stripPixels() ? source.tile.width : stripPixels();
         const int64_t elements = roundUp(pixels * channels, kernels::kTapBlock);
         const ResizePlan& plan = source.plan;
@@ -195,7 +196,7 @@ public:
         return static_cast<int64_t>(double(pixels - 1) * plan.horizontal.ratio()) + 1 + plan.columnTaps;
     }
     /// Strips whose tables stay in the second-level cache. Longer ones follow the source better than shorter ones.
-    int32_t stripPixels() const { return wholeChunks(2048 / channels); }
+    int32_t stripPixels() const { return stripPixels_; }
     static constexpr int32_t kAtOnce = 1;
 
     void begin() { taps_.list(source_); }
@@ -233,6 +234,7 @@ public:
 private:
     const TileSource<T, channels>& source_;
     ColumnTaps<T, channels> taps_;
+    int32_t stripPixels_;
     float* line_;
     kernels::LineFilter filter_{};
     Reached reached_{{0, 0}, 0, 0};
