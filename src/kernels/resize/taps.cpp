@@ -126,11 +126,11 @@ QORI_NOINLINE void sumPhases(const RowFilter& filter, const PixelTaps* pixels, i
 
 /// Pixels whose last tap may be none, of up to kAscendingTaps: there is no branch on it, but nothing is added then, not
 /// even to the sign of a zero.
-template <int channels>
+template <int channels, int taps>
 QORI_NOINLINE void sumPaddedGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
     alignas(32) float nothing[8 * channels];
     for (float& element : nothing) element = -0.0f;
-    const int32_t last = filter.taps - 1;
+    const int32_t last = (taps > 0 ? taps : filter.taps) - 1;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
         const float* const weights = filter.weights + pixels[i].weights;
         const float* const column = filter.columns + ptrdiff_t{pixels[i].first - pixels[0].first} * (8 * channels);
@@ -147,9 +147,9 @@ QORI_NOINLINE void sumGroup(const RowFilter& filter, const PixelTaps* pixels, in
     if constexpr (taps > 0) {
         if (filter.period > 0 && 2 * filter.period <= count)
             return sumPhases<channels, taps>(filter, pixels, count, out);
-        if (filter.isPadded) return sumGroup<channels, 0>(filter, pixels, count, out);
+        if (filter.isPadded) return sumPaddedGroup<channels, taps>(filter, pixels, count, out);
     } else if (filter.isPadded && filter.taps <= kAscendingTaps) {
-        return sumPaddedGroup<channels>(filter, pixels, count, out);
+        return sumPaddedGroup<channels, 0>(filter, pixels, count, out);
     }
     const int32_t origin = pixels[0].first, oneByOne = isOfSuper(filter) ? kAscendingTaps : kPairedTaps;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
@@ -203,6 +203,7 @@ auto chooseSum(const RowFilter& filter) {
     if (filter.taps > kAscendingTaps && isOfSuper(filter)) return sumGroup<channels, 0>;
     switch (filter.taps) {
         case 2: return sumGroup<channels, 2>;
+        case 3: return sumGroup<channels, 3>;
         case 4: return sumGroup<channels, 4>;
         case 6: return sumGroup<channels, 6>;
         case 8: return sumGroup<channels, 8>;
