@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <numbers>
 
+#include "kernels/resize/weights.h"
+
 namespace qori::geometry {
 
 namespace detail {
@@ -42,19 +44,12 @@ constexpr auto sampleLanczos() {
 inline constexpr auto kLanczos2 = sampleLanczos<2, 200>();
 inline constexpr auto kLanczos3 = sampleLanczos<3, 100>();
 
-template <size_t size>
-double interpolate(const std::array<double, size>& table, double at) {
-    const auto i = static_cast<size_t>(at);
-    if (i >= size - 1) return table[size - 1];
-    return table[i] + (at - static_cast<double>(i)) * (table[i + 1] - table[i]);
-}
-
 }  // namespace detail
 
-/// The kernel with 2 or 3 lobes at 0 <= t < lobes, linear between samples 1/200 or 1/100 apart.
-inline double lanczos(int32_t lobes, double t) {
-    return lobes == 2 ? detail::interpolate(detail::kLanczos2, t * 200)
-                      : detail::interpolate(detail::kLanczos3, t * 100);
+/// The kernel with 2 or 3 lobes, linear between samples 1/200 or 1/100 apart.
+inline kernels::Filter lanczosFilter(int32_t lobes) {
+    const double* const samples = lobes == 2 ? detail::kLanczos2.data() : detail::kLanczos3.data();
+    return {kernels::Filter::Shape::samples, lobes, {}, samples, lobes == 2 ? 200 : 100};
 }
 
 }  // namespace qori::geometry

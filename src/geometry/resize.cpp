@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "frame/checks.h"
 #include "frame/float_control.h"
+#include "lanczos_table.h"
 #include "resize_columns_run.h"
+#include "resize_doubles_run.h"
 #include "resize_half_run.h"
 #include "resize_linear_run.h"
 #include "resize_quads_run.h"
@@ -54,20 +56,11 @@ QorResult kindSizeCheck(QorImageSize src, QorImageSize dst, int32_t interpolatio
     }
 }
 
-QorResult offsetCheck(const ResizePlan& plan, int32_t x, int32_t y) {
-    const bool inside = x >= 0 && y >= 0 && x < plan.horizontal.targetLength && y < plan.vertical.targetLength;
-    return inside ? QOR_OK : QOR_ERR_OUT_OF_RANGE;
-}
+QorImageSize targetOf(const ResizePlan& plan) { return {plan.horizontal.targetLength, plan.vertical.targetLength}; }
 
 QorResult trimWarning(const ResizePlan& plan, QorImageSize tile) {
     const bool exceeds = tile.width > plan.horizontal.targetLength || tile.height > plan.vertical.targetLength;
     return exceeds ? QOR_WARN_ADJUSTED : QOR_OK;
-}
-
-int32_t smaller(int32_t a, int32_t b) { return a < b ? a : b; }
-
-Tile trimmed(const ResizePlan& plan, int32_t x, int32_t y, int32_t width, int32_t height) {
-    return {x, y, smaller(width, plan.horizontal.targetLength - x), smaller(height, plan.vertical.targetLength - y)};
 }
 
 // --- queries --------------------------------------------------------------------------------------------------------
@@ -133,7 +126,7 @@ QorResult resizeGetBufferSize(const QorResizePlan* pPlan, QorImageSize dst, int3
     if (QorResult r = firstOf(channelsCheck(numChannels), sizeCheck(dst))) return r;
     int64_t bytes = 0;
     underDefaultControl([&] {  // as in the operation
-        bytes = bufferBytes<T>(plan, trimmed(plan, 0, 0, dst.width, dst.height), numChannels);
+        bytes = bufferBytes<T>(plan, trimmedTile({0, 0}, dst, targetOf(plan)), numChannels);
         return QOR_OK;
     });
     if (QorResult r = reportSize(bytes, pBufSize)) return r;
@@ -151,7 +144,7 @@ QorResult resizeGetSrcOffset(const QorResizePlan* pPlan, QorPoint2D dstOffset, Q
     if (QorResult r = nullCheck(pPlan, pSrcOffset)) return r;
     const ResizePlan& plan = *planOf(pPlan);
     if (QorResult r = tagCheck(&plan)) return r;
-    if (QorResult r = offsetCheck(plan, dstOffset.x, dstOffset.y)) return r;
+    if (QorResult r = offsetCheck(dstOffset, targetOf(plan))) return r;
     *pSrcOffset = {sourceOffset(plan.horizontal, dstOffset.x), sourceOffset(plan.vertical, dstOffset.y)};
     return QOR_OK;
 }
@@ -162,8 +155,8 @@ QorResult resizeGetSrcRoi(const QorResizePlan* pPlan, QorImageRect dst, QorImage
         return r;
     const ResizePlan& plan = *planOf(pPlan);
     if (QorResult r = tagCheck(&plan)) return r;
-    if (QorResult r = offsetCheck(plan, dst.x, dst.y)) return r;
-    const Tile tile = trimmed(plan, dst.x, dst.y, dst.width, dst.height);
+    if (QorResult r = offsetCheck({dst.x, dst.y}, targetOf(plan))) return r;
+    const Tile tile = trimmedTile({dst.x, dst.y}, {dst.width, dst.height}, targetOf(plan));
     const Range columns = tapRange(plan, plan.horizontal, tile.x, tile.width, false, false);
     const Range rows = tapRange(plan, plan.vertical, tile.y, tile.height, false, false);
     *pSrcRect = {columns.first, rows.first, columns.last - columns.first + 1, rows.last - rows.first + 1};
@@ -197,7 +190,8 @@ QorResult initCubic(QorImageSize src, QorImageSize dst, float b, float c, QorRes
                     bool antialiasing) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 4))) return r;
     const auto fillCubic = [=](ResizePlan* block) {
-        const Filter filter{Filter::Shape::cubic, 2, static_cast<double>(b), static_cast<double>(c)};
+        const kernels::Filter filter{
+            kernels::Filter::Shape::cubic, kernels::Cubic::kSupport, {static_cast<double>(b), static_cast<double>(c)}};
         fillFiltered(block, src, dst, filter, antialiasing);
     };
     return fill(fillCubic, pPlan);
@@ -209,7 +203,7 @@ QorResult initLanczos(QorImageSize src, QorImageSize dst, uint32_t lobes, QorRes
     if (lobes != 2 && lobes != 3) return QOR_ERR_UNSUPPORTED_MODE;
     const auto support = static_cast<int32_t>(lobes);
     if (QorResult r = sourceCheck(src, 2 * support)) return r;
-    return fill(fillFiltered, pPlan, src, dst, Filter{Filter::Shape::lanczos, support}, antialiasing);
+    return fill(fillFiltered, pPlan, src, dst, lanczosFilter(support), antialiasing);
 }
 
 QorResult resizeCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
@@ -229,7 +223,7 @@ QorResult resizeSuperInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPl
 
 QorResult resizeAntialiasingLinearInit(QorImageSize src, QorImageSize dst, QorResizePlan* pPlan, uint8_t* pInitBuf) {
     if (QorResult r = firstOf(initCheck(src, dst, pPlan, pInitBuf), sourceCheck(src, 2))) return r;
-    return fill(fillFiltered, pPlan, src, dst, Filter{Filter::Shape::linear, 1}, true);
+    return fill(fillFiltered, pPlan, src, dst, kernels::Filter{kernels::Filter::Shape::linear, 1}, true);
 }
 
 QorResult resizeAntialiasingCubicInit(QorImageSize src, QorImageSize dst, float b, float c, QorResizePlan* pPlan,
@@ -248,7 +242,7 @@ template <class T>
 QorResult tileCheck(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageSize size, const QorResizePlan* pPlan,
                     uint8_t* pBuffer) {
     if (QorResult r = firstOf(nullCheck(src, dst, pPlan, pBuffer), emptyCheck(size))) return r;
-    return firstOf(tagCheck(planOf(pPlan)), sizeCheck(size), offsetCheck(*planOf(pPlan), offset.x, offset.y));
+    return firstOf(tagCheck(planOf(pPlan)), sizeCheck(size), offsetCheck(offset, targetOf(*planOf(pPlan))));
 }
 
 /// Antialiasing serves any interpolation.
@@ -274,7 +268,7 @@ QorResult runTile(Image<const T> src, Image<T> dst, QorPoint2D offset, QorImageS
     const ResizePlan& plan = *planOf(pPlan);
     return underDefaultControl([&] {
         WorkBuffer buffer(pBuffer);
-        const Tile tile = trimmed(plan, offset.x, offset.y, size.width, size.height);
+        const Tile tile = trimmedTile(offset, size, targetOf(plan));
         withWay<T, channels>(plan, [&]<class Way>() { Way(plan, tile, buffer).run(src, dst, open); });
         return trimWarning(plan, size);
     });

@@ -20,7 +20,7 @@ public:
     }
 
     ColumnsFirstTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
-        : source_{plan, tile}, lines_(source_, buffer) {
+        : source_{plan, tile}, lines_(source_, buffer, kStripElements) {
         stripPixels_ = std::min(tile.width, lines_.stripPixels());
         const int64_t columns = lines_.columnsOf(stripPixels_) + kernels::LineFilter::kOverrun;
         ring_.rows = kernels::kTapsPerBlock;
@@ -41,6 +41,9 @@ public:
     }
 
 private:
+    /// All source rows pass for each strip, so that long ones pay although their tables fill the second-level cache.
+    static constexpr int32_t kStripElements = 8192;
+
     void runStrip(Image<T> dst, int32_t x, int32_t width) {
         lines_.beginStrip(x, width);
         ring_.filtered = 0;

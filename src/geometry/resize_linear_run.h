@@ -14,16 +14,17 @@ public:
           rows_(buffer),
           elements_(ptrdiff_t{tile.width} * channels),
           padded_(static_cast<ptrdiff_t>(roundUp(elements_, 32))),
-          tables_(buffer.take<uint8_t>(int64_t{padded_} / 8 * kernels::Gather::kLaneBytes)),
+          tables_(buffer.take<uint8_t>(padded_ / 8 * int64_t{kernels::Gather::kLaneBytes})),
           weights_(buffer.take<int16_t>(padded_)),
           pair_(buffer, padded_) {}
 
     void run(Image<const uint8_t> src, Image<uint8_t> dst, Sides open) {
         source_.open(src, open);
         rows_.open(source_);
-        const kernels::Gather gather = buildTables();
-        const bool coarse = kernels::makeCoarse(weights_, padded_);
         const ResizePlan& plan = source_.plan;
+        kernels::Gather gather = kernels::buildPairs(tables_, columnPicks(source_), channels);
+        const auto* pairs = plan.table<int32_t>(plan.horizontal.weightTable) + source_.tile.x;
+        const bool coarse = kernels::listLinearWeights(gather, pairs, weights_);
         const auto* weights = plan.table<int32_t>(plan.vertical.weightTable) + source_.tile.y;
         const int32_t height = source_.tile.height;
         const bool enlarges = plan.vertical.ratio() < 1;
@@ -57,33 +58,6 @@ private:
         const int32_t position = source_.tile.y + y, index = plan.index(plan.vertical, position);
         const bool needsSecond = plan.table<int32_t>(plan.vertical.weightTable)[position] != 0;
         return {source_.rows.clamp(index), source_.rows.clamp(index + needsSecond)};
-    }
-
-    kernels::Gather buildTables() const {
-        const ResizePlan& plan = source_.plan;
-        const auto* pairs = plan.table<int32_t>(plan.horizontal.weightTable) + source_.tile.x;
-        auto* offsets = reinterpret_cast<int32_t*>(tables_);
-        const auto place = [&](ptrdiff_t i, int32_t first, int32_t second, int16_t weight) {
-            const ptrdiff_t at = kernels::linearOrder(i);
-            offsets[2 * at] = first;
-            offsets[2 * at + 1] = second;
-            weights_[at] = weight;
-        };
-        const Range& legal = source_.columns;
-        ptrdiff_t i = 0;
-        int32_t first = 0, second = 0;
-        int16_t weight = 0;
-        for (int32_t x = 0; x < source_.tile.width; ++x) {
-            const int32_t index = plan.index(plan.horizontal, source_.tile.x + x);
-            first = (legal.clamp(index) - legal.first) * channels;
-            second = (legal.clamp(index + 1) - legal.first) * channels;
-            weight = static_cast<int16_t>(-2 * (pairs[x] >> 16));
-            for (int c = 0; c < channels; ++c, ++i) place(i, first + c, second + c, weight);
-        }
-        for (; i < padded_; ++i) place(i, first, second, weight);
-        kernels::Gather gather = kernels::buildGather(tables_, padded_ / 16, rows_.bytes());
-        kernels::compareWeights(gather, weights_);
-        return gather;
     }
 
     TileSource<uint8_t, channels> source_;

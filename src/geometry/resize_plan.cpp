@@ -2,7 +2,6 @@
 #include "resize_plan.h"
 
 #include "kernels/resize/words.h"
-#include "lanczos_table.h"
 
 namespace qori::geometry {
 namespace {
@@ -197,19 +196,6 @@ PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation,
     return layout;
 }
 
-double Filter::operator()(double distance) const {
-    const double t = __builtin_fabs(distance);
-    if (t >= support) return 0;
-    switch (shape) {
-        case Shape::linear: return 1 - t;
-        // Mitchell and Netravali, Reconstruction filters in computer graphics, 1988.
-        case Shape::cubic:
-            if (t < 1) return (((12 - 9 * b - 6 * c) * t + (-18 + 12 * b + 6 * c)) * t * t + (6 - 2 * b)) / 6;
-            return (((-b - 6 * c) * t + (6 * b + 30 * c)) * t * t + (-12 * b - 48 * c) * t + (8 * b + 24 * c)) / 6;
-        default: return lanczos(support, t);
-    }
-}
-
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst) {
     const Builder builder(block, src, dst, interpNearest, false);
     for (const Axis* axis : {&builder.plan->vertical, &builder.plan->horizontal}) {
@@ -239,37 +225,12 @@ void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixe
     if (!fixedPoint) builder.plan->columnPeriod = periodOf(*builder.plan, 1);
 }
 
-/// Stores a position's weights and returns the sum of their magnitudes. Where they are to sum to 1, the largest takes
-/// what is left of the others' rounding.
-template <class Weight>
-double storeWeights(int32_t taps, Weight weight, bool normalises, float* out) {
-    constexpr int32_t kKept = 32;  // so many are not evaluated twice
-    double kept[kKept], sum = 0, factor = 1;
-    if (normalises) {
-        for (int32_t k = 0; k < taps; ++k) {
-            const double w = weight(k);
-            if (k < kKept) kept[k] = w;
-            sum += w;
-        }
-        factor = 1 / sum;
-    }
-    double magnitude = 0, rest = 1;
-    int32_t largest = 0;
-    for (int32_t k = 0; k < taps; ++k) {
-        out[k] = static_cast<float>(normalises && k < kKept ? kept[k] * factor : weight(k) * factor);
-        const auto w = static_cast<double>(out[k]);
-        magnitude += __builtin_fabs(w);
-        rest -= w;
-        if (__builtin_fabsf(out[k]) > __builtin_fabsf(out[largest])) largest = k;
-    }
-    if (normalises) out[largest] = static_cast<float>(static_cast<double>(out[largest]) + rest);
-    return magnitude;
-}
-
 /// Two passes of it leave 16-bit elements below 2^30.
 constexpr double kMostGain = 128;
 
-void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing) {
+void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const kernels::Filter& filter,
+                  bool antialiasing) {
+    using kernels::Filter;
     const int32_t interpolation = filter.shape == Filter::Shape::linear  ? interpLinear
                                   : filter.shape == Filter::Shape::cubic ? interpCubic
                                                                          : interpLanczos;
@@ -277,15 +238,20 @@ void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const F
     ResizePlan& plan = *builder.plan;
     builder.setReach(halfOf(plan.horizontal, filter.support, antialiasing),
                      halfOf(plan.vertical, filter.support, antialiasing));
-    const bool normalises = antialiasing || filter.shape == Filter::Shape::lanczos;
+    const bool normalises = antialiasing || filter.shape == Filter::Shape::samples;
     for (Axis* axis : {&plan.vertical, &plan.horizontal}) {
         const int32_t half = plan.half(*axis);
         const double scale = antialiasing && axis->ratio() > 1 ? 1 / axis->ratio() : 1;
         auto* weights = builder.table<float>(axis->weightTable);
-        builder.forPositions(*axis, [&](int32_t, double fraction) {
-            const auto weight = [&](int32_t k) { return filter(scale * (k - (half - 1) - fraction)); };
-            const double magnitude = storeWeights(2 * half, weight, normalises, weights);
-            weights += 2 * half;
+        const kernels::Taps taps{2 * half, scale, normalises};
+        double fractions[kernels::kPositions] = {};
+        int count = 0;
+        builder.forPositions(*axis, [&](int32_t i, double fraction) {
+            fractions[count++] = fraction;
+            if (count < kernels::kPositions && i + 1 < axis->targetLength) return;
+            const double magnitude = kernels::makeWeights(filter, taps, fractions, count, weights);
+            weights += ptrdiff_t{taps.count} * count;
+            count = 0;
             if (!(magnitude <= kMostGain)) plan.bounded = 0;
         });
     }

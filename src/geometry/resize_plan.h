@@ -2,6 +2,7 @@
 // The plan of a resize: a record and its tables in the caller's block, and what can be asked of it.
 #pragma once
 #include "frame/plan.h"
+#include "kernels/resize/weights.h"
 
 namespace qori::geometry {
 
@@ -89,20 +90,12 @@ struct PlanLayout {
 
 PlanLayout planLayout(QorImageSize src, QorImageSize dst, int32_t interpolation, bool antialiasing);
 
-/// Which filter a plan weighs its taps with.
-struct Filter {
-    enum class Shape { linear, cubic, lanczos } shape;
-    int32_t support;  ///< Source pixels that the filter reaches to either side.
-    double b = 0, c = 0;
-
-    double operator()(double distance) const;
-};
-
 /// These run under the default control register.
 void fillNearest(ResizePlan* block, QorImageSize src, QorImageSize dst);
 /// `fixedPoint` stores the 14-bit weights of the 8u form, else the fraction as a float.
 void fillLinear(ResizePlan* block, QorImageSize src, QorImageSize dst, bool fixedPoint);
-void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const Filter& filter, bool antialiasing);
+void fillFiltered(ResizePlan* block, QorImageSize src, QorImageSize dst, const kernels::Filter& filter,
+                  bool antialiasing);
 void fillSuper(ResizePlan* block, QorImageSize src, QorImageSize dst);
 
 }  // namespace qori::geometry

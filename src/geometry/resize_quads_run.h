@@ -22,11 +22,7 @@ public:
           columns_(
               buffer.take<float>(kernels::quadColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps))) {}
 
-    /// Such that the filtered rows of a strip stay in the second-level cache.
-    int32_t stripPixels() const {
-        constexpr int32_t kRingFloats = 24576;
-        return wholeChunks(kRingFloats / (rowsInUse(source_.plan) + kAtOnce - 1) / channels);
-    }
+    int32_t stripPixels() const { return ringPixels(source_.plan, kAtOnce, channels); }
     static constexpr int32_t kAtOnce = kernels::kQuadRows;
 
     void begin() { taps_.list(source_); }
@@ -40,21 +36,11 @@ public:
                    source_.columns.last,
                    kernels::quadGroup(plan.horizontal.ratio()),
                    columns_};
-        newest_ = INT32_MIN;
     }
-    /// There is a row left. Where there are fewer than four, the last is done again.
     void filterNext(RowSequence& sequence, Ring& ring) {
-        const T* rows[kernels::kQuadRows];
-        float* out[kernels::kQuadRows];
-        for (int32_t i = 0; i < kernels::kQuadRows; ++i) {
-            if (i == 0 || !sequence.done()) {
-                newest_ = sequence.next();
-                out[i] = ring.next();
-            } else {
-                out[i] = out[i - 1];
-            }
-            rows[i] = source_.at(newest_, 0);
-        }
+        const T* rows[kAtOnce];
+        float* out[kAtOnce];
+        takeRows(source_, sequence, ring, rows, out);
         kernels::filterQuads<T, channels>(filter_, rows, out);
     }
 
@@ -63,7 +49,6 @@ private:
     ColumnTaps<T, channels> taps_;
     float* columns_;
     kernels::QuadFilter filter_{};
-    int32_t newest_ = 0;
 };
 
 }  // namespace qori::geometry

@@ -53,7 +53,7 @@ inline bool hasLongRows(const ResizePlan& plan) { return plan.rowTaps > kernels:
 
 /// Whether two destination rows share source rows, or nearly so, and are made together.
 inline bool makesPairs(const ResizePlan& plan) {
-    const int32_t most = plan.isPadded(plan.vertical) ? kernels::kAscendingTaps : kernels::kChainTaps;
+    const int32_t most = plan.interpolation == interpSuper ? kernels::kAscendingTaps : kernels::kPairedTaps;
     return plan.vertical.ratio() <= plan.rowTaps && plan.rowTaps <= most;
 }
 
@@ -74,9 +74,28 @@ inline double rowScale(const ResizePlan& plan) {
     return 1 / ((plan.columnTaps > kernels::kChainTaps ? 1 : plan.horizontal.ratio()) * plan.vertical.ratio());
 }
 
+/// The next rows of a sequence that is not done, and where they go. Where there are fewer, the last is done again.
+template <class T, int channels, size_t rows>
+void takeRows(const TileSource<T, channels>& source, RowSequence& sequence, Ring& ring, const T* (&from)[rows],
+              float* (&to)[rows]) {
+    int32_t row = 0;
+    for (size_t i = 0; i < rows; ++i) {
+        const bool isNew = i == 0 || !sequence.done();
+        if (isNew) row = sequence.next();
+        from[i] = source.at(row, 0);
+        to[i] = isNew ? ring.next() : to[i - 1];
+    }
+}
+
 inline int32_t wholeChunks(int32_t pixels) {
     const int32_t chunks = pixels / kernels::kTapChunk * kernels::kTapChunk;
     return chunks > 0 ? chunks : kernels::kTapChunk;
+}
+
+/// Strips of so many pixels that their filtered rows stay in the second-level cache.
+inline int32_t ringPixels(const ResizePlan& plan, int32_t atOnce, int channels) {
+    constexpr int32_t kRingFloats = 24576;
+    return wholeChunks(kRingFloats / (rowsInUse(plan) + atOnce - 1) / channels);
 }
 
 /// The taps of a tile's columns one by one.
@@ -89,17 +108,14 @@ public:
 
     void list(const TileSource<T, channels>& source) {
         const ResizePlan& plan = source.plan;
-        const Axis& axis = plan.horizontal;
-        const auto* table = plan.table<float>(axis.weightTable);
-        weights = pairs_ != nullptr ? pairs_ : table;
-        const int32_t period = plan.columnPeriod;
-        for (int32_t x = 0; x < source.tile.width; ++x) {
-            const int32_t position = source.tile.x + x, at = pairs_ != nullptr ? x : position;
-            pixels[x] = {plan.firstTap(axis, position), (period > 0 ? at % period : at) * plan.columnTaps};
-            if (pairs_ == nullptr) continue;
-            pairs_[2 * x] = 1 - table[position];
-            pairs_[2 * x + 1] = table[position];
+        const auto* table = plan.table<float>(plan.horizontal.weightTable);
+        const int32_t x = source.tile.x, width = source.tile.width;
+        weights = table;
+        if (pairs_ != nullptr) {
+            kernels::pairFractions(table + x, width, pairs_);
+            weights = pairs_;
         }
+        listColumns(plan, x, pairs_ != nullptr ? 0 : x, plan.columnTaps, plan.columnPeriod, width, pixels);
     }
 
     kernels::PixelTaps* pixels;
@@ -120,11 +136,7 @@ public:
               kernels::tapColumnFloats(source.plan.horizontal.ratio(), source.plan.columnTaps, channels))),
           results_(buffer.take<float>(8 * kernels::kTapChunk * channels)) {}
 
-    /// Such that the filtered rows of a strip stay in the second-level cache.
-    int32_t stripPixels() const {
-        constexpr int32_t kRingFloats = 24576;
-        return wholeChunks(kRingFloats / (rowsInUse(source_.plan) + kAtOnce - 1) / channels);
-    }
+    int32_t stripPixels() const { return ringPixels(source_.plan, kAtOnce, channels); }
     static constexpr int32_t kAtOnce = kernels::kTapRows;
 
     void begin() { taps_.list(source_); }
@@ -142,21 +154,11 @@ public:
                    columnScale(plan),
                    columns_,
                    results_};
-        newest_ = INT32_MIN;
     }
-    /// There is a row left. Where there are fewer than eight, the last is done again.
     void filterNext(RowSequence& sequence, Ring& ring) {
-        const T* rows[kernels::kTapRows];
-        float* out[kernels::kTapRows];
-        for (int32_t i = 0; i < kernels::kTapRows; ++i) {
-            if (i == 0 || !sequence.done()) {
-                newest_ = sequence.next();
-                out[i] = ring.next();
-            } else {
-                out[i] = out[i - 1];
-            }
-            rows[i] = source_.at(newest_, 0);
-        }
+        const T* rows[kAtOnce];
+        float* out[kAtOnce];
+        takeRows(source_, sequence, ring, rows, out);
         kernels::filterRows<T, channels>(filter_, rows, out);
     }
 
@@ -165,20 +167,6 @@ private:
     ColumnTaps<T, channels> taps_;
     float *columns_, *results_;
     kernels::RowFilter filter_{};
-    int32_t newest_ = 0;
-};
-
-/// The source columns that the taps of a strip reach.
-struct Reached {
-    int32_t from;         ///< The first that is legal.
-    int32_t left, right;  ///< So many outside the legal ones, at either end.
-    ptrdiff_t columns;    ///< Legal ones.
-
-    Reached(const Range& legal, int32_t first, int32_t last)
-        : from(legal.clamp(first)),
-          left(from - first),
-          right(last - legal.clamp(last)),
-          columns(last - right - from + 1) {}
 };
 
 /// Enlargements and small reductions: rows as lines of floats.
@@ -189,7 +177,8 @@ public:
         return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps, channels);
     }
 
-    LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer) : source_(source), taps_(source, buffer) {
+    LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer, int32_t stripElements = 2048)
+        : source_(source), taps_(source, buffer), stripPixels_(wholeChunks(stripElements / channels)) {
         const int64_t pixels = source.tile.width < stripPixels() ? source.tile.width : stripPixels();
         const int64_t elements = roundUp(pixels * channels, kernels::kTapBlock);
         const ResizePlan& plan = source.plan;
@@ -207,7 +196,7 @@ public:
         return static_cast<int64_t>(double(pixels - 1) * plan.horizontal.ratio()) + 1 + plan.columnTaps;
     }
     /// Strips whose tables stay in the second-level cache. Longer ones follow the source better than shorter ones.
-    int32_t stripPixels() const { return wholeChunks(2048 / channels); }
+    int32_t stripPixels() const { return stripPixels_; }
     static constexpr int32_t kAtOnce = 1;
 
     void begin() { taps_.list(source_); }
@@ -217,7 +206,7 @@ public:
         reached_ = Reached(source_.columns, first, pixels[width - 1].first + filter_.taps - 1);
         const ptrdiff_t behind = source_.columns.last - reached_.from + 1 - reached_.columns;
         isWhole_ = reached_.left == 0 && reached_.right == 0 && behind * channels >= kernels::LineFilter::kOverrun;
-        kernels::listLine(filter_, pixels, width, taps_.weights, first);
+        kernels::listLine(filter_, pixels, width, taps_.weights, source_.plan.columnPeriod, first);
     }
     void filterNext(RowSequence& sequence, Ring& ring) {
         const int32_t row = sequence.next();
@@ -245,6 +234,7 @@ public:
 private:
     const TileSource<T, channels>& source_;
     ColumnTaps<T, channels> taps_;
+    int32_t stripPixels_;
     float* line_;
     kernels::LineFilter filter_{};
     Reached reached_{{0, 0}, 0, 0};

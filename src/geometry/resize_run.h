@@ -6,20 +6,9 @@
 #include "kernels/resize/gather.h"
 #include "kernels/resize/taps.h"
 #include "resize_plan.h"
+#include "tile.h"
 
 namespace qori::geometry {
-
-/// The part of a tile inside the destination, in destination pixels.
-struct Tile {
-    int32_t x, y, width, height;
-};
-
-/// Source indices first..last.
-struct Range {
-    int32_t first, last;
-
-    int32_t clamp(int32_t index) const { return index < first ? first : index > last ? last : index; }
-};
 
 /// Indices that `count` positions are made of, within the source except on open sides. Every other index is as good as
 /// the nearest of these.
@@ -51,6 +40,38 @@ struct TileSource {
     }
 };
 
+/// The source columns that the taps of a strip reach.
+struct Reached {
+    int32_t from;         ///< The first that is legal.
+    int32_t left, right;  ///< So many outside the legal ones, at either end.
+    ptrdiff_t columns;    ///< Legal ones.
+
+    Reached(const Range& legal, int32_t first, int32_t last)
+        : from(legal.clamp(first)),
+          left(from - first),
+          right(last - legal.clamp(last)),
+          columns(last - right - from + 1) {}
+};
+
+/// Lists the columns from `position` on with the first weights at `begin` of sets of `taps`, which repeat after
+/// `period` columns, or never where that is 0. Super-sampling has sets of one period only.
+inline void listColumns(const ResizePlan& plan, int32_t position, int32_t begin, int32_t taps, int32_t period,
+                        int32_t width, kernels::PixelTaps* pixels) {
+    const Axis& axis = plan.horizontal;
+    const auto* indices = plan.table<int32_t>(axis.indexTable);
+    if (plan.interpolation != interpSuper) {
+        // Periods are powers of two where positions repeat exactly; else there are weights for every column.
+        const int32_t before = plan.halfWidth - 1, mask = (period & (period - 1)) == 0 ? period - 1 : -1;
+        for (int32_t x = 0; x < width; ++x) pixels[x] = {indices[position + x] - before, ((begin + x) & mask) * taps};
+        return;
+    }
+    int32_t origin = position / axis.targetReduced * axis.sourceReduced, set = begin % axis.targetReduced;
+    for (int32_t x = 0; x < width; ++x) {
+        pixels[x] = {origin + indices[set], set * taps};
+        if (++set == axis.targetReduced) set = 0, origin += axis.sourceReduced;
+    }
+}
+
 /// Rows for the gathering kernels, which want 16 bytes at least: shorter ones are copied.
 template <class T, int channels>
 class GatherRows {
@@ -61,7 +82,6 @@ public:
         source_ = &source;
         bytes_ = (source.columns.last - source.columns.first + 1) * channels * elementBytes<T>;
     }
-    int32_t bytes() const { return bytes_ < kernels::Gather::kLane ? kernels::Gather::kLane : bytes_; }
     const uint8_t* row(int32_t index) const {
         const uint8_t* row = asBytes(source_->at(index, source_->columns.first));
         if (bytes_ >= kernels::Gather::kLane) return row;
@@ -75,6 +95,15 @@ private:
     int32_t bytes_ = 0;
 };
 
+/// Where the columns of a tile come from in the rows of GatherRows.
+template <class T, int channels>
+kernels::Picks columnPicks(const TileSource<T, channels>& source) {
+    const Axis& axis = source.plan.horizontal;
+    const int32_t period = axis.targetReduced;  // of positions exactly where it is a power of two
+    return {source.plan.template table<int32_t>(axis.indexTable) + source.tile.x, source.tile.width,
+            source.columns.first, source.columns.last, (period & (period - 1)) == 0 ? period : 0};
+}
+
 template <class T, int channels>
 class NearestTile {
 public:
@@ -82,14 +111,14 @@ public:
         : source_{plan, tile},
           rows_(buffer),
           rowBytes_(ptrdiff_t{tile.width} * kPixel),
-          tables_(buffer.take<uint8_t>(2 * ((int64_t{tile.width} * kPixel + 31) / 32) * kernels::Gather::kLaneBytes)) {}
+          tables_(buffer.take<uint8_t>(kernels::gatherTableBytes(tile.width, kPixel))) {}
 
     void run(Image<const T> src, Image<T> dst, Sides) {
         source_.open(src, {});
         rows_.open(source_);
-        const kernels::Gather gather = buildTables();
         const Axis& axis = source_.plan.vertical;
         const Tile& tile = source_.tile;
+        const kernels::Gather gather = kernels::buildGather(tables_, columnPicks(source_), kPixel, tile.height);
         const bool rowsApart = dst.step >= rowBytes_ || dst.step <= -rowBytes_;
         for (int32_t y = 0; y < tile.height; ++y) {
             const int32_t index = source_.plan.index(axis, tile.y + y);
@@ -98,30 +127,16 @@ public:
             if (y > 0 && rowsApart && index == source_.plan.index(axis, tile.y + y - 1))
                 repeatRow(to, asBytes(dst.row(y - 1)));
             else
-                kernels::gatherRow(gather, rows_.row(index), asBytes(source_.at(later, source_.columns.first)), to,
-                                   rowBytes_, elementBytes<T>);
+                kernels::gatherRow(gather, rows_.row(index), asBytes(source_.at(later, source_.columns.first)), to);
         }
     }
 
 private:
     static constexpr int kPixel = channels * elementBytes<T>;
 
-    ptrdiff_t groups() const { return (rowBytes_ + 31) / 32; }
-
     void repeatRow(uint8_t* to, const uint8_t* from) const {
         for (ptrdiff_t i = 0; i < rowBytes_; i += 32)
             storeUpTo(to + i, loadUpTo(from + i, rowBytes_ - i), rowBytes_ - i);
-    }
-
-    kernels::Gather buildTables() const {
-        const ResizePlan& plan = source_.plan;
-        auto* offsets = reinterpret_cast<int32_t*>(tables_);
-        for (int32_t x = 0; x < source_.tile.width; ++x) {
-            const int32_t from = (plan.index(plan.horizontal, source_.tile.x + x) - source_.columns.first) * kPixel;
-            for (int b = 0; b < kPixel; ++b) *offsets++ = from + b;
-        }
-        for (ptrdiff_t i = rowBytes_; i < 32 * groups(); ++i, ++offsets) *offsets = offsets[-1];
-        return kernels::buildGather(tables_, groups(), rows_.bytes());
     }
 
     TileSource<T, channels> source_;
@@ -168,89 +183,6 @@ private:
 
     H* rows_[2];
     int32_t indices_[2] = {kNone, kNone};
-};
-
-/// Linear 64f: the fractions are found again from the stored indices, as the plan holds them in single precision only.
-template <int channels>
-class DoubleLinearTile {
-public:
-    DoubleLinearTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer)
-        : source_{plan, tile},
-          elements_(ptrdiff_t{tile.width} * channels),
-          padded_(static_cast<ptrdiff_t>(roundUp(elements_, kLanes))),
-          fractions_(buffer.take<double>(padded_)),
-          places_{buffer.take<int32_t>(padded_), buffer.take<int32_t>(padded_)},
-          pair_(buffer, padded_) {}
-
-    void run(Image<const double> src, Image<double> dst, Sides open) {
-        source_.open(src, open);
-        listElements();
-        const ResizePlan& plan = source_.plan;
-        const Tile& tile = source_.tile;
-        for (int32_t y = 0; y < tile.height; ++y) {
-            const int32_t index = plan.index(plan.vertical, tile.y + y);
-            const int32_t first = source_.rows.clamp(index), second = source_.rows.clamp(index + 1);
-            pair_.provide(first, second, [&](int32_t row, double* out) { filterRow(row, out); });
-            mix(pair_.first(), pair_.second(first == second), fraction(plan.vertical, tile.y + y), dst.row(y));
-        }
-    }
-
-private:
-    static constexpr int kLanes = 4;
-
-    double fraction(const Axis& axis, int32_t position) const {
-        return __builtin_fma(position + 0.5, axis.ratio(), -0.5) - source_.plan.index(axis, position);
-    }
-
-    /// Where each element's neighbours lie in a row, in bytes from its first legal column; those behind the last repeat
-    /// it.
-    void listElements() const {
-        const Range& legal = source_.columns;
-        const Axis& axis = source_.plan.horizontal;
-        ptrdiff_t i = 0;
-        for (int32_t x = 0; x < source_.tile.width; ++x) {
-            const int32_t index = source_.plan.index(axis, source_.tile.x + x);
-            const double f = fraction(axis, source_.tile.x + x);
-            for (int c = 0; c < channels; ++c, ++i) {
-                fractions_[i] = f;
-                for (int k = 0; k < 2; ++k)
-                    places_[k][i] = ((legal.clamp(index + k) - legal.first) * channels + c) * elementBytes<double>;
-            }
-        }
-        for (; i < padded_; ++i) {
-            fractions_[i] = fractions_[i - 1];
-            for (int32_t* places : places_) places[i] = places[i - 1];
-        }
-    }
-
-    void filterRow(int32_t row, double* out) const {
-        const auto* from = asBytes(source_.at(row, source_.columns.first));
-        const auto pick = [from](const int32_t* places) {
-            if constexpr (channels == kLanes) return load(reinterpret_cast<const double*>(from + *places)).v;
-            double p[kLanes];
-            for (double& element : p) __builtin_memcpy(&element, from + *places++, sizeof(double));
-            return _mm256_setr_pd(p[0], p[1], p[2], p[3]);
-        };
-        for (ptrdiff_t i = 0; i < padded_; i += kLanes) {
-            const __m256d f = _mm256_loadu_pd(fractions_ + i), rest = _mm256_sub_pd(_mm256_set1_pd(1), f);
-            const __m256d sum = _mm256_mul_pd(rest, pick(places_[0] + i));
-            _mm256_storeu_pd(out + i, _mm256_fmadd_pd(f, pick(places_[1] + i), sum));
-        }
-    }
-
-    void mix(const double* h0, const double* h1, double fraction, double* dst) const {
-        const __m256d second = _mm256_set1_pd(fraction), first = _mm256_set1_pd(1 - fraction);
-        for (ptrdiff_t i = 0; i < elements_; i += kLanes) {
-            const __m256d sum = _mm256_mul_pd(first, _mm256_loadu_pd(h0 + i));
-            storeUpTo(dst + i, Vec<double>{_mm256_fmadd_pd(second, _mm256_loadu_pd(h1 + i), sum)}, elements_ - i);
-        }
-    }
-
-    TileSource<double, channels> source_;
-    ptrdiff_t elements_, padded_;
-    double* fractions_;
-    int32_t* places_[2];
-    RowPair<double> pair_;
 };
 
 }  // namespace qori::geometry

@@ -43,15 +43,18 @@ public:
         const ResizePlan& plan = source.plan;
         const Tile& tile = source.tile;
         const int32_t begin = source.rows.clamp(plan.firstTap(plan.vertical, tile.y));
-        int32_t started = 0;
+        int32_t started = 0, due = begin;  // no block ends before source row `due`
         for (int32_t y = 0; y < tile.height;) {
             filterNext();
             const int32_t last = begin + ring.filtered - 1;
+            if (last < due) continue;
+            due = INT32_MAX;
             for (int32_t i = y; i < tile.height; ++i) {
                 int32_t& next = next_[i % slots_];
                 if (i == started) next = 0, ++started;
                 const int32_t count = plan.tapsOfRow(tile.y + i);
-                addBlocks(source, ring, i, count, last - begin, next, elements);
+                const int32_t wanted = begin + addBlocks(source, ring, i, count, last - begin, next, elements);
+                if (next < count) due = std::min(due, wanted);
                 if (next == 0) break;  // nor has any later one begun
                 if (next < count) continue;
                 finish(i, totals_ + i % slots_ * step_);
@@ -62,9 +65,10 @@ public:
 
 private:
     /// Adds the blocks from tap `next` on of which all rows are there, up to `last` rows behind the ring's first.
+    /// Returns the row that the next one waits for.
     template <class Source>
-    void addBlocks(const Source& source, const Ring& ring, int32_t y, int32_t count, int32_t last, int32_t& next,
-                   ptrdiff_t elements) {
+    int32_t addBlocks(const Source& source, const Ring& ring, int32_t y, int32_t count, int32_t last, int32_t& next,
+                      ptrdiff_t elements) {
         const ResizePlan& plan = source.plan;
         const int32_t position = source.tile.y + y, tap = plan.firstTap(plan.vertical, position);
         const int32_t begin = source.rows.clamp(plan.firstTap(plan.vertical, source.tile.y));
@@ -73,12 +77,14 @@ private:
         const float* const weights = plan.weights(plan.vertical, position, pair);
         while (next < count) {
             const int32_t rest = count - next, taps = std::min(rest, kernels::kTapsPerBlock);
-            if (place(next + taps - 1) > last) return;
+            const int32_t wanted = place(next + taps - 1);
+            if (wanted > last) return wanted;
             const float* rows[kernels::kTapsPerBlock];
             for (int32_t k = 0; k < taps; ++k) rows[k] = ring.row(place(next + k));
             kernels::addToTotals(rows, weights + next, taps, next == 0, totals_ + y % slots_ * step_, elements);
             next += taps;
         }
+        return last;
     }
 
     int32_t slots_ = 0;

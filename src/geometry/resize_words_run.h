@@ -48,18 +48,12 @@ private:
     void listStrip(int32_t x, int32_t width) {
         const ResizePlan& plan = source_.plan;
         const Axis& axis = plan.horizontal;
-        for (int32_t i = 0; i < width; ++i) {
-            const int32_t position = source_.tile.x + x + i;
-            pixels_[i] = {plan.firstTap(axis, position), plan.weightSet(axis, position) * plan.columnTaps};
-        }
-        const int32_t first = pixels_[0].first, last = pixels_[width - 1].first + plan.columnTaps - 1;
-        const Range& legal = source_.columns;
-        const int32_t from = legal.clamp(first), to = legal.clamp(last);
-        from_ = from;
-        left_ = from - first;
-        right_ = last - to;
-        elements_ = ptrdiff_t{to - from + 1} * channels;
-        kernels::listWords(filter_, pixels_, width, plan.table<float>(axis.weightTable), plan.columnTaps, scale(axis),
+        const int32_t position = source_.tile.x + x;
+        listColumns(plan, position, position, plan.columnTaps, plan.columnPeriod, width, pixels_);
+        const int32_t first = pixels_[0].first;
+        reached_ = Reached(source_.columns, first, pixels_[width - 1].first + plan.columnTaps - 1);
+        kernels::listWords(filter_, pixels_, width,
+                           {plan.table<float>(axis.weightTable), plan.columnTaps, scale(axis), plan.columnPeriod},
                            first);
     }
 
@@ -86,8 +80,9 @@ private:
 
     /// Filters rows 2 * pair and 2 * pair + 1, or those nearest to them.
     void filterPair(int32_t pair) const {
-        const auto row = [&](int32_t i) { return source_.at(source_.rows.clamp(2 * pair + i), from_); };
-        for (int32_t i = 0; i < 2; ++i) kernels::padLine(row(i), elements_, left_, right_, channels, lines_[i]);
+        const auto row = [&](int32_t i) { return source_.at(source_.rows.clamp(2 * pair + i), reached_.from); };
+        for (int32_t i = 0; i < 2; ++i)
+            kernels::padLine(row(i), reached_.columns * channels, reached_.left, reached_.right, channels, lines_[i]);
         kernels::filterWords(filter_, {lines_[0], lines_[1], row(2), row(3)}, ringPair(pair));
     }
 
@@ -108,9 +103,7 @@ private:
     kernels::PixelTaps* pixels_;
     uint8_t* lines_[2];
     int16_t* ring_;
-    // The columns that a strip's taps reach: from which one, elements of legal ones, pixels repeated at the ends.
-    int32_t from_ = 0, left_ = 0, right_ = 0;
-    ptrdiff_t elements_ = 0;
+    Reached reached_{{0, 0}, 0, 0};
 };
 
 }  // namespace qori::geometry

@@ -69,10 +69,11 @@ TYPED_TEST(ResizeWays, ChannelsBecomeWhatTheirPlanesBecome) {
                               {.interpolation = interpCubic, .b = 1.0f / 3, .c = 1.0f / 3},
                               {.interpolation = interpLanczos, .lobes = 2},
                               {.interpolation = interpLanczos, .lobes = 3}};
-    const QorImageSize sizes[][2] = {{{90, 30}, {60, 20}},  {{97, 31}, {61, 23}}, {{40, 12}, {97, 31}},
-                                     {{80, 9}, {20, 9}},    {{7, 6}, {33, 7}},    {{33, 17}, {2, 3}},
-                                     {{64, 8}, {64, 16}},   {{6, 70}, {1, 9}},    {{1400, 7}, {2350, 9}},
-                                     {{5000, 9}, {2811, 6}}};
+    const QorImageSize sizes[][2] = {{{90, 30}, {60, 20}},   {{97, 31}, {61, 23}},  {{40, 12}, {97, 31}},
+                                     {{80, 9}, {20, 9}},     {{7, 6}, {33, 7}},     {{33, 17}, {2, 3}},
+                                     {{64, 8}, {64, 16}},    {{6, 70}, {1, 9}},     {{1400, 7}, {2350, 9}},
+                                     {{5000, 9}, {2811, 6}}, {{960, 6}, {1920, 7}}, {{1920, 6}, {1280, 5}},
+                                     {{2100, 7}, {1200, 3}}};
     for (const Method& m : methods)
         for (const auto& [from, to] : sizes)
             for (int channels : {3, 4}) {
@@ -93,6 +94,66 @@ TYPED_TEST(ResizeWays, ChannelsBecomeWhatTheirPlanesBecome) {
                             ASSERT_EQ(alone.at(x, y, 0), packed.at(x, y, c)) << x << ", " << y << ", channel " << c;
                 }
             }
+}
+
+/// Rows of alike groups of linear 8u, which end where their memory does.
+TEST(Resize, LinearRowsOfSimpleRatiosStayInTheirRows) {
+    constexpr QorImageSize kSizes[][2] = {
+        {{300, 2}, {600, 3}}, {{451, 2}, {902, 3}}, {{450, 3}, {600, 2}}, {{333, 2}, {1332, 4}}, {{903, 3}, {602, 2}}};
+    const Method m{.interpolation = interpLinear};
+    for (const auto& [from, to] : kSizes)
+        for (int channels : {1, 3, 4}) {
+            Pixels<uint8_t> src{from, channels};
+            for (uint8_t& element : src.elements) element = drawPixel<uint8_t>();
+            const Pixels<uint8_t> expected = resized(m, src, to, to.width);
+            const auto bytes = static_cast<int>(src.elements.size());
+            const TestImage guarded = block(kSrc, bytes, 0);
+            std::copy(src.elements.begin(), src.elements.end(), guarded.data<uint8_t>());
+            const QorResizePlan* plan = makePlan<uint8_t>(m, from, to);
+            int32_t size = 0;
+            ASSERT_EQ(QOR_OK, call(qoriResizeGetBufferSize_8u, plan, to, channels, &size));
+            const TestImage buffer = block(kBuffer, size, 0);
+            Pixels<uint8_t> dst{to, channels};
+            ASSERT_EQ(QOR_OK, operate<uint8_t>(Operations<uint8_t>::of(m, channels), guarded.data<uint8_t>(),
+                                               src.step(), dst.elements.data(), dst.step(), {0, 0}, to, borderReplicate,
+                                               plan, buffer.data<uint8_t>()));
+            EXPECT_EQ(expected.elements, dst.elements) << describe({m, from, to}) << ", channels " << channels;
+        }
+}
+
+/// Rows of nearest pixels by tables and without, and tables whose later lanes span more than the first ones do.
+template <class T, class Operation>
+void expectNearest(Operation operation, int channels, int32_t width, int32_t height) {
+    constexpr int32_t kWidth = 3'000;
+    const QorImageSize from{kWidth, 1}, to{width, height};
+    Pixels<T> src{from, channels};
+    for (T& element : src.elements) element = drawPixel<T>();
+    const QorResizePlan* plan = makePlan<T>({.interpolation = interpNearest}, from, to);
+    int32_t bytes = 0;
+    EXPECT_EQ(QOR_OK, call(Exports<T>::getBufferSize, plan, to, channels, &bytes));
+    const TestImage buffer = block(kBuffer, bytes, 0);
+    Pixels<T> dst{to, channels};
+    EXPECT_EQ(QOR_OK, call(operation, src.elements.data(), src.step(), dst.elements.data(), dst.step(),
+                           QorPoint2D{0, 0}, to, plan, buffer.template data<uint8_t>()));
+    for (int y = 0; y < height; ++y)
+        for (int x = 0; x < width; ++x)
+            for (int c = 0; c < channels; ++c)
+                ASSERT_EQ(src.at(static_cast<int>((x + 0.5) * kWidth / width - 1e-10), 0, c), dst.at(x, y, c))
+                    << "width " << width << ", height " << height << ", " << x << ", channel " << c;
+}
+
+TEST(Resize, NearestIsTheSameWithTablesAndWithout) {
+    for (int32_t width = 40; width < 9'000; width += 1 + width / 23)
+        for (int32_t height : {1, 3, 4, 7}) {
+            expectNearest<uint8_t>(qoriResizeNearest_8u_C1R, 1, width, height);
+            expectNearest<uint8_t>(qoriResizeNearest_8u_C3R, 3, width, height);
+            expectNearest<uint8_t>(qoriResizeNearest_8u_C4R, 4, width, height);
+            expectNearest<uint16_t>(qoriResizeNearest_16u_C1R, 1, width, height);
+            expectNearest<uint16_t>(qoriResizeNearest_16u_C3R, 3, width, height);
+            expectNearest<uint16_t>(qoriResizeNearest_16u_C4R, 4, width, height);
+            expectNearest<float>(qoriResizeNearest_32f_C3R, 3, width, height);
+            expectNearest<float>(qoriResizeNearest_32f_C4R, 4, width, height);
+        }
 }
 
 /// Enlarging by 64 meets every odd multiple of 1/128 in both directions, and 64 rows between the same two.

@@ -77,7 +77,7 @@ QORI_INLINE Vec<uint32_t> firstSums(const S* sums, ptrdiff_t columns) {
         for (int v = 0; v < kTurn; ++v)
             if (const ptrdiff_t at = i + 8 * v, count = elements - at < 8 ? elements - at : 8; count > 0)
                 turn[v] = turn[v] + selectOrZero(firstLanes<uint32_t>(count), loadAs<uint32_t>(sums + at, count));
-    alignas(32) uint32_t lanes[8 * kTurn], total[8] = {};
+    alignas(kVectorBytes) uint32_t lanes[8 * kTurn], total[8] = {};
     for (int v = 0; v < kTurn; ++v) store(lanes + 8 * v, turn[v]);
     for (int i = 0; i < 8 * kTurn; ++i) total[i % channels] += lanes[i];
     for (int i = channels; i < 8; ++i) total[i] = total[i - channels];

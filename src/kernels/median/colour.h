@@ -44,7 +44,7 @@ using Wide = typename detail::WideOf<T>::type;
 template <class T>
 struct ColourRow {
     static constexpr int pixels = 64, room = pixels + 4 + Vec<Wide<T>>::lanes;
-    alignas(32) Wide<T> plane[3][room];
+    alignas(kVectorBytes) Wide<T> plane[3][room];
 
     void read(const T* p, ptrdiff_t count, int channels) {
         for (ptrdiff_t i = 0; i < count; ++i)

@@ -26,7 +26,7 @@ struct SmallBins {
     /// up to the bin before.
     QORI_INLINE int find(int32_t below, int32_t* before) const {
         const __m256i more = _mm256_cmpgt_epi16(v, _mm256_set1_epi16(static_cast<int16_t>(below)));
-        alignas(32) uint16_t counts[32];
+        alignas(kVectorBytes) uint16_t counts[32];
         _mm256_store_si256(reinterpret_cast<__m256i*>(counts), _mm256_setzero_si256());
         _mm256_storeu_si256(reinterpret_cast<__m256i*>(counts + 1), v);
         const int bin = __builtin_ctz(static_cast<unsigned>(_mm256_movemask_epi8(more))) / 2;

@@ -61,11 +61,91 @@ QORI_NOINLINE void linearRowAlike(const Gather& gather, LinearRow row, const int
 
 QORI_NOINLINE void linearRowByElements(const Gather& gather, const uint8_t* row, const int16_t* weights, bool coarse,
                                        int16_t* out) {
-    for (ptrdiff_t i = 0; i < 16 * gather.groups; ++i) {
-        const int p0 = row[gather.offsets[2 * i]], p1 = row[gather.offsets[2 * i + 1]];
-        const int w = coarse ? (weights[i] >> 8) * 128 : -weights[i] >> 1;
-        out[i] = static_cast<int16_t>((p0 << 6) + (((p1 - p0) * w + 128) >> 8));
+    const Picks& picks = gather.picks;
+    const int channels = gather.pixelBytes;
+    ptrdiff_t i = 0;
+    for (int32_t x = 0; x < picks.count; ++x) {
+        const int32_t index = picks.indices[x];
+        const uint8_t* const first = row + ptrdiff_t{picks.clamp(index) - picks.first} * channels;
+        const uint8_t* const second = row + ptrdiff_t{picks.clamp(index + 1) - picks.first} * channels;
+        for (int c = 0; c < channels; ++c, ++i) {
+            const ptrdiff_t at = linearOrder(i);
+            const int p0 = first[c], p1 = second[c];
+            const int w = coarse ? (weights[at] >> 8) * 128 : -weights[at] >> 1;
+            out[at] = static_cast<int16_t>((p0 << 6) + (((p1 - p0) * w + 128) >> 8));
+        }
     }
+}
+
+/// Of which pixel eight elements are, as shuffles of words: eight of three channels begin in three ways.
+template <int channels>
+struct WeightOrder {
+    alignas(16) uint8_t of[3][16];
+
+    constexpr WeightOrder() : of{} {
+        for (int k = 0; k < 3; ++k)
+            for (int i = 0; i < 16; ++i) {
+                const int pixel = (8 * k % channels + i / 2) / channels;
+                of[k][i] = static_cast<uint8_t>(2 * pixel + i % 2);
+            }
+    }
+};
+template <int channels>
+constexpr WeightOrder<channels> kWeightOrder{};
+
+/// Lists blocks of 32 weights.
+template <int channels>
+QORI_NOINLINE void listWeightsOf(const int32_t* pairs, int32_t count, int16_t* weights, ptrdiff_t begin,
+                                 ptrdiff_t end) {
+    constexpr int kPhases = channels == 3 ? 3 : 1;
+    int32_t copy[8], pixel = static_cast<int32_t>(begin * 32 / channels);  // 0, or of whole pixels
+    int phase = 0;
+    for (ptrdiff_t lane = 4 * begin; lane < 4 * end; ++lane) {
+        const int32_t* const from = readable(pairs, count, pixel + 8 * phase / channels, 8, copy);
+        const __m256i w = _mm256_srai_epi32(_mm256_loadu_si256(reinterpret_cast<const __m256i*>(from)), 16);
+        const __m256i packed = _mm256_permute4x64_epi64(_mm256_packs_epi32(w, w), 0xD8);
+        __m128i words = _mm_slli_epi16(_mm_sub_epi16(_mm_setzero_si128(), _mm256_castsi256_si128(packed)), 1);
+        if constexpr (channels > 1) {
+            const auto* order = reinterpret_cast<const __m128i*>(kWeightOrder<channels>.of[phase]);
+            words = _mm_shuffle_epi8(words, _mm_load_si128(order));
+        }
+        _mm_storeu_si128(reinterpret_cast<__m128i*>(weights + linearOrder(8 * lane)), words);
+        if (++phase == kPhases) phase = 0, pixel += 8 * kPhases / channels;
+    }
+}
+
+void listWeights(const Gather& gather, const int32_t* pairs, int16_t* weights, ptrdiff_t begin, ptrdiff_t end) {
+    const int32_t count = gather.picks.count;
+    switch (gather.pixelBytes) {
+        case 1: return listWeightsOf<1>(pairs, count, weights, begin, end);
+        case 3: return listWeightsOf<3>(pairs, count, weights, begin, end);
+        default: return listWeightsOf<4>(pairs, count, weights, begin, end);
+    }
+}
+
+bool isCoarse(const int16_t* weights, ptrdiff_t begin, ptrdiff_t end) {
+    const __m256i zero = _mm256_setzero_si256(), fine = _mm256_set1_epi16(255);
+    __m256i refused = zero;
+    for (ptrdiff_t i = 32 * begin; i < 32 * end; i += 16) {
+        const __m256i w = load(weights + i).v;
+        refused = _mm256_or_si256(refused, _mm256_or_si256(_mm256_and_si256(w, fine), _mm256_cmpeq_epi16(w, zero)));
+    }
+    return _mm256_testz_si256(refused, refused);
+}
+
+/// -256 v becomes 128 - v in the low byte and v in the high one.
+void makeCoarse(int16_t* weights, ptrdiff_t begin, ptrdiff_t end) {
+    for (ptrdiff_t i = 32 * begin; i < 32 * end; i += 16) {
+        const __m256i high = _mm256_sub_epi16(_mm256_setzero_si256(), load(weights + i).v);
+        const __m256i low = _mm256_sub_epi16(_mm256_set1_epi16(128), _mm256_srli_epi16(high, 8));
+        store(weights + i, Vec<int16_t>{_mm256_or_si256(high, low)});
+    }
+}
+
+void compareWeights(Gather& gather, const int16_t* weights) {
+    ptrdiff_t g = 4;
+    while (g < gather.alikeEnd && isSame(weights + 16 * g, weights + 16 * g - 32)) ++g;
+    if (g < gather.alikeEnd) gather.alikeEnd = g;
 }
 
 template <bool coarse>
@@ -116,21 +196,20 @@ QORI_NOINLINE void mixRows(const int16_t* h0, const int16_t* h1, __m256i factor,
 
 }  // namespace
 
-bool makeCoarse(int16_t* weights, ptrdiff_t count) {
-    const __m256i zero = _mm256_setzero_si256(), fine = _mm256_set1_epi16(255);
-    __m256i refused = zero;
-    for (ptrdiff_t i = 0; i < count; i += 16) {
-        const __m256i w = load(weights + i).v;
-        refused = _mm256_or_si256(refused, _mm256_or_si256(_mm256_and_si256(w, fine), _mm256_cmpeq_epi16(w, zero)));
+bool listLinearWeights(Gather& gather, const int32_t* pairs, int16_t* weights) {
+    // Blocks of 32 are listed in two stretches, of which the first is all but for periodic groups.
+    const ptrdiff_t all = gather.groups / 2;
+    const ptrdiff_t firstEnd = gather.isPeriodic ? Gather::kListed / 2 : all;
+    const ptrdiff_t secondBegin = gather.isPeriodic ? gather.alikeEnd / 2 : all;
+    listWeights(gather, pairs, weights, 0, firstEnd);
+    listWeights(gather, pairs, weights, secondBegin, all);
+    if (!gather.isPeriodic) compareWeights(gather, weights);
+    const bool coarse = isCoarse(weights, 0, firstEnd) && isCoarse(weights, secondBegin, all);
+    if (coarse) {
+        makeCoarse(weights, 0, firstEnd);
+        makeCoarse(weights, secondBegin, all);
     }
-    if (!_mm256_testz_si256(refused, refused)) return false;
-    for (ptrdiff_t i = 0; i < count; i += 16) {
-        // -256 v becomes 128 - v in the low byte and v in the high one.
-        const __m256i high = _mm256_sub_epi16(zero, load(weights + i).v);
-        const __m256i low = _mm256_sub_epi16(_mm256_set1_epi16(128), _mm256_srli_epi16(high, 8));
-        store(weights + i, Vec<int16_t>{_mm256_or_si256(high, low)});
-    }
-    return true;
+    return coarse;
 }
 
 void linearRow8u(const Gather& gather, LinearRow row, const int16_t* weights, bool coarse, int16_t* out) {

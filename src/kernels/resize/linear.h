@@ -11,12 +11,13 @@ struct LinearRow {
 };
 
 /// The horizontal pass. A group is 16 pairs of neighbours (p0, p1); `weights` holds -2w per pair, w in 0..16384, or
-/// what makeCoarse() made of it. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.
+/// coarse ones. out = (p0 * (16384 - w) + p1 * w + 128) >> 8, at most 16320.
 void linearRow8u(const Gather& gather, LinearRow row, const int16_t* weights, bool coarse, int16_t* out);
 
-/// Turns `count` weights, a multiple of 16, into pairs of signed bytes that count 1/128, if all are such; tells
-/// whether.
-bool makeCoarse(int16_t* weights, ptrdiff_t count);
+/// Lists the weights for it, in linearOrder() and up to a multiple of 32: pairs (16384 - w, w), one for each pixel,
+/// become -2w for each element or, if all such are short, pairs of signed bytes that count 1/128. Tells whether they
+/// are, and leaves alike only those groups that have the weights of the group two before them, too.
+bool listLinearWeights(Gather& gather, const int32_t* pairs, int16_t* weights);
 
 /// The vertical pass: dst = (h0 * (16384 - w) + h1 * w + 0x80000) >> 20. Rows are in the order of linearOrder() and
 /// hold whole blocks of 32 elements.

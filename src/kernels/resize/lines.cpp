@@ -2,6 +2,7 @@
 #include "lines.h"
 
 #include "floats.h"
+#include "octets.h"
 
 namespace qori::kernels {
 namespace {
@@ -67,15 +68,39 @@ bool repeats(const LineFilter& filter, ptrdiff_t g, ptrdiff_t cycle) {
     return same;
 }
 
-/// Finds the cycle and which windows serve.
-void inspect(LineFilter& filter) {
-    const ptrdiff_t cycle = filter.channels == 3 ? 3 : 1;  // eight pixels for three channels
+/// Groups after which elements stand at the same channel: eight pixels for three channels.
+constexpr ptrdiff_t lineCycle(int channels) { return channels == 3 ? 3 : 1; }
+
+void findCycle(LineFilter& filter) {
+    const ptrdiff_t cycle = lineCycle(filter.channels);
     filter.cycle = filter.groups > cycle ? cycle : 0;
     for (ptrdiff_t g = cycle; g + 1 < filter.groups && filter.cycle > 0; ++g)
         if (!repeats(filter, g, cycle)) filter.cycle = 0;
-    bool one = true;
-    for (ptrdiff_t i = 0; i < 8 * filter.groups; ++i) one = one && filter.order[i] < 8;
-    filter.windows = one ? Windows::one : Windows::two;
+}
+
+/// Lists groups `begin` to before `end`, and those that are made together with them. Returns which windows serve.
+template <int channels>
+QORI_NOINLINE Windows listLineOf(const LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights,
+                                 int32_t origin, ptrdiff_t begin, ptrdiff_t end) {
+    const int32_t taps = filter.taps;
+    __m256i beyond = _mm256_setzero_si256();
+    for (ptrdiff_t group = begin / channels * channels; group < end; group += channels) {
+        const EightPixels eight(pixels, width, static_cast<int32_t>(group / channels) * 8, weights);
+        const int octets = static_cast<int>(std::min<ptrdiff_t>(channels, filter.groups - group));
+        for (int j = 0; j < octets; ++j) {
+            const __m256i places = octetPlaces<channels>(eight.first, origin, j), base = leastOfAll(places);
+            filter.bases[group + j] = _mm256_cvtsi256_si32(base);
+            const __m256i order = _mm256_sub_epi32(places, base);
+            store(filter.order + 8 * (group + j), Vec<int32_t>{order});
+            beyond = _mm256_or_si256(beyond, _mm256_srli_epi32(order, 3));
+        }
+        forTaps(eight.weights, taps, [&](int32_t k, __m256 w) {
+            for (int j = 0; j < octets; ++j)
+                store(filter.weights + 8 * ((group + j) * taps + k),
+                      fromInteger<float>(spreadToOctet<channels>(toInteger(w), j)));
+        });
+    }
+    return _mm256_testz_si256(beyond, beyond) ? Windows::one : Windows::two;
 }
 
 template <int channels>
@@ -86,25 +111,23 @@ void repeatFloats(const float* pixel, float* out, int32_t count) {
 
 }  // namespace
 
-void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t origin) {
-    const ptrdiff_t elements = ptrdiff_t{width} * filter.channels;
-    filter.groups = (elements + 7) / 8;
-    int32_t pixel = 0, channel = 0;
-    for (ptrdiff_t g = 0; g < filter.groups; ++g) {
-        int32_t places[8], base = INT32_MAX;
-        for (int i = 0; i < 8; ++i) {
-            const float* from = weights + pixels[pixel].weights;
-            for (int32_t k = 0; k < filter.taps; ++k) filter.weights[(g * filter.taps + k) * 8 + i] = from[k];
-            places[i] = (pixels[pixel].first - origin) * filter.channels + channel;
-            base = places[i] < base ? places[i] : base;
-            if (8 * g + i + 1 >= elements) continue;
-            channel = channel + 1 < filter.channels ? channel + 1 : 0;
-            pixel += channel == 0;
-        }
-        filter.bases[g] = base;
-        for (int i = 0; i < 8; ++i) filter.order[8 * g + i] = places[i] - base;
+void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t period,
+              int32_t origin) {
+    filter.groups = (ptrdiff_t{width} * filter.channels + 7) / 8;
+    const auto list = filter.channels == 1 ? listLineOf<1> : filter.channels == 3 ? listLineOf<3> : listLineOf<4>;
+    const ptrdiff_t cycle = lineCycle(filter.channels), last = filter.groups - 1;
+    const int32_t cyclePixels = static_cast<int32_t>(8 * cycle / filter.channels);
+    if (period > 0 && cyclePixels % period == 0 && last > 2 * cycle) {
+        const Windows first = list(filter, pixels, width, weights, origin, 0, 2 * cycle);
+        const Windows second = list(filter, pixels, width, weights, origin, last, filter.groups);
+        filter.windows = first == Windows::two ? first : second;
+        filter.cycle = cycle;
+        const int32_t step = filter.bases[cycle] - filter.bases[0];
+        for (ptrdiff_t g = 2 * cycle; g < last; ++g) filter.bases[g] = filter.bases[g - cycle] + step;
+        return;
     }
-    inspect(filter);
+    filter.windows = list(filter, pixels, width, weights, origin, 0, filter.groups);
+    findCycle(filter);
 }
 
 void filterLine(const LineFilter& filter, const float* line, const uint8_t* later, int bytes, float* out) {

@@ -33,8 +33,10 @@ struct LineFilter {
 };
 
 /// Fills the filter's tables for `width` pixels; the line begins at source column `origin`. Results behind the last
-/// repeat it.
-void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t origin);
+/// repeat it. Every `period` pixels weights repeat and columns go on by one step, unless it is 0; of tables that repeat
+/// only the first and the last are made.
+void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t period,
+              int32_t origin);
 
 /// `later` is the memory of a row that will be needed soon, with `bytes` per float of the line; it is asked for, not
 /// read.

@@ -1,9 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 // Sums of taps, in one order everywhere. Up to eight taps: w[0] * p[0], then one fused multiply-add per tap in
 // ascending order. Up to twelve: the lower half like that, then the upper half from its far end on, so that the tap of
-// the greatest weight, at the centre, comes last and what is rounded before is small. More: blocks of eight taps, each
-// the sum of two such chains of four, are added up in double precision. Constants come out within 4 units in the last
-// place then, both directions taken together, however many taps there are.
+// the greatest weight, at the centre, comes last and what is rounded before is small. Up to 24, and from nine on where
+// super-sampling weighs all taps alike: fours from both ends towards the centre, added up in turn. More: blocks of
+// eight taps, each the sum of two ascending fours, are added up in double precision. Constants come out within 4 units
+// in the last place then, both directions taken together, however many taps there are.
 #pragma once
 #include <algorithm>
 
@@ -14,7 +15,7 @@ namespace qori::kernels {
 /// So many vectors of two results at a time, as the registers allow.
 inline constexpr int kPairVectors = sizeof(void*) == 4 ? 2 : 4;
 
-inline constexpr int32_t kAscendingTaps = 8, kChainTaps = 12, kTapsPerBlock = 8;
+inline constexpr int32_t kAscendingTaps = 8, kPairedTaps = 12, kChainTaps = 24, kTapsPerBlock = 8;
 
 /// So many taps of a chain are summed in ascending order, the others in descending order behind them.
 constexpr int32_t ascending(int32_t count) { return count > kAscendingTaps ? count / 2 : count; }
@@ -55,9 +56,34 @@ QORI_INLINE void sumAscending(const Weight* w, int32_t count, At at, __m256* sum
     for (int32_t k = 1; k < count; ++k) addTap<vectors>(at(k), w + k, sum);
 }
 
-/// Sums up a chain of `count` taps. at(k) tells where the vectors of tap k lie.
+/// More than kAscendingTaps.
 template <int vectors, class Weight, class At>
-QORI_INLINE void sumChain(const Weight* w, int32_t count, At at, __m256* sum) {
+QORI_INLINE void sumFours(const Weight* w, int32_t count, At at, __m256* sum) {
+    constexpr int32_t kFour = 4;
+    const int32_t lower = count / 2, upper = count - lower;
+    sumAscending<vectors>(w, kFour, at, sum);
+    const auto add = [&](int32_t begin, int32_t taps, int32_t step) {
+        __m256 four[vectors];
+        beginSum<vectors>(at(begin), w + begin, four);
+        const auto addNext = [&](int32_t k) { addTap<vectors>(at(begin + k * step), w + begin + k * step, four); };
+        if (taps == kFour) {
+            for (int32_t k = 1; k < kFour; ++k) addNext(k);
+        } else {
+            for (int32_t k = 1; k < taps; ++k) addNext(k);
+        }
+        for (int v = 0; v < vectors; ++v) sum[v] = _mm256_add_ps(sum[v], four[v]);
+    };
+    for (int32_t from = 0; from < upper; from += kFour) {
+        if (0 < from && from < lower) add(from, std::min(lower - from, kFour), 1);
+        add(count - 1 - from, std::min(upper - from, kFour), -1);
+    }
+}
+
+/// Sums up a chain of `count` taps, of which `oneByOne` at most are not summed by fours. at(k) tells where the vectors
+/// of tap k lie.
+template <int vectors, class Weight, class At>
+QORI_INLINE void sumChain(const Weight* w, int32_t count, At at, __m256* sum, int32_t oneByOne = kPairedTaps) {
+    if (count > oneByOne) return sumFours<vectors>(w, count, at, sum);
     const int32_t upTo = ascending(count);
     sumAscending<vectors>(w, upTo, at, sum);
 #pragma GCC unroll 12

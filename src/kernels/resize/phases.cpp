@@ -81,7 +81,7 @@ struct Later {
     }
 };
 
-enum class Order { ascending, chain, any };
+enum class Order { ascending, chain, fours, any };
 
 template <Order order>
 QORI_NOINLINE void filterOne(const PhaseFilter& filter, const float* line, Later later, ptrdiff_t results, float* out) {
@@ -95,8 +95,11 @@ QORI_NOINLINE void filterOne(const PhaseFilter& filter, const float* line, Later
             sumAscending<n>(taps.first, taps.count, at, sum);
         else if constexpr (order == Order::chain)
             sumChain<n>(taps.first, taps.count, at, sum);
-        else
+        else if constexpr (order == Order::any)
             sumOne<n>(taps.first, taps.count, at, sum);
+        for (int v = 0; v < n && order == Order::fours; v += kPairVectors)
+            sumFours<kPairVectors>(
+                taps.first, taps.count, [&](int32_t k) { return at(k) + 8 * v; }, sum + v);
         for (int v = 0; v < n; ++v) _mm256_storeu_ps(out + i + 8 * v, sum[v]);
     }
 }
@@ -174,7 +177,8 @@ void filterPhases(const PhaseFilter& filter, const float* line, const uint8_t* l
                 filterBoth<Fixed>(filter, line, ahead, results, out);
         });
     const auto filterBy = filter.taps.count <= kAscendingTaps ? filterOne<Order::ascending>
-                          : filter.taps.count <= kChainTaps   ? filterOne<Order::chain>
+                          : filter.taps.count <= kPairedTaps  ? filterOne<Order::chain>
+                          : filter.taps.count <= kChainTaps   ? filterOne<Order::fours>
                                                               : filterOne<Order::any>;
     filterBy(filter, line, ahead, results, out);
 }

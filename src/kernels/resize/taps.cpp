@@ -2,30 +2,10 @@
 #include "taps.h"
 
 #include "floats.h"
+#include "turn.h"
 
 namespace qori::kernels {
 namespace {
-
-/// Within each half, rows become columns: v[j] holds element j of all four in its low half, element 4 + j in its high.
-QORI_INLINE void turnQuads(__m256 v[4]) {
-    const __m256 a = _mm256_unpacklo_ps(v[0], v[1]), b = _mm256_unpackhi_ps(v[0], v[1]);
-    const __m256 c = _mm256_unpacklo_ps(v[2], v[3]), d = _mm256_unpackhi_ps(v[2], v[3]);
-    v[0] = _mm256_shuffle_ps(a, c, 0x44);
-    v[1] = _mm256_shuffle_ps(a, c, 0xEE);
-    v[2] = _mm256_shuffle_ps(b, d, 0x44);
-    v[3] = _mm256_shuffle_ps(b, d, 0xEE);
-}
-
-/// Turns four elements of eight rows, given as four vectors of a row each half, into vectors of a column each.
-QORI_INLINE void turnFloats(const float* const rows[kTapRows], ptrdiff_t at, float* out) {
-    __m256 v[4];
-    for (int j = 0; j < 4; ++j) {
-        const __m256 upper = _mm256_castps128_ps256(_mm_loadu_ps(rows[j] + at));
-        v[j] = _mm256_insertf128_ps(upper, _mm_loadu_ps(rows[4 + j] + at), 1);
-    }
-    turnQuads(v);
-    for (int j = 0; j < 4; ++j) _mm256_storeu_ps(out + 8 * j, v[j]);
-}
 
 /// Turns n (1 to 8) elements of eight rows into as many vectors; the vectors behind them are written too.
 template <class T>
@@ -101,10 +81,11 @@ QORI_INLINE void turnColumns(const RowFilter& filter, const T* const rows[kTapRo
 
 /// One pixel of eight rows. `taps` 0 is any number that a chain holds.
 template <int channels, int taps>
-QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t count, float* out) {
+QORI_INLINE void sumTaps(const float* column, const float* weights, int32_t count, int32_t oneByOne, float* out) {
     __m256 sum[channels];
     sumChain<channels>(
-        weights, taps > 0 ? taps : count, [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); }, sum);
+        weights, taps > 0 ? taps : count, [=](int32_t k) { return column + ptrdiff_t{k} * (8 * channels); }, sum,
+        taps > 0 ? kPairedTaps : oneByOne);
     for (int c = 0; c < channels; ++c) _mm256_storeu_ps(out + 8 * c, sum[c]);
 }
 
@@ -126,6 +107,8 @@ QORI_INLINE void sumPhase(const RowFilter& filter, const PixelTaps* pixels, int3
     }
 }
 
+bool isOfSuper(const RowFilter& filter) { return filter.scale != 1; }
+
 /// The taps of a pixel, of which the last may be none.
 QORI_INLINE int32_t tapsOf(const RowFilter& filter, const float* weights) {
     return filter.taps - (filter.isPadded && weights[filter.taps - 1] == 0);
@@ -143,11 +126,11 @@ QORI_NOINLINE void sumPhases(const RowFilter& filter, const PixelTaps* pixels, i
 
 /// Pixels whose last tap may be none, of up to kAscendingTaps: there is no branch on it, but nothing is added then, not
 /// even to the sign of a zero.
-template <int channels>
+template <int channels, int taps>
 QORI_NOINLINE void sumPaddedGroup(const RowFilter& filter, const PixelTaps* pixels, int32_t count, float* out) {
     alignas(kVectorBytes) float nothing[8 * channels];
     for (float& element : nothing) element = -0.0f;
-    const int32_t last = filter.taps - 1;
+    const int32_t last = (taps > 0 ? taps : filter.taps) - 1;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
         const float* const weights = filter.weights + pixels[i].weights;
         const float* const column = filter.columns + ptrdiff_t{pixels[i].first - pixels[0].first} * (8 * channels);
@@ -164,15 +147,15 @@ QORI_NOINLINE void sumGroup(const RowFilter& filter, const PixelTaps* pixels, in
     if constexpr (taps > 0) {
         if (filter.period > 0 && 2 * filter.period <= count)
             return sumPhases<channels, taps>(filter, pixels, count, out);
-        if (filter.isPadded) return sumGroup<channels, 0>(filter, pixels, count, out);
+        if (filter.isPadded) return sumPaddedGroup<channels, taps>(filter, pixels, count, out);
     } else if (filter.isPadded && filter.taps <= kAscendingTaps) {
-        return sumPaddedGroup<channels>(filter, pixels, count, out);
+        return sumPaddedGroup<channels, 0>(filter, pixels, count, out);
     }
-    const int32_t origin = pixels[0].first;
+    const int32_t origin = pixels[0].first, oneByOne = isOfSuper(filter) ? kAscendingTaps : kPairedTaps;
     for (int32_t i = 0; i < count; ++i, out += 8 * channels) {
         const float* const weights = filter.weights + pixels[i].weights;
         sumTaps<channels, taps>(filter.columns + ptrdiff_t{pixels[i].first - origin} * (8 * channels), weights,
-                                tapsOf(filter, weights), out);
+                                tapsOf(filter, weights), oneByOne, out);
     }
 }
 
@@ -215,10 +198,12 @@ QORI_NOINLINE void sumPieces(const RowFilter& filter, const T* const rows[kTapRo
 }
 
 template <int channels>
-auto chooseSum(int32_t taps) {
-    if (taps > kChainTaps) return sumLongGroup<channels>;
-    switch (taps) {
+auto chooseSum(const RowFilter& filter) {
+    if (filter.taps > kChainTaps) return sumLongGroup<channels>;
+    if (filter.taps > kAscendingTaps && isOfSuper(filter)) return sumGroup<channels, 0>;
+    switch (filter.taps) {
         case 2: return sumGroup<channels, 2>;
+        case 3: return sumGroup<channels, 3>;
         case 4: return sumGroup<channels, 4>;
         case 6: return sumGroup<channels, 6>;
         case 8: return sumGroup<channels, 8>;
@@ -232,6 +217,20 @@ auto chooseSum(int32_t taps) {
 constexpr int32_t kMostColumns = 128;
 
 }  // namespace
+
+void pairFractions(const float* fractions, int32_t count, float* pairs) {
+    int32_t i = 0;
+    for (; i + 8 <= count; i += 8) {
+        const __m256 second = _mm256_loadu_ps(fractions + i), first = _mm256_sub_ps(_mm256_set1_ps(1), second);
+        const __m256 low = _mm256_unpacklo_ps(first, second), high = _mm256_unpackhi_ps(first, second);
+        _mm256_storeu_ps(pairs + 2 * i, _mm256_permute2f128_ps(low, high, 0x20));
+        _mm256_storeu_ps(pairs + 2 * i + 8, _mm256_permute2f128_ps(low, high, 0x31));
+    }
+    for (; i < count; ++i) {
+        pairs[2 * i] = 1 - fractions[i];
+        pairs[2 * i + 1] = fractions[i];
+    }
+}
 
 int32_t tapGroup(double ratio, int32_t taps) {
     if (ratio > 2.0 * taps) return 1;
@@ -248,7 +247,7 @@ int64_t tapColumnFloats(double ratio, int32_t taps, int channels) {
 
 template <class T, int channels>
 void filterRows(const RowFilter& filter, const T* const rows[kTapRows], float* const out[kTapRows]) {
-    const auto sum = chooseSum<channels>(filter.taps);
+    const auto sum = chooseSum<channels>(filter);
     const bool inPieces = filter.group == 1 && filter.taps > kPieceColumns;
     constexpr ptrdiff_t pixel = 8 * channels;
     for (int32_t x = 0; x < filter.width; x += kTapChunk) {

@@ -19,6 +19,9 @@ struct PixelTaps {
     int32_t weights;  ///< Where its weights begin.
 };
 
+/// Weights of two taps: pairs of 1 - f and f.
+void pairFractions(const float* fractions, int32_t count, float* pairs);
+
 struct RowFilter {
     const PixelTaps* pixels;
     const float* weights;
@@ -28,7 +31,7 @@ struct RowFilter {
     int32_t group;                  ///< Destination pixels, at most kTapChunk, whose columns are turned together.
     int32_t period;                 ///< Pixels after which the weights repeat, or 0.
     bool isPadded;                  ///< A last weight of 0 stands for no tap: there may be no such pixel.
-    double scale;                   ///< Factor of the results that have more taps than a chain.
+    double scale;                   ///< Other than 1 for super-sampling: of results of more taps than a chain has.
     float* columns;                 ///< Room for the turned columns of a group: tapColumnFloats().
     float* results;                 ///< kTapChunk pixels of eight rows.
 };

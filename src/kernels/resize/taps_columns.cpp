@@ -6,7 +6,11 @@
 namespace qori::kernels {
 namespace {
 
-enum class Finish { plain, scaled, limited };
+enum class Finish {
+    plain,
+    scaled,  ///< Of super-sampling.
+    limited
+};
 
 /// Rounds to nearest. What 32 bits do not hold becomes the least integer, which is right below them only; where sums
 /// may be so large, those above are cut where they saturate anyway.
@@ -52,7 +56,8 @@ QORI_NOINLINE void sumColumn(const float* const* rows, const PairedTaps& given, 
         __m256 sums[4];
         for (int j = 0; j < 4; j += kPairVectors)
             sumChain<kPairVectors>(
-                taps.first, taps.count, [&](int32_t k) { return rows[k] + i + 8 * j; }, sums + j);
+                taps.first, taps.count, [&](int32_t k) { return rows[k] + i + 8 * j; }, sums + j,
+                finish == Finish::scaled ? kAscendingTaps : kPairedTaps);
         finishSums<finish>(dst + i, sums, scale, elements - i);
     }
 }

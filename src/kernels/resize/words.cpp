@@ -2,11 +2,14 @@
 #include "words.h"
 
 #include "floats.h"
+#include "octets.h"
 
 namespace qori::kernels {
 namespace {
 
 constexpr int kOne = 1 << 14, kDropped = 7;  // of a row's sum, between the passes
+
+constexpr int32_t kFixedTaps = 12;  // up to so many the compiler knows their number
 
 /// Groups after which elements stand at the same channel: sixteen pixels for three channels.
 constexpr int wordCycle(int channels) { return channels == 3 ? 3 : 1; }
@@ -73,8 +76,7 @@ QORI_NOINLINE void filterWordsOf(const WordFilter& filter, WordLines lines, int1
     const auto* weights = reinterpret_cast<const __m256i*>(filter.weights);
     ptrdiff_t g = 0;
     if constexpr (taps > 0)
-        if (filter.repeats && filter.groups > 2 * wordCycle(channels))
-            g = filterCycles<channels, taps, shared>(filter, lines, out);
+        if (filter.repeats) g = filterCycles<channels, taps, shared>(filter, lines, out);
     for (; g < filter.groups; ++g) {
         const WordGroup& group = filter.list[g];
         filterGroup<channels, taps, shared>(filter, lines, group, weights + g * filter.taps, group.bases, out + 32 * g);
@@ -132,6 +134,9 @@ QORI_NOINLINE void sumWordColumn(const int16_t* const* from, const int16_t* give
     }
 }
 
+/// Whether the kernels make use of cycles.
+bool usesCycles(const WordFilter& filter) { return filter.taps <= kFixedTaps && filter.groups > 2 * filter.cycle; }
+
 /// Whether a group's masks and weights are those of a cycle before, and its bases a step on.
 bool goesOn(const WordFilter& filter, ptrdiff_t g) {
     const WordGroup *group = filter.list + g, *before = group - filter.cycle;
@@ -146,32 +151,51 @@ bool goesOn(const WordFilter& filter, ptrdiff_t g) {
     return same;
 }
 
-struct Places {
-    int32_t first, last;
-};
-
-Places placesOf(const int32_t* at, int count) {
-    Places places{at[0], at[0]};
-    for (int i = 1; i < count; ++i) {
-        places.first = at[i] < places.first ? at[i] : places.first;
-        places.last = at[i] > places.last ? at[i] : places.last;
+/// Rounds the weights of eight pixels as roundWeights() does those of one. rounded[k] are those of tap k.
+QORI_INLINE void roundEight(const float* const weights[8], int32_t taps, float scale, __m256i* rounded) {
+    const __m256 factor = _mm256_set1_ps(scale), one = _mm256_set1_ps(kOne);
+    __m256i rest = _mm256_set1_epi32(kOne), most = _mm256_set1_epi32(INT32_MIN);
+    forTaps(weights, taps, [&](int32_t k, __m256 w) {
+        rounded[k] = _mm256_cvtps_epi32(_mm256_mul_ps(_mm256_mul_ps(w, factor), one));
+        rest = _mm256_sub_epi32(rest, rounded[k]);
+        most = _mm256_max_epi32(most, rounded[k]);
+    });
+    for (int32_t k = 0; k < taps; ++k) {  // the first of the largest takes all of it
+        const __m256i taken = _mm256_and_si256(_mm256_cmpeq_epi32(rounded[k], most), rest);
+        rounded[k] = _mm256_add_epi32(rounded[k], taken);
+        rest = _mm256_sub_epi32(rest, taken);
     }
-    return places;
 }
 
-/// The masks and bases of a group from where the sixteen elements' first taps lie.
-void listQuads(WordGroup& group, const int32_t* places, int channels, bool shared) {
-    for (int quad = 0; quad < 4; ++quad) {
-        const int octet = quad / 2;
-        const int32_t* at = places + 4 * quad;
-        const int32_t base = shared ? placesOf(places + 8 * octet, 8).first : placesOf(at, 4).first;
-        group.bases[octet][quad & 1] = base;
-        uint8_t* mask = group.masks[octet] + 16 * (quad & 1);
-        constexpr uint8_t kZero = 0x80;
-        for (int i = 0; i < 4; ++i) {
-            mask[4 * i] = static_cast<uint8_t>(at[i] - base);
-            mask[4 * i + 2] = static_cast<uint8_t>(at[i] - base + channels);
-            mask[4 * i + 1] = mask[4 * i + 3] = kZero;
+/// The masks and bases of octet `octet` from where its elements' first taps lie.
+QORI_INLINE void listOctet(WordGroup& group, int octet, __m256i places, int channels, bool shared) {
+    const __m256i base = shared ? leastOfAll(places) : leastOfQuads(places), at = _mm256_sub_epi32(places, base);
+    group.bases[octet][0] = _mm256_cvtsi256_si32(base);
+    group.bases[octet][1] = _mm256_extract_epi32(base, 4);
+    // Per element its byte, a zero, the next tap's, a zero.
+    const __m256i rest = _mm256_set1_epi32(static_cast<int32_t>(0x80008000u) | channels << 16);
+    store(group.masks[octet], Bytes{_mm256_add_epi32(_mm256_or_si256(at, _mm256_slli_epi32(at, 16)), rest)});
+}
+
+/// Lists groups `begin` to before `end`, and what octets are made together with them.
+template <int channels>
+QORI_NOINLINE void listWordsOf(const WordFilter& filter, const PixelTaps* pixels, int32_t width,
+                               const GivenWeights& weights, int32_t origin, ptrdiff_t begin, ptrdiff_t end) {
+    __m256i rounded[kWordTaps + 1];
+    rounded[weights.taps] = _mm256_setzero_si256();
+    for (ptrdiff_t first = 2 * begin / channels * channels; first < 2 * end; first += channels) {
+        const EightPixels eight(pixels, width, static_cast<int32_t>(first / channels) * 8, weights.table);
+        roundEight(eight.weights, weights.taps, weights.scale, rounded);
+        const int octets = static_cast<int>(std::min<ptrdiff_t>(channels, 2 * filter.groups - first));
+        for (int j = 0; j < octets; ++j) {
+            const ptrdiff_t octet = first + j;
+            listOctet(filter.list[octet / 2], octet & 1, octetPlaces<channels>(eight.first, origin, j), channels,
+                      filter.shared);
+            int16_t* to = filter.weights + 8 * octet * filter.taps;
+            for (int32_t k = 0; k < filter.taps; k += 2, to += 16) {
+                const __m256i pair = _mm256_blend_epi16(rounded[k], _mm256_slli_epi32(rounded[k + 1], 16), 0xAA);
+                store(to, Vec<int16_t>{spreadToOctet<channels>(pair, j)});
+            }
         }
     }
 }
@@ -180,11 +204,20 @@ void listQuads(WordGroup& group, const int32_t* places, int channels, bool share
 bool sharesWindows(const WordFilter& filter, const PixelTaps* pixels, int32_t width) {
     // Elements of pixels that many apart at most are neighbours.
     const int32_t reach = filter.channels == 1 ? 7 : filter.channels == 3 ? 3 : 1;
-    int32_t most = 0;
-    for (int32_t i = 0; i + 1 < width; ++i) {
+    int32_t most = 0, i = 0;
+    if (width >= 8 + reach) {
+        __m256i wide = _mm256_setzero_si256();  // of four pixels, and differences of what is beside their columns
+        for (; i + 4 + reach <= width; i += 4) {
+            const auto fours = [=](int32_t at) { return load(reinterpret_cast<const int32_t*>(pixels + at)).v; };
+            wide = _mm256_max_epi32(wide, _mm256_sub_epi32(fours(i + reach), fours(i)));
+        }
+        int32_t all[8];
+        store(all, Vec<int32_t>{wide});
+        for (int k = 0; k < 8; k += 2) most = std::max(most, all[k]);
+    }
+    for (; i + 1 < width; ++i) {
         const int32_t other = i + reach < width ? i + reach : width - 1;
-        const int32_t distance = pixels[other].first - pixels[i].first;
-        most = distance > most ? distance : most;
+        most = std::max(most, pixels[other].first - pixels[i].first);
     }
     return (most + 2) * filter.channels <= 16;
 }
@@ -202,32 +235,24 @@ void roundWeights(const float* weights, int32_t taps, float scale, int16_t* out)
     out[largest] = static_cast<int16_t>(out[largest] + rest);
 }
 
-void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t taps,
-               float scale, int32_t origin) {
-    const ptrdiff_t elements = ptrdiff_t{width} * filter.channels;
-    filter.groups = (elements + 15) / 16;
-    filter.shared = sharesWindows(filter, pixels, width);
+void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const GivenWeights& weights,
+               int32_t origin) {
+    filter.groups = (ptrdiff_t{width} * filter.channels + 15) / 16;
     filter.cycle = wordCycle(filter.channels);
-    filter.repeats = true;
-    int16_t rounded[kWordTaps] = {};
-    int32_t pixel = 0, channel = 0;
-    roundWeights(weights + pixels[0].weights, taps, scale, rounded);
-    for (ptrdiff_t g = 0; g < filter.groups; ++g) {
-        int32_t places[16];
-        for (int i = 0; i < 16; ++i) {
-            int16_t* to = filter.weights + 16 * g * filter.taps + i / 8 * 8 * filter.taps + 2 * (i & 7);
-            for (int32_t k = 0; k < filter.taps; k += 2, to += 16) {
-                to[0] = rounded[k];
-                to[1] = rounded[k + 1];
-            }
-            places[i] = (pixels[pixel].first - origin) * filter.channels + channel;
-            if (16 * g + i + 1 >= elements) continue;
-            channel = channel + 1 < filter.channels ? channel + 1 : 0;
-            if (channel == 0) roundWeights(weights + pixels[++pixel].weights, taps, scale, rounded);
-        }
-        listQuads(filter.list[g], places, filter.channels, filter.shared);
-        filter.repeats = filter.repeats && (g < filter.cycle || g + 1 == filter.groups || goesOn(filter, g));
+    const auto list = filter.channels == 1 ? listWordsOf<1> : filter.channels == 3 ? listWordsOf<3> : listWordsOf<4>;
+    const int32_t cyclePixels = 16 * filter.cycle / filter.channels;
+    if (weights.period > 0 && cyclePixels % weights.period == 0 && usesCycles(filter)) {
+        filter.shared = sharesWindows(filter, pixels, std::min(width, 2 * cyclePixels + 8));
+        filter.repeats = true;
+        const ptrdiff_t middle = std::min<ptrdiff_t>(2 * filter.cycle, filter.groups);
+        list(filter, pixels, width, weights, origin, 0, middle);
+        list(filter, pixels, width, weights, origin, std::max(middle, filter.groups - filter.cycle), filter.groups);
+        return;
     }
+    filter.shared = sharesWindows(filter, pixels, width);
+    list(filter, pixels, width, weights, origin, 0, filter.groups);
+    filter.repeats = usesCycles(filter);
+    for (ptrdiff_t g = filter.cycle; g + 1 < filter.groups && filter.repeats; ++g) filter.repeats = goesOn(filter, g);
 }
 
 void filterWords(const WordFilter& filter, WordLines lines, int16_t* out) {

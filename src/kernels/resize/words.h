@@ -36,10 +36,17 @@ constexpr ptrdiff_t wordGroupBytes(int32_t taps) { return ptrdiff_t{32} * taps; 
 /// Rounds `taps` weights times `scale` to 2^-14. The largest takes what the others' rounding leaves.
 void roundWeights(const float* weights, int32_t taps, float scale, int16_t* out);
 
-/// Fills the filter's tables for `width` pixels; the line begins at source column `origin`. `weights` has `taps` for
-/// each, which may be one less than the filter's.
-void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const float* weights, int32_t taps,
-               float scale, int32_t origin);
+/// The weights of pixels.
+struct GivenWeights {
+    const float* table;
+    int32_t taps;    ///< Of each; they may be one less than the filter's.
+    float scale;     ///< Their factor.
+    int32_t period;  ///< Pixels after which weights repeat and their columns go on by one step, or 0.
+};
+
+/// Fills the filter's tables for `width` pixels; the line begins at source column `origin`. Of tables that repeat only
+/// those at the ends are made.
+void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const GivenWeights& weights, int32_t origin);
 
 /// Two lines, and the memory of two rows that will be needed soon: it is asked for, not read.
 struct WordLines {
