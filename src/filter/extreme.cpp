@@ -67,7 +67,7 @@ QorResult runCover(const ExtremeTask<T>& task, WorkFrom from) {
 }
 
 template <class T, bool largest>
-using OrderOf = std::conditional_t<largest, kernels::Largest<T>, kernels::Smallest<T>>;
+using OrderOf = std::conditional_t<largest, kernels::Maximum<T>, kernels::Minimum<T>>;
 
 }  // namespace
 
@@ -75,7 +75,7 @@ template <class S, bool largest>
 QorResult extremeOf(Image<const S> src, Image<S> dst, QorImageSize roi, Layout layout, const Window& window,
                     WorkFrom memory) {
     constexpr bool isFloat = std::is_floating_point_v<S>;
-    using T = std::conditional_t<isFloat, kernels::Key, S>;
+    using T = std::conditional_t<isFloat, kernels::FloatKey, S>;
     using Order = OrderOf<T, largest>;
     const ExtremeTask<T> task{{reinterpret_cast<const T*>(src.data), src.step},
                               {reinterpret_cast<T*>(dst.data), dst.step},

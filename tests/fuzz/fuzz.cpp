@@ -62,9 +62,10 @@ public:
 
     /// Left by a pointer, so that the integer behind it is taken as a step or a count.
     bool stepFollows = false;
-    bool countsBits = false;  ///< An integer says how far into the rows the export begins.
-    int channels = 1;         ///< Of the export that is called.
-    int32_t dataType = 0;     ///< QorDataType of its first element type.
+    bool countsBits = false;   ///< An integer says how far into the rows the export begins.
+    bool countsReach = false;  ///< Integers say how far the export reads around the region.
+    int channels = 1;          ///< Of the export that is called.
+    int32_t dataType = 0;      ///< QorDataType of its first element type.
 
 private:
     const uint8_t* data_;
@@ -161,6 +162,14 @@ const QorHistogramSpec* histogramSpec(Input& in) {
     return spec;
 }
 
+const QorAdaptiveGaussSpec* adaptiveSpec(Input& in) {
+    auto* spec = reinterpret_cast<QorAdaptiveGaussSpec*>(planMemory() + in.upTo(63));
+    const int side = 1 + 2 * in.upTo(4);
+    std::memset(planMemory(), 0, 256);
+    qoriThresholdAdaptiveGaussInit({1, 1}, {side, side}, in.dataType, 1, in.take<float>(), spec);
+    return spec;
+}
+
 template <class T>
 T argument(Input& in) {
     const bool isStep = std::exchange(in.stepFollows, false);
@@ -170,6 +179,8 @@ T argument(Input& in) {
         return filterPlan(in);
     } else if constexpr (std::is_same_v<T, const QorHistogramSpec*>) {
         return histogramSpec(in);
+    } else if constexpr (std::is_same_v<T, const QorAdaptiveGaussSpec*>) {
+        return adaptiveSpec(in);
     } else if constexpr (std::is_pointer_v<T> && std::is_pointer_v<std::remove_pointer_t<T>>) {
         // As many as the next integer may say, of four kinds.
         static uint8_t* planes[kMostStep];
@@ -190,6 +201,7 @@ T argument(Input& in) {
     } else if constexpr (std::is_same_v<T, int32_t>) {
         return isStep                        ? in.take<int16_t>() % kMostStep
                : in.countsBits               ? in.take<int16_t>()
+               : in.countsReach              ? in.upTo(40) - 1
                : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
                : in.take<uint8_t>() % 2 == 0 ? in.upTo(5)  // codes and widths of frames
                                              : in.take<int8_t>();
@@ -259,6 +271,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     in.channels = target.channels;
     in.dataType = target.dataType;
     in.countsBits = std::strstr(target.name, "_1u") != nullptr;
+    in.countsReach = std::strstr(target.name, "SumWindow") != nullptr;
     const QorResult result = target.run(in);
     succeeded[&target - kTargets] |= result >= 0;
     if (!isStatus(result)) {

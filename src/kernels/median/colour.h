@@ -10,15 +10,15 @@ namespace detail {
 
 /// Lanes in which 24 distances fit: 24 * 3 * 255 = 18360 for bytes, 24 * 3 * 65535 = 4718520 for words.
 template <class T>
-struct WideOf {
+struct DistanceOf {
     using type = int32_t;
 };
 template <>
-struct WideOf<uint8_t> {
+struct DistanceOf<uint8_t> {
     using type = int16_t;
 };
 template <>
-struct WideOf<float> {
+struct DistanceOf<float> {
     using type = float;
 };
 
@@ -38,13 +38,13 @@ QORI_INLINE Vec<W> distance(const Vec<W>* a, const Vec<W>* b) {
 }  // namespace detail
 
 template <class T>
-using Wide = typename detail::WideOf<T>::type;
+using DistanceIn = typename detail::DistanceOf<T>::type;
 
 /// Pixels of one row, channels apart, in the type in which distances are summed.
 template <class T>
 struct ColourRow {
-    static constexpr int pixels = 64, room = pixels + 4 + Vec<Wide<T>>::lanes;
-    alignas(kVectorBytes) Wide<T> plane[3][room];
+    static constexpr int pixels = 64, room = pixels + 4 + Vec<DistanceIn<T>>::lanes;
+    alignas(kVectorBytes) DistanceIn<T> plane[3][room];
 
     void read(const T* p, ptrdiff_t count, int channels) {
         for (ptrdiff_t i = 0; i < count; ++i)
@@ -56,7 +56,7 @@ struct ColourRow {
 /// vectors. Float sums read the control register.
 template <int side, class T>
 QORI_NOINLINE void medianColour(const ColourRow<T>* const* rows, ptrdiff_t count, ColourRow<T>& result) {
-    using W = Wide<T>;
+    using W = DistanceIn<T>;
     constexpr int all = side * side;
     for (ptrdiff_t at = 0; at < count; at += Vec<W>::lanes) {
         const auto pixel = [=](int k, Vec<W>* to) __attribute__((always_inline)) {

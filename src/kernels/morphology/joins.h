@@ -14,14 +14,14 @@ namespace qori::kernels {
 
 /// Extremes as a choice of the kernel; the float forms of the 3 x 3 square have their own (kernels/filter).
 template <class T>
-struct Smallest {
+struct Minimum {
     using Element = T;
     static constexpr T start = std::numeric_limits<T>::max();  ///< What every element replaces.
     QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> b) { return smaller(a, b); }
 };
 
 template <class T>
-struct Largest {
+struct Maximum {
     using Element = T;
     static constexpr T start = std::numeric_limits<T>::min();
     QORI_INLINE static Vec<T> join(Vec<T> a, Vec<T> b) { return larger(a, b); }
@@ -29,7 +29,7 @@ struct Largest {
 
 // --- keys -----------------------------------------------------------------------------------------------------------
 
-using Key = uint32_t;
+using FloatKey = uint32_t;
 
 namespace detail {
 
@@ -39,31 +39,32 @@ QORI_INLINE __m256i inOrder(__m256i bits) {
 }
 
 /// inOrder() of -infinity, as an unsigned integer.
-inline constexpr Key kLowest = 0x807FFFFF;
-inline constexpr Key kInfinity = 0x7F800000;
+inline constexpr FloatKey kLowest = 0x807FFFFF;
+inline constexpr FloatKey kInfinity = 0x7F800000;
 
 template <class Order>
-inline constexpr bool isSmallest = std::is_same_v<Order, Smallest<Key>>;
+inline constexpr bool isSmallest = std::is_same_v<Order, Minimum<FloatKey>>;
 
 /// Added to what is in order. -infinity comes to 0 where the smallest wins, and NaNs of either sign above +infinity;
 /// where the largest wins, +infinity comes to 2^32 - 1, and NaNs below -infinity.
 template <class Order>
-inline constexpr Key kShift = isSmallest<Order> ? 0u - kLowest : 0xFFFFFFFF - kInfinity;
+inline constexpr FloatKey kShift = isSmallest<Order> ? 0u - kLowest : 0xFFFFFFFF - kInfinity;
 
 }  // namespace detail
 
 template <class Order>
-QORI_INLINE Vec<Key> keysOf(Vec<Key> bits) {
-    return Vec<Key>{detail::inOrder(bits.v)} + splat(detail::kShift<Order>);
+QORI_INLINE Vec<FloatKey> keysOf(Vec<FloatKey> bits) {
+    return Vec<FloatKey>{detail::inOrder(bits.v)} + splat(detail::kShift<Order>);
 }
 
 /// The floats' bits; NaN, quiet, where there was no number.
 template <class Order>
-QORI_INLINE Vec<Key> bitsOf(Vec<Key> keys) {
-    constexpr Key quietNan = 0x7FC00000;
-    const Vec<Key> bits{detail::inOrder((keys - splat(detail::kShift<Order>)).v)};
-    const Mask<Key> none = detail::isSmallest<Order> ? isAtMost(splat(detail::kInfinity - detail::kLowest + 1), keys)
-                                                     : isAtMost(keys, splat(detail::kLowest - detail::kInfinity - 2));
+QORI_INLINE Vec<FloatKey> bitsOf(Vec<FloatKey> keys) {
+    constexpr FloatKey quietNan = 0x7FC00000;
+    const Vec<FloatKey> bits{detail::inOrder((keys - splat(detail::kShift<Order>)).v)};
+    const Mask<FloatKey> none = detail::isSmallest<Order>
+                                    ? isAtMost(splat(detail::kInfinity - detail::kLowest + 1), keys)
+                                    : isAtMost(keys, splat(detail::kLowest - detail::kInfinity - 2));
     return select(none, splat(quietNan), bits);
 }
 
@@ -78,12 +79,12 @@ struct AsIs {
 
 template <class Order>
 struct IntoKeys {
-    QORI_INLINE static Vec<Key> of(Vec<Key> a) { return keysOf<Order>(a); }
+    QORI_INLINE static Vec<FloatKey> of(Vec<FloatKey> a) { return keysOf<Order>(a); }
 };
 
 template <class Order>
 struct FromKeys {
-    QORI_INLINE static Vec<Key> of(Vec<Key> a) { return bitsOf<Order>(a); }
+    QORI_INLINE static Vec<FloatKey> of(Vec<FloatKey> a) { return bitsOf<Order>(a); }
 };
 
 // --- rows -----------------------------------------------------------------------------------------------------------
