@@ -63,8 +63,8 @@ Row box(std::string name, Function function, int side, Best best = {}) {
         const Rimmed<T> src(size, channels);
         const Image<T> dst(size, channels);
         return Contenders{[=] {
-                              function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), {side, side},
-                                       {side / 2, side / 2});
+                              must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), {side, side},
+                                            {side / 2, side / 2}));
                           },
                           side <= 3 ? plainBox<T>(src, dst, channels, side) : std::function<void()>{},
                           {}};
@@ -81,7 +81,7 @@ Row inPlace(std::string name, Function function, Apart apart, int side) {
             const Image<T> dst(size, channels);
             const QorImageSize mask{side, side};
             const QorPoint2D anchor{side / 2, side / 2};
-            return Contenders{[=] { function(image.data(), image.step(), size.roi(), mask, anchor); },
+            return Contenders{[=] { must(function(image.data(), image.step(), size.roi(), mask, anchor)); },
                               {},
                               [=] { apart(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask, anchor); }};
         },
@@ -93,11 +93,11 @@ Row bordered(std::string name, Function function, int side) {
     return rowOf<T>(std::move(name), channels, {}, [=](Size size) {
         const Image<T> src(size, channels), dst(size, channels);
         int32_t bytes = 0;
-        qoriFilterBoxBorderGetBufferSize(size.roi(), {side, side}, 1, channels, &bytes);
+        must(qoriFilterBoxBorderGetBufferSize(size.roi(), {side, side}, 1, channels, &bytes));
         const Block buffer = allocate(static_cast<size_t>(bytes));
         return Contenders{[=] {
-                              function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), {side, side},
-                                       borderReplicate, nullptr, buffer.get());
+                              must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), {side, side},
+                                            borderReplicate, nullptr, buffer.get()));
                           },
                           {},
                           {}};
@@ -109,7 +109,8 @@ Row gauss(std::string name, Function function, int32_t mask, Best best = {}) {
     return rowOf<T>(std::move(name), channels, best, [=](Size size) {
         const Rimmed<T> src(size, channels);
         const Image<T> dst(size, channels);
-        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask); }, {}, {}};
+        return Contenders{
+            [=] { must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask)); }, {}, {}};
     });
 }
 
@@ -117,11 +118,11 @@ Contenders adaptiveBox(Size size) {
     const Image<uint8_t> src(size, 1), dst(size, 1);
     const QorImageSize mask{15, 15};
     int32_t bytes = 0;
-    qoriThresholdAdaptiveBoxGetBufferSize(size.roi(), mask, 1, 1, &bytes);
+    must(qoriThresholdAdaptiveBoxGetBufferSize(size.roi(), mask, 1, 1, &bytes));
     const Block buffer = allocate(static_cast<size_t>(bytes));
     return {[=] {
-                qoriThresholdAdaptiveBox_8u_C1R(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask, 10,
-                                                255, 0, borderReplicate, 0, buffer.get());
+                must(qoriThresholdAdaptiveBox_8u_C1R(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask,
+                                                     10, 255, 0, borderReplicate, 0, buffer.get()));
             },
             {},
             {}};
@@ -131,13 +132,13 @@ Contenders adaptiveGauss(Size size) {
     const Image<uint8_t> src(size, 1), dst(size, 1);
     const QorImageSize mask{15, 15};
     int32_t bytes = 0, specBytes = 0;
-    qoriThresholdAdaptiveGaussGetBufferSize(size.roi(), mask, 1, 1, &specBytes, &bytes);
+    must(qoriThresholdAdaptiveGaussGetBufferSize(size.roi(), mask, 1, 1, &specBytes, &bytes));
     const Block buffer = allocate(static_cast<size_t>(bytes)), record = allocate(static_cast<size_t>(specBytes));
     auto* const spec = reinterpret_cast<QorAdaptiveGaussSpec*>(record.get());
-    qoriThresholdAdaptiveGaussInit(size.roi(), mask, 1, 1, 0, spec);
+    must(qoriThresholdAdaptiveGaussInit(size.roi(), mask, 1, 1, 0, spec));
     return {[=, kept = record] {
-                qoriThresholdAdaptiveGauss_8u_C1R(src.data(), src.step(), dst.data(), dst.step(), size.roi(), 10, 255,
-                                                  0, borderReplicate, 0, spec, buffer.get());
+                must(qoriThresholdAdaptiveGauss_8u_C1R(src.data(), src.step(), dst.data(), dst.step(), size.roi(), 10,
+                                                       255, 0, borderReplicate, 0, spec, buffer.get()));
                 keep(kept.get());
             },
             {},
@@ -189,8 +190,8 @@ Ladder masks(std::string name, Function function) {
                 std::vector<Step> steps;
                 for (int side = 3; side <= 61; side += 2)
                     steps.push_back({std::to_string(side), double(size.pixels()), [=] {
-                                         function(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
-                                                  {side, side}, {side / 2, side / 2});
+                                         must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
+                                                       {side, side}, {side / 2, side / 2}));
                                      }});
                 return steps;
             },

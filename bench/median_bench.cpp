@@ -61,8 +61,8 @@ Row rectangle(std::string name, Function function, int side, Best best = {},
         const Noise<T> src(size, channels, side / 2);
         const Image<T> dst(size, channels);
         return Contenders{[=] {
-                              function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask,
-                                       QorPoint2D{side / 2, side / 2});
+                              must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), mask,
+                                            QorPoint2D{side / 2, side / 2}));
                           },
                           size.pixels() * side * side > 9 * kL2.pixels() ? std::function<void()>{}
                                                                          : plainOf(src, dst, channels, mask),
@@ -85,12 +85,12 @@ Row bordered(std::string name, Function function, Apart apart, int side, int32_t
         const Noise<T> src(size, 1, side / 2);
         const Image<T> dst(size, 1), image(size, 1);
         int32_t bytes = 0;
-        qoriFilterMedianBorderGetBufferSize(size.roi(), mask, dataType, 1, &bytes);
+        must(qoriFilterMedianBorderGetBufferSize(size.roi(), mask, dataType, 1, &bytes));
         const Block buffer = allocate(static_cast<size_t>(bytes));
         return Contenders{
             [=] {
-                function(inPlace ? dst.data() : image.data(), dst.step(), dst.data(), dst.step(), size.roi(), mask,
-                         borderReplicate, T{}, buffer.get());
+                must(function(inPlace ? dst.data() : image.data(), dst.step(), dst.data(), dst.step(), size.roi(), mask,
+                              borderReplicate, T{}, buffer.get()));
             },
             {},
             [=] {
@@ -109,7 +109,8 @@ Row shape(std::string name, Function function, int32_t code) {
     const auto make = [=](Size size) {
         const Noise<T> src(size, channels, 2);
         const Image<T> dst(size, channels);
-        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), code); }, {}, {}};
+        return Contenders{
+            [=] { must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(), code)); }, {}, {}};
     };
     return {.operation = std::move(name), .bytesPerPixel = 2.0 * channels * sizeof(T), .sizes = {kL2}, .make = make};
 }
@@ -154,8 +155,8 @@ Ladder sides(const char* operation, Function function, double power) {
                     const Noise<T> src(size, 1, side / 2);
                     const Image<T> dst(size, 1);
                     steps.push_back({std::to_string(side), power == 0 ? 1.0 : double(side), [=] {
-                                         function(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
-                                                  QorImageSize{side, side}, QorPoint2D{side / 2, side / 2});
+                                         must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
+                                                       QorImageSize{side, side}, QorPoint2D{side / 2, side / 2}));
                                      }});
                 }
                 return steps;

@@ -54,7 +54,7 @@ Row apart(std::string name, Function function, Best best = {}) {
     const auto make = [=](Size size) {
         const Rimmed<T> src(size, channels);
         const Image<T> dst(size, channels);
-        return Contenders{[=] { function(src.data(), src.step(), dst.data(), dst.step(), size.roi()); },
+        return Contenders{[=] { must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi())); },
                           plainOf<largest>(src, dst, channels),
                           {}};
     };
@@ -72,7 +72,7 @@ Row inPlace(std::string name, Function function, Apart apart) {
     const auto make = [=](Size size) {
         const Rimmed<T> image(size, channels), src(size, channels);
         const Image<T> dst(size, channels);
-        return Contenders{[=] { function(image.data(), image.step(), size.roi()); },
+        return Contenders{[=] { must(function(image.data(), image.step(), size.roi())); },
                           {},
                           [=] { apart(src.data(), src.step(), dst.data(), dst.step(), size.roi()); }};
     };
@@ -125,9 +125,9 @@ void runWindow(Function function, const T* src, int32_t srcStep, T* dst, int32_t
     const QorImageSize window{side, side};
     const QorPoint2D middle{side / 2, side / 2};
     if constexpr (std::is_invocable_v<Function, const T*, int32_t, T*, int32_t, QorImageSize, QorImageSize, QorPoint2D>)
-        function(src, srcStep, dst, dstStep, size.roi(), window, middle);
+        must(function(src, srcStep, dst, dstStep, size.roi(), window, middle));
     else
-        function(src, srcStep, dst, dstStep, size.roi(), mask.data(), window, middle);
+        must(function(src, srcStep, dst, dstStep, size.roi(), mask.data(), window, middle));
 }
 
 template <class T, int channels, class Function>
