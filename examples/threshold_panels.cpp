@@ -58,7 +58,7 @@ Picture adaptiveBesideOtsu(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Otsu mask, the photograph in its left half", "ComputeThreshold_Otsu C1, Threshold C1, Copy C3M", brightParts},
+    {"Otsu mask, the photograph in its left half", "Otsu C1, Threshold C1, Copy C3M", brightParts},
     {"Channels below 64 and above 192 replaced", "Threshold_LTValGTVal C3", zebra},
     {"Otsu's threshold beside an adaptive one", "ThresholdAdaptiveBox C1", adaptiveBesideOtsu},
 };
