@@ -94,6 +94,16 @@ QORI_INLINE void turnBlock(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, p
     }
 }
 
+/// A block of half as many rows.
+template <int pixelBytes>
+QORI_INLINE void turnHalfBlock(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, ptrdiff_t fromStep) {
+    constexpr int n = Turning<pixelBytes>::n;
+    Bytes v[n];
+    for (int i = 0; i < n; ++i) v[i] = repeatBlock(from + i * fromStep);
+    turn(v);
+    for (int i = 0; i < n; ++i) storePartial(to + i * toStep, v[i], kBlockBytes);
+}
+
 /// Enough blocks for so many rows and columns, into a tile.
 template <int pixelBytes>
 QORI_INLINE void turnBlocks(uint8_t* tile, const uint8_t* from, ptrdiff_t fromStep, int32_t rows, int32_t columns) {
@@ -117,11 +127,12 @@ public:
         if (rows == T::tileRows && columns == T::tileColumns) {
             turnBlocks<pixelBytes>(tile_, from, fromStep, T::tileRows, T::tileColumns);
             return putWhole(to, toStep, streaming);
-        } else {
-            for (int32_t y = 0; y < rows; ++y)
-                copyRow(edge_ + y * kEdgeStep, from + y * fromStep, ptrdiff_t{columns} * pixelBytes);
-            turnBlocks<pixelBytes>(tile_, edge_, kEdgeStep, rows, columns);
         }
+        if (!keepAlpha && T::even && rows % T::n == 0 && columns % T::columns == 0)
+            return turnDirectly(to, toStep, from, fromStep, rows, columns);
+        for (int32_t y = 0; y < rows; ++y)
+            copyRow(edge_ + y * kEdgeStep, from + y * fromStep, ptrdiff_t{columns} * pixelBytes);
+        turnBlocks<pixelBytes>(tile_, edge_, kEdgeStep, rows, columns);
         for (int32_t x = 0; x < columns; ++x) {
             if constexpr (keepAlpha)
                 selectRow<pixelBytes, pixelBytes / 4 * 3>(to + x * toStep, tile_ + x * T::tileStep, rows);
@@ -131,6 +142,18 @@ public:
     }
 
 private:
+    /// Small images of whole blocks, which touch no byte outside: straight from image to image.
+    static void turnDirectly(uint8_t* to, ptrdiff_t toStep, const uint8_t* from, ptrdiff_t fromStep, int32_t rows,
+                             int32_t columns) {
+        for (int32_t x = 0; x < columns; x += T::columns, to += T::columns * toStep, from += T::columns * pixelBytes) {
+            int32_t y = 0;
+            for (; y <= rows - T::rows; y += T::rows)
+                turnBlock<pixelBytes>(to + ptrdiff_t{y} * pixelBytes, toStep, from + y * fromStep, fromStep);
+            if (y < rows)
+                turnHalfBlock<pixelBytes>(to + ptrdiff_t{y} * pixelBytes, toStep, from + y * fromStep, fromStep);
+        }
+    }
+
     static constexpr int kEdgeStep = (T::tileColumns + T::columns) * pixelBytes;
 
     void putWhole(uint8_t* to, ptrdiff_t toStep, bool streaming) const {
