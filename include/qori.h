@@ -6773,7 +6773,7 @@ QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGaussInit(QorImageSize roiSize
     int32_t dataType, int32_t numChannels, float sigma, QorAdaptiveGaussSpec* pSpec);
 
 /** valGT where the source is greater than the weighted mean of the square around it minus delta, else valLE.
- *  Shapes    The square is that of the specification, whose region may be another.
+ *  Shapes    The square is the one that pSpec was made for; its region may be another.
  *  Elements  Means in single precision: rows first, each a chain of fused multiply-adds from the left, then
  *            columns from the top; delta is then subtracted. delta above 255 fills with valGT and delta of -255
  *            or less with valLE; so does a mask of one pixel for delta above 0 and others. No pixel is read
@@ -6793,7 +6793,7 @@ QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGauss_8u_C1R(const uint8_t* pS
 
 /** In place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else
  *  valLE.
- *  Shapes    The square is that of the specification, whose region may be another.
+ *  Shapes    The square is the one that pSpec was made for; its region may be another.
  *  Units     Steps in bytes, of any alignment; sizes in pixels; delta in grey levels.
  *  Aliasing  Results are those of a source that is a copy. pBuffer must not overlap the image.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
