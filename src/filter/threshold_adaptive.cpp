@@ -98,11 +98,14 @@ struct AdaptiveJob {
           needs{.reach = {reach, reach, reach, reach}, .place = place} {}
 };
 
-/// The smallest integer that is not below delta * area. Exact: 24 bits times an area of 29.
+/// The smallest integer that is not below delta * area. 24 bits times an area of up to 30, as a buffer's size has to
+/// fit 32 bits, can be one bit more than a double has: where the product is a whole number by rounding, its rest tells.
 int64_t excessOf(float delta, int64_t area) {
     const double product = static_cast<double>(delta) * static_cast<double>(area);
+    const double rest = __builtin_fma(static_cast<double>(delta), static_cast<double>(area), -product);
     const auto whole = static_cast<int64_t>(product);
-    return whole + (static_cast<double>(whole) < product);
+    const auto back = static_cast<double>(whole);
+    return whole + (back < product || (back == product && rest > 0));
 }
 
 /// Masks whose sums need 64 bits.
