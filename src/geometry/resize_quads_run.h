@@ -27,15 +27,7 @@ public:
 
     void begin() { taps_.list(source_); }
     void beginStrip(int32_t x, int32_t width) {
-        const ResizePlan& plan = source_.plan;
-        filter_ = {taps_.pixels + x,
-                   taps_.weights,
-                   plan.columnTaps,
-                   width,
-                   source_.columns.first,
-                   source_.columns.last,
-                   kernels::quadGroup(plan.horizontal.ratio()),
-                   columns_};
+        filter_ = {taps_.strip(source_, x, width), kernels::quadGroup(source_.plan.horizontal.ratio()), columns_};
     }
     void filterNext(RowSequence& sequence, Ring& ring) {
         const T* rows[kAtOnce];

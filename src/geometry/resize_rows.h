@@ -118,6 +118,10 @@ public:
         listColumns(plan, x, pairs_ != nullptr ? 0 : x, plan.columnTaps, plan.columnPeriod, width, pixels);
     }
 
+    kernels::StripTaps strip(const TileSource<T, channels>& source, int32_t x, int32_t width) const {
+        return {pixels + x, weights, source.plan.columnTaps, width, source.columns.first, source.columns.last};
+    }
+
     kernels::PixelTaps* pixels;
     const float* weights = nullptr;
 
@@ -142,12 +146,7 @@ public:
     void begin() { taps_.list(source_); }
     void beginStrip(int32_t x, int32_t width) {
         const ResizePlan& plan = source_.plan;
-        filter_ = {taps_.pixels + x,
-                   taps_.weights,
-                   plan.columnTaps,
-                   width,
-                   source_.columns.first,
-                   source_.columns.last,
+        filter_ = {taps_.strip(source_, x, width),
                    kernels::tapGroup(plan.horizontal.ratio(), plan.columnTaps),
                    plan.columnPeriod,
                    plan.isPadded(plan.horizontal),

@@ -68,11 +68,8 @@ bool repeats(const LineFilter& filter, ptrdiff_t g, ptrdiff_t cycle) {
     return same;
 }
 
-/// Groups after which elements stand at the same channel: eight pixels for three channels.
-constexpr ptrdiff_t lineCycle(int channels) { return channels == 3 ? 3 : 1; }
-
 void findCycle(LineFilter& filter) {
-    const ptrdiff_t cycle = lineCycle(filter.channels);
+    const ptrdiff_t cycle = channelCycle(filter.channels);
     filter.cycle = filter.groups > cycle ? cycle : 0;
     for (ptrdiff_t g = cycle; g + 1 < filter.groups && filter.cycle > 0; ++g)
         if (!repeats(filter, g, cycle)) filter.cycle = 0;
@@ -115,7 +112,7 @@ void listLine(LineFilter& filter, const PixelTaps* pixels, int32_t width, const 
               int32_t origin) {
     filter.groups = (ptrdiff_t{width} * filter.channels + 7) / 8;
     const auto list = filter.channels == 1 ? listLineOf<1> : filter.channels == 3 ? listLineOf<3> : listLineOf<4>;
-    const ptrdiff_t cycle = lineCycle(filter.channels), last = filter.groups - 1;
+    const ptrdiff_t cycle = channelCycle(filter.channels), last = filter.groups - 1;
     const int32_t cyclePixels = static_cast<int32_t>(8 * cycle / filter.channels);
     if (period > 0 && cyclePixels % period == 0 && last > 2 * cycle) {
         const Windows first = list(filter, pixels, width, weights, origin, 0, 2 * cycle);

@@ -27,6 +27,9 @@ struct EightPixels {
     }
 };
 
+/// Octets, or pairs of them, after which elements stand at the same channel again: whole octets of pixels.
+constexpr int channelCycle(int channels) { return channels == 3 ? 3 : 1; }
+
 /// Of which of eight pixels, and of which channel, the elements of an octet are.
 template <int channels>
 struct OctetOrder {

@@ -18,14 +18,9 @@ constexpr bool suitsQuads(double ratio, int32_t taps, int channels, bool isFloat
     return channels == 3 ? ratio <= 1 && taps > 2 : ratio <= 1 || taps > 2 || !isFloat;
 }
 
-struct QuadFilter {
-    const PixelTaps* pixels = nullptr;
-    const float* weights = nullptr;
-    int32_t taps = 0;
-    int32_t width = 0;                      ///< Destination pixels.
-    int32_t legalFirst = 0, legalLast = 0;  ///< Source columns that may be read.
-    int32_t group = 1;                      ///< Destination pixels whose columns are spread at once: quadGroup().
-    float* columns = nullptr;               ///< Room for them: quadColumnFloats().
+struct QuadFilter : StripTaps {
+    int32_t group = 1;         ///< Destination pixels whose columns are spread at once: quadGroup().
+    float* columns = nullptr;  ///< Room for them: quadColumnFloats().
 };
 
 int32_t quadGroup(double ratio);

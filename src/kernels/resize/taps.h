@@ -22,18 +22,22 @@ struct PixelTaps {
 /// Weights of two taps: pairs of 1 - f and f.
 void pairFractions(const float* fractions, int32_t count, float* pairs);
 
-struct RowFilter {
-    const PixelTaps* pixels;
-    const float* weights;
-    int32_t taps;
-    int32_t width;                  ///< Destination pixels.
-    int32_t legalFirst, legalLast;  ///< Source columns that may be read.
-    int32_t group;                  ///< Destination pixels, at most kTapChunk, whose columns are turned together.
-    int32_t period;                 ///< Pixels after which the weights repeat, or 0.
-    bool isPadded;                  ///< A last weight of 0 stands for no tap: there may be no such pixel.
-    double scale;                   ///< Other than 1 for super-sampling: of results of more taps than a chain has.
-    float* columns;                 ///< Room for the turned columns of a group: tapColumnFloats().
-    float* results;                 ///< kTapChunk pixels of eight rows.
+/// The taps of a strip's pixels.
+struct StripTaps {
+    const PixelTaps* pixels = nullptr;
+    const float* weights = nullptr;
+    int32_t taps = 0;
+    int32_t width = 0;                      ///< Destination pixels.
+    int32_t legalFirst = 0, legalLast = 0;  ///< Source columns that may be read.
+};
+
+struct RowFilter : StripTaps {
+    int32_t group = 1;         ///< Destination pixels, at most kTapChunk, whose columns are turned together.
+    int32_t period = 0;        ///< Pixels after which the weights repeat, or 0.
+    bool isPadded = false;     ///< A last weight of 0 stands for no tap: there may be no such pixel.
+    double scale = 1;          ///< Other than 1 for super-sampling: of results of more taps than a chain has.
+    float* columns = nullptr;  ///< Room for the turned columns of a group: tapColumnFloats().
+    float* results = nullptr;  ///< kTapChunk pixels of eight rows.
 };
 
 /// Pixels per group for a ratio and a number of taps: columns between the taps of distant pixels are not worth turning.

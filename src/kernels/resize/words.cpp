@@ -11,9 +11,6 @@ constexpr int kOne = 1 << 14, kDropped = 7;  // of a row's sum, between the pass
 
 constexpr int32_t kFixedTaps = 12;  // up to so many the compiler knows their number
 
-/// Groups after which elements stand at the same channel: sixteen pixels for three channels.
-constexpr int wordCycle(int channels) { return channels == 3 ? 3 : 1; }
-
 /// Octets of a row from their windows. `taps` 0 is any number.
 template <int channels, int taps, bool shared>
 QORI_INLINE __m256i sumOctet(const uint8_t* low, const uint8_t* high, Bytes order, const __m256i* weights,
@@ -55,7 +52,7 @@ QORI_INLINE void filterGroup(const WordFilter& filter, const WordLines& lines, c
 /// change.
 template <int channels, int taps, bool shared>
 QORI_INLINE ptrdiff_t filterCycles(const WordFilter& filter, WordLines lines, int16_t* out) {
-    constexpr int cycle = wordCycle(channels);
+    constexpr int cycle = channelCycle(channels);
     WordGroup groups[cycle];
     __m256i weights[cycle * taps];
     for (int c = 0; c < cycle; ++c) groups[c] = filter.list[c];
@@ -238,7 +235,7 @@ void roundWeights(const float* weights, int32_t taps, float scale, int16_t* out)
 void listWords(WordFilter& filter, const PixelTaps* pixels, int32_t width, const GivenWeights& weights,
                int32_t origin) {
     filter.groups = (ptrdiff_t{width} * filter.channels + 15) / 16;
-    filter.cycle = wordCycle(filter.channels);
+    filter.cycle = channelCycle(filter.channels);
     const auto list = filter.channels == 1 ? listWordsOf<1> : filter.channels == 3 ? listWordsOf<3> : listWordsOf<4>;
     const int32_t cyclePixels = 16 * filter.cycle / filter.channels;
     if (weights.period > 0 && cyclePixels % weights.period == 0 && usesCycles(filter)) {
