@@ -223,19 +223,36 @@ const Ladders ratios{
      ratioLadder<uint8_t>("resize cubic 8u, lengths from 480", interpCubic, false, kAnyLength),
      ratioLadder<float>("resize cubic 32f, lengths from 480", interpCubic, false, kAnyLength)}};
 
-template <class T>
-Ladder tileLadder(const char* operation, QorInterpolationKind kind, bool antialiasing) {
-    return ladder(operation, {1, 16, 512}, [=](int rows) -> Job {
-        constexpr Sizes sizes{{768, 768}, {512, 512}};
-        return {double(sizes.dst.pixels()),
-                resizeJob<T, 1>(kind, antialiasing, Image<T>(sizes.src, 1), Image<T>(sizes.dst, 1), sizes, rows)};
-    });
+template <class T, int channels = 1>
+Ladder tileLadder(const char* operation, QorInterpolationKind kind, bool antialiasing, int from) {
+    return ladder(
+        operation, {1, 2, 4, 8, 16, 64, 512},
+        [=](int rows) -> Job {
+            const Sizes sizes{{from, from}, {512, 512}};
+            return {double(sizes.dst.pixels()),
+                    resizeJob<T, channels>(kind, antialiasing, Image<T>(sizes.src, channels),
+                                           Image<T>(sizes.dst, channels), sizes, rows)};
+        },
+        "a call lists what its columns are made of, and destination rows of other tiles share source rows with its "
+        "own");
 }
-const Ladders tiles{{tileLadder<uint8_t>("resize nearest 8u, tile rows", interpNearest, false),
-                     tileLadder<uint8_t>("resize linear 8u, tile rows", interpLinear, false),
-                     tileLadder<uint8_t>("resize cubic 8u, tile rows", interpCubic, false),
-                     tileLadder<uint8_t>("resize super 8u, tile rows", interpSuper, false),
-                     tileLadder<float>("resize lanczos3 32f, tile rows", interpLanczos, false)}};
+const Ladders tiles{{tileLadder<uint8_t>("resize nearest 8u 3:2, tile rows", interpNearest, false, 768),
+                     tileLadder<uint8_t>("resize nearest 8u odd, tile rows", interpNearest, false, 701),
+                     tileLadder<uint8_t>("resize linear 8u 3:2, tile rows", interpLinear, false, 768),
+                     tileLadder<uint8_t>("resize linear 8u odd, tile rows", interpLinear, false, 701),
+                     tileLadder<uint8_t>("resize cubic 8u 3:2, tile rows", interpCubic, false, 768),
+                     tileLadder<uint8_t>("resize cubic 8u odd, tile rows", interpCubic, false, 701),
+                     tileLadder<uint8_t>("resize cubic 8u enlarging, tile rows", interpCubic, false, 301),
+                     tileLadder<uint8_t, 3>("resize cubic 8u C3 odd, tile rows", interpCubic, false, 701),
+                     tileLadder<uint8_t>("resize super 8u 3:2, tile rows", interpSuper, false, 768),
+                     tileLadder<float>("resize super 32f odd, tile rows", interpSuper, false, 1301),
+                     tileLadder<float>("resize linear 32f odd, tile rows", interpLinear, false, 701),
+                     tileLadder<float>("resize linear 32f 2.5:1, tile rows", interpLinear, false, 1301),
+                     tileLadder<float>("resize lanczos3 32f 3:2, tile rows", interpLanczos, false, 768),
+                     tileLadder<float>("resize lanczos3 32f odd, tile rows", interpLanczos, false, 701),
+                     tileLadder<float>("resize lanczos3 32f 2.5:1, tile rows", interpLanczos, false, 1301),
+                     tileLadder<float, 3>("resize lanczos3 32f C3 2.5:1, tile rows", interpLanczos, false, 1301),
+                     tileLadder<float>("resize antialias lanczos3 32f 2.5:1, tile rows", interpLanczos, true, 1301)}};
 
 Step shape(const char* name, Sizes sizes) {
     return {

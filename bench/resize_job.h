@@ -37,6 +37,7 @@ QORI_EXPORTS(uint16_t, 16u, 1)
 QORI_EXPORTS(uint16_t, 16u, 3)
 QORI_EXPORTS(uint16_t, 16u, 4)
 QORI_EXPORTS(float, 32f, 1)
+QORI_EXPORTS(float, 32f, 3)
 #undef QORI_EXPORTS
 
 inline constexpr int kLobes = 3;
