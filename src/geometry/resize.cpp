@@ -88,18 +88,21 @@ auto withWay(const ResizePlan& plan, Visit visit) {
         if constexpr (std::is_same_v<T, uint8_t>) {
             if (plan.interpolation == interpLinear && plan.antialiasing == 0)
                 return visit.template operator()<FixedLinearTile<channels>>();
+            if constexpr (channels == 1)  // exact in both, so that channels still become what their planes become
+                if (plan.interpolation == interpCubic && plan.antialiasing == 0 && plan.horizontal.ratio() < 1 &&
+                    PhaseRows<T>::suits(plan))
+                    return visit.template operator()<TapsTile<T, 1, PhaseRows<T>>>();
             if (WordsTile<channels>::suits(plan)) return visit.template operator()<WordsTile<channels>>();
         }
         if (ColumnsFirstTile<T, channels>::suits(plan))
             return visit.template operator()<ColumnsFirstTile<T, channels>>();
-        if constexpr (channels == 1)
+        if constexpr (channels == 1) {
             if (PhaseRows<T>::suits(plan)) return visit.template operator()<TapsTile<T, 1, PhaseRows<T>>>();
-        if constexpr (channels > 1) {
+            if (LineRows<T, 1>::suits(plan)) return visit.template operator()<TapsTile<T, 1, LineRows<T, 1>>>();
+        } else {
             using Quads = QuadRows<T, channels>;
             if (Quads::suits(plan)) return visit.template operator()<TapsTile<T, channels, Quads>>();
         }
-        using Lines = LineRows<T, channels>;
-        if (Lines::suits(plan)) return visit.template operator()<TapsTile<T, channels, Lines>>();
         return visit.template operator()<TapsTile<T, channels, TurnedRows<T, channels>>>();
     }
 }

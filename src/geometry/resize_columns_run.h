@@ -10,7 +10,7 @@ template <class T, int channels>
 class ColumnsFirstTile {
 public:
     /// By the sums that a source row's height of one destination column takes in either order, where they differ by so
-    /// much that it pays.
+    /// much that it pays: 1.6 to 3.3 times from 1000x4000 to 2000x500, 90 times from 16x8000 to 8000x16.
     static bool suits(const ResizePlan& plan) {
         const Axis &x = plan.horizontal, &y = plan.vertical;
         if (plan.antialiasing == 0 || x.ratio() > 1 || y.ratio() <= 1) return false;

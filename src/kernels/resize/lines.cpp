@@ -132,8 +132,6 @@ void filterLine(const LineFilter& filter, const float* line, const uint8_t* late
         case 2: return filterLineOf<2>(filter, line, later, bytes, out);
         case 4: return filterLineOf<4>(filter, line, later, bytes, out);
         case 6: return filterLineOf<6>(filter, line, later, bytes, out);
-        case 8: return filterLineOf<8>(filter, line, later, bytes, out);
-        case 12: return filterLineOf<12>(filter, line, later, bytes, out);
         default: return filterLineOf<0>(filter, line, later, bytes, out);
     }
 }

@@ -10,12 +10,13 @@ namespace qori::kernels {
 constexpr int kQuadRows = 4;  ///< Rows filtered at once.
 
 /// Whether quads are the way: for few taps, which are added in ascending order everywhere, and where all source pixels
-/// are needed. The idle lane of three channels pays for itself in enlargements, where lines need more windows than
-/// taps; two taps of floats, which need no conversion, are not worth spreading in reductions.
+/// are needed. Over turned rows four channels gain 1.1 to 1.4, floats less than integers; two taps of floats, which
+/// need no conversion, are not worth spreading in reductions. The idle lane of three channels pays for four taps of
+/// integers only: 1.12 to 1.19 in enlargements.
 constexpr bool suitsQuads(double ratio, int32_t taps, int channels, bool isFloat) {
     constexpr int32_t kMostTaps = 8;
     if (channels < 3 || taps > kMostTaps || ratio > taps) return false;
-    return channels == 3 ? ratio <= 1 && taps > 2 : ratio <= 1 || taps > 2 || !isFloat;
+    return channels == 3 ? ratio <= 1 && taps == 4 && !isFloat : ratio <= 1 || taps > 2 || !isFloat;
 }
 
 struct QuadFilter : StripTaps {
