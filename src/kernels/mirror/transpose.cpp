@@ -181,11 +181,19 @@ private:
 /// Bytes of an image from which on lines are fetched ahead: below, they are in the second-level cache already, and
 /// fetching them costs half as much again.
 constexpr int64_t kFarBytes = 512 * 1024;
+/// From here on the destination is fetched a tile ahead as well. Below, lines whose addresses are powers of two apart
+/// push each other out of the first-level cache before they are written.
+constexpr int64_t kFarAheadBytes = 3 * kFarBytes;
+
+/// Rows of the source, or of the destination, that a panel of tiles spans. Each is a page or more apart from the next,
+/// and a page must still be known to the processor when the next tiles come to it: a multiple of every tile's sides.
+constexpr int32_t kPanel = 1024;
 
 /// Fetches the lines of a rectangle. No prefetcher of the processor follows as many rows as a tile has.
+template <int locality>
 QORI_INLINE void prefetch(const uint8_t* p, ptrdiff_t step, int32_t rows, ptrdiff_t bytes) {
     for (; rows > 0; --rows, p += step)
-        for (ptrdiff_t at = 0; at < bytes; at += 64) __builtin_prefetch(p + at);
+        for (ptrdiff_t at = 0; at < bytes; at += 64) __builtin_prefetch(p + at, 0, locality);
 }
 
 }  // namespace
@@ -195,26 +203,45 @@ void transposeImage(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff
                     bool streaming) {
     using T = Turning<pixelBytes>;
     Turner<pixelBytes, keepAlpha> turner;
-    streaming = streaming && ((reinterpret_cast<uintptr_t>(dst) | static_cast<uintptr_t>(dstStep)) & 31u) == 0;
-    const bool far = int64_t{size.width} * size.height * pixelBytes >= kFarBytes;
-    const auto turnAt = [&](int32_t x, int32_t y, int32_t nextX, int32_t nextY) {
+    // Half a cache line does not go past the cache: tiles write them whole, if they lie like that.
+    streaming = streaming && ((reinterpret_cast<uintptr_t>(dst) | static_cast<uintptr_t>(dstStep)) & 63u) == 0;
+    const int64_t bytes = int64_t{size.width} * size.height * pixelBytes;
+    const bool far = bytes >= kFarBytes, fetchesAhead = !T::even || bytes >= kFarAheadBytes;
+    const auto turnAt = [&](int32_t x, int32_t y, int32_t nextX, int32_t nextY) __attribute__((always_inline)) {
         const int32_t rows = std::min(T::tileRows, size.height - y), columns = std::min(T::tileColumns, size.width - x);
         uint8_t* const to = dst + x * dstStep + ptrdiff_t{y} * pixelBytes;
-        if (far && !streaming) prefetch(to, dstStep, columns, ptrdiff_t{rows} * pixelBytes);
-        if (far && nextX < size.width && nextY < size.height)
-            prefetch(src + nextY * srcStep + ptrdiff_t{nextX} * pixelBytes, srcStep,
-                     std::min(T::tileRows, size.height - nextY),
-                     ptrdiff_t{std::min(T::tileColumns, size.width - nextX)} * pixelBytes);
+        if (far && !fetchesAhead && !streaming) prefetch<3>(to, dstStep, columns, ptrdiff_t{rows} * pixelBytes);
+        if (far && nextX < size.width && nextY < size.height) {
+            const int32_t nextRows = std::min(T::tileRows, size.height - nextY);
+            const int32_t nextColumns = std::min(T::tileColumns, size.width - nextX);
+            prefetch<3>(src + nextY * srcStep + ptrdiff_t{nextX} * pixelBytes, srcStep, nextRows,
+                        ptrdiff_t{nextColumns} * pixelBytes);
+            if (fetchesAhead && !streaming)
+                prefetch<T::even ? 3 : 2>(dst + nextX * dstStep + ptrdiff_t{nextY} * pixelBytes, dstStep, nextColumns,
+                                          ptrdiff_t{nextRows} * pixelBytes);
+        }
         turner.turnTile(to, dstStep, src + y * srcStep + ptrdiff_t{x} * pixelBytes, srcStep, rows, columns, streaming);
     };
     // Measured: tiles of 96 bytes a row leave lines half read, which the next tile of the same rows finds in the cache;
     // the others gain where the destination's rows are written on.
     if constexpr (T::even) {
-        for (int32_t x = 0; x < size.width; x += T::tileColumns)
-            for (int32_t y = 0; y < size.height; y += T::tileRows) turnAt(x, y, x, y + T::tileRows);
+        for (int32_t top = 0; top < size.height; top += kPanel) {
+            const int32_t bottom = std::min(size.height, top + kPanel);
+            for (int32_t x = 0; x < size.width; x += T::tileColumns)
+                for (int32_t y = top; y < bottom; y += T::tileRows) {
+                    const bool isLast = y + T::tileRows >= bottom;
+                    turnAt(x, y, isLast ? x + T::tileColumns : x, isLast ? top : y + T::tileRows);
+                }
+        }
     } else {
-        for (int32_t y = 0; y < size.height; y += T::tileRows)
-            for (int32_t x = 0; x < size.width; x += T::tileColumns) turnAt(x, y, x + T::tileColumns, y);
+        for (int32_t left = 0; left < size.width; left += kPanel) {
+            const int32_t right = std::min(size.width, left + kPanel);
+            for (int32_t y = 0; y < size.height; y += T::tileRows)
+                for (int32_t x = left; x < right; x += T::tileColumns) {
+                    const bool isLast = x + T::tileColumns >= right;
+                    turnAt(x, y, isLast ? left : x + T::tileColumns, isLast ? y + T::tileRows : y);
+                }
+        }
     }
 }
 
