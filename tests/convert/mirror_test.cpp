@@ -48,12 +48,14 @@ void checkAxes(Function function, const Shape& shape) {
         if (mayReflect(shape, axis)) check<T, L, kind>(function, shape, axis);
 }
 
-/// Sizes around those of the tiles in which diagonals are turned.
+/// Sizes around those of the tiles in which diagonals are turned, and of their panels.
 std::vector<Shape> diagonalShapes() {
     std::vector<Shape> shapes;
     for (int w : {4, 15, 16, 17, 31, 32, 33, 64, 70, 129})
         for (int h : {4, 8, 15, 16, 17, 33, 64, 130})
             shapes.push_back({.width = w, .height = h, .padding = w % 3, .atBegin = h % 2 == 0, .shift = w % 5});
+    shapes.push_back({.width = 70, .height = 1030});
+    shapes.push_back({.width = 1030, .height = 70});
     return shapes;
 }
 
