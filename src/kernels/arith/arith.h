@@ -258,14 +258,17 @@ bool withScaledOperation(int32_t scale, Run run) {
         }
         return withScaleRule<C, typename Op::W, Op::limit>(scale, [&](auto rule) {
             constexpr bool unscaled = std::is_same_v<decltype(rule), Saturate<C, typename Op::W>>;
-            if constexpr (unscaled && Op::hasExact) {
+            const auto byRule = [rule](Vec<T> a, Vec<T> b) __attribute__((always_inline)) {
+                const auto wide = Op::wide(a, b);
+                return elements<T>(narrow<C>(rule(wide.low), rule(wide.high)));
+            };
+            // What does not depend on the rule is compiled whatever the rule is.
+            if constexpr (!Op::hasExact)
+                binary(byRule);
+            else if constexpr (unscaled)
                 binary(Exact<Op>{});
-            } else {
-                binary([rule](Vec<T> a, Vec<T> b) __attribute__((always_inline)) {
-                    const auto wide = Op::wide(a, b);
-                    return elements<T>(narrow<C>(rule(wide.low), rule(wide.high)));
-                });
-            }
+            else
+                binary(byRule);
         });
     }
 }
