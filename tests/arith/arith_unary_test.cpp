@@ -1,4 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <immintrin.h>
+
 #include <cstdlib>
 
 #include "harness/pixelwise.h"

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // What resizes do with numbers at the ends: elements that are not finite, constants under sums of very many taps, and
 // work buffers full of garbage.
+#include <immintrin.h>
+
 #include <array>
 #include <bit>
 

@@ -19,7 +19,6 @@ namespace {
 uint64_t seed = 20141009;
 Random generator{0};
 std::set<std::string> swept;
-unsigned circumstance;
 
 /// Seeds each test by its name, and expects every test to give back what it allocated.
 class Listener : public testing::EmptyTestEventListener {
@@ -47,7 +46,6 @@ class Listener : public testing::EmptyTestEventListener {
 
 Random& random() { return generator; }
 void markSwept(const char* exportName) { swept.insert(exportName); }
-unsigned nextCircumstance() { return circumstance++; }
 
 }  // namespace qori::test
 

@@ -29,14 +29,18 @@ void forStreamingChoices(int bytesPerPixel, int trafficBytes, Check check) {
     }
 }
 
-#define QORI_EXPECT_UNCHANGED(image, snapshot) EXPECT_EQ("", (image).difference(snapshot))
+void expectUnchanged(const TestImage& image, const Snapshot& expected, const char* file, int line);
+void expectStatus(QorResult expected, QorResult status, const char* text, const char* file, int line);
+
+/// Every byte of an image and around it is the snapshot's.
+#define QORI_EXPECT_UNCHANGED(image, snapshot) expectUnchanged(image, snapshot, __FILE__, __LINE__)
 
 /// A status expected of a call that must leave `output` alone.
-#define QORI_EXPECT_STATUS(expected, output, callExpression)    \
-    do {                                                        \
-        const auto before_ = (output).snapshot();               \
-        EXPECT_EQ(expected, callExpression) << #callExpression; \
-        EXPECT_EQ("", (output).difference(before_));            \
+#define QORI_EXPECT_STATUS(expected, output, callExpression)                         \
+    do {                                                                             \
+        const auto before_ = (output).snapshot();                                    \
+        expectStatus(expected, callExpression, #callExpression, __FILE__, __LINE__); \
+        QORI_EXPECT_UNCHANGED(output, before_);                                      \
     } while (false)
 
 }  // namespace qori::test
