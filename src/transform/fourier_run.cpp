@@ -75,8 +75,7 @@ void forwardRealRows(const FourierPlan& plan, const Channel& c, const Work& w) {
         forEachRows(plan, c, kColumns, [&](const LineRows& src, const LineRows& dst) {
             kernels::rowsToLines(src, width, plan.rowForward, Parts::inOrder, w.lines);
             kernels::transformLines(table, w.lines, w.work);
-            kernels::splitHalves(w.lines, width, table->positions(), plan.roots());
-            kernels::linesToRows(w.lines, table->positions(), width, Parts::inOrder, dst);
+            kernels::halvesToRows(w.lines, width, table->positions(), plan.roots(), dst);
         });
     else
         forEachRows(plan, c, 2 * kColumns, [&](const LineRows& src, const LineRows& dst) {
@@ -93,8 +92,7 @@ void inverseRealRows(const FourierPlan& plan, const Channel& c, const Work& w) {
     const int32_t width = plan.size.width;
     if (plan.halfRoots != 0)
         forEachRows(plan, c, kColumns, [&](const LineRows&, const LineRows& dst) {
-            kernels::rowsToLines(dst, width, plan.rowInverse, Parts::inOrder, w.lines);
-            kernels::joinHalves(w.lines, width, plan.roots());
+            kernels::rowsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
             kernels::transformLines(table, w.lines, w.work);
             kernels::linesToRows(w.lines, table->positions(), width, Parts::exchanged, dst);
         });
@@ -112,19 +110,32 @@ void inverseRealRows(const FourierPlan& plan, const Channel& c, const Work& w) {
 void forwardReal(const FourierPlan& plan, const Channel& c, uint8_t* buffer) {
     const Work w(plan, buffer);
     forwardRealRows(plan, c, w);
-    // From the left: packed pairs begin an element before those between, which have been read by then. The last column
-    // waits until the last block has been read.
     const SpectrumColumns columns(plan, c.dst, c.dstStep, c.channels);
     const kernels::FourierTable* const table = plan.columns();
-    for (int32_t b = 0; b < columns.blocks(); ++b) {
-        kernels::columnsToLines(columns.between(b), plan.columnForward, Parts::inOrder, w.lines);
-        if (b == 0 && !columns.hasLastColumn()) kernels::joinRealColumn(columns.column(0), plan.columnForward, w.lines);
-        kernels::transformLines(table, w.lines, w.work);
-        kernels::linesToColumns(w.lines, table->positions(), Parts::inOrder, columns.packed(b));
-        if (b == 0)
-            kernels::splitRealColumns(w.lines, table->positions(), columns.column(0),
-                                      columns.hasLastColumn() ? w.saved : nullptr);
+    kernels::columnsToLines(columns.between(0), plan.columnForward, Parts::inOrder, w.lines);
+    if (!columns.hasLastColumn()) kernels::joinRealColumn(columns.column(0), plan.columnForward, w.lines);
+    kernels::transformLines(table, w.lines, w.work);
+    kernels::linesToColumns(w.lines, table->positions(), Parts::inOrder, columns.packed(0));
+    kernels::splitRealColumns(w.lines, table->positions(), columns.column(0),
+                              columns.hasLastColumn() ? w.saved : nullptr);
+    // From the right, where whole blocks write what they have read and pass a column on, the last one at first; the
+    // first block takes what is left.
+    int32_t b = columns.blocks() - 1;
+    const auto isShifted = [&] {
+        return columns.hasLastColumn() &&
+               kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
+    };
+    while (b > 0 && isShifted()) --b;
+    if (b == 0) {
+        if (columns.hasLastColumn())
+            kernels::floatsToColumn(w.saved, columns.column(std::min(plan.size.width, 2 * kColumns) - 1));
+        return;
     }
+    // Else from the left: packed pairs begin an element before those between, which have been read by then. The last
+    // column waits until the last block has been read.
+    for (b = 1; b < columns.blocks(); ++b)
+        kernels::transformColumns(table, columns.between(b), columns.packed(b), plan.columnForward, Parts::inOrder,
+                                  w.lines, w.work);
     if (columns.hasLastColumn()) kernels::floatsToColumn(w.saved, columns.column(plan.size.width - 1));
 }
 
@@ -135,13 +146,14 @@ void inverseReal(const FourierPlan& plan, const Channel& c, uint8_t* buffer) {
     // From the right, and the last column before all: what is written is where the source's pairs have been read.
     const float* const saved = from.hasLastColumn() ? w.saved : nullptr;
     if (from.hasLastColumn()) kernels::columnToFloats(from.column(plan.size.width - 1), w.saved);
-    for (int32_t b = from.blocks() - 1; b >= 0; --b) {
-        kernels::columnsToLines(from.packed(b), plan.columnInverse, Parts::exchanged, w.lines);
-        if (b == 0) kernels::joinRealColumns(from.column(0), saved, plan.columnInverse, w.lines);
-        kernels::transformLines(table, w.lines, w.work);
-        kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(b));
-        if (b == 0 && !to.hasLastColumn()) kernels::storeRealColumn(w.lines, table->positions(), to.column(0));
-    }
+    for (int32_t b = from.blocks() - 1; b > 0; --b)
+        kernels::transformColumns(table, from.packed(b), to.between(b), plan.columnInverse, Parts::exchanged, w.lines,
+                                  w.work);
+    kernels::columnsToLines(from.packed(0), plan.columnInverse, Parts::exchanged, w.lines);
+    kernels::joinRealColumns(from.column(0), saved, plan.columnInverse, w.lines);
+    kernels::transformLines(table, w.lines, w.work);
+    kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(0));
+    if (!to.hasLastColumn()) kernels::storeRealColumn(w.lines, table->positions(), to.column(0));
     inverseRealRows(plan, c, w);
 }
 
@@ -161,9 +173,7 @@ void transformComplex(const FourierPlan& plan, const Channel& c, uint8_t* buffer
     for (int32_t x = 0; x < plan.size.width; x += kColumns) {
         const LineColumns columns{rowsOf(c.dst, c.dstStep, 1, 0, plan.size.height), ptrdiff_t{x} * 2, 0,
                                   std::min(kColumns, plan.size.width - x)};
-        kernels::columnsToLines(columns, scale, parts, w.lines);
-        kernels::transformLines(ofColumns, w.lines, w.work);
-        kernels::linesToColumns(w.lines, ofColumns->positions(), parts, columns);
+        kernels::transformColumns(ofColumns, columns, columns, scale, parts, w.lines, w.work);
     }
 }
 

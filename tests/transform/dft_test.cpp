@@ -62,6 +62,9 @@ void forSizes(bool isMain, Check check) {
                               {2022, 1},
                               {4099, 1},
                               {1155, 3},
+                              {47, 64},
+                              {96, 32},
+                              {40, 128},
                               {3, 1201}})
         check(size);
 }

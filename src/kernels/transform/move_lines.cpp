@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "move_lines.h"
 
+#include "turned_rows.h"
+
 namespace qori::kernels {
 namespace {
 
@@ -8,19 +10,17 @@ constexpr int kRows = kLineColumns;
 
 /// Eight rows become eight columns.
 QORI_INLINE void turn(Vec<float> (&v)[kRows]) {
-    __m256 pairs[kRows], quads[kRows];
-    for (int i = 0; i < kRows; i += 2) {
-        pairs[i] = _mm256_unpacklo_ps(v[i].v, v[i + 1].v);
-        pairs[i + 1] = _mm256_unpackhi_ps(v[i].v, v[i + 1].v);
-    }
-    for (int i = 0; i < kRows; i += 4)
-        for (int k = 0; k < 2; ++k) {
-            quads[i + 2 * k] = _mm256_shuffle_ps(pairs[i + k], pairs[i + k + 2], 0x44);
-            quads[i + 2 * k + 1] = _mm256_shuffle_ps(pairs[i + k], pairs[i + k + 2], 0xEE);
-        }
     for (int i = 0; i < 4; ++i) {
-        v[i] = {_mm256_permute2f128_ps(quads[i], quads[i + 4], 0x20)};
-        v[i + 4] = {_mm256_permute2f128_ps(quads[i], quads[i + 4], 0x31)};
+        const __m256 low = _mm256_permute2f128_ps(v[i].v, v[i + 4].v, 0x20);
+        v[i + 4] = {_mm256_permute2f128_ps(v[i].v, v[i + 4].v, 0x31)};
+        v[i] = {low};
+    }
+    Vec<float> first[4] = {v[0], v[1], v[2], v[3]}, second[4] = {v[4], v[5], v[6], v[7]};
+    line::turnHalves(first);
+    line::turnHalves(second);
+    for (int i = 0; i < 4; ++i) {
+        v[i] = first[i];
+        v[i + 4] = second[i];
     }
 }
 
@@ -47,7 +47,15 @@ QORI_INLINE void storeApart(float* p, int apart, Vec<float> a, ptrdiff_t n) {
 template <class Place>
 QORI_INLINE void turnRowsIn(const LineRows& rows, ptrdiff_t elements, float scale, Place place) {
     const Vec<float> factor = splat(scale);
-    for (ptrdiff_t e = 0; e < elements; e += kRows) {
+    ptrdiff_t e = 0;
+    const line::EightRows eight(rows);
+    if (line::isPlain(rows))
+        for (; e + 4 <= elements; e += 4) {
+            Vec<float> v[4];
+            line::loadTurned(eight, e, v);
+            for (int i = 0; i < 4; ++i) store(place(e + i), v[i] * factor);
+        }
+    for (; e < elements; e += kRows) {
         Vec<float> v[kRows];
         for (int y = 0; y < kRows; ++y)
             v[y] = loadApart(rows.row(y < rows.count ? y : rows.count - 1) + e * rows.channels, rows.channels,
@@ -60,7 +68,15 @@ QORI_INLINE void turnRowsIn(const LineRows& rows, ptrdiff_t elements, float scal
 
 template <class Place>
 QORI_INLINE void turnRowsOut(const LineRows& rows, ptrdiff_t elements, Place place) {
-    for (ptrdiff_t e = 0; e < elements; e += kRows) {
+    ptrdiff_t e = 0;
+    const line::EightRows eight(rows);
+    if (line::isPlain(rows))
+        for (; e + 4 <= elements; e += 4) {
+            Vec<float> v[4];
+            for (int i = 0; i < 4; ++i) v[i] = load(place(e + i));
+            line::storeTurned(eight, e, v);
+        }
+    for (; e < elements; e += kRows) {
         Vec<float> v[kRows];
         for (int i = 0; i < kRows; ++i) v[i] = e + i < elements ? load(place(e + i)) : zero<float>();
         turn(v);
@@ -104,15 +120,6 @@ struct PackedPlace {
 
 constexpr int offsetOf(Parts parts, ptrdiff_t part) {
     return (part != 0) != (parts == Parts::exchanged) ? kLineColumns : 0;
-}
-
-/// The parts of eight complex numbers, and back. Lanes hold numbers 0, 1, 4, 5, 2, 3, 6, 7.
-QORI_INLINE ComplexLine separate(Vec<float> a, Vec<float> b) {
-    return {{_mm256_shuffle_ps(a.v, b.v, 0x88)}, {_mm256_shuffle_ps(a.v, b.v, 0xDD)}};
-}
-QORI_INLINE void interleave(ComplexLine line, Vec<float>& a, Vec<float>& b) {
-    a = {_mm256_unpacklo_ps(line.re.v, line.im.v)};
-    b = {_mm256_unpackhi_ps(line.re.v, line.im.v)};
 }
 
 QORI_INLINE ComplexLine scaled(ComplexLine a, Vec<float> factor, Parts parts) {
@@ -204,13 +211,13 @@ void columnsToLines(const LineColumns& columns, float scale, Parts parts, float*
     const bool isWhole = columns.begin == 0 && columns.end == kLineColumns;
     if (channels == 1 && isWhole)
         return forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
-            line::storeLine(lines + y * kLineFloats, scaled(separate(load(p), load(p + kRows)), factor, parts));
+            line::storeLine(lines + y * kLineFloats, scaled(line::separate(load(p), load(p + kRows)), factor, parts));
         });
     if (channels == 1) {
         const LaneMasks masks(columns.begin, columns.end);
         return forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
             const Vec<float> a{_mm256_maskload_ps(p, masks.low)}, b{_mm256_maskload_ps(p + kRows, masks.high)};
-            line::storeLine(lines + y * kLineFloats, scaled(separate(a, b), factor, parts));
+            line::storeLine(lines + y * kLineFloats, scaled(line::separate(a, b), factor, parts));
         });
     }
     const __m256i places = indices(2 * channels);
@@ -231,7 +238,7 @@ void linesToColumns(const float* lines, const int32_t* positions, Parts parts, c
     if (channels == 1 && columns.begin == 0 && columns.end == kLineColumns)
         return forEachRowOf(columns, [=](float* p, ptrdiff_t y) {
             Vec<float> a, b;
-            interleave(lineOf(y), a, b);
+            line::interleave(lineOf(y), a, b);
             store(p, a);
             store(p + kRows, b);
         });
@@ -239,7 +246,7 @@ void linesToColumns(const float* lines, const int32_t* positions, Parts parts, c
         const LaneMasks masks(columns.begin, columns.end);
         return forEachRowOf(columns, [=](float* p, ptrdiff_t y) {
             Vec<float> a, b;
-            interleave(lineOf(y), a, b);
+            line::interleave(lineOf(y), a, b);
             _mm256_maskstore_ps(p, masks.low, a.v);
             _mm256_maskstore_ps(p + kRows, masks.high, b.v);
         });

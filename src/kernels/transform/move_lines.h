@@ -5,7 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 
-#include "butterflies.h"
+#include "fourier.h"
 
 namespace qori::kernels {
 
@@ -25,6 +25,10 @@ enum class Parts { inOrder, exchanged };
 void rowsToLines(const LineRows& rows, ptrdiff_t elements, float scale, Parts parts, float* lines);
 /// Element e is part e % 2 of line positions[e / 2].
 void linesToRows(const float* lines, const int32_t* positions, ptrdiff_t elements, Parts parts, const LineRows& rows);
+
+/// splitHalves and linesToRows of n elements, rowsToLines and joinHalves: the spectra of up to 8 rows of even length.
+void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float* roots, const LineRows& rows);
+void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roots, float* lines);
 
 /// Up to 16 rows of n elements: element e becomes line e, of the first eight rows its real part, of the others the
 /// other one.
@@ -48,6 +52,16 @@ struct LineColumns {
 void columnsToLines(const LineColumns& columns, float scale, Parts parts, float* lines);
 /// Row y is line positions[y].
 void linesToColumns(const float* lines, const int32_t* positions, Parts parts, const LineColumns& columns);
+
+/// Columns to lines, their transform, lines to columns: in one go where whole blocks of one channel allow it.
+void transformColumns(const FourierTable* table, const LineColumns& from, const LineColumns& to, float scale,
+                      Parts parts, float* lines, float* work);
+
+/// The transform of eight complex columns of the layout between rows and columns into the packed one, whose rows begin
+/// an element earlier: `carry` has an element a row that comes behind these, and gets those that come before. False,
+/// and nothing done, where blocks are not whole or the length is not made for it.
+bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+                             float* lines);
 
 /// Packs a spectrum of n real values: frequency 0, the parts of 1, 2, ..., of an even n the last. Lane 0 holds the
 /// transform of a + i b; its frequencies go to a column and, where it is not null, to n floats.
