@@ -287,9 +287,9 @@ TEST(Spectrum, ExtremesOfIntegers) {
         EXPECT_EQ(im, made[2]);
     }
     // The root of 32767^2 + 181^2 is 32767.4999; that of 90^2 + 120^2 is 150, or 37.5 times 4.
-    const int16_t near[3] = {0, 32767, 181}, tie[3] = {0, 90, 120};
+    const int16_t close[3] = {0, 32767, 181}, tie[3] = {0, 90, 120};
     int16_t size[3] = {};
-    EXPECT_EQ(QOR_OK, qoriMagnitudePack_16s_C1RSfs(near, 6, size, 6, {3, 1}, 0));
+    EXPECT_EQ(QOR_OK, qoriMagnitudePack_16s_C1RSfs(close, 6, size, 6, {3, 1}, 0));
     EXPECT_EQ(32767, size[1]);
     EXPECT_EQ(QOR_OK, qoriMagnitudePack_16s_C1RSfs(tie, 6, size, 6, {3, 1}, 2));
     EXPECT_EQ(38, size[1]);
