@@ -3,54 +3,66 @@
 // frequencies of one remainder by r.
 #include "fourier.h"
 
-#include <cstring>
-
 #include "passes.h"
 
 namespace qori::kernels {
 namespace {
 
-constexpr int kMostRadix = 61;
+constexpr int kMostRadix = kMostPrimeFactor;
+
+/// Sums and differences of the points of a prime radix around the first one.
+struct PrimeSums {
+    ComplexLine first, sum[kMostRadix / 2], difference[kMostRadix / 2];
+};
+
+/// `count` of the frequencies from m on, and their mirrors, of 2 half + 1 points. turns: for each q from 1 the cosines
+/// and sines of 2 pi m q / radix, m from 1.
+template <int count, class Put>
+QORI_INLINE void primeFrequencies(const PrimeSums& a, int half, int m, const float* turns, Put put) {
+    ComplexLine even[count], odd[count];
+    for (int i = 0; i < count; ++i) {
+        even[i] = a.first;
+        odd[i] = {zero<float>(), zero<float>()};
+    }
+    const float* t = turns + 2 * (m - 1);
+    for (int q = 0; q < half; ++q, t += 2 * half)
+        for (int i = 0; i < count; ++i) {
+            even[i] = line::mulAdd(a.sum[q], splat(t[2 * i]), even[i]);
+            odd[i] = line::mulAdd(a.difference[q], splat(t[2 * i + 1]), odd[i]);
+        }
+    for (int i = 0; i < count; ++i) {
+        put(m + i, line::minusI(even[i], odd[i]));
+        put(2 * half + 1 - m - i, line::plusI(even[i], odd[i]));
+    }
+}
 
 /// A prime above those that have a kernel of their own.
 QORI_NOINLINE void passAnyPrime(float* lines, ptrdiff_t blocks, ptrdiff_t part, int radix, const float* turns,
                                 const float* twiddles) {
     const ptrdiff_t apart = part * kLineFloats;
     const int half = radix / 2;
-    ComplexLine s[kMostRadix / 2], d[kMostRadix / 2];
+    PrimeSums a;
     for (ptrdiff_t block = 0; block < blocks; ++block, lines += radix * apart) {
         const float* w = twiddles;
         for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
             float* const x = lines + j * kLineFloats;
-            const ComplexLine first = line::loadLine(x);
-            ComplexLine total = first;
+            a.first = line::loadLine(x);
+            ComplexLine total = a.first;
             for (int q = 0; q < half; ++q) {
-                const ComplexLine a = line::loadLine(x + (q + 1) * apart);
-                const ComplexLine b = line::loadLine(x + (radix - 1 - q) * apart);
-                s[q] = line::operator+(a, b);
-                d[q] = line::operator-(a, b);
-                total = line::operator+(total, s[q]);
+                const ComplexLine y = line::loadLine(x + (q + 1) * apart);
+                const ComplexLine z = line::loadLine(x + (radix - 1 - q) * apart);
+                a.sum[q] = line::operator+(y, z);
+                a.difference[q] = line::operator-(y, z);
+                total = line::operator+(total, a.sum[q]);
             }
             line::storeLine(x, total);
-            for (int m = 1; m <= half; ++m) {
-                ComplexLine even = first, odd = {zero<float>(), zero<float>()};
-                int turn = 0;
-                for (int q = 0; q < half; ++q) {
-                    turn += m;
-                    if (turn >= radix) turn -= radix;
-                    const bool isBack = turn > half;
-                    const float* const t = turns + 2 * (isBack ? radix - turn : turn) - 2;
-                    even = line::mulAdd(s[q], splat(t[0]), even);
-                    odd = line::mulAdd(d[q], splat(isBack ? -t[1] : t[1]), odd);
-                }
-                ComplexLine low = line::minusI(even, odd), high = line::plusI(even, odd);
-                if (twiddles != nullptr) {
-                    low = line::times(low, w + 2 * m - 2);
-                    high = line::times(high, w + 2 * (radix - m) - 2);
-                }
-                line::storeLine(x + m * apart, low);
-                line::storeLine(x + (radix - m) * apart, high);
-            }
+            const auto put = [=](int p, ComplexLine f) {
+                line::storeLine(x + p * apart, twiddles == nullptr ? f : line::times(f, w + 2 * p - 2));
+            };
+            int m = 1;
+            for (; m + 2 <= half; m += 3) primeFrequencies<3>(a, half, m, turns, put);
+            if (m + 1 == half) primeFrequencies<2>(a, half, m, turns, put);
+            if (m == half) primeFrequencies<1>(a, half, m, turns, put);
         }
     }
 }
@@ -82,30 +94,6 @@ void line::runStage(const FourierTable& table, const FourierTable::Stage& stage,
 
 namespace {
 
-/// The n points of a block, n odd, by a convolution with a chirp. work: twice the lines of the inner transform.
-void convolveWithChirp(const FourierTable& table, float* block, float* work) {
-    const auto* const inner = table.at<FourierTable>(table.inner);
-    const auto* const chirp = table.at<float>(table.chirpAt);
-    const auto* const spectrum = table.at<float>(table.spectrumAt);
-    const ptrdiff_t n = table.chirpPoints, length = inner->points;
-    float* const back = work + length * kLineFloats;
-    for (ptrdiff_t j = 0; j < n; ++j)
-        line::storeLine(work + j * kLineFloats, line::times(line::loadLine(block + j * kLineFloats), chirp + 2 * j));
-    std::memset(work + n * kLineFloats, 0, static_cast<size_t>((length - n) * kLineBytes));
-    transformLines(inner, work, nullptr);
-    const int32_t* const positions = inner->positions();
-    for (ptrdiff_t k = 0; k < length; ++k) {
-        const ComplexLine product =
-            line::times(line::loadLine(work + ptrdiff_t{positions[k]} * kLineFloats), spectrum + 2 * k);
-        line::storeLine(back + k * kLineFloats, {product.im, product.re});
-    }
-    transformLines(inner, back, nullptr);
-    for (ptrdiff_t j = 0; j < n; ++j) {
-        const ComplexLine sum = line::loadLine(back + ptrdiff_t{positions[j]} * kLineFloats);
-        line::storeLine(block + j * kLineFloats, line::times({sum.im, sum.re}, chirp + 2 * j));
-    }
-}
-
 /// A block from its stage on. Large blocks are divided first; the parts fit a cache then.
 void transformBlock(const FourierTable& table, int32_t first, float* lines, ptrdiff_t points, float* work) {
     for (; first < table.stageCount && points > line::kPointsAtOnce; ++first) {
@@ -120,7 +108,7 @@ void transformBlock(const FourierTable& table, int32_t first, float* lines, ptrd
         line::runStage(table, table.stages[first], lines, points / table.stages[first].length);
     if (table.chirpPoints > 1)
         for (ptrdiff_t i = 0; i < points; i += table.chirpPoints)
-            convolveWithChirp(table, lines + i * kLineFloats, work);
+            line::convolveWithChirp(table, lines + i * kLineFloats, work);
 }
 
 QORI_INLINE float* lineAt(float* lines, int32_t position) { return lines + ptrdiff_t{position} * kLineFloats; }

@@ -28,13 +28,16 @@
 
 namespace qori::kernels {
 
+/// Primes up to this one are summed as they stand; beyond, a convolution with a chirp costs less.
+inline constexpr int kMostPrimeFactor = 97;
+
 struct FourierTable {
     static constexpr int kMostStages = 20;  ///< 3^20 is above 2^31.
 
     /// Blocks of `length` points become `radix` blocks, one for each remainder of frequencies.
     struct Stage {
         int32_t radix, length;
-        int32_t turns;     ///< Where the cosines and sines of an odd radix are.
+        int32_t turns;  ///< Where cosines and sines of 2 pi m q / radix are, of an odd radix, for q and m to its half.
         int32_t twiddles;  ///< Where (radix - 1) complex factors for each of length / radix points are.
     };
 

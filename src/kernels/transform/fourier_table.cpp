@@ -8,8 +8,6 @@
 namespace qori::kernels {
 namespace {
 
-/// Primes up to this one are summed as they stand; beyond, a convolution with a chirp costs less.
-constexpr int32_t kMostPrime = 61;
 /// Lengths up to this one make every root anew and take no memory for it.
 constexpr int64_t kMostWithoutMemory = 1024;
 
@@ -22,7 +20,7 @@ struct Factors {
 
     /// Odd primes from the largest, then a 2 or 4s, then 8s, of which the last has no twiddles.
     explicit Factors(int64_t n) : chirp(n) {
-        for (int32_t prime = kMostPrime; prime >= 3; prime -= 2)
+        for (int32_t prime = kMostPrimeFactor; prime >= 3; prime -= 2)
             if (isPrime(prime))
                 for (; chirp % prime == 0; chirp /= prime) radix[count++] = prime;
         int32_t twos = 0;
@@ -41,15 +39,17 @@ private:
 };
 
 /// The shortest cyclic convolution of small factors that holds a chirp's linear one; powers of two are worth a tenth.
+/// Its twos are 5 or more, so that there are several stages, the last of radix 8 and none of radix 2.
 int64_t convolutionPoints(int64_t chirp) {
     const int64_t least = 2 * chirp - 1;
     const auto from = [=](int64_t n) {
         while (n < least) n *= 2;
         return n;
     };
-    int64_t best = from(1);
-    for (int64_t odd : {3, 5, 9, 15})
-        if (from(odd) < best - best / 10) best = from(odd);
+    int64_t best = from(32 * 3);
+    for (int64_t odd : {5, 9, 15})
+        if (from(32 * odd) < best) best = from(32 * odd);
+    if (from(32) - from(32) / 10 <= best) best = from(32);
     return best;
 }
 
@@ -70,7 +70,7 @@ struct FourierLayout {
             FourierTable::Stage& stage = table.stages[i];
             stage.radix = radix;
             stage.length = static_cast<int32_t>(length);
-            stage.turns = radix % 2 == 1 ? add((radix - 1) * 4) : 0;
+            stage.turns = radix % 2 == 1 ? add((radix / 2) * (radix / 2) * 8) : 0;
             stage.twiddles = length > radix ? add(length / radix * (radix - 1) * 8) : 0;
             length /= radix;
         }
@@ -112,11 +112,14 @@ void fillPositions(FourierTable* table) {
 void fillStages(FourierTable* table, const Roots& roots) {
     for (int32_t i = 0; i < table->stageCount; ++i) {
         const FourierTable::Stage& stage = table->stages[i];
-        if (stage.turns != 0)
-            for (int32_t k = 1; k <= stage.radix / 2; ++k) {
-                const Root root = rootOfUnity(k, stage.radix);
-                storeRoot(table->at<float>(stage.turns) + 2 * k - 2, {root.re, -root.im});
-            }
+        if (stage.turns != 0) {
+            auto* turn = table->at<float>(stage.turns);
+            for (int32_t q = 1; q <= stage.radix / 2; ++q)
+                for (int32_t m = 1; m <= stage.radix / 2; ++m, turn += 2) {
+                    const Root root = rootOfUnity(q * m % stage.radix, stage.radix);
+                    storeRoot(turn, {root.re, -root.im});
+                }
+        }
         if (stage.twiddles == 0) continue;
         auto* out = table->at<float>(stage.twiddles);
         const int64_t ratio = table->points / stage.length;
@@ -145,7 +148,8 @@ void transformDoubles(const Root* in, int64_t stride, Root* out, int64_t n, cons
     }
 }
 
-/// The chirp e^(-i pi j^2 / n), and the transform of its conjugate around 0, over the convolution's length.
+/// The chirp e^(-i pi j^2 / n), and the transform of its conjugate around 0, over the convolution's length, in the
+/// order that the inner transform leaves.
 void fillChirp(FourierTable* table, int64_t convolution, uint8_t* init) {
     const int64_t n = table->chirpPoints;
     auto* const wave = reinterpret_cast<Root*>(init);
@@ -162,7 +166,9 @@ void fillChirp(FourierTable* table, int64_t convolution, uint8_t* init) {
     }
     const Roots roots(convolution, spectrum + convolution);
     transformDoubles(wave, 1, spectrum, convolution, roots, 1);
-    for (int64_t k = 0; k < convolution; ++k) storeRoot(table->at<float>(table->spectrumAt) + 2 * k, spectrum[k]);
+    const int32_t* const positions = table->at<FourierTable>(table->inner)->positions();
+    for (int64_t k = 0; k < convolution; ++k)
+        storeRoot(table->at<float>(table->spectrumAt) + 2 * ptrdiff_t{positions[k]}, spectrum[k]);
 }
 
 }  // namespace
@@ -177,7 +183,7 @@ int64_t fourierInitBytes(int64_t n) {
     return own > ofChirp ? own : ofChirp;
 }
 
-int64_t fourierWorkBytes(int64_t n) { return 2 * kLineBytes * FourierLayout(n).convolution; }
+int64_t fourierWorkBytes(int64_t n) { return kLineBytes * FourierLayout(n).convolution; }
 
 void makeFourierTable(FourierTable* table, int32_t n, void* init) {
     const FourierLayout layout(n);
@@ -185,12 +191,12 @@ void makeFourierTable(FourierTable* table, int32_t n, void* init) {
     fillStages(table, Roots(n, n > kMostWithoutMemory ? init : nullptr));
     fillPositions(table);
     if (layout.convolution == 0) return;
-    fillChirp(table, layout.convolution, static_cast<uint8_t*>(init));
     auto* const inner = table->at<FourierTable>(table->inner);
     *inner = FourierLayout(layout.convolution).table;
     const auto points = layout.convolution;
     fillStages(inner, Roots(points, points > kMostWithoutMemory ? init : nullptr));
     fillPositions(inner);
+    fillChirp(table, points, static_cast<uint8_t*>(init));
 }
 
 int64_t halfRootsInitBytes(int64_t n) { return n > kMostWithoutMemory ? Roots::bytes(n) : 0; }

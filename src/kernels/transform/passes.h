@@ -42,4 +42,7 @@ QORI_NOINLINE void passBlocks(float* lines, ptrdiff_t blocks, ptrdiff_t part, co
 /// One stage of so many blocks.
 void runStage(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
 
+/// The chirpPoints points of a block by a convolution. work: the lines of the inner transform.
+void convolveWithChirp(const FourierTable& table, float* block, float* work);
+
 }  // namespace qori::kernels::line
