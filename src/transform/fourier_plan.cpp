@@ -15,6 +15,9 @@ int32_t pointsOfRow(int32_t width, Elements elements) {
 
 bool isHalved(int32_t width, Elements elements) { return elements != Elements::complex && width % 2 == 0; }
 
+/// Pixels that no buffer holds, and whose bytes 64 bits do.
+constexpr int64_t kTooMany = int64_t{1} << 40;
+
 /// Where a piece lies; meaningless where the whole is too large.
 int32_t place(BlockLayout& layout, int64_t bytes) { return static_cast<int32_t>(layout.add(bytes)); }
 
@@ -49,7 +52,7 @@ FourierSizes::FourierSizes(QorImageSize size, Elements elements) {
     plan.workAt = place(buffer, std::max(kernels::fourierWorkBytes(points), kernels::fourierWorkBytes(size.height)));
     plan.savedAt = place(buffer, elements == Elements::complex ? 0 : int64_t{size.height} * elementBytes<float>);
     if (elements == Elements::integers)
-        plan.imageAt = place(buffer, int64_t{size.width} * size.height * elementBytes<float>);
+        plan.imageAt = place(buffer, std::min(int64_t{size.width} * size.height, kTooMany) * elementBytes<float>);
     bufferBytes = buffer.bytes() + kBlockAlignment;
     plan.bufferBytes = static_cast<int32_t>(bufferBytes);
 }
