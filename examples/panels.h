@@ -18,6 +18,7 @@ std::span<const Panel> copyPanels();
 std::span<const Panel> arithPanels();
 std::span<const Panel> borderPanels();
 std::span<const Panel> filterPanels();
+std::span<const Panel> fourierPanels();
 std::span<const Panel> morphologyPanels();
 std::span<const Panel> medianPanels();
 std::span<const Panel> resizePanels();

@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "harness/guarded_memory.h"
+#include "qorcore.h"
 #include "qori.h"
 
 namespace qori::test {
@@ -64,6 +65,8 @@ public:
     bool stepFollows = false;
     bool countsBits = false;   ///< An integer says how far into the rows the export begins.
     bool countsReach = false;  ///< Integers say how far the export reads around the region.
+    bool isOrder = false;      ///< Integers are exponents of sizes.
+    bool releases = false;     ///< The export frees a plan.
     int channels = 1;          ///< Of the export that is called.
     int32_t dataType = 0;      ///< QorDataType of its first element type.
 
@@ -170,6 +173,32 @@ const QorAdaptiveGaussSpec* adaptiveSpec(Input& in) {
     return spec;
 }
 
+/// A plan of InitAlloc's, for the call or made by it; released after the call.
+QorFft2DPlan* allocatedPlan;
+
+using FourierInit = QorResult (*)(QorFft2DPlan**, QorImageSize, int32_t flag);
+constexpr FourierInit kFourierInits[] = {
+    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) { return qoriDFTInitAlloc_R_32f(plan, size, flag, 1); },
+    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) { return qoriDFTInitAlloc_R_32s(plan, size, flag, 1); },
+    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) { return qoriDFTInitAlloc_C_32fc(plan, size, flag, 1); },
+    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+        return qoriFFTInitAlloc_R_32f(plan, size.width % 7, size.height % 4, flag, 1);
+    },
+    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+        return qoriFFTInitAlloc_R_32s(plan, size.width % 7, size.height % 4, flag, 1);
+    },
+    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+        return qoriFFTInitAlloc_C_32fc(plan, size.width % 7, size.height % 4, flag, 1);
+    },
+};
+
+/// Of any kind, or none where the size is refused.
+QorFft2DPlan* fourierPlan(Input& in) {
+    const FourierInit init = kFourierInits[in.take<uint8_t>() % std::size(kFourierInits)];
+    init(&allocatedPlan, in.size(), 1 << in.upTo(3));
+    return allocatedPlan;
+}
+
 template <class T>
 T argument(Input& in) {
     const bool isStep = std::exchange(in.stepFollows, false);
@@ -181,6 +210,12 @@ T argument(Input& in) {
         return histogramSpec(in);
     } else if constexpr (std::is_same_v<T, const QorAdaptiveGaussSpec*>) {
         return adaptiveSpec(in);
+    } else if constexpr (std::is_same_v<T, const QorFft2DPlan*>) {
+        return fourierPlan(in);
+    } else if constexpr (std::is_same_v<T, QorFft2DPlan**>) {
+        return in.take<uint8_t>() >= 250 ? nullptr : &allocatedPlan;
+    } else if constexpr (std::is_same_v<T, QorFft2DPlan*>) {
+        return in.releases ? fourierPlan(in) : reinterpret_cast<T>(in.memory());
     } else if constexpr (std::is_pointer_v<T> && std::is_pointer_v<std::remove_pointer_t<T>>) {
         // As many as the next integer may say, of four kinds.
         static uint8_t* planes[kMostStep];
@@ -202,6 +237,7 @@ T argument(Input& in) {
         return isStep                        ? in.take<int16_t>() % kMostStep
                : in.countsBits               ? in.take<int16_t>()
                : in.countsReach              ? in.upTo(40) - 1
+               : in.isOrder                  ? in.upTo(9) - 1
                : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
                : in.take<uint8_t>() % 2 == 0 ? in.upTo(5)  // codes and widths of frames
                                              : in.take<int8_t>();
@@ -272,7 +308,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     in.dataType = target.dataType;
     in.countsBits = std::strstr(target.name, "_1u") != nullptr;
     in.countsReach = std::strstr(target.name, "SumWindow") != nullptr;
+    in.isOrder = std::strstr(target.name, "FFTInit") != nullptr;
+    in.releases = std::strstr(target.name, "FTFree_") != nullptr;
     const QorResult result = target.run(in);
+    if (in.releases && result == QOR_OK) allocatedPlan = nullptr;
+    qorFree(std::exchange(allocatedPlan, nullptr));
     succeeded[&target - kTargets] |= result >= 0;
     if (!isStatus(result)) {
         std::fprintf(stderr, "%s returned a status that it does not have\n", target.name);
