@@ -2672,6 +2672,185 @@ QORI_API QorResult QORI_CALL qoriDup_8u_C1C3R(const uint8_t* pSrc, int32_t srcSt
 QORI_API QorResult QORI_CALL qoriDup_8u_C1C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
     QorImageSize roiSize);
 
+/* ---- Cosine transform of 8x8 blocks --------------------------------------------------------------------------- */
+
+/** The forward cosine transform of a block of floats.
+ *  Shapes    64 contiguous pixels, row by row, to 64 contiguous coefficients: row v holds vertical frequency v,
+ *            column u horizontal frequency u.
+ *  Elements  F(u, v) = C(u) C(v) / 4 * the sum over x and y of f(x, y) cos((2x + 1) u pi / 16) cos((2y + 1) v
+ *            pi / 16), C(0) = 1 / sqrt(2) and C(k) = 1 otherwise: the orthonormal DCT-II. F(0, 0) is the sum
+ *            divided by 8. Single precision: the error of a coefficient is below 2^-22 of the root of the sum
+ *            of squares.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Notes     A factorisation into rotations by tangents, rows first, and one scaling of each coefficient by a
+ *            table.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_32f_C1(const float* pSrc, float* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_32f_C1I(float* pSrcDst);
+
+/** The inverse cosine transform of a block of floats.
+ *  Shapes    64 contiguous coefficients to 64 contiguous pixels, as qoriDCT8x8Fwd_32f_C1 orders them.
+ *  Elements  The exact inverse of the forward transform but for rounding: the error of a pixel is below 2^-22
+ *            of the root of the sum of squares.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_32f_C1(const float* pSrc, float* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_32f_C1I(float* pSrcDst);
+
+/** The forward cosine transform of a block of 16-bit pixels.
+ *  Shapes    64 contiguous pixels, row by row, to 64 contiguous coefficients, row v of them vertical frequency
+ *            v.
+ *  Elements  The orthonormal DCT-II of qoriDCT8x8Fwd_32f_C1: F(0, 0) is the sum divided by 8. Any pixels; each
+ *            coefficient is within 1 of the exact one rounded to nearest, and saturates.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Notes     Pixels from -256 to 255 take 16-bit fixed point: columns by rotations in Q15 with three more bits
+ *            than the pixels, rows by products of 16 bits, summed in 32. Blocks with other pixels go through
+ *            single precision, more slowly.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ *  Example   int16_t coefficients[64], scan[64];   // a block of pixels, centred around 0, transformed and in the order of a codec
+ *            qoriDCT8x8FwdLS_8u16s_C1R(pixels, step, coefficients, -128);
+ *            qoriZigzagFwd8x8_16s_C1(coefficients, scan);
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_16s_C1I(int16_t* pSrcDst);
+
+/** The forward cosine transform of 8x8 pixels of an image.
+ *  Shapes    8 rows of 8 pixels to 64 contiguous coefficients, row v of them vertical frequency v.
+ *  Elements  As qoriDCT8x8Fwd_16s_C1.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  Rows of 16s may lie in pDst, as its own rows; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst);
+
+/** The forward cosine transform of 8x8 pixels of an image, with a value added to each.
+ *  Shapes    8 rows of 8 pixels to 64 contiguous coefficients, row v of them vertical frequency v.
+ *  Elements  As qoriDCT8x8Fwd_16s_C1 of the pixels plus addVal, which wrap around to 16 bits. -128 centres the
+ *            pixels around 0. addVal from -256 to 0 is the fast case.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  The image must not overlap pDst.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8FwdLS_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int16_t addVal);
+
+/** The inverse cosine transform of a block of 16-bit coefficients.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 64 contiguous pixels, row by
+ *            row.
+ *  Elements  The inverse of qoriDCT8x8Fwd_16s_C1. Any coefficients; each pixel is within 1 of the exact one
+ *            rounded to nearest, and saturates. Meets IEEE 1180-1990. A block of F(0, 0) alone gives floor(F(0,
+ *            0) / 8 + 1/2) everywhere.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Notes     Blocks of coefficients from -8191 to 8191 whose pixels are from -360 to 360 take 16-bit fixed
+ *            point: rows by products of 16 bits, summed in 32, columns by rotations in Q15 with six more bits
+ *            than the pixels. Other blocks go through single precision, more slowly.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s_C1I(int16_t* pSrcDst);
+
+/** The inverse cosine transform into 8x8 pixels of an image.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 8 rows of 8 pixels.
+ *  Elements  As qoriDCT8x8Inv_16s_C1; 8u pixels saturate to 0 to 255.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  Rows of 16s may lie in pSrc, as its own rows; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s_C1R(const int16_t* pSrc, int16_t* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s8u_C1R(const int16_t* pSrc, uint8_t* pDst, int32_t dstStep);
+
+/** The inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two
+ *  bounds.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 8 rows of 8 pixels.
+ *  Elements  As qoriDCT8x8Inv_16s_C1; then addVal is added, which wraps around to 16 bits, pixels saturate to 0
+ *            to 255, are raised to at least clipDown and then lowered to at most clipUp: clipUp everywhere
+ *            where it is below clipDown.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  The image must not overlap pSrc.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ *  Example   qoriDCT8x8InvLSClip_16s8u_C1R(coefficients, pixels, step, 128, 16, 235);   // levels of studio video
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8InvLSClip_16s8u_C1R(const int16_t* pSrc, uint8_t* pDst, int32_t dstStep,
+    int16_t addVal, uint8_t clipDown, uint8_t clipUp);
+
+/** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4.
+ *  Shapes    64 contiguous coefficients to 64 contiguous pixels, all of them written. Only the first 2 or 4 of
+ *            the first 2 or 4 rows are read: the others count as zero, whatever they are.
+ *  Elements  Bit for bit what qoriDCT8x8Inv_16s_C1 makes of the block with the other coefficients at zero.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_2x2_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_2x2_16s_C1I(int16_t* pSrcDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_4x4_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_4x4_16s_C1I(int16_t* pSrcDst);
+
+/** The inverse cosine transform of a block of 16-bit coefficients, for pixels of ten bits and more.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 64 contiguous pixels, row by
+ *            row.
+ *  Elements  As qoriDCT8x8Inv_16s_C1, always in single precision: pixels are the exact ones rounded to nearest
+ *            but where these are within 2^-6 of a half (coefficients below 2^15; within 2^-9 for those of ten-
+ *            bit pixels).
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_A10_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_A10_16s_C1I(int16_t* pSrcDst);
+
+/** Makes 2x2 pixels of a block's coefficients, a quarter of its size in each direction.
+ *  Shapes    pSrc: 64 coefficients, of which those at 0, 1, 8 and 9 are read. pDst: its first 4 elements are
+ *            written, row by row; in place the other 60 stay.
+ *  Elements  The orthonormal inverse of 2x2 coefficients, divided by 4, so that means are kept: (F(0, 0) +-
+ *            F(1, 0) +- F(0, 1) +- F(1, 1)) / 8, exactly, to nearest, halves up.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8To2x2Inv_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8To2x2Inv_16s_C1I(int16_t* pSrcDst);
+
+/** Makes 4x4 pixels of a block's coefficients, half of its size in each direction.
+ *  Shapes    pSrc: 64 coefficients, of which the first 4 of the first 4 rows are read. pDst: its first 16
+ *            elements are written, row by row; in place the other 48 stay.
+ *  Elements  The orthonormal inverse of 4x4 coefficients, divided by 2, so that means are kept. Single
+ *            precision, to nearest, halves up, saturated: within 1 of the exact pixel rounded.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8To4x4Inv_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8To4x4Inv_16s_C1I(int16_t* pSrcDst);
+
+/** Puts a block's coefficients in zig-zag order.
+ *  Shapes    pDst[i] = pSrc[z(i)] for 64 contiguous elements; z = 0, 1, 8, 16, 9, 2, 3, 10, ..., 55, 62, 63
+ *            runs along the block's diagonals as in JPEG (ITU-T T.81, figure 5).
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriZigzagFwd8x8_16s_C1(const int16_t* pSrc, int16_t* pDst);
+
+/** Puts coefficients in zig-zag order back into rows.
+ *  Shapes    pDst[z(i)] = pSrc[i] for 64 contiguous elements, z as of qoriZigzagFwd8x8_16s_C1.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriZigzagInv8x8_16s_C1(const int16_t* pSrc, int16_t* pDst);
+
 /* ---- Extrema and counting ------------------------------------------------------------------------------------- */
 
 /** Smallest element of each channel.
