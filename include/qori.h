@@ -251,6 +251,12 @@ typedef struct QorResizePlan QorResizePlan;
  *  trusted memory: see Plans above. */
 typedef struct QorHistogramSpec QorHistogramSpec;
 
+/** Tables of a cosine transform of images, in the caller's memory: as many bytes as qoriDCTFwdGetSize_32f reports, at any
+ *  address, or from qoriDCTFwdInitAlloc_32f. The plan begins at the next multiple of 64 and may be copied to a block whose
+ *  address is equal modulo 64. Once filled it is only read: any number of threads may use it at once, each with a work
+ *  buffer of its own. It is trusted memory: see Plans above. */
+typedef struct QorDct2DPlan QorDct2DPlan;
+
 /** Version record of the library. */
 typedef struct QorLibraryVersion {
     int32_t versionMajor;
@@ -2671,6 +2677,110 @@ QORI_API QorResult QORI_CALL qoriDup_8u_C1C3R(const uint8_t* pSrc, int32_t srcSt
     QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriDup_8u_C1C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
     QorImageSize roiSize);
+
+/* ---- Cosine transform of images ------------------------------------------------------------------------------- */
+
+/** Reports how many bytes a plan, the buffer for its initialisation and the work buffer take, at any alignment.
+ *  Shapes    roiSize: any size. hint is kept in the plan; every value gives the same results.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Notes     The buffer for the initialisation may be of 0 bytes. The work buffer serves images of any layout.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (a block of 2^31 bytes or more); then nothing is written.
+ *  Example   int32_t planBytes, initBytes, bufferBytes;   // the spectrum of a picture
+ *            qoriDCTFwdGetSize_32f(roi, hintFast, &planBytes, &initBytes, &bufferBytes);
+ *            QorDct2DPlan* plan = malloc(planBytes);
+ *            uint8_t *init = malloc(initBytes), *buffer = malloc(bufferBytes);
+ *            qoriDCTFwdInit_32f(roi, hintFast, plan, init);
+ *            qoriDCTFwd_32f_C1R(src, srcStep, dst, dstStep, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdGetSize_32f(QorImageSize roiSize, int32_t hint, int32_t* pPlanSize,
+    int32_t* pInitBufSize, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriDCTInvGetSize_32f(QorImageSize roiSize, int32_t hint, int32_t* pPlanSize,
+    int32_t* pInitBufSize, int32_t* pBufSize);
+
+/** Makes a plan in memory of the caller.
+ *  Shapes    pPlan and pInitBuf: as many bytes as the size query reports, at any alignment. pInitBuf is not
+ *            looked at where that is 0.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Notes     Plans of both directions are alike: either serves the forward and the inverse transform.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_SIZE (a block of 2^31 bytes or more), QOR_ERR_NULL_PTR (a buffer is wanted and there is
+ *            none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdInit_32f(QorImageSize roiSize, int32_t hint, QorDct2DPlan* pPlan,
+    uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriDCTInvInit_32f(QorImageSize roiSize, int32_t hint, QorDct2DPlan* pPlan,
+    uint8_t* pInitBuf);
+
+/** Makes a plan in memory from qorMalloc, to be released with qoriDCTFwdFree_32f or qoriDCTInvFree_32f.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Notes     The buffer for the initialisation comes from qorMalloc too, for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (a block of 2^31 bytes or more), QOR_ERR_NO_MEMORY (an allocation failed: what
+ *            was allocated is freed); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdInitAlloc_32f(QorDct2DPlan** ppPlan, QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriDCTInvInitAlloc_32f(QorDct2DPlan** ppPlan, QorImageSize roiSize, int32_t hint);
+
+/** Releases a plan that qoriDCTFwdInitAlloc_32f or qoriDCTInvInitAlloc_32f made.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdFree_32f(QorDct2DPlan* pPlan);
+QORI_API QorResult QORI_CALL qoriDCTInvFree_32f(QorDct2DPlan* pPlan);
+
+/** Reports how many bytes of work buffer a plan takes, at any alignment; each thread needs a buffer of its own.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdGetBufSize_32f(const QorDct2DPlan* pPlan, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriDCTInvGetBufSize_32f(const QorDct2DPlan* pPlan, int32_t* pBufSize);
+
+/** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha.
+ *  Shapes    W x H pixels, the plan's size, to as many coefficients: row v holds vertical frequency v, column u
+ *            horizontal frequency u.
+ *  Elements  The orthonormal DCT-II: F(u, v) = c(u, W) c(v, H) * the sum over x and y of f(x, y) cos((2x + 1) u
+ *            pi / 2W) cos((2y + 1) v pi / 2H), c(0, n) = sqrt(1 / n), c(k, n) = sqrt(2 / n) otherwise. Single
+ *            precision: the RMS error is about 2e-7 of the result's RMS.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise images must not overlap. pBuffer must not
+ *            overlap anything.
+ *  Notes     A Fourier transform of the reordered elements (Makhoul, 1980), along rows and then down columns:
+ *            work grows as n log n for every size, primes included.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform), QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+
+/** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha.
+ *  Shapes    W x H coefficients, the plan's size, to as many pixels.
+ *  Elements  The orthonormal DCT-III, the inverse of the forward transform. Single precision: the RMS error is
+ *            about 2e-7 of the result's RMS.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise images must not overlap. pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform), QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
 
 /* ---- Cosine transform of 8x8 blocks --------------------------------------------------------------------------- */
 

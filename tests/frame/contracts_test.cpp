@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "harness/call.h"
+#include "harness/companion/qorcore_instrumented.h"
 #include "qori.h"
 
 namespace qori::test {
@@ -237,7 +238,10 @@ private:
                 case Flaw::zeroStep: argument.scalar = 0; break;
             }
         }
-        return contract_.invoke(contract_.function, arguments);
+        const QorResult result = contract_.invoke(contract_.function, arguments);
+        if (result == QOR_OK && has(contract_.name, "qoriDCT") && has(contract_.name, "InitAlloc"))
+            qorFree(entries[0][0]);
+        return result;
     }
 
     const Contract& contract_;

@@ -2,6 +2,7 @@
 // Cosine transforms by their definition, one sum per coefficient and direction.
 #pragma once
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <cstdint>
 #include <numbers>
@@ -9,30 +10,34 @@
 
 namespace qori::test::reference {
 
-/// Basis of the orthonormal DCT-II of n points: row k holds frequency k.
-inline std::vector<double> cosineBasis(int n) {
-    std::vector<double> basis(static_cast<size_t>(n) * static_cast<size_t>(n));
-    for (int k = 0; k < n; ++k)
-        for (int x = 0; x < n; ++x) {
-            // The angle is reduced exactly, in integers, before it meets pi.
-            const auto turns = static_cast<int64_t>(2 * x + 1) * k % (4 * int64_t{n});
-            const long double angle = std::numbers::pi_v<long double> * static_cast<long double>(turns) / (2 * n);
-            const long double scale = std::sqrt((k == 0 ? 1.0L : 2.0L) / n);
-            basis[static_cast<size_t>(k * n + x)] = static_cast<double>(scale * std::cos(angle));
-        }
-    return basis;
-}
+/// The basis of the orthonormal DCT-II of n points.
+class CosineBasis {
+public:
+    explicit CosineBasis(int n) : n_(n), cosines_(4 * static_cast<size_t>(n)) {
+        for (int j = 0; j < 4 * n; ++j)
+            cosines_[static_cast<size_t>(j)] =
+                static_cast<double>(std::cos(std::numbers::pi_v<long double> * j / (2 * static_cast<long double>(n))));
+    }
+    /// Of frequency k at element x.
+    double operator()(int k, int x) const {
+        const auto turn = static_cast<size_t>((2 * int64_t{x} + 1) * k % (4 * int64_t{n_}));
+        return cosines_[turn] * std::sqrt((k == 0 ? 1.0 : 2.0) / n_);
+    }
+
+private:
+    int n_;
+    std::vector<double> cosines_;
+};
 
 /// Along each row of n elements, `rows` of them: frequencies, or elements of frequencies where it is inverse.
 inline std::vector<double> transformRows(const std::vector<double>& in, int n, int rows, bool inverse) {
-    const std::vector<double> basis = cosineBasis(n);
+    const CosineBasis basis(n);
     std::vector<double> out(in.size());
-    for (int y = 0; y < rows; ++y)
-        for (int k = 0; k < n; ++k) {
-            double sum = 0;
-            for (int x = 0; x < n; ++x)
-                sum += in[static_cast<size_t>(y * n + x)] * basis[static_cast<size_t>(inverse ? x * n + k : k * n + x)];
-            out[static_cast<size_t>(y * n + k)] = sum;
+    for (int k = 0; k < n; ++k)
+        for (int x = 0; x < n; ++x) {
+            const double weight = inverse ? basis(x, k) : basis(k, x);
+            for (int y = 0; y < rows; ++y)
+                out[static_cast<size_t>(y * n + k)] += in[static_cast<size_t>(y * n + x)] * weight;
         }
     return out;
 }
@@ -53,9 +58,14 @@ inline std::vector<double> cosineTransform(const std::vector<double>& in, int wi
 
 /// An 8x8 block by the basis as it was made once.
 inline std::vector<double> blockTransform(const std::vector<double>& in, bool inverse) {
-    static const std::vector<double> basis = cosineBasis(8);
+    static const std::array<std::array<double, 8>, 8> basis = [] {
+        std::array<std::array<double, 8>, 8> made;
+        for (int k = 0; k < 8; ++k)
+            for (int x = 0; x < 8; ++x) made[static_cast<size_t>(k)][static_cast<size_t>(x)] = CosineBasis(8)(k, x);
+        return made;
+    }();
     std::vector<double> rows(64), out(64);
-    const auto weight = [&](size_t k, size_t x) { return basis[inverse ? x * 8 + k : k * 8 + x]; };
+    const auto weight = [&](size_t k, size_t x) { return inverse ? basis[x][k] : basis[k][x]; };
     for (size_t y = 0; y < 8; ++y)
         for (size_t k = 0; k < 8; ++k)
             for (size_t x = 0; x < 8; ++x) rows[8 * y + k] += in[8 * y + x] * weight(k, x);
