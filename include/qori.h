@@ -2791,7 +2791,6 @@ QORI_API QorResult QORI_CALL qoriDCTInv_32f_AC4R(const float* pSrc, int32_t srcS
  *            pi / 16), C(0) = 1 / sqrt(2) and C(k) = 1 otherwise: the orthonormal DCT-II. F(0, 0) is the sum
  *            divided by 8. Single precision: the error of a coefficient is below 2^-22 of the root of the sum
  *            of squares.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Notes     A factorisation into rotations by tangents, rows first, and one scaling of each coefficient by a
  *            table.
@@ -2804,7 +2803,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_32f_C1I(float* pSrcDst);
  *  Shapes    64 contiguous coefficients to 64 contiguous pixels, as qoriDCT8x8Fwd_32f_C1 orders them.
  *  Elements  The exact inverse of the forward transform but for rounding: the error of a pixel is below 2^-22
  *            of the root of the sum of squares.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
@@ -2816,7 +2814,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8Inv_32f_C1I(float* pSrcDst);
  *            v.
  *  Elements  The orthonormal DCT-II of qoriDCT8x8Fwd_32f_C1: F(0, 0) is the sum divided by 8. Any pixels; each
  *            coefficient is within 1 of the exact one rounded to nearest, and saturates.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Notes     Pixels from -256 to 255 take 16-bit fixed point: columns by rotations in Q15 with three more bits
  *            than the pixels, rows by products of 16 bits, summed in 32. Blocks with other pixels go through
@@ -2858,7 +2855,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8FwdLS_8u16s_C1R(const uint8_t* pSrc, int3
  *  Elements  The inverse of qoriDCT8x8Fwd_16s_C1. Any coefficients; each pixel is within 1 of the exact one
  *            rounded to nearest, and saturates. Meets IEEE 1180-1990. A block of F(0, 0) alone gives floor(F(0,
  *            0) / 8 + 1/2) everywhere.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Notes     Blocks of coefficients from -8191 to 8191 whose pixels are from -360 to 360 take 16-bit fixed
  *            point: rows by products of 16 bits, summed in 32, columns by rotations in Q15 with six more bits
@@ -2898,7 +2894,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8InvLSClip_16s8u_C1R(const int16_t* pSrc, 
  *  Shapes    64 contiguous coefficients to 64 contiguous pixels, all of them written. Only the first 2 or 4 of
  *            the first 2 or 4 rows are read: the others count as zero, whatever they are.
  *  Elements  Bit for bit what qoriDCT8x8Inv_16s_C1 makes of the block with the other coefficients at zero.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
@@ -2911,9 +2906,7 @@ QORI_API QorResult QORI_CALL qoriDCT8x8Inv_4x4_16s_C1I(int16_t* pSrcDst);
  *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 64 contiguous pixels, row by
  *            row.
  *  Elements  As qoriDCT8x8Inv_16s_C1, always in single precision: pixels are the exact ones rounded to nearest
- *            but where these are within 2^-6 of a half (coefficients below 2^15; within 2^-9 for those of ten-
- *            bit pixels).
- *  Units     Steps in bytes, at least 1, of any alignment.
+ *            but where these are within 2^-6 of a half.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
@@ -2925,7 +2918,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8Inv_A10_16s_C1I(int16_t* pSrcDst);
  *            written, row by row; in place the other 60 stay.
  *  Elements  The orthonormal inverse of 2x2 coefficients, divided by 4, so that means are kept: (F(0, 0) +-
  *            F(1, 0) +- F(0, 1) +- F(1, 1)) / 8, exactly, to nearest, halves up.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
@@ -2937,7 +2929,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8To2x2Inv_16s_C1I(int16_t* pSrcDst);
  *            elements are written, row by row; in place the other 48 stay.
  *  Elements  The orthonormal inverse of 4x4 coefficients, divided by 2, so that means are kept. Single
  *            precision, to nearest, halves up, saturated: within 1 of the exact pixel rounded.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
@@ -2947,7 +2938,6 @@ QORI_API QorResult QORI_CALL qoriDCT8x8To4x4Inv_16s_C1I(int16_t* pSrcDst);
 /** Puts a block's coefficients in zig-zag order.
  *  Shapes    pDst[i] = pSrc[z(i)] for 64 contiguous elements; z = 0, 1, 8, 16, 9, 2, 3, 10, ..., 55, 62, 63
  *            runs along the block's diagonals as in JPEG (ITU-T T.81, figure 5).
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
@@ -2955,7 +2945,6 @@ QORI_API QorResult QORI_CALL qoriZigzagFwd8x8_16s_C1(const int16_t* pSrc, int16_
 
 /** Puts coefficients in zig-zag order back into rows.
  *  Shapes    pDst[z(i)] = pSrc[i] for 64 contiguous elements, z as of qoriZigzagFwd8x8_16s_C1.
- *  Units     Steps in bytes, at least 1, of any alignment.
  *  Aliasing  pSrc may be pDst; other overlaps are undefined.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
  */
