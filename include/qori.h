@@ -251,6 +251,12 @@ typedef struct QorResizePlan QorResizePlan;
  *  trusted memory: see Plans above. */
 typedef struct QorHistogramSpec QorHistogramSpec;
 
+/** Tables of a cosine transform of images, in the caller's memory: as many bytes as qoriDCTFwdGetSize_32f reports, at any
+ *  address, or from qoriDCTFwdInitAlloc_32f. The plan begins at the next multiple of 64 and may be copied to a block whose
+ *  address is equal modulo 64. Once filled it is only read: any number of threads may use it at once, each with a work
+ *  buffer of its own. It is trusted memory: see Plans above. */
+typedef struct QorDct2DPlan QorDct2DPlan;
+
 /** Version record of the library. */
 typedef struct QorLibraryVersion {
     int32_t versionMajor;
@@ -2699,6 +2705,278 @@ QORI_API QorResult QORI_CALL qoriDup_8u_C1C3R(const uint8_t* pSrc, int32_t srcSt
     QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriDup_8u_C1C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
     QorImageSize roiSize);
+
+/* ---- Cosine transform of images ------------------------------------------------------------------------------- */
+
+/** Reports how many bytes a plan, the buffer for its initialisation and the work buffer take, at any alignment.
+ *  Shapes    roiSize: any size. hint is kept in the plan; every value gives the same results.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Notes     The buffer for the initialisation may be of 0 bytes. The work buffer serves images of any layout.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (a block of 2^31 bytes or more); then nothing is written.
+ *  Example   int32_t planBytes, initBytes, bufferBytes;   // the spectrum of a picture
+ *            qoriDCTFwdGetSize_32f(roi, hintFast, &planBytes, &initBytes, &bufferBytes);
+ *            QorDct2DPlan* plan = malloc(planBytes);
+ *            uint8_t *init = malloc(initBytes), *buffer = malloc(bufferBytes);
+ *            qoriDCTFwdInit_32f(roi, hintFast, plan, init);
+ *            qoriDCTFwd_32f_C1R(src, srcStep, dst, dstStep, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdGetSize_32f(QorImageSize roiSize, int32_t hint, int32_t* pPlanSize,
+    int32_t* pInitBufSize, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriDCTInvGetSize_32f(QorImageSize roiSize, int32_t hint, int32_t* pPlanSize,
+    int32_t* pInitBufSize, int32_t* pBufSize);
+
+/** Makes a plan in memory of the caller.
+ *  Shapes    pPlan and pInitBuf: as many bytes as the size query reports, at any alignment. pInitBuf is not
+ *            looked at where that is 0.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Notes     Plans of both directions are alike: either serves the forward and the inverse transform.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_SIZE (a block of 2^31 bytes or more), QOR_ERR_NULL_PTR (a buffer is wanted and there is
+ *            none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdInit_32f(QorImageSize roiSize, int32_t hint, QorDct2DPlan* pPlan,
+    uint8_t* pInitBuf);
+QORI_API QorResult QORI_CALL qoriDCTInvInit_32f(QorImageSize roiSize, int32_t hint, QorDct2DPlan* pPlan,
+    uint8_t* pInitBuf);
+
+/** Makes a plan in memory from qorMalloc, to be released with qoriDCTFwdFree_32f or qoriDCTInvFree_32f.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Notes     The buffer for the initialisation comes from qorMalloc too, for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1), QOR_ERR_SIZE (a block of 2^31 bytes or more), QOR_ERR_NO_MEMORY (an allocation failed: what
+ *            was allocated is freed); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdInitAlloc_32f(QorDct2DPlan** ppPlan, QorImageSize roiSize, int32_t hint);
+QORI_API QorResult QORI_CALL qoriDCTInvInitAlloc_32f(QorDct2DPlan** ppPlan, QorImageSize roiSize, int32_t hint);
+
+/** Releases a plan that qoriDCTFwdInitAlloc_32f or qoriDCTInvInitAlloc_32f made.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdFree_32f(QorDct2DPlan* pPlan);
+QORI_API QorResult QORI_CALL qoriDCTInvFree_32f(QorDct2DPlan* pPlan);
+
+/** Reports how many bytes of work buffer a plan takes, at any alignment; each thread needs a buffer of its own.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwdGetBufSize_32f(const QorDct2DPlan* pPlan, int32_t* pBufSize);
+QORI_API QorResult QORI_CALL qoriDCTInvGetBufSize_32f(const QorDct2DPlan* pPlan, int32_t* pBufSize);
+
+/** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha.
+ *  Shapes    W x H pixels, the plan's size, to as many coefficients: row v holds vertical frequency v, column u
+ *            horizontal frequency u.
+ *  Elements  The orthonormal DCT-II: F(u, v) = c(u, W) c(v, H) * the sum over x and y of f(x, y) cos((2x + 1) u
+ *            pi / 2W) cos((2y + 1) v pi / 2H), c(0, n) = sqrt(1 / n), c(k, n) = sqrt(2 / n) otherwise. Single
+ *            precision: the RMS error is about 2e-7 of the result's RMS.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise images must not overlap. pBuffer must not
+ *            overlap anything.
+ *  Notes     A Fourier transform of the reordered elements (Makhoul, 1980), along rows and then down columns:
+ *            work grows as n log n for every size, primes included.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform), QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTFwd_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+
+/** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha.
+ *  Shapes    W x H coefficients, the plan's size, to as many pixels.
+ *  Elements  The orthonormal DCT-III, the inverse of the forward transform. Single precision: the RMS error is
+ *            about 2e-7 of the result's RMS.
+ *  Units     Steps in bytes, at least 1, of any alignment; roiSize in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise images must not overlap. pBuffer must not
+ *            overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (no plan of a cosine
+ *            transform), QOR_ERR_NULL_PTR (pSrc, pDst or pBuffer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDCTInv_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    const QorDct2DPlan* pPlan, uint8_t* pBuffer);
+
+/* ---- Cosine transform of 8x8 blocks --------------------------------------------------------------------------- */
+
+/** The forward cosine transform of a block of floats.
+ *  Shapes    64 contiguous pixels, row by row, to 64 contiguous coefficients: row v holds vertical frequency v,
+ *            column u horizontal frequency u.
+ *  Elements  F(u, v) = C(u) C(v) / 4 * the sum over x and y of f(x, y) cos((2x + 1) u pi / 16) cos((2y + 1) v
+ *            pi / 16), C(0) = 1 / sqrt(2) and C(k) = 1 otherwise: the orthonormal DCT-II. F(0, 0) is the sum
+ *            divided by 8. Single precision: the error of a coefficient is below 2^-22 of the root of the sum
+ *            of squares.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Notes     A factorisation into rotations by tangents, rows first, and one scaling of each coefficient by a
+ *            table.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_32f_C1(const float* pSrc, float* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_32f_C1I(float* pSrcDst);
+
+/** The inverse cosine transform of a block of floats.
+ *  Shapes    64 contiguous coefficients to 64 contiguous pixels, as qoriDCT8x8Fwd_32f_C1 orders them.
+ *  Elements  The exact inverse of the forward transform but for rounding: the error of a pixel is below 2^-22
+ *            of the root of the sum of squares.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_32f_C1(const float* pSrc, float* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_32f_C1I(float* pSrcDst);
+
+/** The forward cosine transform of a block of 16-bit pixels.
+ *  Shapes    64 contiguous pixels, row by row, to 64 contiguous coefficients, row v of them vertical frequency
+ *            v.
+ *  Elements  The orthonormal DCT-II of qoriDCT8x8Fwd_32f_C1: F(0, 0) is the sum divided by 8. Any pixels; each
+ *            coefficient is within 1 of the exact one rounded to nearest, and saturates.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Notes     Pixels from -256 to 255 take 16-bit fixed point: columns by rotations in Q15 with three more bits
+ *            than the pixels, rows by products of 16 bits, summed in 32. Blocks with other pixels go through
+ *            single precision, more slowly.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ *  Example   int16_t coefficients[64], scan[64];   // a block of pixels, centred around 0, transformed and in the order of a codec
+ *            qoriDCT8x8FwdLS_8u16s_C1R(pixels, step, coefficients, -128);
+ *            qoriZigzagFwd8x8_16s_C1(coefficients, scan);
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_16s_C1I(int16_t* pSrcDst);
+
+/** The forward cosine transform of 8x8 pixels of an image.
+ *  Shapes    8 rows of 8 pixels to 64 contiguous coefficients, row v of them vertical frequency v.
+ *  Elements  As qoriDCT8x8Fwd_16s_C1.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  Rows of 16s may lie in pDst, as its own rows; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Fwd_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst);
+
+/** The forward cosine transform of 8x8 pixels of an image, with a value added to each.
+ *  Shapes    8 rows of 8 pixels to 64 contiguous coefficients, row v of them vertical frequency v.
+ *  Elements  As qoriDCT8x8Fwd_16s_C1 of the pixels plus addVal, which wrap around to 16 bits. -128 centres the
+ *            pixels around 0. addVal from -256 to 0 is the fast case.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  The image must not overlap pDst.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8FwdLS_8u16s_C1R(const uint8_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int16_t addVal);
+
+/** The inverse cosine transform of a block of 16-bit coefficients.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 64 contiguous pixels, row by
+ *            row.
+ *  Elements  The inverse of qoriDCT8x8Fwd_16s_C1. Any coefficients; each pixel is within 1 of the exact one
+ *            rounded to nearest, and saturates. Meets IEEE 1180-1990. A block of F(0, 0) alone gives floor(F(0,
+ *            0) / 8 + 1/2) everywhere.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Notes     Blocks of coefficients from -8191 to 8191 whose pixels are from -360 to 360 take 16-bit fixed
+ *            point: rows by products of 16 bits, summed in 32, columns by rotations in Q15 with six more bits
+ *            than the pixels. Other blocks go through single precision, more slowly.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s_C1I(int16_t* pSrcDst);
+
+/** The inverse cosine transform into 8x8 pixels of an image.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 8 rows of 8 pixels.
+ *  Elements  As qoriDCT8x8Inv_16s_C1; 8u pixels saturate to 0 to 255.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  Rows of 16s may lie in pSrc, as its own rows; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s_C1R(const int16_t* pSrc, int16_t* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_16s8u_C1R(const int16_t* pSrc, uint8_t* pDst, int32_t dstStep);
+
+/** The inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two
+ *  bounds.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 8 rows of 8 pixels.
+ *  Elements  As qoriDCT8x8Inv_16s_C1; then addVal is added, which wraps around to 16 bits, pixels saturate to 0
+ *            to 255, are raised to at least clipDown and then lowered to at most clipUp: clipUp everywhere
+ *            where it is below clipDown.
+ *  Units     Steps in bytes, at least 1, of any alignment.
+ *  Aliasing  The image must not overlap pSrc.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1); then
+ *            nothing is written.
+ *  Example   qoriDCT8x8InvLSClip_16s8u_C1R(coefficients, pixels, step, 128, 16, 235);   // levels of studio video
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8InvLSClip_16s8u_C1R(const int16_t* pSrc, uint8_t* pDst, int32_t dstStep,
+    int16_t addVal, uint8_t clipDown, uint8_t clipUp);
+
+/** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4.
+ *  Shapes    64 contiguous coefficients to 64 contiguous pixels, all of them written. Only the first 2 or 4 of
+ *            the first 2 or 4 rows are read: the others count as zero, whatever they are.
+ *  Elements  Bit for bit what qoriDCT8x8Inv_16s_C1 makes of the block with the other coefficients at zero.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_2x2_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_2x2_16s_C1I(int16_t* pSrcDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_4x4_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_4x4_16s_C1I(int16_t* pSrcDst);
+
+/** The inverse cosine transform of a block of 16-bit coefficients, for pixels of ten bits and more.
+ *  Shapes    64 contiguous coefficients, row v of them vertical frequency v, to 64 contiguous pixels, row by
+ *            row.
+ *  Elements  As qoriDCT8x8Inv_16s_C1, always in single precision: pixels are the exact ones rounded to nearest
+ *            but where these are within 2^-6 of a half.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_A10_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8Inv_A10_16s_C1I(int16_t* pSrcDst);
+
+/** Makes 2x2 pixels of a block's coefficients, a quarter of its size in each direction.
+ *  Shapes    pSrc: 64 coefficients, of which those at 0, 1, 8 and 9 are read. pDst: its first 4 elements are
+ *            written, row by row; in place the other 60 stay.
+ *  Elements  The orthonormal inverse of 2x2 coefficients, divided by 4, so that means are kept: (F(0, 0) +-
+ *            F(1, 0) +- F(0, 1) +- F(1, 1)) / 8, exactly, to nearest, halves up.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8To2x2Inv_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8To2x2Inv_16s_C1I(int16_t* pSrcDst);
+
+/** Makes 4x4 pixels of a block's coefficients, half of its size in each direction.
+ *  Shapes    pSrc: 64 coefficients, of which the first 4 of the first 4 rows are read. pDst: its first 16
+ *            elements are written, row by row; in place the other 48 stay.
+ *  Elements  The orthonormal inverse of 4x4 coefficients, divided by 2, so that means are kept. Single
+ *            precision, to nearest, halves up, saturated: within 1 of the exact pixel rounded.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDCT8x8To4x4Inv_16s_C1(const int16_t* pSrc, int16_t* pDst);
+QORI_API QorResult QORI_CALL qoriDCT8x8To4x4Inv_16s_C1I(int16_t* pSrcDst);
+
+/** Puts a block's coefficients in zig-zag order.
+ *  Shapes    pDst[i] = pSrc[z(i)] for 64 contiguous elements; z = 0, 1, 8, 16, 9, 2, 3, 10, ..., 55, 62, 63
+ *            runs along the block's diagonals as in JPEG (ITU-T T.81, figure 5).
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriZigzagFwd8x8_16s_C1(const int16_t* pSrc, int16_t* pDst);
+
+/** Puts coefficients in zig-zag order back into rows.
+ *  Shapes    pDst[z(i)] = pSrc[i] for 64 contiguous elements, z as of qoriZigzagFwd8x8_16s_C1.
+ *  Aliasing  pSrc may be pDst; other overlaps are undefined.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriZigzagInv8x8_16s_C1(const int16_t* pSrc, int16_t* pDst);
 
 /* ---- Fourier transforms of any size --------------------------------------------------------------------------- */
 

@@ -199,6 +199,23 @@ QorFft2DPlan* fourierPlan(Input& in) {
     return allocatedPlan;
 }
 
+/// None where the size is refused: the tag is gone then.
+QorDct2DPlan* cosinePlan(Input& in) {
+    auto* plan = reinterpret_cast<QorDct2DPlan*>(planMemory() + in.upTo(63));
+    static uint8_t init[1 << 18];
+    std::memset(planMemory(), 0, 256);
+    qoriDCTFwdInit_32f(in.size(), 0, plan, init);
+    return plan;
+}
+
+/// Where a plan in memory of its own is stored; the plan before it is released.
+QorDct2DPlan** newCosinePlan(Input& in) {
+    static QorDct2DPlan* plan;
+    if (plan != nullptr) qoriDCTFwdFree_32f(plan);
+    plan = nullptr;
+    return in.take<uint8_t>() >= 250 ? nullptr : &plan;
+}
+
 template <class T>
 T argument(Input& in) {
     const bool isStep = std::exchange(in.stepFollows, false);
@@ -216,6 +233,10 @@ T argument(Input& in) {
         return in.take<uint8_t>() >= 250 ? nullptr : &allocatedPlan;
     } else if constexpr (std::is_same_v<T, QorFft2DPlan*>) {
         return in.releases ? fourierPlan(in) : reinterpret_cast<T>(in.memory());
+    } else if constexpr (std::is_same_v<T, const QorDct2DPlan*>) {
+        return cosinePlan(in);
+    } else if constexpr (std::is_same_v<T, QorDct2DPlan**>) {
+        return newCosinePlan(in);
     } else if constexpr (std::is_pointer_v<T> && std::is_pointer_v<std::remove_pointer_t<T>>) {
         // As many as the next integer may say, of four kinds.
         static uint8_t* planes[kMostStep];
