@@ -106,7 +106,8 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_WEIGHT", QOR_ERR_WEIGHT},
                                 {"QOR_ERR_STEP_ALIGN", QOR_ERR_STEP_ALIGN},
                                 {"QOR_ERR_BORDER", QOR_ERR_BORDER},
-                                {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED}};
+                                {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED},
+                                {"QOR_ERR_ALGORITHM", QOR_ERR_ALGORITHM}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
 
