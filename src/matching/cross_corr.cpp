@@ -3,6 +3,7 @@
 #include "direct.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
+#include "transform.h"
 
 namespace qori::matching {
 namespace {
@@ -32,34 +33,71 @@ Problem problemOf(QorImageSize src, QorImageSize tpl, int32_t algorithm) {
     return {src, tpl, shapes[algorithm >> 16 & 3], kinds[algorithm & 3], hints[algorithm >> 8 & 3]};
 }
 
+enum class Way { pairs, doubles, transform };
+
+/// Nanoseconds, about, of one result's multiplications.
+template <class T>
+constexpr double kDirectCost = sizeof(T) == 1 ? 0.02 : 0.06;
+
+/// Templates whose width and height leave direct sums a chance, for those who ask for them.
+bool isSmall(const Problem& problem) {
+    const QorImageSize tpl = problem.tpl;
+    return tpl.width <= 27 || !((tpl.height >= 11 && problem.src.width > 44) || tpl.width > 64);
+}
+
+template <class T>
+Way wayOf(const Problem& problem) {
+    const bool isDirect = problem.area() < kernels::correlation::kMostPairTaps && isSmall(problem);
+    const Way direct = sizeof(T) == 1 ? Way::pairs : Way::doubles;
+    if (problem.hint == Hint::direct && isDirect) return direct;
+    if (problem.hint != Hint::none || problem.area() >= kernels::correlation::kMostPairTaps) return Way::transform;
+    constexpr int64_t kSurelyDirect = 64;
+    if (problem.area() <= kSurelyDirect) return direct;
+    const double results = static_cast<double>(problem.width()) * static_cast<double>(problem.height());
+    const double cost = results * static_cast<double>(problem.area()) * kDirectCost<T>;
+    return cost < TransformPlan(problem).cost ? direct : Way::transform;
+}
+
 /// Bytes of work memory for elements of a kind, slack for its alignment included.
 template <class T>
 int64_t workBytes(const Problem& problem) {
-    if (sizeof(T) == 1 && problem.area() < kernels::correlation::kMostPairTaps)
-        return DirectWork<CellOf<T>>(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();
-    return DirectWork<double>(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();
+    switch (wayOf<T>(problem)) {
+        case Way::pairs: return DirectWork<Pair>(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();
+        case Way::doubles: return DirectWork<double>(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();
+        default: return TransformWork(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();
+    }
 }
 
-template <class Cell, class T, class D>
-void runDirect(Channel<T, D> channel, int processed, uint8_t* memory) {
-    DirectWork<Cell> work(channel.problem, kIsExact<T>, WorkBuffer(memory));
+/// Runs the channels of a call one after the other; runOne takes the channel.
+template <class T, class D, class RunOne>
+void forChannels(Channel<T, D> channel, int processed, RunOne runOne) {
     for (int c = 0; c < processed; ++c) {
-        Direct<T, D, Cell>(channel, work).run();
+        runOne(channel);
         ++channel.src.data;
         ++channel.tpl.data;
         ++channel.dst.data;
     }
 }
 
+template <class Cell, class T, class D>
+void runDirect(const Channel<T, D>& all, int processed, uint8_t* memory) {
+    DirectWork<Cell> work(all.problem, kIsExact<T>, WorkBuffer(memory));
+    forChannels(all, processed, [&](const Channel<T, D>& channel) { Direct<T, D, Cell>(channel, work).run(); });
+}
+
 template <class T, class D>
-QORI_NOINLINE QorResult correlate(const Channel<T, D>& channel, int processed, uint8_t* memory) {
-    return underDefaultControl([&] {
-        if (sizeof(T) == 1 && channel.problem.area() < kernels::correlation::kMostPairTaps)
-            runDirect<CellOf<T>>(channel, processed, memory);
-        else
-            runDirect<double>(channel, processed, memory);
-        return QOR_OK;
-    });
+void runTransform(const Channel<T, D>& all, int processed, uint8_t* memory) {
+    TransformWork work(all.problem, kIsExact<T>, WorkBuffer(memory));
+    work.makeTables();
+    forChannels(all, processed, [&](const Channel<T, D>& channel) { Transform<T, D>(channel, work).run(); });
+}
+
+template <class T, class D>
+QORI_NOINLINE void correlate(const Channel<T, D>& channel, int processed, uint8_t* memory) {
+    if (wayOf<T>(channel.problem) == Way::transform)
+        runTransform(channel, processed, memory);
+    else
+        runDirect<CellOf<T>>(channel, processed, memory);
 }
 
 template <class T, class D, Layout layout>
@@ -67,10 +105,13 @@ QorResult crossCorr(Shape shape, Kind kind, Image<const T> src, QorImageSize src
                     QorImageSize tplRoi, Image<D> dst, int32_t scale = 0) {
     if (QorResult r = firstOf(nullCheck(src, tpl, dst), sizesCheck(srcRoi, tplRoi), stepCheck(src, tpl, dst))) return r;
     const Problem problem{srcRoi, tplRoi, shape, kind};
-    const WorkMemory memory(workBytes<T>(problem));
-    if (QorResult r = memory.check()) return r;
-    return correlate<T, D>({problem, src, tpl, dst, channels(layout), scale}, processedChannels(layout),
-                           memory.begin<uint8_t>(1));
+    return underDefaultControl([&]() -> QorResult {
+        const WorkMemory memory(workBytes<T>(problem));
+        if (QorResult r = memory.check()) return r;
+        correlate<T, D>({problem, src, tpl, dst, channels(layout), scale}, processedChannels(layout),
+                        memory.begin<uint8_t>(1));
+        return QOR_OK;
+    });
 }
 
 template <class T, class D>
@@ -80,15 +121,20 @@ QorResult crossCorrNorm(Image<const T> src, QorImageSize srcRoi, Image<const T> 
                               nullCheck(buffer), algorithmCheck(algorithm)))
         return r;
     const Problem problem = problemOf(srcRoi, tplRoi, algorithm);
-    return correlate<T, D>({problem, src, tpl, dst, 1, scale}, 1, buffer);
+    return underDefaultControl([&]() -> QorResult {
+        correlate<T, D>({problem, src, tpl, dst, 1, scale}, 1, buffer);
+        return QOR_OK;
+    });
 }
 
 QorResult crossCorrNormGetBufferSize(QorImageSize srcRoi, QorImageSize tplRoi, int32_t algorithm, int32_t* bufferSize) {
     if (QorResult r = firstOf(nullCheck(bufferSize), sizesCheck(srcRoi, tplRoi), algorithmCheck(algorithm))) return r;
     const Problem problem = problemOf(srcRoi, tplRoi, algorithm);
-    const int64_t bytes =
-        std::max({workBytes<uint8_t>(problem), workBytes<uint16_t>(problem), workBytes<float>(problem)});
-    return reportSize(bytes, bufferSize);
+    return underDefaultControl([&]() -> QorResult {
+        const int64_t bytes =
+            std::max({workBytes<uint8_t>(problem), workBytes<uint16_t>(problem), workBytes<float>(problem)});
+        return reportSize(bytes, bufferSize);
+    });
 }
 
 }  // namespace

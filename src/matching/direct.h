@@ -26,7 +26,7 @@ public:
           crosses(memory.take<Cell>(pitch_ * kernels::correlation::kCrossRows)),
           results(memory.take<double>(pitch_)),
           row(memory.take<double>(std::max<int64_t>(cellPitch_, problem.tpl.width) + 1)),
-          sums(problem, tile_.width, isExact, memory),
+          sums(problem, problem.kind, tile_.width, isExact, memory),
           bytes_(memory.bytes()) {}
 
     int64_t bytes() const { return bytes_; }

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // What is known of a template beforehand.
 #pragma once
+#include <bit>
 #include <cmath>
 
 #include "problem.h"
@@ -43,7 +44,8 @@ TemplateSums sumTemplate(const Channel<T, D>& channel, double* row) {
             forTaps(channel, mean, row, [&](double tap) { finish.tapSum += tap; });
             // Each column of a window is up to its height of additions, then twice the logarithm of its width of them
             // along the row; a sum of values enters squared.
-            const double depth = 3.0 + problem.tpl.height + 2 * std::ilogb(problem.tpl.width);
+            const double depth =
+                3.0 + problem.tpl.height + 2 * std::bit_width(static_cast<uint32_t>(problem.tpl.width));
             finish.roundings = 3 * depth * 0x1p-53;
         }
     }

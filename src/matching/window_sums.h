@@ -16,8 +16,9 @@ class WindowSums {
 public:
     using Sums = kernels::correlation::Sums<Cell>;
 
-    WindowSums(const Problem& problem, int64_t tileWidth, bool isExact, WorkBuffer& memory)
-        : kind_(problem.kind), height_(problem.tpl.height), span_(problem.tpl.width), isExact_(isExact) {
+    /// What results of the kind need, for tiles of so many columns.
+    WindowSums(const Problem& problem, Kind kind, int64_t tileWidth, bool isExact, WorkBuffer& memory)
+        : kind_(kind), height_(problem.tpl.height), span_(problem.tpl.width), isExact_(isExact) {
         if (kind_ == Kind::plain) return;
         pitch_ = roundUp(tileWidth + span_, kernels::correlation::kBlockCells<Cell>) +
                  kernels::correlation::kBlockCells<Cell>;

@@ -60,6 +60,28 @@ void finishRow(const Finish& finish, const Cell* crosses, Sums<Cell> sums, ptrdi
 template void finishRow<Pair>(const Finish&, const Pair*, Sums<Pair>, ptrdiff_t, double*);
 template void finishRow<double>(const Finish&, const double*, Sums<double>, ptrdiff_t, double*);
 
+ptrdiff_t nextFaint(const Finish& finish, Sums<double> sums, double faintest, ptrdiff_t x, ptrdiff_t n) {
+    const bool isCentred = finish.kind == Kind::normLevel;
+    const Vec<double> area = splat(finish.area), limit = splat(isCentred ? faintest * finish.area : faintest);
+    const Vec<double> least = splat(isCentred ? finish.norm * 0x1p-23 * finish.area : 0.0);
+    const Vec<double> roundings = splat(finish.roundings * finish.area);
+    for (; x < n; x += Vec<double>::lanes) {
+        const Vec<double> s2 = load(sums.squares + x);
+        Vec<double> energy = s2;
+        Mask<double> isFlat = isAtMost(s2, least);
+        if (isCentred) {
+            const Vec<double> s1 = load(sums.values + x);
+            energy = productDifference(area, s2, s1, s1);
+            isFlat = isLess(energy, least) | isAtMost(energy, roundings * s2);
+        } else if (finish.kind == Kind::plain) {
+            isFlat = {_mm256_setzero_si256()};
+        }
+        const Mask<double> isFaint = ~(isAtMost(limit, energy) | isFlat);
+        if (any(isFaint)) return std::min<ptrdiff_t>(x + firstSelected(isFaint), n);
+    }
+    return n;
+}
+
 template <class D>
 void storeRow(const double* results, int32_t scale, D* row, int channels, ptrdiff_t n) {
     const auto put = [=](auto convert) {

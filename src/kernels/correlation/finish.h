@@ -23,6 +23,10 @@ struct Finish {
 template <class Cell>
 void finishRow(const Finish& finish, const Cell* crosses, Sums<Cell> sums, ptrdiff_t n, double* results);
 
+/// The first of the windows from x on, or n, whose energy (V, or S2 where the kind is not normLevel) is below
+/// `faintest` or not a number, though the result needs its cross sum. n is as in finishRow.
+ptrdiff_t nextFaint(const Finish& finish, Sums<double> sums, double faintest, ptrdiff_t x, ptrdiff_t n);
+
 /// Every channels-th element of the row. 8u: the float result times 2^-scale, to nearest, ties to even, saturated.
 template <class D>
 void storeRow(const double* results, int32_t scale, D* row, int channels, ptrdiff_t n);
