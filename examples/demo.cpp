@@ -93,7 +93,8 @@ void run(const char* photoFile, const char* sheetFile, const char* fontFile) {
     const Typeface type(fontFile);
     std::vector<Panel> panels;
     for (const auto& family : {copyPanels(), borderPanels(), arithPanels(), thresholdPanels(), tablePanels(),
-                               statsPanels(), filterPanels(), morphologyPanels(), medianPanels(), resizePanels()})
+                               statsPanels(), filterPanels(), morphologyPanels(), medianPanels(), resizePanels(),
+                               matchingPanels()})
         panels.insert(panels.end(), family.begin(), family.end());
 
     const int rows = (static_cast<int>(panels.size()) + kColumns - 1) / kColumns;

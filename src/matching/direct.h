@@ -104,7 +104,7 @@ private:
 
     void runTile(const Tile& tile) {
         const int64_t rows = tile.height + problem_.tpl.height - 1;
-        const double offset = sourceOffset(channel_, tile, rows);
+        const double offset = sourceOffset(channel_, tile);
         for (int64_t i = 0; i < rows; ++i) {
             auto span = channel_.span(tile, work_.cellPitch());
             const T* const from = channel_.patchRow(tile, i, span);

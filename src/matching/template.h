@@ -55,20 +55,27 @@ TemplateSums sumTemplate(const Channel<T, D>& channel, double* row) {
     return sums;
 }
 
-/// What the elements of a patch are made less by: their mean, wherever centring undoes it, so that a window's energy is
-/// the difference of small numbers. 0 where an element is not finite, which concerns its own windows only.
+/// What the elements of a patch are made less by wherever centring undoes it, so that a window's energy is the
+/// difference of small numbers: the median of some of them. It is one of them, so that constant areas become zeros, and
+/// a few that are huge or not finite do not move it. 0 where there is nothing finite.
 template <class T, class D>
-double sourceOffset(const Channel<T, D>& channel, const Tile& tile, int64_t rows) {
+double sourceOffset(const Channel<T, D>& channel, const Tile& tile) {
     if (kIsExact<T> || channel.problem.kind != Kind::normLevel) return 0;
-    double sum = 0, count = 0;
-    for (int64_t i = 0; i < rows; ++i) {
-        auto span = channel.span(tile, tile.width + channel.problem.tpl.width - 1);
-        const T* const from = channel.patchRow(tile, i, span);
-        sum += kernels::correlation::sumOfElements(from, channel.channels, span.inside);
-        count += static_cast<double>(span.inside);
+    constexpr int kAcross = 8;
+    const QorImageSize tpl = channel.problem.tpl;
+    double samples[kAcross * kAcross];
+    int count = 0;
+    for (int i = 0; i < kAcross; ++i) {
+        auto span = channel.span(tile, tile.width + tpl.width - 1);
+        const T* const from = channel.patchRow(tile, (tile.height + tpl.height - 2) * i / (kAcross - 1), span);
+        for (int j = 0; j < kAcross && span.inside > 0; ++j) {
+            const T sample = from[(span.inside - 1) * j / (kAcross - 1) * channel.channels];
+            if (std::isfinite(sample)) samples[count++] = static_cast<double>(sample);
+        }
     }
-    const double mean = count > 0 ? sum / count : 0;
-    return std::isfinite(mean) ? mean : 0;
+    if (count == 0) return 0;
+    std::nth_element(samples, samples + count / 2, samples + count);
+    return samples[count / 2];
 }
 
 }  // namespace qori::matching

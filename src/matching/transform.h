@@ -186,7 +186,7 @@ private:
         double offsets[TransformWork::kTiles] = {}, squares = 0;
         int64_t rows = 0;
         for (int k = 0; k < count; ++k) {
-            offsets[k] = sourceOffset(channel_, tiles[k], patchRows(tiles[k]));
+            offsets[k] = sourceOffset(channel_, tiles[k]);
             rows = std::max(rows, patchRows(tiles[k]));
         }
         const auto quads = work_.quads(rows);

@@ -64,6 +64,7 @@ public:
     bool stepFollows = false;
     bool countsBits = false;   ///< An integer says how far into the rows the export begins.
     bool countsReach = false;  ///< Integers say how far the export reads around the region.
+    bool isAlgorithm = false;  ///< An integer is a QorCorrelation.
     int channels = 1;          ///< Of the export that is called.
     int32_t dataType = 0;      ///< QorDataType of its first element type.
 
@@ -199,9 +200,10 @@ T argument(Input& in) {
         // Anchors inside small kernels, offsets inside and outside small images; not every one is checked.
         return {in.upTo(5) - (in.upTo(9) == 0), in.upTo(5)};
     } else if constexpr (std::is_same_v<T, int32_t>) {
-        return isStep                        ? in.take<int16_t>() % kMostStep
-               : in.countsBits               ? in.take<int16_t>()
-               : in.countsReach              ? in.upTo(40) - 1
+        return isStep           ? in.take<int16_t>() % kMostStep
+               : in.countsBits  ? in.take<int16_t>()
+               : in.countsReach ? in.upTo(40) - 1
+               : in.isAlgorithm ? in.upTo(2) | in.upTo(2) << 8 | in.upTo(2) << 16 | (in.upTo(15) == 0 ? 3 : 0)
                : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
                : in.take<uint8_t>() % 2 == 0 ? in.upTo(5)  // codes and widths of frames
                                              : in.take<int8_t>();
@@ -272,6 +274,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     in.dataType = target.dataType;
     in.countsBits = std::strstr(target.name, "_1u") != nullptr;
     in.countsReach = std::strstr(target.name, "SumWindow") != nullptr;
+    in.isAlgorithm = std::strstr(target.name, "CrossCorrNorm") != nullptr;
     const QorResult result = target.run(in);
     succeeded[&target - kTargets] |= result >= 0;
     if (!isStatus(result)) {

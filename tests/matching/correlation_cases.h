@@ -68,12 +68,12 @@ struct Scene {
         const int left = reference::axis(job.placement, job.src.width, job.tpl.width).first;
         const int top = reference::axis(job.placement, job.src.height, job.tpl.height).first;
         for (int c = 0; c < processed; ++c) {
-            const auto source = reference::plane(src.template view<S>(channels), job.src, c);
-            const auto pattern = reference::plane(tpl.template view<S>(channels), job.tpl, c);
+            const reference::Correlation correlation(reference::plane(src.template view<S>(channels), job.src, c),
+                                                     reference::plane(tpl.template view<S>(channels), job.tpl, c),
+                                                     job.normaliser);
             for (int y = 0; y < size.height; ++y)
                 for (int x = 0; x < size.width; ++x) {
-                    const double expected =
-                        reference::correlationAt(source, pattern, left + x, top + y, job.normaliser);
+                    const double expected = correlation.at(left + x, top + y);
                     const D result = written.get(x, y, c);
                     ASSERT_TRUE(isClose(result, expected, tolerance))
                         << "(" << x << ", " << y << ", " << c << "): " << +result << ", expected " << expected;

@@ -2,6 +2,7 @@
 // Correlation by its definition, one placement at a time: means first, then sums around them.
 #pragma once
 #include <cmath>
+#include <utility>
 #include <vector>
 
 #include "harness/image.h"
@@ -42,25 +43,46 @@ inline Axis axis(Placement placement, int source, int length) {
     }
 }
 
-/// Of the template at (x, y) of the source, outside of which there are zeros.
-inline double correlationAt(const Plane& source, const Plane& tpl, int x, int y, Normaliser normaliser) {
-    const double area = static_cast<double>(tpl.elements.size());
-    const auto sumOf = [&](auto term) {
-        double sum = 0;
-        for (int j = 0; j < tpl.height; ++j)
-            for (int i = 0; i < tpl.width; ++i) sum += term(source.at(x + i, y + j), tpl.at(i, j));
-        return sum;
-    };
-    const bool centred = normaliser == Normaliser::centred;
-    const double s0 = centred ? sumOf([](double s, double) { return s; }) / area : 0;
-    const double t0 = centred ? sumOf([](double, double t) { return t; }) / area : 0;
-    const double cross = sumOf([=](double s, double t) { return (s - s0) * (t - t0); });
-    if (normaliser == Normaliser::none) return cross;
-    const double window = sumOf([=](double s, double) { return (s - s0) * (s - s0); });
-    const double squares = sumOf([=](double, double t) { return (t - t0) * (t - t0); });
-    if (!centred) return window > 0 && squares > 0 ? cross / std::sqrt(window * squares) : 0;
-    const double epsilon = std::ldexp(1.0, -23), norm = std::sqrt(std::fmax(squares, epsilon));
-    return norm * epsilon > window ? 0 : cross / (std::sqrt(window) * norm);
-}
+/// Of a template and the windows of a source, outside of which there are zeros.
+class Correlation {
+public:
+    Correlation(Plane source, Plane tpl, Normaliser normaliser)
+        : source_(std::move(source)), tpl_(std::move(tpl)), normaliser_(normaliser) {
+        if (isCentred()) {
+            double sum = 0;
+            for (const double tap : tpl_.elements) sum += tap;
+            for (double& tap : tpl_.elements) tap -= sum / area();
+        }
+        for (const double tap : tpl_.elements) squares_ += tap * tap;
+    }
+
+    /// With the template's corner at (x, y) of the source.
+    double at(int x, int y) const {
+        double mean = 0, window = 0, cross = 0;
+        if (isCentred()) forWindow(x, y, [&](double s, double) { mean += s / area(); });
+        forWindow(x, y, [&](double s, double t) {
+            window += (s - mean) * (s - mean);
+            cross += (s - mean) * t;
+        });
+        if (normaliser_ == Normaliser::none) return cross;
+        if (!isCentred()) return window > 0 && squares_ > 0 ? cross / std::sqrt(window * squares_) : 0;
+        const double epsilon = std::ldexp(1.0, -23), norm = std::sqrt(std::fmax(squares_, epsilon));
+        return norm * epsilon > window ? 0 : cross / (std::sqrt(window) * norm);
+    }
+
+private:
+    bool isCentred() const { return normaliser_ == Normaliser::centred; }
+    double area() const { return static_cast<double>(tpl_.elements.size()); }
+    template <class Use>
+    void forWindow(int x, int y, Use use) const {
+        const double* tap = tpl_.elements.data();
+        for (int j = 0; j < tpl_.height; ++j)
+            for (int i = 0; i < tpl_.width; ++i) use(source_.at(x + i, y + j), *tap++);
+    }
+
+    Plane source_, tpl_;
+    Normaliser normaliser_;
+    double squares_ = 0;
+};
 
 }  // namespace qori::test::reference

@@ -45,20 +45,7 @@ void readCells(const T* from, int channels, RowSpan span, int16_t* buffer, Pair*
     }
 }
 
-template <class T>
-double sumOfElements(const T* from, int channels, ptrdiff_t n) {
-    // Four chains: an addition need not wait for the one before.
-    double sums[4] = {};
-    ptrdiff_t x = 0;
-    for (; x + 4 <= n; x += 4)
-        for (int k = 0; k < 4; ++k) sums[k] += static_cast<double>(from[(x + k) * channels]);
-    for (; x < n; ++x) sums[0] += static_cast<double>(from[x * channels]);
-    return (sums[0] + sums[1]) + (sums[2] + sums[3]);
-}
-
-#define QORI_CELLS_OF(T)                                                 \
-    template void readCells<T>(const T*, int, RowSpan, double, double*); \
-    template double sumOfElements<T>(const T*, int, ptrdiff_t);
+#define QORI_CELLS_OF(T) template void readCells<T>(const T*, int, RowSpan, double, double*);
 QORI_CELLS_OF(uint8_t)
 QORI_CELLS_OF(int8_t)
 QORI_CELLS_OF(uint16_t)

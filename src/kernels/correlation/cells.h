@@ -38,10 +38,6 @@ void readCells(const T* from, int channels, RowSpan span, double offset, double*
 template <class T>
 void readCells(const T* from, int channels, RowSpan span, int16_t* buffer, Pair* cells);
 
-/// The sum of every channels-th of n elements.
-template <class T>
-double sumOfElements(const T* from, int channels, ptrdiff_t n);
-
 /// Fewer products than this of pairs of 8-bit elements never leave 32 bits: 32,512 * 255^2 < 2^31.
 inline constexpr int64_t kMostPairTaps = 32'512;
 
