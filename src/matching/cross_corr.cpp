@@ -35,9 +35,8 @@ Problem problemOf(QorImageSize src, QorImageSize tpl, int32_t algorithm) {
 
 enum class Way { pairs, doubles, transform };
 
-/// Nanoseconds, about, of one result's multiplications.
-template <class T>
-constexpr double kDirectCost = sizeof(T) == 1 ? 0.02 : 0.06;
+/// Nanoseconds, about, of one multiplication.
+constexpr double kPairCost = 0.02, kDoubleCost = 0.06;
 
 /// Templates whose width and height leave direct sums a chance, for those who ask for them.
 bool isSmall(const Problem& problem) {
@@ -47,14 +46,15 @@ bool isSmall(const Problem& problem) {
 
 template <class T>
 Way wayOf(const Problem& problem) {
-    const bool isDirect = problem.area() < kernels::correlation::kMostPairTaps && isSmall(problem);
-    const Way direct = sizeof(T) == 1 ? Way::pairs : Way::doubles;
-    if (problem.hint == Hint::direct && isDirect) return direct;
-    if (problem.hint != Hint::none || problem.area() >= kernels::correlation::kMostPairTaps) return Way::transform;
+    const bool fitsPairs = problem.area() < kernels::correlation::kMostPairTaps;
+    const Way direct = sizeof(T) == 1 && fitsPairs ? Way::pairs : Way::doubles;
+    if (problem.hint != Hint::none)
+        return problem.hint == Hint::direct && fitsPairs && isSmall(problem) ? direct : Way::transform;
     constexpr int64_t kSurelyDirect = 64;
     if (problem.area() <= kSurelyDirect) return direct;
     const double results = static_cast<double>(problem.width()) * static_cast<double>(problem.height());
-    const double cost = results * static_cast<double>(problem.area()) * kDirectCost<T>;
+    const double cost =
+        results * static_cast<double>(problem.area()) * (direct == Way::pairs ? kPairCost : kDoubleCost);
     return cost < TransformPlan(problem).cost ? direct : Way::transform;
 }
 
@@ -94,10 +94,13 @@ void runTransform(const Channel<T, D>& all, int processed, uint8_t* memory) {
 
 template <class T, class D>
 QORI_NOINLINE void correlate(const Channel<T, D>& channel, int processed, uint8_t* memory) {
-    if (wayOf<T>(channel.problem) == Way::transform)
-        runTransform(channel, processed, memory);
+    const Way way = wayOf<T>(channel.problem);
+    if constexpr (sizeof(T) == 1)
+        if (way == Way::pairs) return runDirect<Pair>(channel, processed, memory);
+    if (way == Way::doubles)
+        runDirect<double>(channel, processed, memory);
     else
-        runDirect<CellOf<T>>(channel, processed, memory);
+        runTransform(channel, processed, memory);
 }
 
 template <class T, class D, Layout layout>

@@ -9,10 +9,6 @@ namespace qori::matching {
 
 using kernels::correlation::Pair;
 
-/// Cells that multiply the elements of T the fastest.
-template <class T>
-using CellOf = std::conditional_t<sizeof(T) == 1, Pair, double>;
-
 template <class Cell>
 class DirectWork {
 public:
@@ -26,7 +22,7 @@ public:
           crosses(memory.take<Cell>(pitch_ * kernels::correlation::kCrossRows)),
           results(memory.take<double>(pitch_)),
           row(memory.take<double>(std::max<int64_t>(cellPitch_, problem.tpl.width) + 1)),
-          sums(problem, problem.kind, tile_.width, isExact, memory),
+          sums(problem, problem.kind, tile_.width, tile_.height, isExact, memory),
           bytes_(memory.bytes()) {}
 
     int64_t bytes() const { return bytes_; }

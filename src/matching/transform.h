@@ -70,8 +70,8 @@ public:
           strips(memory.take<double>(plan.width * kernels::correlation::kLineDoubles)),
           slots(memory.take<double>(2 * plan.width)),
           results(memory.take<double>(plan.width)),
-          sums{{problem, sumsKind(problem, isExact), plan.tileWidth, isExact, memory},
-               {problem, sumsKind(problem, isExact), plan.tileWidth, isExact, memory}},
+          sums{{problem, sumsKind(problem, isExact), plan.tileWidth, plan.tileHeight, isExact, memory},
+               {problem, sumsKind(problem, isExact), plan.tileWidth, plan.tileHeight, isExact, memory}},
           bytes_(memory.bytes()) {}
 
     int64_t bytes() const { return bytes_; }

@@ -16,9 +16,14 @@ class WindowSums {
 public:
     using Sums = kernels::correlation::Sums<Cell>;
 
-    /// What results of the kind need, for tiles of so many columns.
-    WindowSums(const Problem& problem, Kind kind, int64_t tileWidth, bool isExact, WorkBuffer& memory)
-        : kind_(kind), height_(problem.tpl.height), span_(problem.tpl.width), isExact_(isExact) {
+    /// What results of the kind need, for tiles of so many columns and rows.
+    WindowSums(const Problem& problem, Kind kind, int64_t tileWidth, int64_t tileHeight, bool isExact,
+               WorkBuffer& memory)
+        : kind_(kind),
+          height_(problem.tpl.height),
+          span_(problem.tpl.width),
+          kept_(std::min<int64_t>(height_, tileHeight)),
+          isExact_(isExact) {
         if (kind_ == Kind::plain) return;
         pitch_ = roundUp(tileWidth + span_, kernels::correlation::kBlockCells<Cell>) +
                  kernels::correlation::kBlockCells<Cell>;
@@ -27,7 +32,7 @@ public:
         spans_ = memory.take<Cell>(pitch_);
         if (isExact_) return;
         entered_ = take(memory, 1);
-        ends_ = take(memory, height_);
+        ends_ = take(memory, kept_ + 1);
     }
 
     /// Those of the next row of a tile, beginning with row 0. rowOf(i, slot) gives row i of the tile's patch; rows of
@@ -72,9 +77,11 @@ private:
     Sums addBlock(int64_t y, ptrdiff_t columns, RowOf rowOf) {
         const int64_t inBlock = y % height_;
         if (inBlock == 0) {
+            // Of those that begin below the tile only the last is kept.
             for (int64_t i = height_ - 1; i >= 0; --i)
-                kernels::correlation::addRow(rowOf(y + i, 0), i == height_ - 1 ? Sums{} : row(ends_, i + 1),
-                                             row(ends_, i), columns);
+                kernels::correlation::addRow(rowOf(y + i, 0),
+                                             i == height_ - 1 ? Sums{} : row(ends_, std::min(i + 1, kept_)),
+                                             row(ends_, std::min(i, kept_)), columns);
             return ends_;
         }
         kernels::correlation::addRow(rowOf(y + height_ - 1, 0), inBlock == 1 ? Sums{} : entered_, entered_, columns);
@@ -83,7 +90,7 @@ private:
     }
 
     Kind kind_;
-    int64_t height_, span_, pitch_ = 0;
+    int64_t height_, span_, kept_, pitch_ = 0;
     bool isExact_;
     Sums columns_{}, windows_{}, entered_{}, ends_{};
     Cell* spans_ = nullptr;
