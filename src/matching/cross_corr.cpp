@@ -50,17 +50,22 @@ Way wayOf(const Problem& problem) {
     const Way direct = sizeof(T) == 1 && fitsPairs ? Way::pairs : Way::doubles;
     if (problem.hint != Hint::none)
         return problem.hint == Hint::direct && fitsPairs && isSmall(problem) ? direct : Way::transform;
-    constexpr int64_t kSurelyDirect = 64;
-    if (problem.area() <= kSurelyDirect) return direct;
     const double results = static_cast<double>(problem.width()) * static_cast<double>(problem.height());
     const double cost =
         results * static_cast<double>(problem.area()) * (direct == Way::pairs ? kPairCost : kDoubleCost);
+    // Plans take some microseconds themselves.
+    constexpr int64_t kSurelyDirect = 64;
+    constexpr double kSoon = 10'000;
+    if (problem.area() <= kSurelyDirect || cost < kSoon) return direct;
     return cost < TransformPlan(problem).cost ? direct : Way::transform;
 }
 
 /// Bytes of work memory for elements of a kind, slack for its alignment included.
 template <class T>
 int64_t workBytes(const Problem& problem) {
+    // Taps alone are beyond 31 bits, and products of lengths stay within 63.
+    constexpr int64_t kTooMany = int64_t{1} << 31;
+    if (problem.area() >= kTooMany) return problem.area();
     switch (wayOf<T>(problem)) {
         case Way::pairs: return DirectWork<Pair>(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();
         case Way::doubles: return DirectWork<double>(problem, kIsExact<T>, WorkBuffer(nullptr)).bytes();

@@ -42,7 +42,8 @@ private:
         const int64_t tileH = std::min(problem.height(), h - problem.tpl.height + 1);
         const int64_t tiles = ((problem.width() - 1) / tileW + 1) * ((problem.height() - 1) / tileH + 1);
         const double points = static_cast<double>(w) * static_cast<double>(h);
-        const int bits = static_cast<int>(std::bit_width(static_cast<uint64_t>(w * h)));
+        const auto bits =
+            static_cast<int>(std::bit_width(static_cast<uint64_t>(w)) + std::bit_width(static_cast<uint64_t>(h))) - 1;
         const double perTransform = points * (1.5 + 0.25 * bits);
         double total = perTransform * (1 + 2 * static_cast<double>((tiles + 1) / 2));
         if (points > kManyPoints) total *= points / kManyPoints;

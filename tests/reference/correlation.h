@@ -43,6 +43,12 @@ inline Axis axis(Placement placement, int source, int length) {
     }
 }
 
+/// `condition` is by how much a window's energy may be smaller than the squares that it is a difference of, and
+/// rounding errors larger than those of a number.
+struct Score {
+    double value, condition;
+};
+
 /// Of a template and the windows of a source, outside of which there are zeros.
 class Correlation {
 public:
@@ -54,20 +60,22 @@ public:
             for (double& tap : tpl_.elements) tap -= sum / area();
         }
         for (const double tap : tpl_.elements) squares_ += tap * tap;
+        for (const double element : source_.elements) largest_ = std::fmax(largest_, std::fabs(element));
     }
 
     /// With the template's corner at (x, y) of the source.
-    double at(int x, int y) const {
+    Score at(int x, int y) const {
         double mean = 0, window = 0, cross = 0;
         if (isCentred()) forWindow(x, y, [&](double s, double) { mean += s / area(); });
         forWindow(x, y, [&](double s, double t) {
             window += (s - mean) * (s - mean);
             cross += (s - mean) * t;
         });
-        if (normaliser_ == Normaliser::none) return cross;
-        if (!isCentred()) return window > 0 && squares_ > 0 ? cross / std::sqrt(window * squares_) : 0;
+        if (normaliser_ == Normaliser::none) return {cross, 1};
+        if (!isCentred()) return {window > 0 && squares_ > 0 ? cross / std::sqrt(window * squares_) : 0, 1};
         const double epsilon = std::ldexp(1.0, -23), norm = std::sqrt(std::fmax(squares_, epsilon));
-        return norm * epsilon > window ? 0 : cross / (std::sqrt(window) * norm);
+        if (norm * epsilon > window) return {0, 1};
+        return {cross / (std::sqrt(window) * norm), 1 + 4 * area() * largest_ * largest_ / window};
     }
 
 private:
@@ -82,7 +90,7 @@ private:
 
     Plane source_, tpl_;
     Normaliser normaliser_;
-    double squares_ = 0;
+    double squares_ = 0, largest_ = 0;
 };
 
 }  // namespace qori::test::reference
