@@ -31,7 +31,7 @@ void forTaps(const Channel<T, D>& channel, double offset, double* row, Use use) 
 template <class T, class D>
 TemplateSums sumTemplate(const Channel<T, D>& channel, double* row) {
     const Problem& problem = channel.problem;
-    TemplateSums sums{{problem.kind, static_cast<double>(problem.area()), 0, 0, 0}, 0};
+    TemplateSums sums{{problem.kind, static_cast<double>(problem.area()), 0, 0, 0, !std::is_same_v<D, double>}, 0};
     if (problem.kind == Kind::plain) return sums;
     kernels::correlation::Finish& finish = sums.finish;
     double mean = 0, squares = 0;

@@ -17,6 +17,7 @@ struct Finish {
     Kind kind;
     double area, tapSum, norm;
     double roundings;  ///< The rounding error of V in units of S2; 0 where the sums are exact.
+    bool isFloat;      ///< Results will be rounded to float.
 };
 
 /// n is rounded up to whole vectors of doubles. Sums that the kind does not need may be null.
