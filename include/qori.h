@@ -285,6 +285,34 @@ typedef struct QorLinearFilterPlan QorLinearFilterPlan;
  *  any number of threads may use it at once. It is trusted memory: see Plans above. */
 typedef struct QorAdaptiveGaussSpec QorAdaptiveGaussSpec;
 
+/** Which way of a Fourier transform divides, by the number of points N of rows and then of columns. */
+typedef enum QorFftNormFlag {
+    fftDivFwdByN = 1,   /**< The forward one by N. */
+    fftDivInvByN = 2,   /**< The inverse by N. */
+    fftDivBySqrtN = 4,  /**< Both by the square root of N. */
+    fftNoDiv = 8        /**< None: a round trip multiplies by width * height. */
+} QorFftNormFlag;
+
+/** A two-dimensional Fourier transform prepared: as many bytes as qoriFFTGetSize or qoriDFTGetSize report, at any
+ *  address, or a block of InitAlloc. It begins at the next multiple of 64 and may be copied to a block whose address is
+ *  equal modulo 64. Once filled it is only read: any number of threads may use it at once, each with a work buffer of
+ *  its own. It is trusted memory: see Plans above.
+ *
+ *  The packed spectrum of a real image W x H has as many values as the image and its shape. Frequencies (k, m) and
+ *  (W - k, H - m) are conjugate, so that the half with k <= W / 2 says all; Re and Im are the parts of a frequency. For
+ *  W = 6, H = 4 and for W = 5, H = 3:
+ *
+ *      Re(0,0) Re(1,0) Im(1,0) Re(2,0) Im(2,0) Re(3,0)        Re(0,0) Re(1,0) Im(1,0) Re(2,0) Im(2,0)
+ *      Re(0,1) Re(1,1) Im(1,1) Re(2,1) Im(2,1) Re(3,1)        Re(0,1) Re(1,1) Im(1,1) Re(2,1) Im(2,1)
+ *      Im(0,1) Re(1,2) Im(1,2) Re(2,2) Im(2,2) Im(3,1)        Im(0,1) Re(1,2) Im(1,2) Re(2,2) Im(2,2)
+ *      Re(0,2) Re(1,3) Im(1,3) Re(2,3) Im(2,3) Re(3,2)
+ *
+ *  Inside, row r holds the frequencies (k, r), the parts side by side at columns 2 k - 1 and 2 k. The first column and,
+ *  of an even width, the last hold spectra of real columns: row 0 frequency 0, rows 2 m - 1 and 2 m the parts of m, and
+ *  of an even height the last row H / 2. (0, 0), and with even sides (W / 2, 0), (0, H / 2) and (W / 2, H / 2), are
+ *  real and take one element. */
+typedef struct QorFft2DPlan QorFft2DPlan;
+
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
 /** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
@@ -2719,8 +2747,9 @@ QORI_API QorResult QORI_CALL qoriCrossCorrNormGetBufferSize(QorImageSize srcRoiS
  *            2^-23: a constant template. It is 0 where n * 2^-23 > V, or V is not above its own rounding error:
  *            a constant window. Integer sources: all sums exact (16u below 2^21 template pixels), the result in
  *            double precision and rounded to float. 32f: double precision; normalised results are off by no
- *            more than 1e-5, whatever offset source and template have. 8u results: the float times
- *            2^-scaleFactor, to nearest, ties to even, saturated.
+ *            more than 1e-5, whatever offset source and template have, and an element that is not finite
+ *            concerns the windows that it is in. 8u results: the float times 2^-scaleFactor, to nearest, ties
+ *            to even, saturated.
  *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels; scaleFactor any int.
  *  Aliasing  The images may be read only and overlap, but the destination and the buffer must not overlap
  *            anything.
@@ -3151,6 +3180,277 @@ QORI_API QorResult QORI_CALL qoriCrossCorrValid_16u32f_C1R(const uint16_t* pSrc,
 QORI_API QorResult QORI_CALL qoriCrossCorrValid_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
     const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
 
+/* ---- Fourier transforms of any size --------------------------------------------------------------------------- */
+
+/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each
+ *  call.
+ *  Shapes    Any size. The work grows as n log n, whatever the factors of the sides.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     pInitBufSize: memory of Init alone; it may be 0. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_SIZE (width or height below 1), QOR_ERR_NULL_PTR (pPlanSize,
+ *            pInitBufSize or pBufSize is null), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_SIZE (the plan or
+ *            a buffer would take 2^31 bytes or more); then nothing is written.
+ *  Example   int32_t planBytes, initBytes, bytes;
+ *            qoriDFTGetSize_R_32f((QorImageSize){640, 360}, fftDivInvByN, hintFast, &planBytes, &initBytes, &bytes);
+ *            QorFft2DPlan* plan = malloc(planBytes);
+ *            uint8_t* init = malloc(initBytes + 1);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriDFTInit_R_32f((QorImageSize){640, 360}, fftDivInvByN, hintFast, plan, init);
+ *            free(init);
+ *            qoriDFTFwd_RToPack_32f_C1R(src, srcStep, spectrum, spectrumStep, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriDFTGetSize_R_32f(QorImageSize roiSize, int32_t flag, int32_t hint, int32_t* pPlanSize,
+    int32_t* pInitBufSize, int32_t* pBufSize);
+
+/** Prepares a transform of real images of 32f.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     pInitBuf is not used after the call. flag: QorFftNormFlag. hint: QorAccuracyHint; it changes
+ *            nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_SIZE (width or height below 1), QOR_ERR_NULL_PTR (pPlan is null),
+ *            QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_NULL_PTR (no init buffer, and its reported size is
+ *            not 0), QOR_ERR_SIZE (the plan or a buffer would take 2^31 bytes or more); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInit_R_32f(QorImageSize roiSize, int32_t flag, int32_t hint, QorFft2DPlan* pPlan,
+    uint8_t* pInitBuf);
+
+/** Reports how many bytes the plan of a transform of complex images takes, its initialisation and each call.
+ *  Shapes    Any size. The work grows as n log n, whatever the factors of the sides.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     pInitBufSize: memory of Init alone; it may be 0. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_SIZE (width or height below 1), QOR_ERR_NULL_PTR (pPlanSize,
+ *            pInitBufSize or pBufSize is null), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_SIZE (the plan or
+ *            a buffer would take 2^31 bytes or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTGetSize_C_32fc(QorImageSize roiSize, int32_t flag, int32_t hint, int32_t* pPlanSize,
+    int32_t* pInitBufSize, int32_t* pBufSize);
+
+/** Prepares a transform of complex images.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     pInitBuf is not used after the call. flag: QorFftNormFlag. hint: QorAccuracyHint; it changes
+ *            nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_SIZE (width or height below 1), QOR_ERR_NULL_PTR (pPlan is null),
+ *            QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_NULL_PTR (no init buffer, and its reported size is
+ *            not 0), QOR_ERR_SIZE (the plan or a buffer would take 2^31 bytes or more); then nothing is
+ *            written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInit_C_32fc(QorImageSize roiSize, int32_t flag, int32_t hint, QorFft2DPlan* pPlan,
+    uint8_t* pInitBuf);
+
+/** Allocates and prepares a transform of real images of 32f; qoriDFTFree_R_32f releases it.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     *ppPlan is written when all went well only. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (ppPlan is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_NO_MEMORY (the allocator has none; nothing stays
+ *            allocated); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInitAlloc_R_32f(QorFft2DPlan** ppPlan, QorImageSize roiSize, int32_t flag,
+    int32_t hint);
+
+/** Releases a plan of qoriDFTInitAlloc_R_32f, and none that Init has filled.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTFree_R_32f(QorFft2DPlan* pPlan);
+
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan is not a plan
+ *            of this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTGetBufSize_R_32f(const QorFft2DPlan* pPlan, int32_t* pBufSize);
+
+/** Allocates and prepares a transform of 8u images to 32s spectra and back; qoriDFTFree_R_32s releases it.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     *ppPlan is written when all went well only. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (ppPlan is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_NO_MEMORY (the allocator has none; nothing stays
+ *            allocated); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInitAlloc_R_32s(QorFft2DPlan** ppPlan, QorImageSize roiSize, int32_t flag,
+    int32_t hint);
+
+/** Releases a plan of qoriDFTInitAlloc_R_32s, and none that Init has filled.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTFree_R_32s(QorFft2DPlan* pPlan);
+
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan is not a plan
+ *            of this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTGetBufSize_R_32s(const QorFft2DPlan* pPlan, int32_t* pBufSize);
+
+/** Allocates and prepares a transform of complex images; qoriDFTFree_C_32fc releases it.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Notes     *ppPlan is written when all went well only. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (ppPlan is null), QOR_ERR_SIZE (width or height below 1),
+ *            QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_NO_MEMORY (the allocator has none; nothing stays
+ *            allocated); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInitAlloc_C_32fc(QorFft2DPlan** ppPlan, QorImageSize roiSize, int32_t flag,
+    int32_t hint);
+
+/** Releases a plan of qoriDFTInitAlloc_C_32fc, and none that Init has filled.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTFree_C_32fc(QorFft2DPlan* pPlan);
+
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan is not a plan
+ *            of this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTGetBufSize_C_32fc(const QorFft2DPlan* pPlan, int32_t* pBufSize);
+
+/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan).
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  F(u, v) = sum over x, y of f(x, y) e^(-2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result. The destination holds intermediate values meanwhile. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriDFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_C1IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_C3IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_C4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+
+/** The real image of a packed spectrum, each channel by itself.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  f(x, y) = sum over u, v of F(u, v) e^(2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriDFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_C1IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_C3IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_C4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+
+/** The spectrum of an 8u image, each channel by itself, packed, in 32s.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  The spectrum in single precision, times 2^-scaleFactor, rounded to nearest with ties to even and
+ *            saturated. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Aliasing  Nothing may overlap.
+ *  Notes     Without pBuffer the call allocates what qoriDFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_8u32s_C1RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_8u32s_C3RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_8u32s_C4RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_RToPack_8u32s_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+
+/** The 8u image of a packed spectrum of 32s, each channel by itself.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  The image in single precision, of values rounded to it, times 2^-scaleFactor, rounded to nearest
+ *            with ties to even and saturated. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Aliasing  Nothing may overlap.
+ *  Notes     Without pBuffer the call allocates what qoriDFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32s8u_C1RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32s8u_C3RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32s8u_C4RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_PackToR_32s8u_AC4RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+
+/** The spectrum of a complex image, frequency (u, v) at pixel (u, v).
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  F(u, v) = sum over x, y of f(x, y) e^(-2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriDFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTFwd_CToC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTFwd_CToC_32fc_C1IR(QorComplex32f* pSrcDst, int32_t srcDstStep,
+    const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+
+/** The complex image of a complex spectrum.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  f(x, y) = sum over u, v of F(u, v) e^(2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes, of images in pixels.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriDFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriDFTInv_CToC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriDFTInv_CToC_32fc_C1IR(QorComplex32f* pSrcDst, int32_t srcDstStep,
+    const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+
 /* ---- Extrema and counting ------------------------------------------------------------------------------------- */
 
 /** Smallest element of each channel.
@@ -3414,6 +3714,279 @@ QORI_API QorResult QORI_CALL qoriCountInRange_32f_C3R(const float* pSrc, int32_t
     int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
 QORI_API QorResult QORI_CALL qoriCountInRange_32f_AC4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
     int32_t pCounts[3], const float lowerBound[3], const float upperBound[3]);
+
+/* ---- Fourier transforms of sizes 2^m x 2^n -------------------------------------------------------------------- */
+
+/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each
+ *  call.
+ *  Shapes    2^orderX columns, 2^orderY rows.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     pInitBufSize: memory of Init alone; it may be 0. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_ORDER (orderX or orderY below 0 or above 30), QOR_ERR_NULL_PTR
+ *            (pPlanSize, pInitBufSize or pBufSize is null), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER
+ *            (orderX above 29 or orderY above 28), QOR_ERR_SIZE (the plan or a buffer would take 2^31 bytes or
+ *            more); then nothing is written.
+ *  Example   int32_t planBytes, initBytes, bytes;
+ *            qoriFFTGetSize_R_32f(9, 8, fftDivInvByN, hintFast, &planBytes, &initBytes, &bytes);
+ *            QorFft2DPlan* plan = malloc(planBytes);
+ *            uint8_t* init = malloc(initBytes + 1);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriFFTInit_R_32f(9, 8, fftDivInvByN, hintFast, plan, init);
+ *            free(init);
+ *            qoriFFTFwd_RToPack_32f_C1R(src, srcStep, spectrum, spectrumStep, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriFFTGetSize_R_32f(int32_t orderX, int32_t orderY, int32_t flag, int32_t hint,
+    int32_t* pPlanSize, int32_t* pInitBufSize, int32_t* pBufSize);
+
+/** Prepares a transform of real images of 32f.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     pInitBuf is not used after the call. flag: QorFftNormFlag. hint: QorAccuracyHint; it changes
+ *            nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_ORDER (orderX or orderY below 0 or above 30), QOR_ERR_NULL_PTR
+ *            (pPlan is null), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER (orderX above 29 or orderY
+ *            above 28), QOR_ERR_NULL_PTR (no init buffer and an order of 11 or more), QOR_ERR_SIZE (the plan or
+ *            a buffer would take 2^31 bytes or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInit_R_32f(int32_t orderX, int32_t orderY, int32_t flag, int32_t hint,
+    QorFft2DPlan* pPlan, uint8_t* pInitBuf);
+
+/** Reports how many bytes the plan of a transform of complex images takes, its initialisation and each call.
+ *  Shapes    2^orderX columns, 2^orderY rows.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     pInitBufSize: memory of Init alone; it may be 0. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_ORDER (orderX or orderY below 0 or above 30), QOR_ERR_NULL_PTR
+ *            (pPlanSize, pInitBufSize or pBufSize is null), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER
+ *            (orderX or orderY above 28), QOR_ERR_SIZE (the plan or a buffer would take 2^31 bytes or more);
+ *            then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTGetSize_C_32fc(int32_t orderX, int32_t orderY, int32_t flag, int32_t hint,
+    int32_t* pPlanSize, int32_t* pInitBufSize, int32_t* pBufSize);
+
+/** Prepares a transform of complex images.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     pInitBuf is not used after the call. flag: QorFftNormFlag. hint: QorAccuracyHint; it changes
+ *            nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_ORDER (orderX or orderY below 0 or above 30), QOR_ERR_NULL_PTR
+ *            (pPlan is null), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER (orderX or orderY above 28),
+ *            QOR_ERR_NULL_PTR (no init buffer and an order of 11 or more), QOR_ERR_SIZE (the plan or a buffer
+ *            would take 2^31 bytes or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInit_C_32fc(int32_t orderX, int32_t orderY, int32_t flag, int32_t hint,
+    QorFft2DPlan* pPlan, uint8_t* pInitBuf);
+
+/** Allocates and prepares a transform of real images of 32f; qoriFFTFree_R_32f releases it.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     *ppPlan is written when all went well only. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (ppPlan is null), QOR_ERR_ORDER (orderX or orderY below 0
+ *            or above 30), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER (orderX above 29 or orderY above
+ *            28), QOR_ERR_NO_MEMORY (the allocator has none; nothing stays allocated); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInitAlloc_R_32f(QorFft2DPlan** ppPlan, int32_t orderX, int32_t orderY, int32_t flag,
+    int32_t hint);
+
+/** Releases a plan of qoriFFTInitAlloc_R_32f, and none that Init has filled.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTFree_R_32f(QorFft2DPlan* pPlan);
+
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan is not a plan
+ *            of this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTGetBufSize_R_32f(const QorFft2DPlan* pPlan, int32_t* pBufSize);
+
+/** Allocates and prepares a transform of 8u images to 32s spectra and back; qoriFFTFree_R_32s releases it.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     *ppPlan is written when all went well only. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (ppPlan is null), QOR_ERR_ORDER (orderX or orderY below 0
+ *            or above 30), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER (orderX above 29 or orderY above
+ *            28), QOR_ERR_NO_MEMORY (the allocator has none; nothing stays allocated); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInitAlloc_R_32s(QorFft2DPlan** ppPlan, int32_t orderX, int32_t orderY, int32_t flag,
+    int32_t hint);
+
+/** Releases a plan of qoriFFTInitAlloc_R_32s, and none that Init has filled.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTFree_R_32s(QorFft2DPlan* pPlan);
+
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan is not a plan
+ *            of this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTGetBufSize_R_32s(const QorFft2DPlan* pPlan, int32_t* pBufSize);
+
+/** Allocates and prepares a transform of complex images; qoriFFTFree_C_32fc releases it.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Notes     *ppPlan is written when all went well only. flag: QorFftNormFlag. hint: QorAccuracyHint; it
+ *            changes nothing.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (ppPlan is null), QOR_ERR_ORDER (orderX or orderY below 0
+ *            or above 30), QOR_ERR_FLAG (flag not 1, 2, 4 or 8), QOR_ERR_ORDER (orderX or orderY above 28),
+ *            QOR_ERR_NO_MEMORY (the allocator has none; nothing stays allocated); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInitAlloc_C_32fc(QorFft2DPlan** ppPlan, int32_t orderX, int32_t orderY,
+    int32_t flag, int32_t hint);
+
+/** Releases a plan of qoriFFTInitAlloc_C_32fc, and none that Init has filled.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTFree_C_32fc(QorFft2DPlan* pPlan);
+
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan is not a plan
+ *            of this family and its elements); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTGetBufSize_C_32fc(const QorFft2DPlan* pPlan, int32_t* pBufSize);
+
+/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan).
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  F(u, v) = sum over x, y of f(x, y) e^(-2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result. The destination holds intermediate values meanwhile. AC4 keeps the
+ *            destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriFFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_C1IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_C3IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_C4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+
+/** The real image of a packed spectrum, each channel by itself.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  f(x, y) = sum over u, v of F(u, v) e^(2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriFFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_C1IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_C3IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_C4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_AC4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32f_AC4IR(float* pSrcDst, int32_t srcDstStep, const QorFft2DPlan* pPlan,
+    uint8_t* pBuffer);
+
+/** The spectrum of an 8u image, each channel by itself, packed, in 32s.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  The spectrum in single precision, times 2^-scaleFactor, rounded to nearest with ties to even and
+ *            saturated. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Aliasing  Nothing may overlap.
+ *  Notes     Without pBuffer the call allocates what qoriFFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_8u32s_C1RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_8u32s_C3RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_8u32s_C4RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_RToPack_8u32s_AC4RSfs(const uint8_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+
+/** The 8u image of a packed spectrum of 32s, each channel by itself.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  The image in single precision, of values rounded to it, times 2^-scaleFactor, rounded to nearest
+ *            with ties to even and saturated. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Aliasing  Nothing may overlap.
+ *  Notes     Without pBuffer the call allocates what qoriFFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32s8u_C1RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32s8u_C3RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32s8u_C4RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_PackToR_32s8u_AC4RSfs(const int32_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, int32_t scaleFactor, uint8_t* pBuffer);
+
+/** The spectrum of a complex image, frequency (u, v) at pixel (u, v).
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  F(u, v) = sum over x, y of f(x, y) e^(-2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriFFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTFwd_CToC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTFwd_CToC_32fc_C1IR(QorComplex32f* pSrcDst, int32_t srcDstStep,
+    const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+
+/** The complex image of a complex spectrum.
+ *  Shapes    Source and destination have the plan's size.
+ *  Elements  f(x, y) = sum over u, v of F(u, v) e^(2 pi i (u x / W + v y / H)), times the plan's factors of
+ *            rows and columns. Single precision: the RMS of the errors is about 2^-24 sqrt(log2 of the points)
+ *            of the RMS of the result.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in bytes.
+ *  Aliasing  pSrc == pDst with equal steps works in place; otherwise the images must not overlap. pBuffer must
+ *            not overlap anything.
+ *  Notes     Without pBuffer the call allocates what qoriFFTGetBufSize reports, and frees it.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan is null), QOR_ERR_CONTEXT (pPlan is not a plan of
+ *            this family and its elements), QOR_ERR_NULL_PTR (an image is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (pBuffer is null and the allocator has none); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriFFTInv_CToC_32fc_C1R(const QorComplex32f* pSrc, int32_t srcStep, QorComplex32f* pDst,
+    int32_t dstStep, const QorFft2DPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriFFTInv_CToC_32fc_C1IR(QorComplex32f* pSrcDst, int32_t srcDstStep,
+    const QorFft2DPlan* pPlan, uint8_t* pBuffer);
 
 /* ---- General linear filter around an anchor ------------------------------------------------------------------- */
 
@@ -6684,6 +7257,190 @@ QORI_API QorResult QORI_CALL qoriSet_32s_C3CR(int32_t value, int32_t* pDst, int3
 QORI_API QorResult QORI_CALL qoriSet_32s_C4CR(int32_t value, int32_t* pDst, int32_t dstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriSet_32f_C3CR(float value, float* pDst, int32_t dstStep, QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriSet_32f_C4CR(float value, float* pDst, int32_t dstStep, QorImageSize roiSize);
+
+/* ---- Packed spectra ------------------------------------------------------------------------------------------- */
+
+/** Multiplies two packed spectra, each channel by itself: a convolution of their images.
+ *  Shapes    The packed layout of QorFft2DPlan, of any size.
+ *  Elements  Real frequencies are multiplied, complex ones (a + ib)(c + id) = (ac - bd) + i(ad + bc). 32f: one
+ *            product rounded, then a fused multiply-add. 16s, 32s: exact, times 2^-scaleFactor, to nearest with
+ *            ties to even, saturated. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in elements, which is the image's size in
+ *            pixels.
+ *  Aliasing  The destination may be either source, with its step; otherwise it must not overlap them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ *  Example   qoriFFTFwd_RToPack_32f_C1IR(image, step, plan, buffer);   // a blur by a kernel of the image's size
+ *            qoriMulPack_32f_C1IR(kernelSpectrum, kernelStep, image, step, roi);
+ *            qoriFFTInv_PackToR_32f_C1IR(image, step, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriMulPack_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_C1RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_C1IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_C3RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_C3IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_C4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_C4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_AC4RSfs(const int16_t* pSrc1, int32_t src1Step, const int16_t* pSrc2,
+    int32_t src2Step, int16_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_16s_AC4IRSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_C1RSfs(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, int32_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_C1IRSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_C3RSfs(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, int32_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_C3IRSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_C4RSfs(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, int32_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_C4IRSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_AC4RSfs(const int32_t* pSrc1, int32_t src1Step, const int32_t* pSrc2,
+    int32_t src2Step, int32_t* pDst, int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMulPack_32s_AC4IRSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize, int32_t scaleFactor);
+
+/** Multiplies a packed spectrum by the conjugate of a second one: a correlation of their images.
+ *  Shapes    The packed layout of QorFft2DPlan, of any size.
+ *  Elements  Real frequencies are multiplied, complex ones (a + ib)(c - id) = (ac + bd) + i(bc - ad), with c +
+ *            id of pSrc2; in place, of pSrcDst. One product is rounded, then a fused multiply-add. AC4 keeps
+ *            the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in elements, which is the image's size in
+ *            pixels.
+ *  Aliasing  The destination may be either source, with its step; otherwise it must not overlap them.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_C1R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_C1IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_C3R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_C3IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_C4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_C4IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_AC4R(const float* pSrc1, int32_t src1Step, const float* pSrc2,
+    int32_t src2Step, float* pDst, int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMulPackConj_32f_AC4IR(const float* pSrc, int32_t srcStep, float* pSrcDst,
+    int32_t srcDstStep, QorImageSize roiSize);
+
+/** The magnitude of every frequency of a packed spectrum, as a full image.
+ *  Shapes    Source: the packed layout of QorFft2DPlan, of any size. Destination: as many elements, frequency
+ *            (x, y) at pixel (x, y) for all x < width, y < height; those that the packed layout leaves out are
+ *            conjugates of others, of the same magnitude.
+ *  Elements  32f: sqrt(re^2 + im^2) in double precision, rounded; it does not overflow where the result does
+ *            not. 16s, 32s: the exact magnitude times 2^-scaleFactor, to nearest with ties to even, saturated.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in elements, which is the image's size in
+ *            pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriMagnitudePack_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMagnitudePack_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriMagnitudePack_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMagnitudePack_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMagnitudePack_32s_C1RSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriMagnitudePack_32s_C3RSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+
+/** The phase of every frequency of a packed spectrum, as a full image.
+ *  Shapes    Source: the packed layout of QorFft2DPlan, of any size. Destination: as many elements, frequency
+ *            (x, y) at pixel (x, y) for all x < width, y < height; those that the packed layout leaves out are
+ *            conjugates of others, of the negated phase.
+ *  Elements  atan2(im, re) in radians, above -pi and up to pi; 0 where the frequency is 0. Zeros have no sign:
+ *            a negative real frequency is at pi, its conjugate too. Computed in double precision and rounded;
+ *            16s, 32s: times 2^-scaleFactor, to nearest, saturated: scaleFactor -13 makes pi 25,736.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in elements, which is the image's size in
+ *            pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriPhasePack_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriPhasePack_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst, int32_t dstStep,
+    QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriPhasePack_16s_C1RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriPhasePack_16s_C3RSfs(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriPhasePack_32s_C1RSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriPhasePack_32s_C3RSfs(const int32_t* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t scaleFactor);
+
+/** Every frequency of a packed spectrum, as a full complex image.
+ *  Shapes    Source: the packed layout of QorFft2DPlan, of any size. Destination: as many complex elements,
+ *            frequency (x, y) at pixel (x, y) for all x < width, y < height; those that the packed layout
+ *            leaves out are conjugates of others.
+ *  Elements  Parts are copied or negated; the imaginary part of a real frequency is 0. 32s: -2^31 negated is
+ *            2^31 - 1.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in elements, which is the image's size in
+ *            pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriPackToCplxExtend_32f32fc_C1R(const float* pSrc, int32_t srcStep, QorComplex32f* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriPackToCplxExtend_32s32sc_C1R(const int32_t* pSrc, int32_t srcStep, QorComplex32s* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+
+/** Packs the spectrum of a real image that is given as a full complex one.
+ *  Shapes    Source: frequency (x, y) at pixel (x, y). Destination: the packed layout of QorFft2DPlan, as many
+ *            elements. The frequencies of the layout are copied; that others are their conjugates, and real
+ *            ones real, is not looked at.
+ *  Units     Steps in bytes, at least 1 and of any alignment; roiSize in elements, which is the image's size in
+ *            pixels.
+ *  Aliasing  The images must not overlap.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_SIZE (width or height below 1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriCplxExtendToPack_32fc32f_C1R(const QorComplex32f* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriCplxExtendToPack_32fc32f_C3R(const QorComplex32f* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriCplxExtendToPack_32sc32s_C1R(const QorComplex32s* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriCplxExtendToPack_32sc32s_C3R(const QorComplex32s* pSrc, int32_t srcStep, int32_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriCplxExtendToPack_16sc16s_C1R(const QorComplex16s* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
+QORI_API QorResult QORI_CALL qoriCplxExtendToPack_16sc16s_C3R(const QorComplex16s* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize);
 
 /* ---- Fixed thresholds ----------------------------------------------------------------------------------------- */
 

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "harness/call.h"
+#include "qorcore.h"
 #include "qori.h"
 
 namespace qori::test {
@@ -107,6 +108,9 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_STEP_ALIGN", QOR_ERR_STEP_ALIGN},
                                 {"QOR_ERR_BORDER", QOR_ERR_BORDER},
                                 {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED},
+                                {"QOR_ERR_ORDER", QOR_ERR_ORDER},
+                                {"QOR_ERR_FLAG", QOR_ERR_FLAG},
+                                {"QOR_ERR_NO_MEMORY", QOR_ERR_NO_MEMORY},
                                 {"QOR_ERR_ALGORITHM", QOR_ERR_ALGORITHM}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
@@ -238,7 +242,10 @@ private:
                 case Flaw::zeroStep: argument.scalar = 0; break;
             }
         }
-        return contract_.invoke(contract_.function, arguments);
+        const QorResult result = contract_.invoke(contract_.function, arguments);
+        if (result == QOR_OK && std::strstr(contract_.name, "InitAlloc") != nullptr)
+            qorFree(*reinterpret_cast<void**>(arguments[0].pointer));
+        return result;
     }
 
     const Contract& contract_;

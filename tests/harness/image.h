@@ -106,6 +106,13 @@ public:
                 for (int c = 0; c < channels; ++c) pixels.set(x, y, c, next());
     }
 
+    /// Calls each(x, y) for each pixel of the region, row by row.
+    template <class Each>
+    void forEach(Each each) const {
+        for (int y = 0; y < height_; ++y)
+            for (int x = 0; x < width_; ++x) each(x, y);
+    }
+
     Snapshot snapshot() const;
     /// Empty when every byte, around the image too, is the snapshot's; else where the first difference is.
     std::string difference(const Snapshot& expected) const;

@@ -73,6 +73,15 @@ QORI_INLINE ComplexLineOf<T> negMulAdd(ComplexLineOf<T> a, Vec<T> s, ComplexLine
     return {negMulAdd(a.re, s, c.re), negMulAdd(a.im, s, c.im)};
 }
 
+/// The parts of eight complex numbers, and back. Lanes hold numbers 0, 1, 4, 5, 2, 3, 6, 7.
+QORI_INLINE ComplexLine separate(Vec<float> a, Vec<float> b) {
+    return {{_mm256_shuffle_ps(a.v, b.v, 0x88)}, {_mm256_shuffle_ps(a.v, b.v, 0xDD)}};
+}
+QORI_INLINE void interleave(ComplexLine line, Vec<float>& a, Vec<float>& b) {
+    a = {_mm256_unpacklo_ps(line.re.v, line.im.v)};
+    b = {_mm256_unpackhi_ps(line.re.v, line.im.v)};
+}
+
 /// Forward transforms of 2, 4 and 8 points in place.
 template <class T>
 QORI_INLINE void butterfly(ComplexLineOf<T> (&a)[2]) {
@@ -133,6 +142,31 @@ QORI_INLINE void butterfly(ComplexLineOf<T> (&a)[p], const T* turns) {
         a[m] = minusI(even, odd);
         a[p - m] = plusI(even, odd);
     }
+}
+
+/// Of two real frequencies a and b in the places of the parts: a + b and a - b.
+QORI_INLINE ComplexLine sumAndDifference(ComplexLine a) { return {a.re + a.im, a.re - a.im}; }
+
+/// A point or frequency k and the one at n / 2 - k.
+struct Halves {
+    ComplexLine at, mirror;
+};
+
+/// From points z and y of the transform of n / 2 to frequencies of n; `root` is half of e^(-2 pi i k / n).
+QORI_INLINE Halves splitHalf(ComplexLine z, ComplexLine y, const float* root) {
+    const Vec<float> half = splat(0.5f);
+    const ComplexLine even = {z.re + y.re, z.im - y.im}, odd = {z.im + y.im, y.re - z.re};
+    const ComplexLine turned = times(odd, root);
+    return {mulAdd(even, half, turned), {mulSub(even.re, half, turned.re), negMulAdd(even.im, half, turned.im)}};
+}
+
+/// From frequencies x and y to points, parts exchanged.
+QORI_INLINE Halves joinHalf(ComplexLine x, ComplexLine y, const float* root) {
+    const Vec<float> two = splat(2.0f);
+    const ComplexLine even = {x.re + y.re, x.im - y.im}, odd = {x.re - y.re, x.im + y.im};
+    const ComplexLine turned = times(odd, splat(root[0]), splat(-root[1]));
+    return {{mulAdd(turned.re, two, even.im), negMulAdd(turned.im, two, even.re)},
+            {mulSub(turned.re, two, even.im), mulAdd(turned.im, two, even.re)}};
 }
 
 }  // namespace line

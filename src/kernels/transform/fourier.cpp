@@ -5,45 +5,12 @@
 
 #include <cstring>
 
+#include "passes.h"
+
 namespace qori::kernels {
 namespace {
 
-/// Blocks up to this many points go through all their stages before the next block does: 32 KiB, which first-level
-/// caches hold.
-constexpr ptrdiff_t kPointsAtOnce = 512;
 constexpr int kMostRadix = 61;
-
-template <int radix>
-constexpr bool isOdd = radix % 2 == 1;
-
-template <int radix>
-QORI_INLINE void butterflyOf(ComplexLine (&a)[radix], const float* turns) {
-    if constexpr (isOdd<radix>)
-        line::butterfly<radix>(a, turns);
-    else
-        line::butterfly(a);
-}
-
-/// Blocks of radix * part points. Without twiddles, part is 1.
-template <int radix, bool hasTwiddles>
-QORI_NOINLINE void passBlocks(float* lines, ptrdiff_t blocks, ptrdiff_t part, const float* turns,
-                              const float* twiddles) {
-    const ptrdiff_t apart = part * kLineFloats;
-    for (ptrdiff_t block = 0; block < blocks; ++block) {
-        const float* w = twiddles;
-        for (ptrdiff_t j = 0; j < (hasTwiddles ? part : 1); ++j) {
-            float* const x = lines + j * kLineFloats;
-            ComplexLine a[radix];
-            for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * apart);
-            butterflyOf<radix>(a, turns);
-            line::storeLine(x, a[0]);
-            for (int p = 1; p < radix; ++p)
-                line::storeLine(x + p * apart, hasTwiddles ? line::times(a[p], w + 2 * p - 2) : a[p]);
-            w += 2 * (radix - 1);
-        }
-        lines += radix * apart;
-    }
-}
 
 /// A prime above those that have a kernel of their own.
 QORI_NOINLINE void passAnyPrime(float* lines, ptrdiff_t blocks, ptrdiff_t part, int radix, const float* turns,
@@ -91,12 +58,14 @@ QORI_NOINLINE void passAnyPrime(float* lines, ptrdiff_t blocks, ptrdiff_t part, 
 template <int radix>
 void passOf(float* lines, ptrdiff_t blocks, ptrdiff_t part, const float* turns, const float* twiddles) {
     if (twiddles != nullptr)
-        passBlocks<radix, true>(lines, blocks, part, turns, twiddles);
+        line::passBlocks<radix, true>(lines, blocks, part, turns, twiddles);
     else
-        passBlocks<radix, false>(lines, blocks, 1, turns, nullptr);
+        line::passBlocks<radix, false>(lines, blocks, 1, turns, nullptr);
 }
 
-void pass(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks) {
+}  // namespace
+
+void line::runStage(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks) {
     const float* const turns = table.at<float>(stage.turns);
     const float* const twiddles = stage.twiddles == 0 ? nullptr : table.at<float>(stage.twiddles);
     const ptrdiff_t part = stage.length / stage.radix;
@@ -110,6 +79,8 @@ void pass(const FourierTable& table, const FourierTable::Stage& stage, float* li
         default: return passAnyPrime(lines, blocks, part, stage.radix, turns, twiddles);
     }
 }
+
+namespace {
 
 /// The n points of a block, n odd, by a convolution with a chirp. work: twice the lines of the inner transform.
 void convolveWithChirp(const FourierTable& table, float* block, float* work) {
@@ -137,25 +108,22 @@ void convolveWithChirp(const FourierTable& table, float* block, float* work) {
 
 /// A block from its stage on. Large blocks are divided first; the parts fit a cache then.
 void transformBlock(const FourierTable& table, int32_t first, float* lines, ptrdiff_t points, float* work) {
-    for (; first < table.stageCount && points > kPointsAtOnce; ++first) {
+    for (; first < table.stageCount && points > line::kPointsAtOnce; ++first) {
         const FourierTable::Stage& stage = table.stages[first];
-        pass(table, stage, lines, 1);
+        line::runStage(table, stage, lines, 1);
         const ptrdiff_t part = points / stage.radix;
         for (int32_t i = 1; i < stage.radix; ++i)
             transformBlock(table, first + 1, lines + i * part * kLineFloats, part, work);
         points = part;
     }
     for (; first < table.stageCount; ++first)
-        pass(table, table.stages[first], lines, points / table.stages[first].length);
+        line::runStage(table, table.stages[first], lines, points / table.stages[first].length);
     if (table.chirpPoints > 1)
         for (ptrdiff_t i = 0; i < points; i += table.chirpPoints)
             convolveWithChirp(table, lines + i * kLineFloats, work);
 }
 
 QORI_INLINE float* lineAt(float* lines, int32_t position) { return lines + ptrdiff_t{position} * kLineFloats; }
-
-/// Of two real frequencies a and b in the places of the parts: a + b and a - b.
-QORI_INLINE ComplexLine sumAndDifference(ComplexLine a) { return {a.re + a.im, a.re - a.im}; }
 
 }  // namespace
 
@@ -166,30 +134,24 @@ void transformLines(const FourierTable* table, float* lines, float* work) {
 void splitHalves(float* lines, int32_t n, const int32_t* positions, const float* roots) {
     const int32_t points = n / 2;
     float* const first = lineAt(lines, positions[0]);
-    line::storeLine(first, sumAndDifference(line::loadLine(first)));
-    const Vec<float> half = splat(0.5f);
+    line::storeLine(first, line::sumAndDifference(line::loadLine(first)));
     for (int32_t k = 1; k <= points - k; ++k) {
         float *const at = lineAt(lines, positions[k]), *const mirror = lineAt(lines, positions[points - k]);
-        const ComplexLine z = line::loadLine(at), y = line::loadLine(mirror);
-        const ComplexLine even = {z.re + y.re, z.im - y.im}, odd = {z.im + y.im, y.re - z.re};
-        const ComplexLine turned = line::times(odd, roots + 2 * k);
-        line::storeLine(mirror, {line::mulSub(even.re, half, turned.re), line::negMulAdd(even.im, half, turned.im)});
-        line::storeLine(at, line::mulAdd(even, half, turned));
+        const line::Halves x = line::splitHalf(line::loadLine(at), line::loadLine(mirror), roots + 2 * k);
+        line::storeLine(mirror, x.mirror);
+        line::storeLine(at, x.at);
     }
 }
 
 void joinHalves(float* lines, int32_t n, const float* roots) {
     const int32_t points = n / 2;
-    const ComplexLine ends = sumAndDifference(line::loadLine(lines));
+    const ComplexLine ends = line::sumAndDifference(line::loadLine(lines));
     line::storeLine(lines, {ends.im, ends.re});
-    const Vec<float> two = splat(2.0f);
     for (int32_t k = 1; k <= points - k; ++k) {
         float *const at = lineAt(lines, k), *const mirror = lineAt(lines, points - k);
-        const ComplexLine x = line::loadLine(at), y = line::loadLine(mirror);
-        const ComplexLine even = {x.re + y.re, x.im - y.im}, odd = {x.re - y.re, x.im + y.im};
-        const ComplexLine turned = line::times(odd, splat(roots[2 * k]), splat(-roots[2 * k + 1]));
-        line::storeLine(mirror, {line::mulSub(turned.re, two, even.im), line::mulAdd(turned.im, two, even.re)});
-        line::storeLine(at, {line::mulAdd(turned.re, two, even.im), line::negMulAdd(turned.im, two, even.re)});
+        const line::Halves z = line::joinHalf(line::loadLine(at), line::loadLine(mirror), roots + 2 * k);
+        line::storeLine(mirror, z.mirror);
+        line::storeLine(at, z.at);
     }
 }
 

@@ -64,7 +64,9 @@ void transformLines(const FourierTable* table, float* lines, float* work);
 
 /// Factors that splitHalves and joinHalves take for n / 2 points: n / 4 + 1 complex numbers.
 constexpr int64_t halfRootsBytes(int64_t n) { return (n / 4 + 1) * 8; }
-void makeHalfRoots(float* roots, int32_t n);
+/// init: memory of halfRootsInitBytes(n), or none, and each root takes longer.
+int64_t halfRootsInitBytes(int64_t n);
+void makeHalfRoots(float* roots, int32_t n, void* init = nullptr);
 
 /// From the transform of n / 2 points to the spectra of eight real sequences of n: frequency k at positions[k] for
 /// 0 < k < n / 2; at positions[0] the real frequencies 0 and n / 2 in the places of the parts.

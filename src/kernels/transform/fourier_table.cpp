@@ -193,9 +193,12 @@ void makeFourierTable(FourierTable* table, int32_t n, void* init) {
     fillPositions(inner);
 }
 
-void makeHalfRoots(float* roots, int32_t n) {
+int64_t halfRootsInitBytes(int64_t n) { return n > kMostWithoutMemory ? Roots::bytes(n) : 0; }
+
+void makeHalfRoots(float* roots, int32_t n, void* init) {
+    const Roots ofTurn(n, n > kMostWithoutMemory ? init : nullptr);
     for (int32_t k = 0; k <= n / 4; ++k) {
-        const Root root = rootOfUnity(k, n);
+        const Root root = ofTurn(k);
         storeRoot(roots + 2 * k, {root.re / 2, root.im / 2});
     }
 }

@@ -1,0 +1,164 @@
+// SPDX-License-Identifier: Apache-2.0
+// Transforms of columns whose first pass reads the image and whose last one writes it.
+#include "move_lines.h"
+#include "passes.h"
+
+namespace qori::kernels {
+namespace {
+
+template <bool isExchanged>
+QORI_INLINE ComplexLine exchangedIf(ComplexLine a) {
+    return isExchanged ? ComplexLine{a.im, a.re} : a;
+}
+
+QORI_INLINE float* rowOf(const LineColumns& columns, ptrdiff_t y) { return columns.rows.row(y) + columns.element; }
+
+/// The first stage, of the whole length: rows of the image to lines.
+template <int radix, bool isExchanged>
+QORI_NOINLINE void passIn(const LineColumns& from, float scale, const FourierTable& table, float* lines) {
+    const ptrdiff_t part = table.points / radix, apart = part * kLineFloats;
+    const float* w = table.at<float>(table.stages[0].twiddles);
+    const Vec<float> factor = splat(scale);
+    for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
+        ComplexLine a[radix];
+        for (int q = 0; q < radix; ++q) {
+            const float* const p = rowOf(from, j + q * part);
+            const ComplexLine z = line::separate(load(p), load(p + kLineColumns));
+            a[q] = exchangedIf<isExchanged>({z.re * factor, z.im * factor});
+        }
+        line::butterfly(a);
+        float* const x = lines + j * kLineFloats;
+        line::storeLine(x, a[0]);
+        for (int p = 1; p < radix; ++p) line::storeLine(x + p * apart, line::times(a[p], w + 2 * p - 2));
+    }
+}
+
+/// Frequencies first, first + apart, ... of a transform whose last stage is not done yet.
+struct Frequencies {
+    int32_t first, apart;
+};
+
+/// The last stage: blocks of `radix` lines to rows of the image.
+template <int radix, bool isExchanged>
+QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to) {
+    const int32_t part = table.points / radix;
+    const int32_t* const positions = table.positions();
+    for (int32_t k = f.first; k < part; k += f.apart) {
+        const float* const x = lines + ptrdiff_t{positions[k]} * kLineFloats;
+        ComplexLine a[radix];
+        for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * kLineFloats);
+        line::butterfly(a);
+        for (int p = 0; p < radix; ++p) {
+            float* const row = rowOf(to, k + ptrdiff_t{p} * part);
+            Vec<float> low, high;
+            line::interleave(exchangedIf<isExchanged>(a[p]), low, high);
+            store(row, low);
+            store(row + kLineColumns, high);
+        }
+    }
+}
+
+/// The same into rows that begin an element earlier, on the boundaries of what was read.
+template <int radix>
+QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines, Frequencies f, float* carry,
+                                  const LineColumns& to) {
+    const int32_t part = table.points / radix;
+    const int32_t* const positions = table.positions();
+    const __m256i next = _mm256_setr_epi32(1, 2, 3, 4, 5, 6, 7, 0);
+    constexpr int last = 0x80;
+    for (int32_t k = f.first; k < part; k += f.apart) {
+        const float* const x = lines + ptrdiff_t{positions[k]} * kLineFloats;
+        ComplexLine a[radix];
+        for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * kLineFloats);
+        line::butterfly(a);
+        for (int p = 0; p < radix; ++p) {
+            const ptrdiff_t y = k + ptrdiff_t{p} * part;
+            float* const row = rowOf(to, y);
+            Vec<float> low, high;
+            line::interleave(a[p], low, high);
+            const __m256 behind = _mm256_broadcast_ss(carry + y);
+            _mm_store_ss(carry + y, _mm256_castps256_ps128(low.v));
+            const __m256 first = _mm256_permutevar8x32_ps(low.v, next), second = _mm256_permutevar8x32_ps(high.v, next);
+            store(row, Vec<float>{_mm256_blend_ps(first, second, last)});
+            store(row + kLineColumns, Vec<float>{_mm256_blend_ps(second, behind, last)});
+        }
+    }
+}
+
+/// The stages behind the first and before the last, then the last, of blocks that fit a cache.
+template <class Last>
+void middleAndLast(const FourierTable& table, int32_t stage, float* lines, ptrdiff_t points, Frequencies f, Last last) {
+    const int32_t end = table.stageCount - 1;
+    for (; stage < end && points > line::kPointsAtOnce; ++stage) {
+        const int32_t radix = table.stages[stage].radix;
+        line::runStage(table, table.stages[stage], lines, 1);
+        const ptrdiff_t part = points / radix;
+        for (int32_t i = 1; i < radix; ++i)
+            middleAndLast(table, stage + 1, lines + i * part * kLineFloats, part,
+                          {f.first + f.apart * i, f.apart * radix}, last);
+        points = part;
+        f.apart *= radix;
+    }
+    for (; stage < end; ++stage) line::runStage(table, table.stages[stage], lines, points / table.stages[stage].length);
+    last(f);
+}
+
+/// All stages; last(frequencies) does the last.
+template <int firstRadix, bool isExchanged, class Last>
+void transformFused(const FourierTable& table, const LineColumns& from, float scale, float* lines, Last last) {
+    passIn<firstRadix, isExchanged>(from, scale, table, lines);
+    if (table.points <= line::kPointsAtOnce) return middleAndLast(table, 1, lines, table.points, {0, 1}, last);
+    const ptrdiff_t part = table.points / firstRadix;
+    for (int32_t i = 0; i < firstRadix; ++i)
+        middleAndLast(table, 1, lines + i * part * kLineFloats, part, {i, firstRadix}, last);
+}
+
+/// By the first radix, 8 or 4.
+template <bool isExchanged, class Last>
+void transformFused(const FourierTable& table, const LineColumns& from, float scale, float* lines, Last last) {
+    if (table.stages[0].radix == 8)
+        transformFused<8, isExchanged>(table, from, scale, lines, last);
+    else
+        transformFused<4, isExchanged>(table, from, scale, lines, last);
+}
+
+template <bool isExchanged>
+void transformFused(const FourierTable& table, const LineColumns& from, const LineColumns& to, float scale,
+                    float* lines) {
+    transformFused<isExchanged>(table, from, scale, lines,
+                                [&](Frequencies f) { passOut<8, isExchanged>(table, lines, f, to); });
+}
+
+bool isWhole(const LineColumns& columns) {
+    return columns.rows.channels == 1 && columns.begin == 0 && columns.end == kLineColumns;
+}
+
+/// Powers of two from 32 on, and their products with others where those come in between.
+bool isFusible(const FourierTable& table) {
+    const int32_t stages = table.stageCount;
+    return stages >= 2 && table.chirpPoints == 1 && table.stages[stages - 1].radix == 8 &&
+           (table.stages[0].radix == 8 || table.stages[0].radix == 4);
+}
+
+}  // namespace
+
+void transformColumns(const FourierTable* table, const LineColumns& from, const LineColumns& to, float scale,
+                      Parts parts, float* lines, float* work) {
+    if (isWhole(from) && isWhole(to) && isFusible(*table)) {
+        if (parts == Parts::inOrder) return transformFused<false>(*table, from, to, scale, lines);
+        return transformFused<true>(*table, from, to, scale, lines);
+    }
+    columnsToLines(from, scale, parts, lines);
+    transformLines(table, lines, work);
+    linesToColumns(lines, table->positions(), parts, to);
+}
+
+bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+                             float* lines) {
+    if (!isWhole(columns) || !isFusible(*table)) return false;
+    transformFused<false>(*table, columns, scale, lines,
+                          [&](Frequencies f) { passOutShifted<8>(*table, lines, f, carry, columns); });
+    return true;
+}
+
+}  // namespace qori::kernels

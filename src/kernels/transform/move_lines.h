@@ -1,0 +1,81 @@
+// SPDX-License-Identifier: Apache-2.0
+// Between images and the lines of transforms (fourier.h). Rows are turned, eight at a time, so that lanes are rows;
+// columns are gathered, eight complex ones at a time. Images may hold several channels, of which one is meant.
+#pragma once
+#include <cstddef>
+#include <cstdint>
+
+#include "fourier.h"
+
+namespace qori::kernels {
+
+/// Rows of a channel, of which `count` are there; a row's element e is at e * channels.
+struct LineRows {
+    uint8_t* first;
+    ptrdiff_t step;
+    int count, channels;
+
+    float* row(ptrdiff_t y) const { return reinterpret_cast<float*>(first + y * step); }
+};
+
+/// Which of a line's parts is read or written first.
+enum class Parts { inOrder, exchanged };
+
+/// Up to 8 rows. Element e, times the scale, becomes part e % 2 of line e / 2.
+void rowsToLines(const LineRows& rows, ptrdiff_t elements, float scale, Parts parts, float* lines);
+/// Element e is part e % 2 of line positions[e / 2].
+void linesToRows(const float* lines, const int32_t* positions, ptrdiff_t elements, Parts parts, const LineRows& rows);
+
+/// splitHalves and linesToRows of n elements, rowsToLines and joinHalves: the spectra of up to 8 rows of even length.
+void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float* roots, const LineRows& rows);
+void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roots, float* lines);
+
+/// Up to 16 rows of n elements: element e becomes line e, of the first eight rows its real part, of the others the
+/// other one.
+void rowsToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines);
+/// The spectra of splitPairs, n odd: frequency 0, then the parts of 1, 2, ...
+void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+/// The other way round, for joinPairs.
+void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines);
+/// Element e is line positions[e], parts exchanged: of the first eight rows its second part.
+void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+
+/// Complex columns of a channel, one in each of the lanes `begin` to `end`: the parts of lane l are elements
+/// element + 2 l and the next. Columns keep their lanes from columnsToLines to linesToColumns; lane 0 is lane 0.
+struct LineColumns {
+    LineRows rows;  ///< `count` of them.
+    ptrdiff_t element;
+    int begin, end;
+};
+
+/// Row y becomes line y; lanes without a column are 0.
+void columnsToLines(const LineColumns& columns, float scale, Parts parts, float* lines);
+/// Row y is line positions[y].
+void linesToColumns(const float* lines, const int32_t* positions, Parts parts, const LineColumns& columns);
+
+/// Columns to lines, their transform, lines to columns: in one go where whole blocks of one channel allow it.
+void transformColumns(const FourierTable* table, const LineColumns& from, const LineColumns& to, float scale,
+                      Parts parts, float* lines, float* work);
+
+/// The transform of eight complex columns of the layout between rows and columns into the packed one, whose rows begin
+/// an element earlier: `carry` has an element a row that comes behind these, and gets those that come before. False,
+/// and nothing done, where blocks are not whole or the length is not made for it.
+bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+                             float* lines);
+
+/// Packs a spectrum of n real values: frequency 0, the parts of 1, 2, ..., of an even n the last. Lane 0 holds the
+/// transform of a + i b; its frequencies go to a column and, where it is not null, to n floats.
+void splitRealColumns(const float* lines, const int32_t* positions, const LineRows& column, float* second);
+/// Makes lane 0, parts exchanged, of such spectra; the second is 0 where it is null.
+void joinRealColumns(const LineRows& column, const float* second, float scale, float* lines);
+
+/// Of an odd width the only real column: lane 0 of the lines with no imaginary part, and the other way round, parts
+/// exchanged.
+void joinRealColumn(const LineRows& column, float scale, float* lines);
+void storeRealColumn(const float* lines, const int32_t* positions, const LineRows& column);
+
+/// A column of single elements.
+void columnToFloats(const LineRows& column, float* out);
+void floatsToColumn(const float* in, const LineRows& column);
+
+}  // namespace qori::kernels

@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+// Passes over lines, for those that put transforms together.
+#pragma once
+#include "fourier.h"
+
+namespace qori::kernels::line {
+
+/// Blocks up to this many points go through all their stages before the next block does: 32 KiB, which first-level
+/// caches hold.
+inline constexpr ptrdiff_t kPointsAtOnce = 512;
+template <int radix>
+inline constexpr bool isOdd = radix % 2 == 1;
+
+template <int radix>
+QORI_INLINE void butterflyOf(ComplexLine (&a)[radix], const float* turns) {
+    if constexpr (isOdd<radix>)
+        butterfly<radix>(a, turns);
+    else
+        butterfly(a);
+}
+
+/// Blocks of radix * part points. Without twiddles, part is 1.
+template <int radix, bool hasTwiddles>
+QORI_NOINLINE void passBlocks(float* lines, ptrdiff_t blocks, ptrdiff_t part, const float* turns,
+                              const float* twiddles) {
+    const ptrdiff_t apart = part * kLineFloats;
+    for (ptrdiff_t block = 0; block < blocks; ++block) {
+        const float* w = twiddles;
+        for (ptrdiff_t j = 0; j < (hasTwiddles ? part : 1); ++j) {
+            float* const x = lines + j * kLineFloats;
+            ComplexLine a[radix];
+            for (int q = 0; q < radix; ++q) a[q] = loadLine(x + q * apart);
+            butterflyOf<radix>(a, turns);
+            storeLine(x, a[0]);
+            for (int p = 1; p < radix; ++p) storeLine(x + p * apart, hasTwiddles ? times(a[p], w + 2 * p - 2) : a[p]);
+            w += 2 * (radix - 1);
+        }
+        lines += radix * apart;
+    }
+}
+
+/// One stage of so many blocks.
+void runStage(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
+
+}  // namespace qori::kernels::line

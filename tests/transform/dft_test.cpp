@@ -1,0 +1,263 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <initializer_list>
+
+#include "fourier_cases.h"
+
+namespace qori::test {
+namespace {
+
+constexpr PlanExports exportsOf(Elements elements) {
+    switch (elements) {
+        case Elements::real:
+            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+                        return call(qoriDFTGetSize_R_32f, size, flag, 1, plan, init, buffer);
+                    },
+                    [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
+                        return call(qoriDFTInit_R_32f, size, flag, 2, plan, init);
+                    },
+                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                        return call(qoriDFTInitAlloc_R_32f, plan, size, flag, 1);
+                    },
+                    qoriDFTFree_R_32f, qoriDFTGetBufSize_R_32f};
+        case Elements::complex:
+            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+                        return call(qoriDFTGetSize_C_32fc, size, flag, 1, plan, init, buffer);
+                    },
+                    [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
+                        return call(qoriDFTInit_C_32fc, size, flag, 2, plan, init);
+                    },
+                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                        return call(qoriDFTInitAlloc_C_32fc, plan, size, flag, 1);
+                    },
+                    qoriDFTFree_C_32fc, qoriDFTGetBufSize_C_32fc};
+        default:
+            return {nullptr, nullptr,
+                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                        return call(qoriDFTInitAlloc_R_32s, plan, size, flag, 1);
+                    },
+                    qoriDFTFree_R_32s, qoriDFTGetBufSize_R_32s};
+    }
+}
+
+constexpr int32_t kFlags[] = {fftDivFwdByN, fftDivInvByN, fftDivBySqrtN, fftNoDiv};
+int32_t anyFlag() { return kFlags[random().below(4)]; }
+
+/// Every width and every height to 64 (of the main layout, else some), with another that changes; factors of all kinds,
+/// chirps in a whole side and in parts of it.
+template <class Check>
+void forSizes(bool isMain, Check check) {
+    for (int n = 1; n <= 64; ++n) {
+        if (isMain || random().oneIn(5)) check(QorImageSize{n, 1 + n * 7 % 23});
+        if (isMain || random().oneIn(5)) check(QorImageSize{1 + n * 5 % 19, n});
+    }
+    if (!isMain) return check(QorImageSize{134, 67});
+    for (QorImageSize size : {QorImageSize{360, 2},
+                              {3, 1000},
+                              {134, 17},
+                              {67, 17},
+                              {18, 142},
+                              {17, 509},
+                              {1009, 1},
+                              {2, 1009},
+                              {2022, 1},
+                              {4099, 1},
+                              {1155, 3},
+                              {47, 64},
+                              {96, 32},
+                              {40, 128},
+                              {3, 1201}})
+        check(size);
+}
+
+template <Elements elements, Layout layout, Kind kind, class Check>
+void sweep(const char* name, Check check) {
+    forSizes(layout == Layout::C1 && kind == Kind::R, [=](QorImageSize size) {
+        if (!testing::Test::HasFailure()) check(exportsOf(elements), size);
+    });
+    markSwept(name);
+}
+
+// One function an operation, by the names of the registry.
+
+template <class, class, Layout layout, Kind kind, class Function>
+void forwardToPack(const char* name, Function function) {
+    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkReal<layout, kind, true>(function, exports, size, anyFlag());
+    });
+}
+template <class, class, Layout layout, Kind kind, class Function>
+void inverseFromPack(const char* name, Function function) {
+    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkReal<layout, kind, false>(function, exports, size, anyFlag());
+    });
+}
+template <class, class, Layout layout, Kind kind, class Function>
+void forwardComplex(const char* name, Function function) {
+    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkComplex<kind, true>(function, exports, size, anyFlag());
+    });
+}
+template <class, class, Layout layout, Kind kind, class Function>
+void inverseComplex(const char* name, Function function) {
+    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkComplex<kind, false>(function, exports, size, anyFlag());
+    });
+}
+template <class S, class D, Layout layout, Kind kind, class Function>
+void forwardToIntegers(const char* name, Function function) {
+    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkIntegers<S, D, layout, true>(function, exports, size, anyFlag(), random().below(9) - 4);
+    });
+}
+template <class S, class D, Layout layout, Kind kind, class Function>
+void inverseToBytes(const char* name, Function function) {
+    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkIntegers<S, D, layout, false>(function, exports, size, anyFlag(), random().below(9) - 2);
+    });
+}
+
+// Plans are made, measured and released by every one of these.
+template <class, class, Layout, Kind, class Function>
+void getSize(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void init(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void initAlloc(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void freePlan(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void planBufferSize(const char* name, Function) {
+    markSwept(name);
+}
+
+TEST(Dft, AllMembers) {
+#define QORI_KIND_ Kind::none
+#define QORI_KIND_R Kind::R
+#define QORI_KIND_IR Kind::IR
+#define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
+    operation<S, D, Layout::SL, QORI_KIND_##kind>(#name, &name);
+#include "members/dft.inc"
+#undef QORI_MEMBER
+}
+
+TEST(Dft, FailsInOrder) {
+    const PlanExports real = exportsOf(Elements::real), integers = exportsOf(Elements::integers),
+                      complex = exportsOf(Elements::complex);
+    checkOperation(
+        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
+            return call(qoriDFTFwd_RToPack_32f_C1R, static_cast<const float*>(src), srcStep, static_cast<float*>(dst),
+                        dstStep, plan, buffer);
+        },
+        real, {integers, complex});
+    checkOperation(
+        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
+            return call(qoriDFTInv_PackToR_32s8u_C1RSfs, static_cast<const int32_t*>(src), srcStep,
+                        static_cast<uint8_t*>(dst), dstStep, plan, 3, buffer);
+        },
+        integers, {real, complex});
+    checkOperation(
+        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
+            return call(qoriDFTInv_CToC_32fc_C1R, static_cast<const QorComplex32f*>(src), srcStep,
+                        static_cast<QorComplex32f*>(dst), dstStep, plan, buffer);
+        },
+        complex, {real, integers});
+    for (const PlanExports& exports : {real, integers, complex}) checkAllocations(exports, {1009, 1200});
+}
+
+TEST(Dft, PlansAreRefusedInOrder) {
+    int32_t plan = -1, init = -1, buffer = -1;
+    int32_t* const none = nullptr;
+    QorFft2DPlan *const noPlan = nullptr, *out = nullptr;
+    QorFft2DPlan** const noOut = nullptr;
+    uint8_t* const noInit = nullptr;
+    alignas(64) static uint8_t memory[1 << 16];
+    auto* const record = reinterpret_cast<QorFft2DPlan*>(memory);
+    for (QorImageSize size : {QorImageSize{0, 1}, {1, 0}, {-3, 4}}) {
+        EXPECT_EQ(QOR_ERR_SIZE, call(qoriDFTGetSize_R_32f, size, 0, 0, none, none, none));
+        EXPECT_EQ(QOR_ERR_SIZE, call(qoriDFTInit_C_32fc, size, 0, 0, noPlan, noInit));
+        EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriDFTInitAlloc_R_32f, noOut, size, 0, 0));
+        EXPECT_EQ(QOR_ERR_SIZE, call(qoriDFTInitAlloc_R_32f, &out, size, 0, 0));
+    }
+    const QorImageSize ok{30, 20};
+    EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriDFTGetSize_R_32f, ok, 0, 0, &plan, none, &buffer));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriDFTInit_C_32fc, ok, 0, 0, noPlan, noInit));
+    for (int32_t flag : {0, 3, 5, 6, 7, 9, 16, -1}) {
+        EXPECT_EQ(QOR_ERR_FLAG, call(qoriDFTGetSize_C_32fc, ok, flag, 0, &plan, &init, &buffer));
+        EXPECT_EQ(QOR_ERR_FLAG, call(qoriDFTInit_R_32f, ok, flag, 0, record, noInit));
+        EXPECT_EQ(QOR_ERR_FLAG, call(qoriDFTInitAlloc_C_32fc, &out, ok, flag, 0));
+    }
+    for (QorImageSize size : {QorImageSize{INT32_MAX, 1}, {1, INT32_MAX}, {1 << 28, 1}, {INT32_MAX, INT32_MAX}}) {
+        EXPECT_EQ(QOR_ERR_SIZE, call(qoriDFTGetSize_C_32fc, size, 1, 0, &plan, &init, &buffer));
+        EXPECT_EQ(QOR_ERR_NO_MEMORY, call(qoriDFTInitAlloc_R_32s, &out, size, 1, 0));
+    }
+    EXPECT_EQ(-1, plan);
+    EXPECT_EQ(-1, init);
+    EXPECT_EQ(-1, buffer);
+    EXPECT_EQ(nullptr, out);
+    // Chirps and long sides are made with memory for it.
+    EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriDFTInit_R_32f, QorImageSize{67, 1}, 1, 0, record, noInit));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriDFTInit_R_32f, QorImageSize{1, 1025}, 1, 0, record, noInit));
+    EXPECT_EQ(QOR_OK, call(qoriDFTInit_R_32f, QorImageSize{61, 1024}, 1, 0, record, noInit));
+}
+
+/// Plans of powers of two are the other family's in all but their tag.
+TEST(Dft, AgreesWithFft) {
+    const QorImageSize size{64, 32};
+    const Plan plan(exportsOf(Elements::real), size, fftDivBySqrtN);
+    QorFft2DPlan* other = nullptr;
+    ASSERT_EQ(QOR_OK, call(qoriFFTInitAlloc_R_32f, &other, 6, 5, int32_t{fftDivBySqrtN}, 1));
+    const Shape shape = shapeOf(size);
+    const TestImage src(kSrc, shape, 4), dst(kDst, shape, 4);
+    src.fill<float>(1, noise);
+    uint8_t* const none = nullptr;
+    const float* const from = src.data<float>();
+    const QorFft2DPlan* const ofFft = other;
+    EXPECT_EQ(QOR_OK,
+              call(qoriDFTFwd_RToPack_32f_C1R, from, src.step(), dst.data<float>(), dst.step(), plan.get(), none));
+    const Snapshot expected = dst.snapshot();
+    EXPECT_EQ(QOR_ERR_CONTEXT,
+              call(qoriFFTFwd_RToPack_32f_C1R, from, src.step(), dst.data<float>(), dst.step(), plan.get(), none));
+    EXPECT_EQ(QOR_OK, call(qoriFFTFwd_RToPack_32f_C1R, from, src.step(), dst.data<float>(), dst.step(), ofFft, none));
+    QORI_EXPECT_UNCHANGED(dst, expected);
+    EXPECT_EQ(QOR_OK, call(qoriFFTFree_R_32f, other));
+}
+
+/// A plan is used where it was copied to, by several calls; the results do not depend on where it is.
+TEST(Dft, PlansMayBeMoved) {
+    const QorImageSize size{201, 6};
+    int32_t planBytes = 0, initBytes = 0, bufferBytes = 0;
+    ASSERT_EQ(QOR_OK, qoriDFTGetSize_R_32f(size, fftNoDiv, 1, &planBytes, &initBytes, &bufferBytes));
+    std::vector<uint8_t> init(static_cast<size_t>(initBytes));
+    const auto blockOf = [&](std::vector<uint8_t>& memory) {
+        memory.resize(static_cast<size_t>(planBytes) + 64);
+        return memory.data() + (64 - reinterpret_cast<uintptr_t>(memory.data()) % 64) % 64;
+    };
+    std::vector<uint8_t> first, second;
+    uint8_t *const made = blockOf(first), *const copied = blockOf(second);
+    ASSERT_EQ(QOR_OK, qoriDFTInit_R_32f(size, fftNoDiv, 1, reinterpret_cast<QorFft2DPlan*>(made), init.data()));
+    const TestImage src(kSrc, shapeOf(size), 4), dst(kDst, shapeOf(size), 4);
+    src.fill<float>(1, noise);
+    uint8_t* const none = nullptr;
+    const float* const from = src.data<float>();
+    const auto run = [&](const uint8_t* plan) {
+        return call(qoriDFTFwd_RToPack_32f_C1R, from, src.step(), dst.data<float>(), dst.step(),
+                    reinterpret_cast<const QorFft2DPlan*>(plan), none);
+    };
+    EXPECT_EQ(QOR_OK, run(made));
+    const Snapshot expected = dst.snapshot();
+    std::memcpy(copied, made, static_cast<size_t>(planBytes) - 64);
+    std::fill(first.begin(), first.end(), uint8_t{0xAA});
+    EXPECT_EQ(QOR_OK, run(copied));
+    QORI_EXPECT_UNCHANGED(dst, expected);
+}
+
+}  // namespace
+}  // namespace qori::test

@@ -1,0 +1,236 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <initializer_list>
+
+#include "fourier_cases.h"
+
+namespace qori::test {
+namespace {
+
+int32_t orderOf(int32_t n) {
+    int32_t order = 0;
+    while (1 << order < n) ++order;
+    return order;
+}
+
+constexpr PlanExports exportsOf(Elements elements) {
+    switch (elements) {
+        case Elements::real:
+            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+                        return call(qoriFFTGetSize_R_32f, orderOf(size.width), orderOf(size.height), flag, 1, plan,
+                                    init, buffer);
+                    },
+                    [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
+                        return call(qoriFFTInit_R_32f, orderOf(size.width), orderOf(size.height), flag, 2, plan, init);
+                    },
+                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                        return call(qoriFFTInitAlloc_R_32f, plan, orderOf(size.width), orderOf(size.height), flag, 1);
+                    },
+                    qoriFFTFree_R_32f, qoriFFTGetBufSize_R_32f};
+        case Elements::complex:
+            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+                        return call(qoriFFTGetSize_C_32fc, orderOf(size.width), orderOf(size.height), flag, 1, plan,
+                                    init, buffer);
+                    },
+                    [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
+                        return call(qoriFFTInit_C_32fc, orderOf(size.width), orderOf(size.height), flag, 2, plan, init);
+                    },
+                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                        return call(qoriFFTInitAlloc_C_32fc, plan, orderOf(size.width), orderOf(size.height), flag, 1);
+                    },
+                    qoriFFTFree_C_32fc, qoriFFTGetBufSize_C_32fc};
+        default:
+            return {nullptr, nullptr,
+                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                        return call(qoriFFTInitAlloc_R_32s, plan, orderOf(size.width), orderOf(size.height), flag, 1);
+                    },
+                    qoriFFTFree_R_32s, qoriFFTGetBufSize_R_32s};
+    }
+}
+
+constexpr int32_t kFlags[] = {fftDivFwdByN, fftDivInvByN, fftDivBySqrtN, fftNoDiv};
+int32_t anyFlag() { return kFlags[random().below(4)]; }
+
+/// Every pair of sides up to 64 (of the main layout, else some), some larger ones where tables come from the init
+/// buffer and blocks leave a cache.
+template <class Check>
+void forSizes(bool isMain, Check check) {
+    for (int x = 0; x <= 6; ++x)
+        for (int y = 0; y <= 6; ++y)
+            if (isMain || random().oneIn(4)) check(QorImageSize{1 << x, 1 << y});
+    if (!isMain) return check(QorImageSize{2048, 2});
+    for (QorImageSize size : {QorImageSize{128, 16}, {16, 256}, {512, 2}, {2, 1024}, {2048, 1}, {4, 2048}, {4096, 2}})
+        check(size);
+}
+
+template <Elements elements, Layout layout, Kind kind, class Check>
+void sweep(const char* name, Check check) {
+    forSizes(layout == Layout::C1 && kind == Kind::R, [=](QorImageSize size) {
+        if (!testing::Test::HasFailure()) check(exportsOf(elements), size);
+    });
+    markSwept(name);
+}
+
+// One function an operation, by the names of the registry.
+
+template <class, class, Layout layout, Kind kind, class Function>
+void forwardToPack(const char* name, Function function) {
+    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkReal<layout, kind, true>(function, exports, size, anyFlag());
+    });
+}
+template <class, class, Layout layout, Kind kind, class Function>
+void inverseFromPack(const char* name, Function function) {
+    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkReal<layout, kind, false>(function, exports, size, anyFlag());
+    });
+}
+template <class, class, Layout layout, Kind kind, class Function>
+void forwardComplex(const char* name, Function function) {
+    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkComplex<kind, true>(function, exports, size, anyFlag());
+    });
+}
+template <class, class, Layout layout, Kind kind, class Function>
+void inverseComplex(const char* name, Function function) {
+    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkComplex<kind, false>(function, exports, size, anyFlag());
+    });
+}
+template <class S, class D, Layout layout, Kind kind, class Function>
+void forwardToIntegers(const char* name, Function function) {
+    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkIntegers<S, D, layout, true>(function, exports, size, anyFlag(), random().below(9) - 4);
+    });
+}
+template <class S, class D, Layout layout, Kind kind, class Function>
+void inverseToBytes(const char* name, Function function) {
+    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
+        checkIntegers<S, D, layout, false>(function, exports, size, anyFlag(), random().below(9) - 2);
+    });
+}
+
+// Plans are made, measured and released by every one of these.
+template <class, class, Layout, Kind, class Function>
+void getSize(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void init(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void initAlloc(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void freePlan(const char* name, Function) {
+    markSwept(name);
+}
+template <class, class, Layout, Kind, class Function>
+void planBufferSize(const char* name, Function) {
+    markSwept(name);
+}
+
+TEST(Fft, AllMembers) {
+#define QORI_KIND_ Kind::none
+#define QORI_KIND_R Kind::R
+#define QORI_KIND_IR Kind::IR
+#define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
+    operation<S, D, Layout::SL, QORI_KIND_##kind>(#name, &name);
+#include "members/fft.inc"
+#undef QORI_MEMBER
+}
+
+TEST(Fft, FailsInOrder) {
+    const PlanExports real = exportsOf(Elements::real), integers = exportsOf(Elements::integers),
+                      complex = exportsOf(Elements::complex);
+    checkOperation(
+        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
+            return call(qoriFFTFwd_RToPack_32f_C1R, static_cast<const float*>(src), srcStep, static_cast<float*>(dst),
+                        dstStep, plan, buffer);
+        },
+        real, {integers, complex});
+    checkOperation(
+        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
+            return call(qoriFFTInv_PackToR_32s8u_C1RSfs, static_cast<const int32_t*>(src), srcStep,
+                        static_cast<uint8_t*>(dst), dstStep, plan, 3, buffer);
+        },
+        integers, {real, complex});
+    checkOperation(
+        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
+            return call(qoriFFTInv_CToC_32fc_C1R, static_cast<const QorComplex32f*>(src), srcStep,
+                        static_cast<QorComplex32f*>(dst), dstStep, plan, buffer);
+        },
+        complex, {real, integers});
+    for (const PlanExports& exports : {real, integers, complex}) checkAllocations(exports, {2048, 4096});
+}
+
+TEST(Fft, PlansAreRefusedInOrder) {
+    int32_t plan = -1, init = -1, buffer = -1;
+    const auto real = [&](int32_t x, int32_t y, int32_t flag, int32_t* p) {
+        return call(qoriFFTGetSize_R_32f, x, y, flag, 1, p, &init, &buffer);
+    };
+    const auto complex = [&](int32_t x, int32_t y, int32_t flag, int32_t* p) {
+        return call(qoriFFTGetSize_C_32fc, x, y, flag, 1, p, &init, &buffer);
+    };
+    for (int32_t order : {-1, 31, INT32_MIN, INT32_MAX}) {
+        EXPECT_EQ(QOR_ERR_ORDER, real(order, 0, 0, nullptr));
+        EXPECT_EQ(QOR_ERR_ORDER, complex(0, order, 0, nullptr));
+    }
+    for (int32_t flag : {0, 3, 5, 6, 7, 9, 16, -1}) {
+        EXPECT_EQ(QOR_ERR_NULL_PTR, real(30, 0, flag, nullptr));
+        EXPECT_EQ(QOR_ERR_FLAG, real(30, 29, flag, &plan));
+        EXPECT_EQ(QOR_ERR_FLAG, complex(30, 29, flag, &plan));
+    }
+    EXPECT_EQ(QOR_ERR_ORDER, real(30, 0, fftNoDiv, &plan));
+    EXPECT_EQ(QOR_ERR_ORDER, real(0, 29, fftNoDiv, &plan));
+    EXPECT_EQ(QOR_ERR_ORDER, complex(29, 0, fftNoDiv, &plan));
+    EXPECT_EQ(QOR_ERR_ORDER, complex(0, 29, fftNoDiv, &plan));
+    EXPECT_EQ(QOR_ERR_SIZE, real(29, 28, fftNoDiv, &plan));
+    EXPECT_EQ(QOR_ERR_SIZE, complex(28, 0, fftNoDiv, &plan));
+    EXPECT_EQ(-1, plan);
+    EXPECT_EQ(-1, init);
+    EXPECT_EQ(-1, buffer);
+
+    alignas(64) static uint8_t memory[1 << 16];
+    auto* const record = reinterpret_cast<QorFft2DPlan*>(memory);
+    QorFft2DPlan *const none = nullptr, *out = nullptr;
+    uint8_t* const noInit = nullptr;
+    EXPECT_EQ(QOR_ERR_ORDER, call(qoriFFTInit_R_32f, 31, 0, 0, 0, none, noInit));
+    EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriFFTInit_R_32f, 30, 0, 0, 0, none, noInit));
+    EXPECT_EQ(QOR_ERR_FLAG, call(qoriFFTInit_C_32fc, 29, 0, 0, 0, record, noInit));
+    EXPECT_EQ(QOR_ERR_ORDER, call(qoriFFTInit_C_32fc, 29, 0, 8, 0, record, noInit));
+    for (const auto& [x, y] : {std::pair{11, 0}, {0, 11}, {12, 3}}) {
+        EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriFFTInit_R_32f, x, y, 8, 0, record, noInit));
+        EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriFFTInit_C_32fc, x, y, 8, 0, record, noInit));
+        EXPECT_EQ(QOR_OK, real(x, y, 8, &plan));
+        EXPECT_GT(init, 0);
+        EXPECT_EQ(QOR_OK, complex(x, y, 8, &plan));
+        EXPECT_GT(init, 0);
+    }
+    EXPECT_EQ(QOR_OK, call(qoriFFTInit_R_32f, 10, 10, 8, 12345, record, noInit));
+    QorFft2DPlan** const noOut = nullptr;
+    EXPECT_EQ(QOR_ERR_NULL_PTR, call(qoriFFTInitAlloc_R_32s, noOut, -1, 0, 0, 0));
+    EXPECT_EQ(QOR_ERR_ORDER, call(qoriFFTInitAlloc_R_32s, &out, -1, 0, 0, 0));
+    EXPECT_EQ(QOR_ERR_FLAG, call(qoriFFTInitAlloc_R_32s, &out, 30, 0, 0, 0));
+    EXPECT_EQ(QOR_ERR_ORDER, call(qoriFFTInitAlloc_R_32s, &out, 30, 0, 1, 0));
+    EXPECT_EQ(QOR_ERR_NO_MEMORY, call(qoriFFTInitAlloc_R_32s, &out, 15, 15, 1, 0));
+    EXPECT_EQ(nullptr, out);
+}
+
+/// A constant is its own mean, and has no other frequency.
+TEST(Fft, ConstantsAreExact) {
+    for (const auto& [flag, expected] : {std::pair{fftDivFwdByN, 3.0f}, {fftNoDiv, 3.0f * 32 * 16}}) {
+        const QorImageSize size{32, 16};
+        const Plan plan(exportsOf(Elements::real), size, flag);
+        const TestImage image(kDst, shapeOf(size), 4);
+        image.fill<float>(1, [] { return 3.0f; });
+        EXPECT_EQ(QOR_OK,
+                  call(qoriFFTFwd_RToPack_32f_C1IR, image.data<float>(), image.step(), plan.get(), plan.buffer()));
+        const View<float> spectrum = image.view<float>(1);
+        image.forEach([&](int x, int y) { EXPECT_EQ(x + y == 0 ? expected : 0, spectrum.get(x, y)) << x << "," << y; });
+    }
+}
+
+}  // namespace
+}  // namespace qori::test
