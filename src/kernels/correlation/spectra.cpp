@@ -3,6 +3,8 @@
 
 #include <bit>
 
+#include "kernels/transform/passes.h"
+
 namespace qori::kernels::correlation {
 
 namespace {
@@ -11,54 +13,32 @@ using Line = ComplexLineOf<double>;
 
 // --- passes ---------------------------------------------------------------------------------------------------------
 
+/// The transpose of a stage: blocks of radix * part points are multiplied by the twiddles before the butterfly.
 template <int radix>
-QORI_INLINE void butterflyOf(Line (&a)[radix], const double* turns) {
-    if constexpr (radix % 2 == 1)
-        line::butterfly<radix>(a, turns);
-    else
-        line::butterfly(a);
-}
-
-/// Blocks of radix * part points. Forth multiplies by the twiddles behind the butterfly, back before it; blocks of one
-/// butterfly have none.
-template <int radix, bool isBack>
-QORI_NOINLINE void passBlocks(double* lines, ptrdiff_t blocks, ptrdiff_t part, const double* turns,
-                              const double* twiddles) {
+QORI_NOINLINE void passBlocksBack(double* lines, ptrdiff_t blocks, ptrdiff_t part, const double* turns,
+                                  const double* twiddles) {
     const ptrdiff_t apart = part * kLineDoubles;
     for (; blocks > 0; --blocks, lines += radix * apart) {
         const double* w = twiddles;
         for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
             double* const x = lines + j * kLineDoubles;
-            Line a[radix];
-            for (int p = 0; p < radix; ++p) {
-                a[p] = line::loadLine(x + p * apart);
-                if (isBack && p > 0) a[p] = line::times(a[p], w + 2 * p - 2);
-            }
-            butterflyOf<radix>(a, turns);
-            for (int p = 0; p < radix; ++p)
-                line::storeLine(x + p * apart, !isBack && p > 0 ? line::times(a[p], w + 2 * p - 2) : a[p]);
+            Line a[radix] = {line::loadLine(x)};
+            for (int p = 1; p < radix; ++p) a[p] = line::times(line::loadLine(x + p * apart), w + 2 * p - 2);
+            line::butterflyOf<radix>(a, turns);
+            for (int p = 0; p < radix; ++p) line::storeLine(x + p * apart, a[p]);
         }
-    }
-}
-
-/// The same for part 1, where all twiddles are 1.
-template <int radix>
-QORI_NOINLINE void passSingles(double* lines, ptrdiff_t blocks, const double* turns) {
-    for (; blocks > 0; --blocks, lines += radix * kLineDoubles) {
-        Line a[radix];
-        for (int p = 0; p < radix; ++p) a[p] = line::loadLine(lines + p * kLineDoubles);
-        butterflyOf<radix>(a, turns);
-        for (int p = 0; p < radix; ++p) line::storeLine(lines + p * kLineDoubles, a[p]);
     }
 }
 
 template <int radix, bool isBack>
 void passOf(double* lines, ptrdiff_t length, ptrdiff_t part, const double* turns, const double* twiddles) {
     const ptrdiff_t blocks = length / (radix * part);
-    if (part == 1)
-        passSingles<radix>(lines, blocks, turns);
+    if (part == 1)  // all twiddles are 1
+        line::passBlocks<radix, false>(lines, blocks, 1, turns, twiddles);
+    else if constexpr (isBack)
+        passBlocksBack<radix>(lines, blocks, part, turns, twiddles);
     else
-        passBlocks<radix, isBack>(lines, blocks, part, turns, twiddles);
+        line::passBlocks<radix, true>(lines, blocks, part, turns, twiddles);
 }
 
 template <bool isBack, class Stage>
