@@ -2759,8 +2759,8 @@ QORI_API QorResult QORI_CALL qoriCrossCorrNormGetBufferSize(QorImageSize srcRoiS
  *            Results are the same within their errors.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pTpl or pDst is null), QOR_ERR_SIZE (a width or
  *            height below 1, or a template wider or taller than the source), QOR_ERR_STEP (a step below 1),
- *            QOR_ERR_NULL_PTR (pBuffer is null), QOR_ERR_ALGORITHM (a field of algType has another value); then
- *            nothing is written.
+ *            QOR_ERR_NULL_PTR (pBuffer is null), QOR_ERR_ALGORITHM (a field of algType has another value),
+ *            QOR_ERR_SIZE (work memory of 2^31 bytes or more); then nothing is written.
  */
 QORI_API QorResult QORI_CALL qoriCrossCorrNorm_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
     const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep, int32_t algType,

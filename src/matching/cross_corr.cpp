@@ -130,6 +130,8 @@ QorResult crossCorrNorm(Image<const T> src, QorImageSize srcRoi, Image<const T> 
         return r;
     const Problem problem = problemOf(srcRoi, tplRoi, algorithm);
     return underDefaultControl([&]() -> QorResult {
+        // No buffer was reported for these.
+        if (workBytes<T>(problem) > INT32_MAX) return QOR_ERR_SIZE;
         correlate<T, D>({problem, src, tpl, dst, 1, scale}, 1, buffer);
         return QOR_OK;
     });

@@ -101,15 +101,12 @@ TEST(CrossCorr, OlderFormsOfLargeTemplates) {
     runOlder<double, double, Layout::C1>(qoriCrossCorrValid_NormLevel_64f_C1R, valid);
 }
 
-/// A buffer of exactly the reported size, full of garbage, that ends at a no-access page.
+/// With a buffer of exactly the reported size, full of garbage, that ends at a no-access page.
 template <class S, class D, class Function>
-void runAlgorithm(Function function, const Job& job, int32_t hint, double tolerance, auto fill) {
-    SCOPED_TRACE(describe(job) + ", hint " + std::to_string(hint));
-    Scene<S, D> scene(job, 1);
-    fill(scene);
-    const Snapshot src = scene.src.snapshot(), tpl = scene.tpl.snapshot(), dst = scene.dst.snapshot();
+QorResult callAlgorithm(Function function, const Scene<S, D>& scene, int32_t hint) {
+    const Job& job = scene.job;
     int32_t bytes = 0;
-    ASSERT_EQ(QOR_OK, call(qoriCrossCorrNormGetBufferSize, job.src, job.tpl, job.algorithm(hint), &bytes));
+    EXPECT_EQ(QOR_OK, call(qoriCrossCorrNormGetBufferSize, job.src, job.tpl, job.algorithm(hint), &bytes));
     const TestImage buffer = block(3, bytes);
     buffer.fill<uint8_t>(1, [] { return uint8_t{0xFF}; });
     const auto run = [&](auto... scale) {
@@ -118,9 +115,18 @@ void runAlgorithm(Function function, const Job& job, int32_t hint, double tolera
                     job.algorithm(hint), buffer.data<uint8_t>());
     };
     if constexpr (std::is_same_v<D, uint8_t>)
-        ASSERT_EQ(QOR_OK, run(job.scale));
+        return run(job.scale);
     else
-        ASSERT_EQ(QOR_OK, run());
+        return run();
+}
+
+template <class S, class D, class Function>
+void runAlgorithm(Function function, const Job& job, int32_t hint, double tolerance, auto fill) {
+    SCOPED_TRACE(describe(job) + ", hint " + std::to_string(hint));
+    Scene<S, D> scene(job, 1);
+    fill(scene);
+    const Snapshot src = scene.src.snapshot(), tpl = scene.tpl.snapshot(), dst = scene.dst.snapshot();
+    ASSERT_EQ(QOR_OK, (callAlgorithm<S, D>(function, scene, hint)));
     scene.compare(1, tolerance, dst);
     QORI_EXPECT_UNCHANGED(scene.src, src);
     QORI_EXPECT_UNCHANGED(scene.tpl, tpl);
@@ -240,12 +246,7 @@ TEST(CrossCorr, HugeAndNonFiniteElements) {
             scene.src.fill<float>(1, drawPixel<float>);
             scene.tpl.fill<float>(1, drawPixel<float>);
             scene.src.view<float>(1).set(20, 30, 0, bad);
-            int32_t bytes = 0;
-            ASSERT_EQ(QOR_OK, call(qoriCrossCorrNormGetBufferSize, job.src, job.tpl, job.algorithm(hint), &bytes));
-            const TestImage buffer = block(3, bytes);
-            ASSERT_EQ(QOR_OK, call(qoriCrossCorrNorm_32f_C1R, scene.src.data<float>(), scene.src.step(), job.src,
-                                   scene.tpl.data<float>(), scene.tpl.step(), job.tpl, scene.dst.data<float>(),
-                                   scene.dst.step(), job.algorithm(hint), buffer.data<uint8_t>()));
+            ASSERT_EQ(QOR_OK, (callAlgorithm<float, float>(qoriCrossCorrNorm_32f_C1R, scene, hint)));
             const reference::Correlation correlation(reference::plane(scene.src.view<float>(1), job.src, 0),
                                                      reference::plane(scene.tpl.view<float>(1), job.tpl, 0),
                                                      Normaliser::centred);
@@ -280,6 +281,22 @@ TEST(CrossCorr, ConstantImages) {
                 scene.tpl.template fill<float>(1, [=] { return value; });
             });
         }
+}
+
+/// Exactly 0, whatever the transform's errors.
+TEST(CrossCorr, WindowsOfZeros) {
+    for (const Normaliser normaliser : {Normaliser::none, Normaliser::energy}) {
+        const Job job{{70, 40}, {9, 8}, Placement::full, normaliser};
+        for (const int32_t hint : kHints) {
+            Scene<float, float> scene(job, 1);
+            scene.tpl.fill<float>(1, drawPixel<float>);
+            for (int y = 0; y < 40; ++y)
+                for (int x = 0; x < 70; ++x) scene.src.view<float>(1).set(x, y, 0, x < 30 ? 0 : drawPixel<float>());
+            ASSERT_EQ(QOR_OK, (callAlgorithm<float, float>(qoriCrossCorrNorm_32f_C1R, scene, hint)));
+            for (int y = 0; y < 47; ++y)
+                for (int x = 0; x < 30; ++x) ASSERT_EQ(0, scene.dst.view<float>(1).get(x, y)) << x << ", " << y;
+        }
+    }
 }
 
 TEST(CrossCorr, ScalesOfAnySize) {
@@ -350,6 +367,8 @@ TEST(CrossCorr, OperationsCheckInOrder) {
     QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, out, status(pixels, 20, kSource, pixels, 5, kPattern, dst, 96, 3, false));
     for (const int32_t bad : {3, 0x300, 0x30000, -1})
         QORI_EXPECT_STATUS(QOR_ERR_ALGORITHM, out, status(pixels, 20, kSource, pixels, 5, kPattern, dst, 96, bad));
+    const QorImageSize huge{60'000, 60'000};  // for which the query reports no buffer
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, out, status(pixels, 60'000, huge, pixels, 60'000, huge, dst, 96, corrValid));
     EXPECT_EQ(QOR_OK, status(pixels, 20, kSource, pixels, 5, kPattern, dst, 96, corrValid));
     EXPECT_EQ(QOR_OK, status(pixels, 20, kPattern, pixels, 5, kPattern, dst, 96, corrValid));  // one placement
 }

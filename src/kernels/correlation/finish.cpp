@@ -52,7 +52,9 @@ QORI_NOINLINE void finishAs(const Finish& finish, const Cell* crosses, Sums<Cell
     for (ptrdiff_t x = 0; x < n; x += Vec<double>::lanes) {
         const Vec<double> cross = loadNumbers(crosses + x);
         if constexpr (kind == Kind::plain) {
-            store(results + x, cross);
+            // Windows of zeros have no energy; a transform leaves them its errors.
+            const bool isKnown = sums.squares == nullptr;
+            store(results + x, isKnown ? cross : selectOrZero(~isEqual(loadNumbers(sums.squares + x), none), cross));
         } else if constexpr (kind == Kind::norm) {
             const Vec<double> energy = loadNumbers(sums.squares + x) * square;
             store(results + x, selectOrZero(~isAtMost(energy, none), overRoot<isFloat>(cross, energy)));
@@ -97,8 +99,6 @@ ptrdiff_t nextFaint(const Finish& finish, Sums<double> sums, double faintest, pt
             const Vec<double> s1 = load(sums.values + x);
             energy = productDifference(area, s2, s1, s1);
             isFlat = isLess(energy, least) | isAtMost(energy, roundings * s2);
-        } else if (finish.kind == Kind::plain) {
-            isFlat = {_mm256_setzero_si256()};
         }
         const Mask<double> isFaint = ~(isAtMost(limit, energy) | isFlat);
         if (any(isFaint)) return std::min<ptrdiff_t>(x + firstSelected(isFaint), n);

@@ -20,7 +20,8 @@ struct Finish {
     bool isFloat;      ///< Results will be rounded to float.
 };
 
-/// n is rounded up to whole vectors of doubles. Sums that the kind does not need may be null.
+/// n is rounded up to whole vectors of doubles. Sums that the kind does not need may be null; with squares, plain
+/// results of windows of zeros become 0.
 template <class Cell>
 void finishRow(const Finish& finish, const Cell* crosses, Sums<Cell> sums, ptrdiff_t n, double* results);
 
