@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
-#include <cmath>
 #include <vector>
 
 #include "panels.h"
@@ -8,30 +7,31 @@
 namespace demo {
 namespace {
 
-/// A part of the photograph to look for: of a regular choice of places the one with the most contrast.
+/// A part of the photograph to look for: of a regular choice of places the one with the most detail.
 struct Pattern {
     QorPoint2D place;
     QorImageSize size;
 };
 
-double contrastOf(const Picture& grey, QorPoint2D place, QorImageSize size) {
-    double mean = 0, norm = 0;
-    require(qoriMean_8u_C1R(grey.at(place.x, place.y), grey.step(), size, &mean));
-    require(qoriNorm_L2_8u_C1R(grey.at(place.x, place.y), grey.step(), size, &norm));
-    return norm * norm - mean * mean * size.width * size.height;
+/// By how much it differs from its neighbour a few pixels to the right.
+double detailOf(const Picture& grey, QorPoint2D place, QorImageSize size, int shift) {
+    double norm = 0;
+    require(qoriNormDiff_L2_8u_C1R(grey.at(place.x, place.y), grey.step(), grey.at(place.x + shift, place.y),
+                                   grey.step(), size, &norm));
+    return norm;
 }
 
 Pattern choosePattern(const Picture& grey) {
-    constexpr int kPlaces = 7;
-    const int side = std::clamp(std::min(grey.width(), grey.height()) / 6, 1, 96);
+    constexpr int kPlaces = 7, kShift = 4;
+    const int side = std::clamp(std::min(grey.width(), grey.height()) / 9, 1, 64);
     Pattern best{{0, 0}, {side, side}};
     double most = -1;
     for (int i = 0; i < kPlaces * kPlaces; ++i) {
-        const QorPoint2D place{(grey.width() - side) * (i % kPlaces) / (kPlaces - 1),
+        const QorPoint2D place{(grey.width() - side - kShift) * (i % kPlaces) / (kPlaces - 1),
                                (grey.height() - side) * (i / kPlaces) / (kPlaces - 1)};
-        const double contrast = contrastOf(grey, place, best.size);
-        if (contrast > most) {
-            most = contrast;
+        const double detail = detailOf(grey, place, best.size, kShift);
+        if (detail > most) {
+            most = detail;
             best.place = place;
         }
     }
@@ -86,33 +86,35 @@ void drawFrame(const Picture& out, int x, int y, QorImageSize size, int thicknes
     bar(right, y, right + thickness, bottom);
 }
 
-/// What was looked for stands in the corner; a frame is where it was found.
+/// Frames the place of the best score.
+void frameBest(const Picture& out, const Surface& surface, QorImageSize size) {
+    float best = 0;
+    int32_t x = 0, y = 0;
+    require(qoriMaxIndx_32f_C1R(surface.scores.data(), surface.step, out.size(), &best, &x, &y));
+    drawFrame(out, x - size.width / 2, y - size.height / 2, size, 1 + std::min(out.width(), out.height()) / 160);
+}
+
+/// What was looked for stands in the corner.
 Picture foundTemplate(const Picture& photo) {
     const Picture grey = greyOf(photo);
     const Pattern pattern = choosePattern(grey);
     const Picture tpl = dimmed(grey, pattern);
-    const Surface surface = correlate(grey, tpl);
-    float best = 0;
-    int32_t x = 0, y = 0;
-    require(qoriMaxIndx_32f_C1R(surface.scores.data(), surface.step, photo.size(), &best, &x, &y));
-
     Picture out(photo.size(), 3);
     require(qoriCopy_8u_C3R(photo.data(), photo.step(), out.data(), out.step(), photo.size()));
-    const int thickness = 1 + std::min(photo.width(), photo.height()) / 160;
     require(qoriDup_8u_C1C3R(tpl.data(), tpl.step(), out.data(), out.step(), pattern.size));
-    drawFrame(out, x - pattern.size.width / 2, y - pattern.size.height / 2, pattern.size, thickness);
+    frameBest(out, correlate(grey, tpl), pattern.size);
     return out;
 }
 
-/// Black is -1, white is 1.
+/// Black is 0 and below, white is 1.
 Picture surfaceOfTemplate(const Picture& photo) {
     const Picture grey = greyOf(photo);
     const Pattern pattern = choosePattern(grey);
     const Surface surface = correlate(grey, dimmed(grey, pattern));
     Picture scores(photo.size(), 1), out(photo.size(), 3);
-    require(
-        qoriScale_32f8u_C1R(surface.scores.data(), surface.step, scores.data(), scores.step(), photo.size(), -1, 1));
+    require(qoriScale_32f8u_C1R(surface.scores.data(), surface.step, scores.data(), scores.step(), photo.size(), 0, 1));
     require(qoriDup_8u_C1C3R(scores.data(), scores.step(), out.data(), out.step(), photo.size()));
+    frameBest(out, surface, pattern.size);
     return out;
 }
 

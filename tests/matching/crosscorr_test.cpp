@@ -236,6 +236,17 @@ TEST(CrossCorr, OffsetsDoNotCostPrecision) {
     compareScene<float>(qoriCrossCorrNorm_32f_C1R, 1e7, 255);
 }
 
+/// The products whose difference is a window's energy leave the 53 bits of a double.
+TEST(CrossCorr, NearlyConstantWindows) {
+    const Job job{{40, 135}, {27, 120}, Placement::valid, Normaliser::centred};
+    const auto draw = [] { return static_cast<uint16_t>(random().oneIn(500) ? 65534 : 65535); };
+    for (const int32_t hint : kHints)
+        runAlgorithm<uint16_t, float>(qoriCrossCorrNorm_16u32f_C1R, job, hint, 6e-8, [&](const auto& scene) {
+            scene.src.template fill<uint16_t>(1, draw);
+            scene.tpl.template fill<uint16_t>(1, draw);
+        });
+}
+
 /// What an element that is huge or not finite does to results ends where its windows end.
 TEST(CrossCorr, HugeAndNonFiniteElements) {
     const Job job{{60, 50}, {9, 7}, Placement::full, Normaliser::centred};
