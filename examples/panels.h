@@ -26,5 +26,6 @@ std::span<const Panel> statsPanels();
 std::span<const Panel> tablePanels();
 std::span<const Panel> thresholdPanels();
 std::span<const Panel> dctPanels();
+std::span<const Panel> matchingPanels();
 
 }  // namespace demo

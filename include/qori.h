@@ -118,7 +118,7 @@ typedef enum QorStatusCode {
     QOR_ERR_ROUND_MODE = -213, /**< Rounding-mode code not 0, 1 or 2. */
     QOR_ERR_BORDER = -225, /**< Border type not supported. */
     QOR_ERR_ODD_VALUE = -227, /**< A size or offset that must be even is odd. */
-    QOR_ERR_ALGORITHM = -228, /**< Algorithm code (low byte of the algorithm argument) above 2. */
+    QOR_ERR_ALGORITHM = -228, /**< A field of the algorithm argument outside its values. */
     QOR_ERR_DIRECTION = -231, /**< Transform direction code not 0 or 1. */
     QOR_ERR_UNSUPPORTED_MODE = -9999, /**< A combination of modes that the library does not support. */
 } QorStatusCode;
@@ -182,6 +182,18 @@ typedef enum QorAccuracyHint {
     hintFast = 1,
     hintAccurate = 2
 } QorAccuracyHint;
+
+/** The algorithm argument of qoriCrossCorrNorm: one value of each of the three fields, combined. */
+typedef enum QorCorrelation {
+    corrPlain = 0,         /**< Correlation. */
+    corrNorm = 1,          /**< Normalised by the energies of window and template. */
+    corrNormLevel = 2,     /**< Normalised likewise, both made less by their means. */
+    corrTransform = 0x100, /**< Hint: by Fourier transforms. */
+    corrDirect = 0x200,    /**< Hint: by definition, where the template is not large. */
+    corrFull = 0,          /**< Every placement that overlaps the source. */
+    corrValid = 0x10000,   /**< Placements inside the source. */
+    corrSame = 0x20000     /**< A result for each source pixel. */
+} QorCorrelation;
 
 /** Which elements a threshold selects. */
 typedef enum QorCompareOp {
@@ -2705,6 +2717,474 @@ QORI_API QorResult QORI_CALL qoriDup_8u_C1C3R(const uint8_t* pSrc, int32_t srcSt
     QorImageSize roiSize);
 QORI_API QorResult QORI_CALL qoriDup_8u_C1C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst, int32_t dstStep,
     QorImageSize roiSize);
+
+/* ---- Cross-correlation ---------------------------------------------------------------------------------------- */
+
+/** Reports how many bytes the buffer of a cross-correlation takes, at any alignment and for all element types.
+ *  Shapes    algType: a QorCorrelation of each field, as the operation takes it.
+ *  Units     Sizes in pixels.
+ *  Aliasing  pBufferSize must not be null.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a width or height below
+ *            1, or a template wider or taller than the source), QOR_ERR_ALGORITHM (a field of algType has
+ *            another value), QOR_ERR_SIZE (a result of 2^31 or more); then nothing is written.
+ *  Example   int32_t bytes;   // where is the template, whatever the light?
+ *            const int32_t algorithm = corrNormLevel | corrValid;
+ *            qoriCrossCorrNormGetBufferSize(roi, tplSize, algorithm, &bytes);
+ *            uint8_t* buffer = malloc(bytes);
+ *            qoriCrossCorrNorm_8u32f_C1R(src, srcStep, roi, tpl, tplStep, tplSize, dst, dstStep, algorithm, buffer);
+ *            const QorImageSize places = {roi.width - tplSize.width + 1, roi.height - tplSize.height + 1};
+ *            float best;
+ *            int32_t x, y;
+ *            qoriMaxIndx_32f_C1R(dst, dstStep, places, &best, &x, &y);
+ */
+QORI_API QorResult QORI_CALL qoriCrossCorrNormGetBufferSize(QorImageSize srcRoiSize, QorImageSize tplRoiSize,
+    int32_t algType, int32_t* pBufferSize);
+
+/** Correlates a template with the source at every placement: plain, normalised or zero-mean normalised.
+ *  Shapes    With a source of w x h and a template of tw x th pixels the destination has, Full: (w + tw - 1) x
+ *            (h + th - 1) pixels, one for every placement that overlaps the source: dst(x, y) is that of the
+ *            template's corner on source pixel (x - tw + 1, y - th + 1). Valid: (w - tw + 1) x (h - th + 1),
+ *            the placements inside the source: corner on (x, y). Same: w x h: the template's centre, pixel (tw
+ *            / 2, th / 2) rounded down, on (x, y). Outside the source pixels count as 0.
+ *  Elements  algType: one QorCorrelation of each of its three fields. With sums over the template's pixels t
+ *            and the window's s of C = sum s t, S1 = sum s, S2 = sum s^2, T1 = sum t, A = tw * th: corrPlain C.
+ *            corrNorm C / sqrt(S2 * sum t^2), 0 where S2 or sum t^2 is 0. corrNormLevel (C - S1 * T1 / A) /
+ *            (sqrt(V) * n) with V = S2 - S1^2 / A, and n^2 = sum (t - T1 / A)^2, or 2^-23 where that is below
+ *            2^-23: a constant template. It is 0 where n * 2^-23 > V, or V is not above its own rounding error:
+ *            a constant window. Integer sources: all sums exact (16u below 2^21 template pixels), the result in
+ *            double precision and rounded to float. 32f: double precision; normalised results are off by no
+ *            more than 1e-5, whatever offset source and template have, and an element that is not finite
+ *            concerns the windows that it is in. 8u results: the float times 2^-scaleFactor, to nearest, ties
+ *            to even, saturated.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels; scaleFactor any int.
+ *  Aliasing  The images may be read only and overlap, but the destination and the buffer must not overlap
+ *            anything.
+ *  Notes     The hint chooses how: 0 whatever is faster; corrTransform transforms; corrDirect sums by
+ *            definition where the template has fewer than 32,512 pixels and is narrow (27 columns) or small
+ *            against the source (fewer than 11 rows or a source of at most 44 columns, and at most 64 columns).
+ *            Results are the same within their errors.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pSrc, pTpl or pDst is null), QOR_ERR_SIZE (a width or
+ *            height below 1, or a template wider or taller than the source), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NULL_PTR (pBuffer is null), QOR_ERR_ALGORITHM (a field of algType has another value),
+ *            QOR_ERR_SIZE (work memory of 2^31 bytes or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriCrossCorrNorm_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep, int32_t algType,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriCrossCorrNorm_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep, int32_t algType, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriCrossCorrNorm_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep, int32_t algType,
+    uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriCrossCorrNorm_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst, int32_t dstStep, int32_t scaleFactor,
+    int32_t algType, uint8_t* pBuffer);
+
+/** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2).
+ *  Shapes    With a source of w x h and a template of tw x th pixels the destination has, Full: (w + tw - 1) x
+ *            (h + th - 1) pixels, one for every placement that overlaps the source: dst(x, y) is that of the
+ *            template's corner on source pixel (x - tw + 1, y - th + 1). Valid: (w - tw + 1) x (h - th + 1),
+ *            the placements inside the source: corner on (x, y). Same: w x h: the template's centre, pixel (tw
+ *            / 2, th / 2) rounded down, on (x, y). Outside the source pixels count as 0.
+ *  Elements  C = sum s t, S2 = sum s^2, T2 = sum t^2 over the template's pixels t and the window's s of the
+ *            channel; 0 where S2 or T2 is 0. Precision, and the scaling of 8u results, as of qoriCrossCorrNorm.
+ *            AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels; scaleFactor any int.
+ *  Aliasing  The images may be read only and overlap, but the destination and the buffer must not overlap
+ *            anything.
+ *  Notes     Work memory comes from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a width or height below
+ *            1, or a template wider or taller than the source), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8s32f_C1R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8s32f_C3R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8s32f_C4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_Norm_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8s32f_C1R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8s32f_C3R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8s32f_C4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_Norm_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8s32f_C1R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8s32f_C3R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8s32f_C4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_32f_C1R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_32f_C3R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_32f_C4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_Norm_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+
+/** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n).
+ *  Shapes    With a source of w x h and a template of tw x th pixels the destination has, Full: (w + tw - 1) x
+ *            (h + th - 1) pixels, one for every placement that overlaps the source: dst(x, y) is that of the
+ *            template's corner on source pixel (x - tw + 1, y - th + 1). Valid: (w - tw + 1) x (h - th + 1),
+ *            the placements inside the source: corner on (x, y). Same: w x h: the template's centre, pixel (tw
+ *            / 2, th / 2) rounded down, on (x, y). Outside the source pixels count as 0.
+ *  Elements  C = sum s t, S1 = sum s, S2 = sum s^2, T1 = sum t over the template's A pixels t and the window's
+ *            s of the channel; V = S2 - S1^2 / A; n^2 = sum (t - T1 / A)^2, or 2^-23 where that is below 2^-23.
+ *            0 where n * 2^-23 > V, or V is not above its own rounding error. Precision, and the scaling of 8u
+ *            results, as of qoriCrossCorrNorm; 64f in double precision. AC4 keeps the destination's channel 3.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels; scaleFactor any int.
+ *  Aliasing  The images may be read only and overlap, but the destination and the buffer must not overlap
+ *            anything.
+ *  Notes     Work memory comes from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a width or height below
+ *            1, or a template wider or taller than the source), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8s32f_C1R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8s32f_C3R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8s32f_C4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_32f_C1R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_32f_C3R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_32f_C4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrFull_NormLevel_64f_C1R(const double* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const double* pTpl, int32_t tplStep, QorImageSize tplRoiSize, double* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8s32f_C1R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8s32f_C3R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8s32f_C4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_32f_C1R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_32f_C3R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_32f_C4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrSame_NormLevel_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u32f_C4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u32f_AC4R(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8s32f_C1R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8s32f_C3R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8s32f_C4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8s32f_AC4R(const int8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_16u32f_C4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_16u32f_AC4R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_32f_C1R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_32f_C3R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_32f_C4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_32f_AC4R(const float* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u_C1RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u_C3RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u_C4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_8u_AC4RSfs(const uint8_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, uint8_t* pDst,
+    int32_t dstStep, int32_t scaleFactor);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_NormLevel_64f_C1R(const double* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const double* pTpl, int32_t tplStep, QorImageSize tplRoiSize, double* pDst,
+    int32_t dstStep);
+
+/** Correlation with a template at the placements inside the source: dst = sum s t.
+ *  Shapes    With a source of w x h and a template of tw x th pixels the destination has, Full: (w + tw - 1) x
+ *            (h + th - 1) pixels, one for every placement that overlaps the source: dst(x, y) is that of the
+ *            template's corner on source pixel (x - tw + 1, y - th + 1). Valid: (w - tw + 1) x (h - th + 1),
+ *            the placements inside the source: corner on (x, y). Same: w x h: the template's centre, pixel (tw
+ *            / 2, th / 2) rounded down, on (x, y). Outside the source pixels count as 0.
+ *  Elements  Sums over the template's pixels t and the window's s: of integers exact, of 32f in double
+ *            precision, then rounded to float.
+ *  Units     Steps in bytes, at least 1 and of any alignment; sizes in pixels; scaleFactor any int.
+ *  Aliasing  The images may be read only and overlap, but the destination and the buffer must not overlap
+ *            anything.
+ *  Notes     Work memory comes from qorMalloc for the duration of the call.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a width or height below
+ *            1, or a template wider or taller than the source), QOR_ERR_STEP (a step below 1),
+ *            QOR_ERR_NO_MEMORY (no work memory); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const uint8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_8s32f_C1R(const int8_t* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const int8_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep,
+    QorImageSize srcRoiSize, const uint16_t* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst,
+    int32_t dstStep);
+QORI_API QorResult QORI_CALL qoriCrossCorrValid_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize srcRoiSize,
+    const float* pTpl, int32_t tplStep, QorImageSize tplRoiSize, float* pDst, int32_t dstStep);
 
 /* ---- Cosine transform of images ------------------------------------------------------------------------------- */
 

@@ -110,7 +110,8 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED},
                                 {"QOR_ERR_ORDER", QOR_ERR_ORDER},
                                 {"QOR_ERR_FLAG", QOR_ERR_FLAG},
-                                {"QOR_ERR_NO_MEMORY", QOR_ERR_NO_MEMORY}};
+                                {"QOR_ERR_NO_MEMORY", QOR_ERR_NO_MEMORY},
+                                {"QOR_ERR_ALGORITHM", QOR_ERR_ALGORITHM}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
 

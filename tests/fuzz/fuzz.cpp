@@ -67,6 +67,7 @@ public:
     bool countsReach = false;  ///< Integers say how far the export reads around the region.
     bool isOrder = false;      ///< Integers are exponents of sizes.
     bool releases = false;     ///< The export frees a plan.
+    bool isAlgorithm = false;  ///< An integer is a QorCorrelation.
     int channels = 1;          ///< Of the export that is called.
     int32_t dataType = 0;      ///< QorDataType of its first element type.
 
@@ -259,6 +260,7 @@ T argument(Input& in) {
                : in.countsBits               ? in.take<int16_t>()
                : in.countsReach              ? in.upTo(40) - 1
                : in.isOrder                  ? in.upTo(9) - 1
+               : in.isAlgorithm              ? in.upTo(2) | in.upTo(2) << 8 | in.upTo(2) << 16 | (in.upTo(15) == 0 ? 3 : 0)
                : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
                : in.take<uint8_t>() % 2 == 0 ? in.upTo(5)  // codes and widths of frames
                                              : in.take<int8_t>();
@@ -331,6 +333,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     in.countsReach = std::strstr(target.name, "SumWindow") != nullptr;
     in.isOrder = std::strstr(target.name, "FFTInit") != nullptr;
     in.releases = std::strstr(target.name, "FTFree_") != nullptr;
+    in.isAlgorithm = std::strstr(target.name, "CrossCorrNorm") != nullptr;
     const QorResult result = target.run(in);
     if (in.releases && result == QOR_OK) allocatedPlan = nullptr;
     qorFree(std::exchange(allocatedPlan, nullptr));

@@ -11,8 +11,8 @@ inline constexpr ptrdiff_t kPointsAtOnce = 512;
 template <int radix>
 inline constexpr bool isOdd = radix % 2 == 1;
 
-template <int radix>
-QORI_INLINE void butterflyOf(ComplexLine (&a)[radix], const float* turns) {
+template <int radix, class T>
+QORI_INLINE void butterflyOf(ComplexLineOf<T> (&a)[radix], const T* turns) {
     if constexpr (isOdd<radix>)
         butterfly<radix>(a, turns);
     else
@@ -20,15 +20,16 @@ QORI_INLINE void butterflyOf(ComplexLine (&a)[radix], const float* turns) {
 }
 
 /// Blocks of radix * part points. Without twiddles, part is 1.
-template <int radix, bool hasTwiddles>
-QORI_NOINLINE void passBlocks(float* lines, ptrdiff_t blocks, ptrdiff_t part, const float* turns,
-                              const float* twiddles) {
-    const ptrdiff_t apart = part * kLineFloats;
+template <int radix, bool hasTwiddles, class T>
+QORI_NOINLINE void passBlocks(T* lines, ptrdiff_t blocks, ptrdiff_t part, const T* turns,
+                              const std::type_identity_t<T>* twiddles) {
+    constexpr ptrdiff_t line = kLineBytes / sizeof(T);
+    const ptrdiff_t apart = part * line;
     for (ptrdiff_t block = 0; block < blocks; ++block) {
-        const float* w = twiddles;
+        const T* w = twiddles;
         for (ptrdiff_t j = 0; j < (hasTwiddles ? part : 1); ++j) {
-            float* const x = lines + j * kLineFloats;
-            ComplexLine a[radix];
+            T* const x = lines + j * line;
+            ComplexLineOf<T> a[radix];
             for (int q = 0; q < radix; ++q) a[q] = loadLine(x + q * apart);
             butterflyOf<radix>(a, turns);
             storeLine(x, a[0]);
