@@ -3705,6 +3705,125 @@ QORI_API QorResult QORI_CALL qoriHistogram_32f_C3R(const float* pSrc, int32_t sr
 QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
     int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
 
+/* ---- Local binary patterns ------------------------------------------------------------------------------------ */
+
+/** Local binary patterns of the eight neighbours: a bit is set where the neighbour is at least the pixel.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  Bits 0 to 7: top-left, left, bottom-left, bottom, bottom-right, right, top-right, top, which is
+ *            mode 0 of qoriLBPImageMode3x3. 32f: comparisons with NaN are false.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   qoriLBPImage3x3_8u_C1R(grey, greyStep, codes, codesStep, roi, borderReplicate, 0);
+ *            uint32_t counts[256];   // the texture's signature
+ *            qoriHistogramEven_8u_C1R(codes, codesStep, roi, counts, levels, 257, 0, 256);
+ */
+QORI_API QorResult QORI_CALL qoriLBPImage3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage3x3_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, float borderValue);
+
+/** Local binary patterns of the eight neighbours, whose order the caller chooses.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  A bit is set where its neighbour is at least the pixel; 32f: comparisons with NaN are false.
+ *            lbpMode, of which only the two low bits count: bits 0 to 7 are the neighbours counter-clockwise
+ *            (0) or clockwise (1) from the top-left one, counter-clockwise (2) or clockwise (3) from the left
+ *            one.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImageMode3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode3x3_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, float borderValue);
+
+/** Local binary patterns of neighbours two pixels away: a bit is set where the neighbour is at least the pixel.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  16u codes: the sixteen pixels on the edge of the 5 x 5 square, counter-clockwise from the top-left
+ *            corner. 8u codes: every second of them, which are the corners and the middles of the sides, so
+ *            that bit i is bit 2 i of the 16u code. This is mode 0 of qoriLBPImageMode5x5. 32f: comparisons
+ *            with NaN are false.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, float borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_32f16u_C1R(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, float borderValue);
+
+/** Local binary patterns of neighbours two pixels away, whose order the caller chooses.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  A bit is set where its neighbour is at least the pixel; 32f: comparisons with NaN are false. 16u
+ *            codes: the sixteen pixels on the edge of the 5 x 5 square; 8u codes: every second of them, the
+ *            corners and the middles of the sides. lbpMode, of which only the two low bits count: from bit 0
+ *            on, counter-clockwise (0) or clockwise (1) from the top-left corner, counter-clockwise (2) or
+ *            clockwise (3) from the middle of the left side. In every mode bit i of the 8u code is bit 2 i of
+ *            the 16u code.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, float borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_32f16u_C1R(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, float borderValue);
+
+/** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three
+ *  rows.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  Codes are bytes for both types, their bits those of qoriLBPImage3x3. The bits of the left and of
+ *            the right neighbour are set where the three pixels of that column add up to at least what the
+ *            three of the pixel's own column do, above, beside and below; noise of single rows so changes them
+ *            less.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImageHorizCorr_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageHorizCorr_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint16_t borderValue);
+
 /* ---- Tables by levels ----------------------------------------------------------------------------------------- */
 
 /** Maps intervals to constants: dst = pValues[k] where pLevels[k] <= src < pLevels[k + 1], else src.
