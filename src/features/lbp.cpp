@@ -14,7 +14,8 @@ namespace {
 /// Bytes of a strip's row of keys: five of them and a row of constants stay in the first-level cache, and on the stack.
 constexpr int32_t kStripBytes = 4096;
 
-/// The rows of keys that windows of one strip see.
+/// The rows of keys that windows of one strip see. Rows enter one ahead of their first use: what has just been stored
+/// cannot be loaded at other alignments until it has reached the cache.
 template <class T, int reach>
 class KeyRows {
 public:
@@ -24,21 +25,25 @@ public:
     explicit KeyRows(const BorderedImage& strip)
         : strip_(strip), next_(strip.rule.open.top ? -reach : 0), end_(strip.size.height) {
         if (strip.rule.open.bottom) end_ += reach;
-        if (strip.rule.constant == nullptr || (strip.rule.open.top && strip.rule.open.bottom)) return;
+        if (strip.rule.constant == nullptr) return;
         T value;
         __builtin_memcpy(&value, strip.rule.constant, sizeof value);
-        Key key;
-        kernels::patternKeys(&value, &key, 1);
-        for (int32_t x = -reach; x < strip.size.width + reach; ++x) constant_[kAhead + x] = key;
+        kernels::patternKeys(&value, &constantKey_, 1);
+        if (strip.rule.open.top && strip.rule.open.bottom) return;
+        for (int32_t x = -reach; x < strip.size.width + reach; ++x) constant_[kAhead + x] = constantKey_;
     }
 
     /// Points at the first pixel of the rows that windows of row y see. Rows are asked for from the top.
     void rowsAround(int32_t y, const Key** rows) {
-        for (; next_ <= y + reach && next_ < end_; ++next_) enter(next_);
+        for (; next_ <= y + reach + 1 && next_ < end_; ++next_) enter(next_);
+        if (y >= reach && y + reach < strip_.size.height) {
+            for (int32_t i = 0; i < kRows; ++i) rows[i] = slot(y - reach + i);
+            return;
+        }
         for (int32_t i = 0; i < kRows; ++i) {
             const int32_t row = y - reach + i;
             const bool isConstant = strip_.rule.constant != nullptr && strip_.isMissingRow(row);
-            rows[i] = kAhead + (isConstant ? constant_ : slot(strip_.seenRow(row)));
+            rows[i] = isConstant ? constant_ + kAhead : slot(strip_.seenRow(row));
         }
     }
 
@@ -46,27 +51,30 @@ private:
     /// Keys in front of a row's first pixel, which so begins on a vector, and behind its last block.
     static constexpr int32_t kAhead = 32;
     static constexpr int32_t kRowKeys = kStripBytes / elementBytes<Key> + 3 * kAhead;
+    static constexpr uint32_t kSlots = reach == 1 ? 4 : 8;
+    static_assert(kSlots > kRows);
 
-    Key* slot(int32_t y) { return ring_[(y + reach) % kRows]; }
+    Key* slot(int32_t y) { return ring_[static_cast<uint32_t>(y) % kSlots] + kAhead; }
 
     void enter(int32_t y) {
         const Sides& open = strip_.rule.open;
         const int32_t width = strip_.size.width, left = open.left ? reach : 0, right = open.right ? reach : 0;
-        Key* const keys = slot(y) + kAhead;
+        Key* const keys = slot(y);
         kernels::patternKeys(reinterpret_cast<const T*>(strip_.pixel(-left, y)), keys - left,
                              ptrdiff_t{width} + left + right);
-        const auto synthesise = [&](int32_t x) {
-            T beside[reach];
-            strip_.gather({x, y, reach, 1}, reinterpret_cast<uint8_t*>(beside), 0);
-            kernels::patternKeys(beside, keys + x, reach);
+        const auto synthesised = [&](int32_t x) {
+            return strip_.rule.constant != nullptr ? constantKey_ : keys[strip_.seenColumn(x)];
         };
-        if (!open.left) synthesise(-reach);
-        if (!open.right) synthesise(width);
+        for (int32_t i = 0; i < reach; ++i) {
+            if (!open.left) keys[-1 - i] = synthesised(-1 - i);
+            if (!open.right) keys[width + i] = synthesised(width + i);
+        }
     }
 
-    BorderedImage strip_;
+    const BorderedImage& strip_;
     int32_t next_, end_;  ///< The row that enters next, and that behind the last.
-    alignas(64) Key ring_[kRows][kRowKeys];
+    Key constantKey_{};
+    alignas(64) Key ring_[kSlots][kRowKeys];
     alignas(64) Key constant_[kRowKeys];
 };
 

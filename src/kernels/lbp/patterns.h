@@ -4,9 +4,9 @@
 // Rows come as keys: integers moved so that signed comparisons, the only ones there are, put them in order; floats as
 // they are. Keys may be read, though they mean nothing, up to a block beyond the row.
 //
-// A block's truths are packed to a byte for each of 32 pixels, in whatever order packing leaves them, and bits are
-// joined from the highest down: acc = 2 acc + truth, a truth being 0 or -1. The last step turns the sum of negative
-// bits into the code, and the order is put right once, at the end.
+// A block's truths are packed to a byte for each of 32 pixels, 0 or 255, in whatever order packing leaves them; the
+// order is put right once, at the end. Bits are joined in two ways, to keep all ports of the processor busy: the upper
+// five by averages, which shift a sum to the right and enter a truth on its left, the lower three by additions.
 #pragma once
 #include "kernels/copy_rows.h"
 #include "kernels/vector_math.h"
@@ -64,10 +64,21 @@ QORI_INLINE Bytes truths(const KeyBlock<Key>& centre, const KeyBlock<Key>& neigh
         return {_mm256_packs_epi16(_mm256_packs_epi32(truth[0], truth[1]), _mm256_packs_epi32(truth[2], truth[3]))};
 }
 
-/// The sum of bits as a code, of pixels in order.
-template <class Key>
-QORI_INLINE Bytes codesOf(Bytes sum) {
-    const Bytes codes = isFloat<Key> ? zero<uint8_t>() - sum : sum + splat<uint8_t>(255);
+/// Bits 0 to 7 as a code, of pixels in order. truthOf.operator()<bit>() makes the truths of a bit. An average is
+/// (a + b + 1) / 2: of an even sum and 0 its half, of an even sum and 255 its half and 128; the fifth sum is a multiple
+/// of 8 still.
+template <class Key, class TruthOf>
+QORI_INLINE Bytes joinBits(TruthOf truthOf) {
+    const auto enter = [](Bytes sum, Bytes truth) { return Bytes{_mm256_avg_epu8(sum.v, truth.v)}; };
+    Bytes upper = enter(zero<uint8_t>(), truthOf.template operator()<3>());
+    upper = enter(upper, truthOf.template operator()<4>());
+    upper = enter(upper, truthOf.template operator()<5>());
+    upper = enter(upper, truthOf.template operator()<6>());
+    upper = enter(upper, truthOf.template operator()<7>());
+    Bytes lower = truthOf.template operator()<2>();  // negative: a truth counts as -1
+    lower = lower + lower + truthOf.template operator()<1>();
+    lower = lower + lower + truthOf.template operator()<0>();
+    const Bytes codes = isFloat<Key> ? upper - lower : lower - upper + splat<uint8_t>(255);
     if constexpr (sizeof(Key) == 1)
         return codes;
     else if constexpr (sizeof(Key) == 2)
@@ -100,22 +111,10 @@ constexpr Place placeOfBit(int bit, int count, int reach, int mode) {
 /// Eight bits of the code, from firstBit on.
 template <class Key, int count, int reach, int mode, int firstBit>
 QORI_INLINE Bytes eightBits(const Key* const* rows, const KeyBlock<Key>& centre, ptrdiff_t x) {
-    const auto truthOf = [&]<int bit>() __attribute__((always_inline)) {
+    return joinBits<Key>([&]<int bit>() __attribute__((always_inline)) {
         constexpr Place place = placeOfBit(firstBit + bit, count, reach, mode);
         return truths(centre, KeyBlock<Key>(rows[reach + place.dy] + x + place.dx));
-    };
-    Bytes sum = truthOf.template operator()<7>();
-    const auto join = [&]<int bit>() __attribute__((always_inline)) {
-        sum = sum + sum + truthOf.template operator()<bit>();
-    };
-    join.template operator()<6>();
-    join.template operator()<5>();
-    join.template operator()<4>();
-    join.template operator()<3>();
-    join.template operator()<2>();
-    join.template operator()<1>();
-    join.template operator()<0>();
-    return codesOf<Key>(sum);
+    });
 }
 
 /// A block of codes, or the first n.
@@ -192,7 +191,6 @@ void patternColumnSums(const Key* const* rows, Wider<Key>* sums, ptrdiff_t width
 template <bool streaming, class Key>
 void correctedPatternRow(const Key* const* rows, const Wider<Key>* sums, uint8_t* dst, ptrdiff_t width) {
     using Sum = Wider<Key>;
-    constexpr int kLeft = 1, kRight = 5;  // bits
     for (ptrdiff_t x = 0; x < width; x += kPatternBlock) {
         const lbp::KeyBlock<Key> centre(rows[1] + x);
         const auto bySums = [&](ptrdiff_t dx) {
@@ -208,15 +206,14 @@ void correctedPatternRow(const Key* const* rows, const Wider<Key>* sums, uint8_t
             const __m256i second = _mm256_permute4x64_epi64(_mm256_packs_epi32(truth(2), truth(3)), inOrder);
             return Bytes{_mm256_packs_epi16(first, second)};
         };
-        Bytes sum = zero<uint8_t>();
-        for (int bit = 7; bit >= 0; --bit) {
-            const lbp::Place place = lbp::placeOfBit(bit, 8, 1, 0);
-            const Bytes truth = bit == kLeft || bit == kRight
-                                    ? bySums(place.dx)
-                                    : lbp::truths(centre, lbp::KeyBlock<Key>(rows[1 + place.dy] + x + place.dx));
-            sum = sum + sum + truth;
-        }
-        lbp::storeCodes<streaming>(dst + x, lbp::codesOf<Key>(sum), width - x);
+        const Bytes codes = lbp::joinBits<Key>([&]<int bit>() __attribute__((always_inline)) {
+            constexpr lbp::Place place = lbp::placeOfBit(bit, 8, 1, 0);
+            if constexpr (place.dy == 0)
+                return bySums(place.dx);
+            else
+                return lbp::truths(centre, lbp::KeyBlock<Key>(rows[1 + place.dy] + x + place.dx));
+        });
+        lbp::storeCodes<streaming>(dst + x, codes, width - x);
     }
 }
 
