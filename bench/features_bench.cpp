@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Local binary patterns.
+// Local binary patterns and descriptors of oriented gradients.
 #include <algorithm>
 
 #include "bench.h"
@@ -66,6 +66,81 @@ const Rows lbp{{
     patterns<uint8_t, uint8_t>("LBP horizontal correction 8u C1", 0, 0, 0, qoriLBPImageHorizCorr_8u_C1R),
     patterns<uint16_t, uint8_t>("LBP horizontal correction 16u C1", 0, 0, 0, qoriLBPImageHorizCorr_16u_C1R),
 }};
+
+/// Plan, buffer and destination of persons, 64 x 128, every eight pixels or ten by six of them.
+struct Persons {
+    static constexpr QorHogConfig config{0, 8, 16, 8, 9, 8.0f, 0.2f, {64, 128}};
+    std::vector<QorPoint2D> windows;
+    Block plan, buffer, descriptors;
+
+    Persons(Size size, bool all) {
+        const int stepX = all ? 8 : (size.width - 64) / 9, stepY = all ? 8 : (size.height - 128) / 5;
+        for (int y = 0; y + 128 <= size.height; y += stepY)
+            for (int x = 0; x + 64 <= size.width; x += stepX) windows.push_back({x, y});
+        int32_t bytes = 0;
+        must(qoriHOGGetSize(&config, &bytes));
+        plan = allocate(static_cast<size_t>(bytes));
+        must(qoriHOGInit(&config, reinterpret_cast<QorHogPlan*>(plan.get())));
+        must(qoriHOGGetBufferSize(record(), size.roi(), &bytes));
+        buffer = allocate(static_cast<size_t>(bytes));
+        must(qoriHOGGetDescriptorSize(record(), &bytes));
+        descriptors = allocate(static_cast<size_t>(bytes) * windows.size());
+    }
+    const QorHogPlan* record() const { return reinterpret_cast<const QorHogPlan*>(plan.get()); }
+    float* destination() const { return reinterpret_cast<float*>(descriptors.get()); }
+};
+
+constexpr Size kVideo{640, 480};
+
+template <class T, int channels, class Function>
+Row gradients(std::string name, bool all, double best, Function function) {
+    const auto make = [=](Size size) {
+        const Image<T> src(size, channels);
+        const Persons persons(size, all);
+        return Contenders{[=] {
+                              const auto run = [&](auto value) {
+                                  must(function(src.data(), src.step(), size.roi(), persons.windows.data(),
+                                                static_cast<int32_t>(persons.windows.size()), persons.destination(),
+                                                persons.record(), borderReplicate, value, persons.buffer.get()));
+                              };
+                              if constexpr (channels == 1)
+                                  run(T{0});
+                              else
+                                  run(nullptr);
+                          },
+                          {},
+                          {}};
+    };
+    return {.operation = std::move(name),
+            .bytesPerPixel = double(channels * sizeof(T)),
+            .sizes = {kVideo},
+            .make = make,
+            .roofline = Roofline::read,
+            .best = best};
+}
+
+const Rows hog{{
+    gradients<uint8_t, 1>("HOG 64x128 windows 8u32f C1, 3285 windows", true, 39, qoriHOG_8u32f_C1R),
+    gradients<uint8_t, 3>("HOG 64x128 windows 8u32f C3, 3285 windows", true, 35, qoriHOG_8u32f_C3R),
+    gradients<uint8_t, 1>("HOG 64x128 windows 8u32f C1, 60 windows", false, 80, qoriHOG_8u32f_C1R),
+    gradients<uint16_t, 1>("HOG 64x128 windows 16u32f C1, 3285 windows", true, 0, qoriHOG_16u32f_C1R),
+    gradients<float, 1>("HOG 64x128 windows 32f C1, 3285 windows", true, 0, qoriHOG_32f_C1R),
+}};
+
+/// Windows side by side, over each other or alone; units are windows.
+const Ladders windows{{{"HOG 8u C1, windows", [] {
+                            std::vector<Step> steps;
+                            const Image<uint8_t> src(kVideo, 1);
+                            const Persons persons(kVideo, true);
+                            for (int n : {1, 2, 4, 8, 16, 32, 44, 45, 64, 128, 256, 512, 1024, 3285})
+                                steps.push_back({std::to_string(n), double(n), [=] {
+                                                     must(qoriHOG_8u32f_C1R(src.data(), src.step(), kVideo.roi(),
+                                                                            persons.windows.data(), n,
+                                                                            persons.destination(), persons.record(),
+                                                                            borderReplicate, 0, persons.buffer.get()));
+                                                 }});
+                            return steps;
+                        }}}};
 
 }  // namespace
 }  // namespace qori::bench

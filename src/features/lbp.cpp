@@ -36,6 +36,7 @@ public:
     /// Points at the first pixel of the rows that windows of row y see. Rows are asked for from the top.
     void rowsAround(int32_t y, const Key** rows) {
         for (; next_ <= y + reach + 1 && next_ < end_; ++next_) enter(next_);
+        if (next_ < end_) kernels::prefetchRow(strip_.pixel(0, next_), ptrdiff_t{strip_.size.width} * elementBytes<T>);
         if (y >= reach && y + reach < strip_.size.height) {
             for (int32_t i = 0; i < kRows; ++i) rows[i] = slot(y - reach + i);
             return;

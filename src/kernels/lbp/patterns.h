@@ -161,6 +161,12 @@ void patternKeys(const T* src, PatternKey<T>* keys, ptrdiff_t n) {
     }
 }
 
+/// A row that is read soon. Rows of strips are too short for the processor to see them coming.
+inline void prefetchRow(const uint8_t* row, ptrdiff_t bytes) {
+    constexpr ptrdiff_t kLine = 64;
+    for (ptrdiff_t i = 0; i < bytes; i += kLine) _mm_prefetch(reinterpret_cast<const char*>(row + i), _MM_HINT_T0);
+}
+
 /// One row of codes of `count` neighbours on the square ring of radius `reach`, 8 or 16 of them. rows: at the first
 /// pixel, from `reach` above to `reach` below. Streaming: dst is 32-byte aligned.
 template <class D, int reach, int mode, bool streaming, class Key>
