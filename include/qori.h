@@ -3843,7 +3843,7 @@ QORI_API QorResult QORI_CALL qoriHOG_32f_C3R(const float* pSrc, int32_t srcStep,
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1); then nothing is written.
  *  Example   qoriLBPImage3x3_8u_C1R(grey, greyStep, codes, codesStep, roi, borderReplicate, 0);
- *            uint32_t counts[256];   // the texture's signature
+ *            int32_t counts[256], levels[257];   // the texture's signature
  *            qoriHistogramEven_8u_C1R(codes, codesStep, roi, counts, levels, 257, 0, 256);
  */
 QORI_API QorResult QORI_CALL qoriLBPImage3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
