@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
 #include <cmath>
+#include <numbers>
 #include <vector>
 
 #include "panels.h"
@@ -12,7 +13,7 @@ constexpr int kCell = 16, kBlock = 2 * kCell, kBins = 9;
 
 /// A line through the middle of a cell along the edges of one orientation, as bright as its share of the gradients.
 void drawStroke(const Picture& out, int x, int y, int bin, float share) {
-    const double gradient = (bin + 0.5) * M_PI / kBins;  // edges are at right angles to it
+    const double gradient = (bin + 0.5) * std::numbers::pi / kBins;  // edges are at right angles to it
     const double dx = -std::sin(gradient), dy = std::cos(gradient);
     const int light = std::min(255, static_cast<int>(600 * share));
     for (int i = -kCell + 1; i < kCell; ++i) {

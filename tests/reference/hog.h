@@ -4,6 +4,7 @@
 #pragma once
 #include <algorithm>
 #include <cmath>
+#include <numbers>
 #include <vector>
 
 #include "qori.h"
@@ -22,14 +23,18 @@ struct HogVote {
 };
 
 inline float orientation(float dx, float dy) {
-    const float pi = static_cast<float>(M_PI), e = 2.220446e-16f;
+    const float pi = static_cast<float>(std::numbers::pi), e = 2.220446e-16f;
     const float xx = dx * dx, yy = dy * dy;
-    if (xx >= yy) return dx * dy / (xx + 0.28f * yy + e) + (dx < 0 ? pi : dy < 0 ? static_cast<float>(2 * M_PI) : 0.0f);
-    return static_cast<float>(dy >= 0 ? M_PI / 2 : 3 * M_PI / 2) - dx * dy / (yy + 0.28f * xx + e);
+    if (xx >= yy)
+        return dx * dy / (xx + 0.28f * yy + e) + (dx < 0   ? pi
+                                                  : dy < 0 ? static_cast<float>(2 * std::numbers::pi)
+                                                           : 0.0f);
+    return static_cast<float>(dy >= 0 ? std::numbers::pi / 2 : 3 * std::numbers::pi / 2) -
+           dx * dy / (yy + 0.28f * xx + e);
 }
 
 inline HogVote voteOf(HogGradient g, int nbins) {
-    const float place = orientation(g.dx, g.dy) * static_cast<float>(nbins / M_PI) - 0.5f;
+    const float place = orientation(g.dx, g.dy) * static_cast<float>(nbins / std::numbers::pi) - 0.5f;
     const float bin = std::floor(place), fraction = place - bin;
     const auto size = static_cast<float>(std::sqrt(static_cast<double>(g.squares())));
     return {(static_cast<int>(bin) + 2 * nbins) % nbins, size * (1 - fraction), size * fraction};
