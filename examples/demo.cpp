@@ -94,7 +94,7 @@ void run(const char* photoFile, const char* sheetFile, const char* fontFile) {
     std::vector<Panel> panels;
     for (const auto& family :
          {copyPanels(), borderPanels(), arithPanels(), thresholdPanels(), tablePanels(), statsPanels(), filterPanels(),
-          morphologyPanels(), medianPanels(), resizePanels(), fourierPanels(), dctPanels(), matchingPanels()})
+          morphologyPanels(), medianPanels(), resizePanels(), fourierPanels(), dctPanels(), matchingPanels(), featuresPanels()})
         panels.insert(panels.end(), family.begin(), family.end());
 
     const int rows = (static_cast<int>(panels.size()) + kColumns - 1) / kColumns;

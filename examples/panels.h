@@ -27,5 +27,6 @@ std::span<const Panel> tablePanels();
 std::span<const Panel> thresholdPanels();
 std::span<const Panel> dctPanels();
 std::span<const Panel> matchingPanels();
+std::span<const Panel> featuresPanels();
 
 }  // namespace demo

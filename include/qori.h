@@ -319,6 +319,23 @@ typedef enum QorFftNormFlag {
  *  real and take one element. */
 typedef struct QorFft2DPlan QorFft2DPlan;
 
+/** What a descriptor of oriented gradients is made of. Blocks are 2 x 2 cells. */
+typedef struct QorHogConfig {
+    int32_t blockOrder;     /**< 0: the blocks of a window row by row, x fastest; else column by column. */
+    int32_t cellSize;       /**< 2 to 16 pixels. */
+    int32_t blockSize;      /**< 2 * cellSize. */
+    int32_t blockStride;    /**< From block to block, a multiple of cellSize. */
+    int32_t nbins;          /**< Orientations in half a turn, 2 to 16. */
+    float blockWeightParam; /**< Standard deviation of a block's weights in pixels, above 0. */
+    float normParam;        /**< Largest value of a block between its two normalisations, above 0. */
+    QorImageSize winSize;   /**< Each side blockSize and a multiple of blockStride. */
+} QorHogConfig;
+
+/** A descriptor of oriented gradients prepared, in the caller's memory: as many bytes as qoriHOGGetSize reports, at any
+ *  address. It may be copied. Once filled it is only read: any number of threads may use it at once. It is trusted
+ *  memory: see Plans above. */
+typedef struct QorHogPlan QorHogPlan;
+
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
 /** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
@@ -5034,6 +5051,230 @@ QORI_API QorResult QORI_CALL qoriHistogram_32f_C3R(const float* pSrc, int32_t sr
     int32_t* const pHist[3], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
 QORI_API QorResult QORI_CALL qoriHistogram_32f_C4R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
     int32_t* const pHist[4], const QorHistogramSpec* pSpec, uint8_t* pBuffer);
+
+/* ---- Histograms of oriented gradients ------------------------------------------------------------------------- */
+
+/** Reports how many bytes the plan of a descriptor takes, at any alignment: 16 blockSize^2 + 72.
+ *  Units     srcStep and sizes of memory in bytes; sizes, positions and strides in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_UNSUPPORTED_MODE (cellSize
+ *            outside 2 to 16, blockSize not 2 cellSize, blockStride below 1 or no multiple of cellSize, nbins
+ *            outside 2 to 16, blockWeightParam or normParam not above 0), QOR_ERR_SIZE (a side of winSize below
+ *            blockSize, or not blockSize and some strides); then nothing is written.
+ *  Example   const QorHogConfig config = {0, 8, 16, 8, 9, 8.0f, 0.2f, {64, 128}};   // persons, 64 x 128
+ *            int32_t planBytes, bytes, bufferBytes;
+ *            qoriHOGGetSize(&config, &planBytes);
+ *            QorHogPlan* plan = malloc(planBytes);
+ *            qoriHOGInit(&config, plan);
+ *            qoriHOGGetDescriptorSize(plan, &bytes);
+ *            qoriHOGGetBufferSize(plan, roi, &bufferBytes);
+ *            float* descriptor = malloc(bytes);
+ *            qoriHOG_8u32f_C1R(grey, greyStep, roi, &corner, 1, descriptor, plan, borderReplicate, 0, malloc(bufferBytes));
+ */
+QORI_API QorResult QORI_CALL qoriHOGGetSize(const QorHogConfig* pConfig, int32_t* pPlanSize);
+
+/** Fills the plan of a descriptor.
+ *  Elements  A pixel's weight for a cell is the Gaussian of standard deviation blockWeightParam around the
+ *            middle of the block times the bilinear weight of the cell: with u = (i + 0.5) / cellSize - 0.5 for
+ *            pixel i of the block along an axis, max(0, 1 - |u|) for the first cell and max(0, 1 - |u - 1|) for
+ *            the second, one factor for each axis. What would belong to cells outside the block is lost.
+ *  Units     srcStep and sizes of memory in bytes; sizes, positions and strides in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_UNSUPPORTED_MODE (cellSize
+ *            outside 2 to 16, blockSize not 2 cellSize, blockStride below 1 or no multiple of cellSize, nbins
+ *            outside 2 to 16, blockWeightParam or normParam not above 0), QOR_ERR_SIZE (a side of winSize below
+ *            blockSize, or not blockSize and some strides); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHOGInit(const QorHogConfig* pConfig, QorHogPlan* pPlan);
+
+/** Reports how many bytes the descriptor of one window takes.
+ *  Units     srcStep and sizes of memory in bytes; sizes, positions and strides in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan has not been
+ *            filled), QOR_ERR_SIZE (a result of 2^31 or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHOGGetDescriptorSize(const QorHogPlan* pPlan, int32_t* pDescriptorSize);
+
+/** Reports how many bytes the buffer takes, at any alignment: 12 for each pixel of the region.
+ *  Units     srcStep and sizes of memory in bytes; sizes, positions and strides in pixels.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (pPlan has not been
+ *            filled), QOR_ERR_SIZE (roiSize.width or height below the window's), QOR_ERR_SIZE (a result of 2^31
+ *            or more); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHOGGetBufferSize(const QorHogPlan* pPlan, QorImageSize roiSize, int32_t* pBufferSize);
+
+/** Descriptors of windows by the orientations of their gradients (Dalal and Triggs 2005).
+ *  Shapes    pLocation: the top-left corners of nLocations windows in the region; null for one at (0, 0). pDst:
+ *            one descriptor after the other, as many floats each as qoriHOGGetDescriptorSize reports bytes / 4.
+ *            A window that does not lie within the area (below) is left out, and the next one's descriptor
+ *            takes its place.
+ *  Elements  All in single precision, and operations as written. The area is the part of the region that whole
+ *            strides of blocks tile, from its first pixel on. Gradients over it: dx = p(x + 1, y) - p(x - 1,
+ *            y), dy = p(x, y + 1) - p(x, y - 1); of three channels that of the largest dx dx + dy dy, the first
+ *            where several have it. Orientation: where dx dx >= dy dy, dx dy / (dx dx + 0.28 (dy dy) + e) + q,
+ *            q being pi for dx < 0, else 2 pi for dy < 0, else 0; elsewhere (pi / 2, for dy < 0 3 pi / 2) - dx
+ *            dy / (dy dy + 0.28 (dx dx) + e); e = 2.220446e-16. Times nbins / pi, less 0.5, its floor is the
+ *            bin, modulo nbins, and its fraction f parts the magnitude m = sqrt(dx dx + dy dy), whose sum is
+ *            one fused multiply-add: m (1 - f) for this bin and m f for the next. Both are added to the block's
+ *            four cells, times the pixel's weights. A block is scaled by 1 / sqrt(sum of its squares + 1e-6),
+ *            cut off at normParam and scaled so again. Its values lie cell by cell, row by row, the bins of a
+ *            cell together.
+ *  Units     srcStep and sizes of memory in bytes; sizes, positions and strides in pixels.
+ *  Aliasing  Source, with the neighbours that are read, destination, locations, plan and buffer must not
+ *            overlap. pDst need not be cached: descriptors of several megabytes are stored past the cache.
+ *  Notes     borderType: sides of the area whose flag is set are read from memory, borderReadAll reads all; on
+ *            the others a missing neighbour is borderValue (borderConstant), the edge pixel (borderReplicate)
+ *            or the one beyond it inside (kind 3). Windows that lie whole strides apart share blocks, which are
+ *            computed once where the buffer has room: the results are bit by bit those of each window alone.
+ *            32f: a gradient that is no number, or whose square overflows, spoils the blocks that it belongs to
+ *            and no others.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (pPlan, pSrc, pDst or pBuffer is null), QOR_ERR_CONTEXT
+ *            (pPlan has not been filled), QOR_ERR_STEP (a step below 1), QOR_ERR_STEP_ALIGN (srcStep not a
+ *            multiple of the element's size), QOR_ERR_SIZE (roiSize.width or height below the window's),
+ *            QOR_ERR_BAD_ARG (nLocations below 1), QOR_ERR_NULL_PTR (no pLocation for two windows or more),
+ *            QOR_ERR_BORDER (the kind of borderType is not borderConstant, borderReplicate, 3 or
+ *            borderReadAll), QOR_ERR_NULL_PTR (no borderValue, and borderConstant); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriHOG_8u32f_C1R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    uint8_t borderValue, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_16u32f_C1R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    uint16_t borderValue, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_16s32f_C1R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    int16_t borderValue, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_32f_C1R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    float borderValue, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_8u32f_C3R(const uint8_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    const uint8_t borderValue[3], uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_16u32f_C3R(const uint16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    const uint16_t borderValue[3], uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_16s32f_C3R(const int16_t* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    const int16_t borderValue[3], uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriHOG_32f_C3R(const float* pSrc, int32_t srcStep, QorImageSize roiSize,
+    const QorPoint2D* pLocation, int32_t nLocations, float* pDst, const QorHogPlan* pPlan, int32_t borderType,
+    const float borderValue[3], uint8_t* pBuffer);
+
+/* ---- Local binary patterns ------------------------------------------------------------------------------------ */
+
+/** Local binary patterns of the eight neighbours: a bit is set where the neighbour is at least the pixel.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  Bits 0 to 7: top-left, left, bottom-left, bottom, bottom-right, right, top-right, top, which is
+ *            mode 0 of qoriLBPImageMode3x3. 32f: comparisons with NaN are false.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ *  Example   qoriLBPImage3x3_8u_C1R(grey, greyStep, codes, codesStep, roi, borderReplicate, 0);
+ *            int32_t counts[256], levels[257];   // the texture's signature
+ *            qoriHistogramEven_8u_C1R(codes, codesStep, roi, counts, levels, 257, 0, 256);
+ */
+QORI_API QorResult QORI_CALL qoriLBPImage3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage3x3_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, float borderValue);
+
+/** Local binary patterns of the eight neighbours, whose order the caller chooses.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  A bit is set where its neighbour is at least the pixel; 32f: comparisons with NaN are false.
+ *            lbpMode, of which only the two low bits count: bits 0 to 7 are the neighbours counter-clockwise
+ *            (0) or clockwise (1) from the top-left one, counter-clockwise (2) or clockwise (3) from the left
+ *            one.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImageMode3x3_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode3x3_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, float borderValue);
+
+/** Local binary patterns of neighbours two pixels away: a bit is set where the neighbour is at least the pixel.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  16u codes: the sixteen pixels on the edge of the 5 x 5 square, counter-clockwise from the top-left
+ *            corner. 8u codes: every second of them, which are the corners and the middles of the sides, so
+ *            that bit i is bit 2 i of the 16u code. This is mode 0 of qoriLBPImageMode5x5. 32f: comparisons
+ *            with NaN are false.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, float borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImage5x5_32f16u_C1R(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, float borderValue);
+
+/** Local binary patterns of neighbours two pixels away, whose order the caller chooses.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  A bit is set where its neighbour is at least the pixel; 32f: comparisons with NaN are false. 16u
+ *            codes: the sixteen pixels on the edge of the 5 x 5 square; 8u codes: every second of them, the
+ *            corners and the middles of the sides. lbpMode, of which only the two low bits count: from bit 0
+ *            on, counter-clockwise (0) or clockwise (1) from the top-left corner, counter-clockwise (2) or
+ *            clockwise (3) from the middle of the left side. In every mode bit i of the 8u code is bit 2 i of
+ *            the 16u code.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_8u16u_C1R(const uint8_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_32f8u_C1R(const float* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, float borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageMode5x5_32f16u_C1R(const float* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, uint8_t lbpMode, int32_t borderType, float borderValue);
+
+/** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three
+ *  rows.
+ *  Shapes    The source has roiSize pixels, and on every side that borderType reads from memory as many more as
+ *            the neighbourhood reaches: one, for 5x5 two. The destination has roiSize codes.
+ *  Elements  Codes are bytes for both types, their bits those of qoriLBPImage3x3. The bits of the left and of
+ *            the right neighbour are set where the three pixels of that column add up to at least what the
+ *            three of the pixel's own column do, above, beside and below; noise of single rows so changes them
+ *            less.
+ *  Units     Steps in bytes, of any alignment and sign; roiSize in pixels.
+ *  Aliasing  Source, with the neighbours that are read, and destination must not overlap.
+ *  Notes     borderType: a QorBorderMode, which is not checked. Flagged sides are read from memory,
+ *            borderReadAll or all four flags read everything. On the others a missing neighbour is borderValue
+ *            (borderConstant), the pixel as far on the other side of the edge pixel, which is not repeated
+ *            (kind 3), or the nearest pixel (every other kind); each axis follows its own sides.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
+ *            1); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriLBPImageHorizCorr_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint8_t borderValue);
+QORI_API QorResult QORI_CALL qoriLBPImageHorizCorr_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorImageSize roiSize, int32_t borderType, uint16_t borderValue);
 
 /* ---- Tables by levels ----------------------------------------------------------------------------------------- */
 

@@ -42,6 +42,14 @@ int64_t product(int64_t a, int64_t b) {
 
 }  // namespace
 
+int32_t BorderedImage::seen(int32_t at, int32_t count, bool openBefore, bool openBehind) const {
+    const int32_t last = count - 1;
+    if (!rule.mirrors) return std::clamp(at, openBefore ? INT32_MIN : 0, openBehind ? INT32_MAX : last);
+    if (count == 1 && !openBefore && !openBehind) return 0;  // either side mirrors the other
+    while ((at < 0 && !openBefore) || (at > last && !openBehind)) at = at < 0 ? -at : 2 * last - at;
+    return at;
+}
+
 void BorderedImage::gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) const {
     const int32_t missingLeft = rule.open.left ? 0 : std::clamp(-rect.x, 0, rect.width);
     const int32_t missingRight = rule.open.right ? 0 : std::clamp(rect.x + rect.width - size.width, 0, rect.width);
@@ -49,15 +57,23 @@ void BorderedImage::gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) con
     const ptrdiff_t leftBytes = ptrdiff_t{missingLeft} * pixelBytes, presentBytes = ptrdiff_t{present} * pixelBytes;
     const int32_t firstPresent = std::clamp(rect.x + missingLeft, rule.open.left ? INT32_MIN : 0, INT32_MAX);
     for (int32_t y = rect.y; y < rect.y + rect.height; ++y, to += toStep) {
-        const bool missing = (y < 0 && !rule.open.top) || (y >= size.height && !rule.open.bottom);
-        if (missing && rule.constant != nullptr) {
+        if (rule.constant != nullptr && isMissingRow(y)) {
             repeat(to, rule.constant, pixelBytes, rect.width);
             continue;
         }
-        const int32_t row = missing ? std::clamp(y, 0, size.height - 1) : y;
+        const int32_t row = seenRow(y);
+        if (present > 0) kernels::copyRow(to + leftBytes, pixel(firstPresent, row), presentBytes);
+        if (rule.mirrors) {
+            const auto mirror = [&](int32_t begin, int32_t end) {
+                for (int32_t i = begin; i < end; ++i)
+                    repeat(to + ptrdiff_t{i} * pixelBytes, pixel(seenColumn(rect.x + i), row), pixelBytes, 1);
+            };
+            mirror(0, missingLeft);
+            mirror(missingLeft + present, rect.width);
+            continue;
+        }
         const uint8_t *first = pixel(0, row), *last = pixel(size.width - 1, row);
         repeat(to, rule.constant != nullptr ? rule.constant : first, pixelBytes, missingLeft);
-        if (present > 0) kernels::copyRow(to + leftBytes, pixel(firstPresent, row), presentBytes);
         repeat(to + leftBytes + presentBytes, rule.constant != nullptr ? rule.constant : last, pixelBytes,
                missingRight);
     }

@@ -2,8 +2,8 @@
 // What a neighbourhood operation sees beyond its region, for every operation that looks around a pixel.
 //
 // Each axis has its own rule: beyond an open side pixels are read from memory, beyond a closed one they are
-// synthesised, from the nearest pixel along that axis or as a constant. With the constant a pixel is missing when
-// either of its coordinates is.
+// synthesised, from the nearest pixel along that axis, from the mirrored one or as a constant. With the constant a
+// pixel is missing when either of its coordinates is.
 //
 // Synthesised pixels exist in the caller's work buffer only, and only where a window needs them. With a window that
 // reaches l, t, r, b pixels to the left, above, to the right and below, and with all sides closed:
@@ -74,15 +74,23 @@ constexpr Border Border::of(int32_t mode) {
             {open(borderReadLeft), open(borderReadTop), open(borderReadRight), open(borderReadBottom)}};
 }
 
-/// What windows see beyond each side, by this model: from memory, one constant, or the nearest pixel.
+/// What windows see beyond each side, by this model: from memory, one constant, the nearest pixel or the mirrored one.
 struct BorderRule {
     Sides open;
-    const uint8_t* constant;  ///< The missing pixel, or null where pixels are replicated.
+    const uint8_t* constant;  ///< The missing pixel, or null where pixels are replicated or mirrored.
+    /// For windows that reach as far on both sides of an axis. Not in place: mirrored rows may have been written over.
+    bool mirrors = false;
 
     static constexpr BorderRule readAll() { return {{true, true, true, true}, nullptr}; }
     /// Of a family that takes no kinds but these; any other would replicate.
     static BorderRule of(Border border, const void* value) {
         return {border.open, border.kind == BorderKind::constant ? static_cast<const uint8_t*>(value) : nullptr};
+    }
+    /// Of a family that mirrors too.
+    static BorderRule withMirror(Border border, const void* value) {
+        BorderRule rule = of(border, value);
+        rule.mirrors = border.kind == BorderKind::mirror;
+        return rule;
     }
 };
 
@@ -95,8 +103,15 @@ struct BorderedImage {
     BorderRule rule;
 
     const uint8_t* pixel(int32_t x, int32_t y) const { return origin + y * step + ptrdiff_t{x} * pixelBytes; }
+    /// The coordinates whose pixel is seen there, where it is not the constant. Mirrored ones are never further away.
+    int32_t seenColumn(int32_t x) const { return seen(x, size.width, rule.open.left, rule.open.right); }
+    int32_t seenRow(int32_t y) const { return seen(y, size.height, rule.open.top, rule.open.bottom); }
+    bool isMissingRow(int32_t y) const { return (y < 0 && !rule.open.top) || (y >= size.height && !rule.open.bottom); }
     /// Writes the pixels of a rectangle, which may lie anywhere around the region.
     void gather(QorImageRect rect, uint8_t* to, ptrdiff_t toStep) const;
+
+private:
+    int32_t seen(int32_t at, int32_t count, bool openBefore, bool openBehind) const;
 };
 
 /// Pixels to be made and where their windows lie.

@@ -89,10 +89,8 @@ void RowWindow::save(int32_t y) {
 }
 
 const uint8_t* RowWindow::interiorRow(int32_t x, int32_t y) const {
-    const int32_t last = image_.size.height - 1;
-    const bool missing = (y < 0 && !image_.rule.open.top) || (y > last && !image_.rule.open.bottom);
-    if (missing && image_.rule.constant != nullptr) return constant_.memory;
-    const int32_t row = missing ? std::clamp(y, 0, last) : y;
+    if (image_.rule.constant != nullptr && image_.isMissingRow(y)) return constant_.memory;
+    const int32_t row = image_.seenRow(y);
     if (row < 0 || row >= overwrittenBelow_) return image_.pixel(x - needs_.reach.left, row);
     return saved_.row(savedSlot(row)) + ptrdiff_t{x} * image_.pixelBytes;
 }

@@ -11,6 +11,8 @@
 namespace qori::test {
 namespace {
 
+constexpr int32_t kMirror = 3;
+
 struct Case {
     QorImageSize size;
     WindowNeeds needs;
@@ -18,14 +20,26 @@ struct Case {
     int pixelBytes;
 };
 
+/// Back and forth between closed sides, without repeating the edge.
+int mirrored(int at, int count, bool openBefore, bool openBehind) {
+    const bool beyond = (at < 0 && !openBefore) || (at >= count && !openBehind);
+    if (!beyond) return at;
+    if (count == 1 && !openBefore && !openBehind) return 0;
+    return mirrored(at < 0 ? -at : 2 * (count - 1) - at, count, openBefore, openBehind);
+}
+
 /// What the source has at (x, y) by the rule, -1 for the constant.
 ptrdiff_t sourceOffset(const Case& job, const BorderRule& rule, int x, int y) {
     const bool missingX = (x < 0 && !rule.open.left) || (x >= job.size.width && !rule.open.right);
     const bool missingY = (y < 0 && !rule.open.top) || (y >= job.size.height && !rule.open.bottom);
     if (rule.constant != nullptr && (missingX || missingY)) return -1;
     const Reach& reach = job.needs.reach;
-    const int column = missingX ? std::clamp(x, 0, job.size.width - 1) : x;
-    const int row = missingY ? std::clamp(y, 0, job.size.height - 1) : y;
+    int column = missingX ? std::clamp(x, 0, job.size.width - 1) : x;
+    int row = missingY ? std::clamp(y, 0, job.size.height - 1) : y;
+    if (rule.mirrors) {
+        column = mirrored(x, job.size.width, rule.open.left, rule.open.right);
+        row = mirrored(y, job.size.height, rule.open.top, rule.open.bottom);
+    }
     return ptrdiff_t{row + reach.top} * (job.size.width + reach.columns()) + column + reach.left;
 }
 
@@ -38,7 +52,7 @@ void checkCase(const Case& job) {
     const Snapshot before = image.snapshot();
     const uint8_t* const source = before.bytes.data() + before.originOffset;
     const uint8_t constant[] = {1, 2, 3, 4, 5, 6};
-    const BorderRule rule = BorderRule::of(Border::of(job.border), constant);
+    const BorderRule rule = BorderRule::withMirror(Border::of(job.border), constant);
     auto* const origin =
         image.data<uint8_t>() + reach.top * ptrdiff_t{image.step()} + ptrdiff_t{reach.left} * job.pixelBytes;
     const BorderedImage bordered{origin, image.step(), job.size, job.pixelBytes, rule};
@@ -82,11 +96,16 @@ std::string describe(const Case& job) {
 
 void checkAll(const Case& job) {
     for (int32_t sides = 0; sides < 256 && !testing::Test::HasFailure(); sides += 16)
-        for (int32_t kind : {borderConstant, borderReplicate, borderReadAll})
+        for (int32_t kind : {int32_t{borderConstant}, int32_t{borderReplicate}, int32_t{borderReadAll}, kMirror})
             for (Place place : {Place::apart, Place::inOrder, Place::anyOrder}) {
+                if (kind == kMirror && place != Place::apart) continue;
                 Case now = job;
                 now.border = kind | sides;
                 now.needs.place = place;
+                if (kind == kMirror) {  // of regions smaller than that, the other side's neighbours are seen
+                    now.needs.reach.right = now.needs.reach.left;
+                    now.needs.reach.bottom = now.needs.reach.top;
+                }
                 SCOPED_TRACE(describe(now));
                 checkCase(now);
             }

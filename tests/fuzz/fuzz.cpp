@@ -217,6 +217,41 @@ QorDct2DPlan** newCosinePlan(Input& in) {
     return in.take<uint8_t>() >= 250 ? nullptr : &plan;
 }
 
+const QorHogConfig* hogConfig(Input& in) {
+    static QorHogConfig config;
+    const int cell = 1 + in.upTo(16);
+    config = {in.upTo(1), cell, 2 * cell, cell * (1 + in.upTo(2)), 1 + in.upTo(16), in.take<float>(), 0.2f, {}};
+    config.winSize = {2 * cell + config.blockStride * in.upTo(3), 2 * cell + config.blockStride * in.upTo(3)};
+    if (in.upTo(9) == 0) (&config.blockOrder)[in.upTo(4)] = in.take<int32_t>();
+    return in.take<uint8_t>() >= 250 ? nullptr : &config;
+}
+
+/// Of windows that fit the images here, which are low.
+const QorHogPlan* hogPlan(Input& in) {
+    auto* plan = reinterpret_cast<QorHogPlan*>(planMemory() + in.upTo(63));
+    const int across = in.upTo(2), stride = 2 + 2 * in.upTo(2);
+    const QorHogConfig config{in.upTo(1),
+                              2,
+                              4,
+                              stride,
+                              2 + in.upTo(14),
+                              1.0f + in.take<uint8_t>(),
+                              0.2f,
+                              {4 + across * stride, stride == 2 ? 4 + 2 * in.upTo(1) : 4}};
+    std::memset(planMemory(), 0, 256);
+    qoriHOGInit(&config, plan);
+    return plan;
+}
+
+/// As many as a step may say; every fourth lies in most images, so that their descriptors fit an arena.
+const QorPoint2D* locations(Input& in) {
+    static QorPoint2D points[kMostStep];
+    if (points[0].x == 0)
+        for (int i = 0; i < kMostStep; ++i) points[i] = {i % 4 == 3 ? i % 9 : i * 997, i % 4 == 3 ? i % 3 : -i};
+    points[0].x = -1;
+    return in.take<uint8_t>() >= 250 ? nullptr : points;
+}
+
 template <class T>
 T argument(Input& in) {
     const bool isStep = std::exchange(in.stepFollows, false);
@@ -238,6 +273,13 @@ T argument(Input& in) {
         return cosinePlan(in);
     } else if constexpr (std::is_same_v<T, QorDct2DPlan**>) {
         return newCosinePlan(in);
+    } else if constexpr (std::is_same_v<T, const QorHogConfig*>) {
+        return hogConfig(in);
+    } else if constexpr (std::is_same_v<T, const QorHogPlan*>) {
+        return hogPlan(in);
+    } else if constexpr (std::is_same_v<T, const QorPoint2D*>) {
+        in.stepFollows = true;
+        return locations(in);
     } else if constexpr (std::is_pointer_v<T> && std::is_pointer_v<std::remove_pointer_t<T>>) {
         // As many as the next integer may say, of four kinds.
         static uint8_t* planes[kMostStep];

@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
+#include <cmath>
+#include <numbers>
+#include <vector>
+
+#include "panels.h"
+
+namespace demo {
+namespace {
+
+constexpr int kCell = 16, kBlock = 2 * kCell, kBins = 9;
+
+/// A line through the middle of a cell along the edges of one orientation, as bright as its share of the gradients.
+void drawStroke(const Picture& out, int x, int y, int bin, float share) {
+    const double gradient = (bin + 0.5) * std::numbers::pi / kBins;  // edges are at right angles to it
+    const double dx = -std::sin(gradient), dy = std::cos(gradient);
+    const int light = std::min(255, static_cast<int>(600 * share));
+    for (int i = -kCell + 1; i < kCell; ++i) {
+        uint8_t* const pixel = out.at(x + kCell / 2 + static_cast<int>(std::lround(dx * i / 2.1)),
+                                      y + kCell / 2 + static_cast<int>(std::lround(dy * i / 2.1)));
+        for (int c = 0; c < 3; ++c)
+            pixel[c] = static_cast<uint8_t>(std::max<int>(pixel[c], c == 2 ? light / 2 : light));
+    }
+}
+
+/// One window for each block.
+std::vector<float> descriptorsOf(const Picture& photo, const std::vector<QorPoint2D>& corners) {
+    const QorHogConfig config{0, kCell, kBlock, kBlock, kBins, kCell, 0.2f, {kBlock, kBlock}};
+    int32_t planBytes = 0, bytes = 0, bufferBytes = 0;
+    require(qoriHOGGetSize(&config, &planBytes));
+    std::vector<uint8_t> memory(static_cast<size_t>(planBytes));
+    auto* const plan = reinterpret_cast<QorHogPlan*>(memory.data());
+    require(qoriHOGInit(&config, plan));
+    require(qoriHOGGetDescriptorSize(plan, &bytes));
+    require(qoriHOGGetBufferSize(plan, photo.size(), &bufferBytes));
+    std::vector<uint8_t> buffer(static_cast<size_t>(bufferBytes));
+    std::vector<float> descriptors(static_cast<size_t>(bytes) / sizeof(float) * corners.size());
+    require(qoriHOG_8u32f_C3R(photo.data(), photo.step(), photo.size(), corners.data(),
+                              static_cast<int32_t>(corners.size()), descriptors.data(), plan, borderReplicate, nullptr,
+                              buffer.data()));
+    return descriptors;
+}
+
+/// Orientations of each cell over the darkened photograph.
+Picture gradients(const Picture& photo) {
+    Picture out(photo.size(), 3);
+    for (int y = 0; y < photo.height(); ++y)
+        for (int i = 0; i < 3 * photo.width(); ++i) out.at(0, y)[i] = photo.at(0, y)[i] / 3;
+    std::vector<QorPoint2D> corners;
+    for (int y = 0; y + kBlock <= photo.height(); y += kBlock)
+        for (int x = 0; x + kBlock <= photo.width(); x += kBlock) corners.push_back({x, y});
+    const std::vector<float> descriptors = descriptorsOf(photo, corners);
+    const float* share = descriptors.data();
+    for (const QorPoint2D corner : corners)
+        for (int cell = 0; cell < 4; ++cell)
+            for (int bin = 0; bin < kBins; ++bin)
+                drawStroke(out, corner.x + cell % 2 * kCell, corner.y + cell / 2 * kCell, bin, *share++);
+    return out;
+}
+
+/// The patterns of the green channel, and below how often each code is met, by the root.
+Picture patterns(const Picture& photo) {
+    constexpr int kCodes = 256;
+    const Picture grey(photo.size(), 1), codes(photo.size(), 1);
+    Picture out(photo.size(), 3);
+    require(qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), grey.data(), grey.step(), photo.size()));
+    require(
+        qoriLBPImage3x3_8u_C1R(grey.data(), grey.step(), codes.data(), codes.step(), photo.size(), borderReplicate, 0));
+    for (int c = 0; c < 3; ++c)
+        require(qoriCopy_8u_C1C3R(codes.data(), codes.step(), out.data() + c, out.step(), photo.size()));
+    int32_t counts[kCodes], levels[kCodes + 1];
+    require(qoriHistogramEven_8u_C1R(codes.data(), codes.step(), photo.size(), counts, levels, kCodes + 1, 0, kCodes));
+    const int width = photo.width(), plot = photo.height() / 3, top = photo.height() - plot;
+    constexpr uint8_t kPaper[3] = {18, 20, 24}, kInk[3] = {235, 190, 60};
+    require(qoriSet_8u_C3R(kPaper, out.at(0, top), out.step(), {width, plot}));
+    const double most = *std::max_element(counts, counts + kCodes);
+    for (int k = 0; k < kCodes; ++k) {
+        const int begin = width * k / kCodes, end = width * (k + 1) / kCodes;
+        const int bar = static_cast<int>(0.95 * plot * std::sqrt(counts[k] / most));
+        if (bar > 0 && end > begin)
+            require(qoriSet_8u_C3R(kInk, out.at(begin, photo.height() - bar), out.step(), {end - begin, bar}));
+    }
+    return out;
+}
+
+constexpr Panel kPanels[] = {
+    {"Orientations of gradients, 16 x 16 cells", "HOG C3", gradients, {kBlock, kBlock}},
+    {"Local binary patterns and how often each is met", "LBPImage3x3 C1, HistogramEven C1", patterns, {3, 3}},
+};
+
+}  // namespace
+
+std::span<const Panel> featuresPanels() { return kPanels; }
+
+}  // namespace demo

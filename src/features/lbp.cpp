@@ -1,0 +1,163 @@
+// SPDX-License-Identifier: Apache-2.0
+// Local binary patterns. Strips of columns go from top to bottom over a ring of rows of keys, which have whatever the
+// windows see beyond the region, so that kernels know no borders.
+#include "frame/border.h"
+#include "frame/checks.h"
+#include "frame/float_control.h"
+#include "frame/plan.h"
+#include "frame/streaming.h"
+#include "kernels/lbp/patterns.h"
+
+namespace qori::features {
+namespace {
+
+/// Bytes of a strip's row of keys: five of them and a row of constants stay in the first-level cache, and on the stack.
+constexpr int32_t kStripBytes = 4096;
+
+/// The rows of keys that windows of one strip see. Rows enter one ahead of their first use: what has just been stored
+/// cannot be loaded at other alignments until it has reached the cache.
+template <class T, int reach>
+class KeyRows {
+public:
+    using Key = kernels::PatternKey<T>;
+    static constexpr int32_t kRows = 2 * reach + 1;
+
+    explicit KeyRows(const BorderedImage& strip)
+        : strip_(strip), next_(strip.rule.open.top ? -reach : 0), end_(strip.size.height) {
+        if (strip.rule.open.bottom) end_ += reach;
+        if (strip.rule.constant == nullptr) return;
+        T value;
+        __builtin_memcpy(&value, strip.rule.constant, sizeof value);
+        kernels::patternKeys(&value, &constantKey_, 1);
+        if (strip.rule.open.top && strip.rule.open.bottom) return;
+        for (int32_t x = -reach; x < strip.size.width + reach; ++x) constant_[kAhead + x] = constantKey_;
+    }
+
+    /// Points at the first pixel of the rows that windows of row y see. Rows are asked for from the top.
+    void rowsAround(int32_t y, const Key** rows) {
+        for (; next_ <= y + reach + 1 && next_ < end_; ++next_) enter(next_);
+        if (next_ < end_) kernels::prefetchRow(strip_.pixel(0, next_), ptrdiff_t{strip_.size.width} * elementBytes<T>);
+        if (y >= reach && y + reach < strip_.size.height) {
+            for (int32_t i = 0; i < kRows; ++i) rows[i] = slot(y - reach + i);
+            return;
+        }
+        for (int32_t i = 0; i < kRows; ++i) {
+            const int32_t row = y - reach + i;
+            const bool isConstant = strip_.rule.constant != nullptr && strip_.isMissingRow(row);
+            rows[i] = isConstant ? constant_ + kAhead : slot(strip_.seenRow(row));
+        }
+    }
+
+private:
+    /// Keys in front of a row's first pixel, which so begins on a vector, and behind its last block.
+    static constexpr int32_t kAhead = 32;
+    static constexpr int32_t kRowKeys = kStripBytes / elementBytes<Key> + 3 * kAhead;
+    static constexpr uint32_t kSlots = reach == 1 ? 4 : 8;
+    static_assert(kSlots > kRows);
+
+    Key* slot(int32_t y) { return ring_[static_cast<uint32_t>(y) % kSlots] + kAhead; }
+
+    void enter(int32_t y) {
+        const Sides& open = strip_.rule.open;
+        const int32_t width = strip_.size.width, left = open.left ? reach : 0, right = open.right ? reach : 0;
+        Key* const keys = slot(y);
+        kernels::patternKeys(reinterpret_cast<const T*>(strip_.pixel(-left, y)), keys - left,
+                             ptrdiff_t{width} + left + right);
+        const auto synthesised = [&](int32_t x) {
+            return strip_.rule.constant != nullptr ? constantKey_ : keys[strip_.seenColumn(x)];
+        };
+        for (int32_t i = 0; i < reach; ++i) {
+            if (!open.left) keys[-1 - i] = synthesised(-1 - i);
+            if (!open.right) keys[width + i] = synthesised(width + i);
+        }
+    }
+
+    const BorderedImage& strip_;
+    int32_t next_, end_;  ///< The row that enters next, and that behind the last.
+    Key constantKey_{};
+    alignas(64) Key ring_[kSlots][kRowKeys];
+    alignas(64) Key constant_[kRowKeys];
+};
+
+/// A kernel makes a row from the rows around it.
+template <class T, class D, int reach, class MakeRow>
+void makeStrip(const BorderedImage& strip, Image<D> dst, MakeRow makeRow) {
+    KeyRows<T, reach> keys(strip);
+    for (int32_t y = 0; y < strip.size.height; ++y) {
+        const kernels::PatternKey<T>* rows[2 * reach + 1];
+        keys.rowsAround(y, rows);
+        makeRow(rows, dst.row(y), ptrdiff_t{strip.size.width});
+    }
+}
+
+/// Strips of equal widths, whole vectors but for the last.
+template <class T, class D, int reach, class MakeRow>
+void makeStrips(const BorderedImage& image, Image<D> dst, MakeRow makeRow) {
+    constexpr int32_t kUnit = kernels::kPatternBlock, kMost = kStripBytes / elementBytes<T>;
+    const int32_t strips = (image.size.width - 1) / kMost + 1;
+    const auto width = static_cast<int32_t>(roundUp((int64_t{image.size.width} + strips - 1) / strips, kUnit));
+    for (int64_t x = 0; x < image.size.width; x += width) {
+        BorderedImage strip = image;
+        strip.origin = image.pixel(static_cast<int32_t>(x), 0);
+        strip.size.width = static_cast<int32_t>(std::min(int64_t{width}, image.size.width - x));
+        strip.rule.open.left |= x > 0;
+        strip.rule.open.right |= x + strip.size.width < image.size.width;
+        makeStrip<T, D, reach>(strip, {advance(dst.data, static_cast<ptrdiff_t>(x) * elementBytes<D>), dst.step},
+                               makeRow);
+    }
+}
+
+/// rowMaker<streaming>() gives what makes a row.
+template <int reach, class T, class D, class RowMaker>
+QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value, RowMaker rowMaker) {
+    if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
+    const BorderedImage image{asBytes(src.data), src.step, roi, elementBytes<T>,
+                              BorderRule::withMirror(Border::of(borderType), &value)};
+    const bool isAligned = (reinterpret_cast<uintptr_t>(dst.data) | static_cast<uintptr_t>(dst.step)) % 32 == 0;
+    return underControlOf<T>([&] {
+        if (isAligned && streams(streamRules::copy, traffic(roi, elementBytes<T> + elementBytes<D>))) {
+            makeStrips<T, D, reach>(image, dst, rowMaker.template operator()<true>());
+            streamFence();
+        } else {
+            makeStrips<T, D, reach>(image, dst, rowMaker.template operator()<false>());
+        }
+        return QOR_OK;
+    });
+}
+
+template <int mode, int reach, class T, class D>
+QorResult lbpOfMode(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value) {
+    return lbp<reach>(src, dst, roi, borderType, value, []<bool streaming>() {
+        return [](const kernels::PatternKey<T>* const* rows, D* to, ptrdiff_t width) {
+            kernels::patternRow<D, reach, mode, streaming>(rows, to, width);
+        };
+    });
+}
+
+template <int reach, class T, class D>
+QorResult lbpImage(Image<const T> src, Image<D> dst, QorImageSize roi, uint8_t mode, int32_t borderType, T value) {
+    switch (mode % 4) {
+        case 0: return lbpOfMode<0, reach>(src, dst, roi, borderType, value);
+        case 1: return lbpOfMode<1, reach>(src, dst, roi, borderType, value);
+        case 2: return lbpOfMode<2, reach>(src, dst, roi, borderType, value);
+        default: return lbpOfMode<3, reach>(src, dst, roi, borderType, value);
+    }
+}
+
+template <class T>
+QorResult lbpImageHorizCorr(Image<const T> src, Image<uint8_t> dst, QorImageSize roi, int32_t borderType, T value) {
+    using Key = kernels::PatternKey<T>;
+    return lbp<1>(src, dst, roi, borderType, value, []<bool streaming>() {
+        return [](const Key* const* rows, uint8_t* to, ptrdiff_t width) {
+            constexpr ptrdiff_t kAhead = 16;
+            alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
+            kernels::patternColumnSums(rows, sums + kAhead, width);
+            kernels::correctedPatternRow<streaming>(rows, sums + kAhead, to, width);
+        };
+    });
+}
+
+}  // namespace
+}  // namespace qori::features
+
+#include "entries/lbp.inc"
