@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Affine warps about the middle of the image; plans and buffers are made outside the timing. What lies outside the
-// source is the border value. Turns by 0 degrees and multiples of 90 move pixels, whatever the interpolation: those rows
-// are shifted by a fraction, so that it does its work.
+// source is the border value. Turns by 0 degrees and multiples of 90 move pixels, whatever the interpolation: those
+// rows are shifted by a fraction, so that it does its work.
 #include <cmath>
 #include <numbers>
 
@@ -85,8 +85,8 @@ Row row(QorInterpolationKind kind, Map map, double best = 0, int32_t border = bo
 }
 
 constexpr Map kTilted{"15 degrees", 15};
-constexpr Map kMaps[] = {{"0 degrees", 0},   {"45 degrees", 45},      {"90 degrees", 90},      {"180 degrees", 180},
-                         {"scale 2", 0, 2},  {"scale 0.5", 0, 0.5},   {"shear 0.3", 0, 1, 0.3}};
+constexpr Map kMaps[] = {{"0 degrees", 0},  {"45 degrees", 45},    {"90 degrees", 90},      {"180 degrees", 180},
+                         {"scale 2", 0, 2}, {"scale 0.5", 0, 0.5}, {"shear 0.3", 0, 1, 0.3}};
 
 std::vector<Row> warpRows(QorInterpolationKind kind, double bestGray, double bestColour) {
     std::vector<Row> rows = {row<uint8_t, 1>(kind, kTilted, bestGray), row<uint8_t, 3>(kind, kTilted, bestColour)};

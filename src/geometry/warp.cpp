@@ -38,7 +38,10 @@ bool readsAll(int32_t borderType) {
 
 /// Sources from so many rows on are refused by the size query: rows of 2^30 bytes in single pixels.
 QorResult heightCheck(int32_t height, int32_t dataType) {
-    const int32_t most = dataType == qor8u ? 1 << 30 : dataType == qor64f ? 1 << 27 : dataType == qor32f ? 1 << 28 : 1 << 29;
+    const int32_t most = dataType == qor8u    ? 1 << 30
+                         : dataType == qor64f ? 1 << 27
+                         : dataType == qor32f ? 1 << 28
+                                              : 1 << 29;
     return height >= most ? QOR_ERR_SIZE : QOR_OK;
 }
 
@@ -95,7 +98,8 @@ struct InitBorder {
 };
 
 QorResult borderCheck(InitBorder border) {
-    if (border.type != borderConstant && border.type != borderReplicate && !readsAll(border.type)) return QOR_ERR_BORDER;
+    if (border.type != borderConstant && border.type != borderReplicate && !readsAll(border.type))
+        return QOR_ERR_BORDER;
     return border.type == borderConstant && border.values == nullptr ? QOR_ERR_NULL_PTR : QOR_OK;
 }
 
@@ -120,9 +124,9 @@ QorResult init(const InitArguments& a, InitBorder border, int32_t interpolation,
                                                                  : WarpBorder::constant;
         // At a pixel's centre the family's filters weigh the neighbours by b / 6 each.
         const bool interpolates = interpolation == interpLinear || (interpolation == interpCubic && cubic.b == 0);
-        return fillWarpPlan(pPlan, {a.src, a.dst, interpolation, a.dataType, a.channels, Affine::of(a.coeffs),
-                                    a.direction == kToSource, kind, border.values, kernels::weightsOf(cubic),
-                                    interpolates});
+        return fillWarpPlan(
+            pPlan, {a.src, a.dst, interpolation, a.dataType, a.channels, Affine::of(a.coeffs), a.direction == kToSource,
+                    kind, border.values, kernels::weightsOf(cubic), interpolates});
     });
 }
 

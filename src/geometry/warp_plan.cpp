@@ -36,15 +36,15 @@ kernels::Pattern fillOf(const WarpArguments& a) {
     }
 }
 
-/// One row of a matrix, where it takes the pixels of an image to whole numbers but for the rounding of coefficients that
-/// were sines and cosines: moved to the whole numbers.
+/// One row of a matrix, where it takes the pixels of an image to whole numbers but for the rounding of coefficients
+/// that were sines and cosines: moved to the whole numbers.
 bool roundRow(double& alongX, double& alongY, double& offset, QorImageSize dst) {
     constexpr double kRounding = 0x1p-48, kMost = 0x1p-34;
     const double x = __builtin_rint(alongX), y = __builtin_rint(alongY), o = __builtin_rint(offset);
     const double width = dst.width, height = dst.height;
     const double magnitude = (__builtin_fabs(x) + 1) * width + (__builtin_fabs(y) + 1) * height + __builtin_fabs(o);
-    const double deviation = __builtin_fabs(alongX - x) * width + __builtin_fabs(alongY - y) * height +
-                             __builtin_fabs(offset - o);
+    const double deviation =
+        __builtin_fabs(alongX - x) * width + __builtin_fabs(alongY - y) * height + __builtin_fabs(offset - o);
     if (!(deviation <= kRounding * magnitude && deviation <= kMost)) return false;
     alongX = x;
     alongY = y;

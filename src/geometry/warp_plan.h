@@ -39,8 +39,8 @@ struct WarpPlan {
     int32_t transform, interpolation, dataType, channels;
     QorImageSize src, dst;
     WarpBorder border;
-    QorResult status;      ///< QOR_WARN_WARP_EMPTY where there is nothing to be written, whatever the tile.
-    int32_t movesPixels;   ///< Every position is a pixel's: nothing is interpolated.
+    QorResult status;     ///< QOR_WARN_WARP_EMPTY where there is nothing to be written, whatever the tile.
+    int32_t movesPixels;  ///< Every position is a pixel's: nothing is interpolated.
     Affine forward, backward;
     double borderValues[4];
     kernels::CubicWeights cubic;

@@ -7,7 +7,7 @@ namespace {
 using kernels::WarpBox;
 
 /// Rows that are made strip by strip.
-constexpr int32_t kBandRows = 64;
+constexpr int32_t kBandRows = 32;
 
 class TileRun {
 public:
@@ -26,8 +26,8 @@ public:
             source_ = {images.src, images.srcStep, -1, -1, width + 1, height + 1, &plan.cubic};
             fast_ = rectangle_;
         }
-        isNear_ = geometry_.bias() == kernels::kFineBias && int64_t{width} * images.pixelBytes >= kernels::kNearRowBytes &&
-                  isWithin32Bits();
+        isNear_ = geometry_.bias() == kernels::kFineBias &&
+                  int64_t{width} * images.pixelBytes >= kernels::kNearRowBytes && isWithin32Bits();
         if (isCubic)
             any_ = {-3, -3, width + 2.0, height + 2.0};
         else if (isNearest)
@@ -61,7 +61,8 @@ private:
     /// The offsets of all pixels, and of those around the source that may be read.
     bool isWithin32Bits() const {
         const int64_t step = images_.srcStep < 0 ? -int64_t{images_.srcStep} : images_.srcStep;
-        return step * (int64_t{plan_.src.height} + 2) + (int64_t{plan_.src.width} + 3) * images_.pixelBytes <= INT32_MAX;
+        return step * (int64_t{plan_.src.height} + 2) + (int64_t{plan_.src.width} + 3) * images_.pixelBytes <=
+               INT32_MAX;
     }
 
     /// Strips touch a cache line of each source row that they cross, for as many rows of the band as share it: they are
@@ -70,7 +71,7 @@ private:
         constexpr double kSourceRows = 64;
         constexpr int32_t kLeast = 64, kMost = 1 << 20;
         const double slope = __builtin_fabs(plan_.backward.yx);
-        return slope * kMost <= kSourceRows  ? kMost
+        return slope * kMost <= kSourceRows    ? kMost
                : slope * kLeast >= kSourceRows ? kLeast
                                                : static_cast<int32_t>(kSourceRows / slope) / kLeast * kLeast;
     }
@@ -78,8 +79,7 @@ private:
     void prepare(Row& row, int32_t y) {
         const WarpSpan columns{tile_.x, tile_.x + tile_.width};
         row.line = geometry_.line(tile_.y + y);
-        row.written = plan_.border == WarpBorder::replicate ? columns
-                                                            : geometry_.within(row.line, rectangle_, columns);
+        row.written = plan_.border == WarpBorder::replicate ? columns : geometry_.within(row.line, rectangle_, columns);
         const bool hasFast = isNear_ && kernels_.inside != kernels_.anywhere;
         row.fast = hasFast ? geometry_.within(row.line, fast_, row.written) : WarpSpan{columns.first, columns.first};
         row.dst = images_.dst + ptrdiff_t{y} * images_.dstStep - ptrdiff_t{tile_.x} * images_.pixelBytes;
@@ -93,7 +93,8 @@ private:
 
     void fill(const Row& row, WarpSpan span) const {
         if (!span.isEmpty())
-            kernels::fillRow(pixel(row, span.first), plan_.fill, (ptrdiff_t{span.end} - span.first) * images_.pixelBytes);
+            kernels::fillRow(pixel(row, span.first), plan_.fill,
+                             (ptrdiff_t{span.end} - span.first) * images_.pixelBytes);
     }
 
     void make(const Row& row, WarpSpan strip) const {

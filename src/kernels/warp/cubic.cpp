@@ -125,8 +125,8 @@ public:
 
     /// Copies of four windows live at once.
     QORI_INLINE Window at(int32_t column, int32_t row, int slot) {
-        const bool isInside = column > source_.left && column + 2 <= source_.right && row > source_.top &&
-                              row + 2 <= source_.bottom;
+        const bool isInside =
+            column > source_.left && column + 2 <= source_.right && row > source_.top && row + 2 <= source_.bottom;
         if (anywhere && !isInside) return {copy(column, row, slot), kStep};
         return {source_.origin + (row - 1) * source_.step + (column - 1) * ptrdiff_t{kPixel}, source_.step};
     }
@@ -226,9 +226,9 @@ WarpKernels cubicKernels() {
     return {cubicRun<T, channels, false>, any, any, 1, 1, 2, 2};
 }
 
-#define QORI_CUBIC(T)                           \
-    template WarpKernels cubicKernels<T, 1>();  \
-    template WarpKernels cubicKernels<T, 3>();  \
+#define QORI_CUBIC(T)                          \
+    template WarpKernels cubicKernels<T, 1>(); \
+    template WarpKernels cubicKernels<T, 3>(); \
     template WarpKernels cubicKernels<T, 4>();
 QORI_CUBIC(uint8_t)
 QORI_CUBIC(uint16_t)

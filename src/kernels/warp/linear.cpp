@@ -2,6 +2,7 @@
 #include "linear.h"
 
 #include "elements.h"
+#include "linear_bytes.h"
 
 namespace qori::kernels {
 namespace {
@@ -22,14 +23,10 @@ struct Pairs {
     __m256 left, right;
 };
 
-/// Pairs of 8 or 16 bits come in one word, whose upper half is not used for 8 bits.
+/// Pairs of 16 bits come in one word.
 template <class T>
 QORI_INLINE Pairs pairsOf(__m256i words) {
-    if constexpr (sizeof(T) == 1) {
-        const __m256i mask = _mm256_set1_epi32(255);
-        return {_mm256_cvtepi32_ps(_mm256_and_si256(words, mask)),
-                _mm256_cvtepi32_ps(_mm256_and_si256(_mm256_srli_epi32(words, 8), mask))};
-    } else if constexpr (std::is_signed_v<T>) {
+    if constexpr (std::is_signed_v<T>) {
         return {_mm256_cvtepi32_ps(_mm256_srai_epi32(_mm256_slli_epi32(words, 16), 16)),
                 _mm256_cvtepi32_ps(_mm256_srai_epi32(words, 16))};
     } else {
@@ -39,7 +36,7 @@ QORI_INLINE Pairs pairsOf(__m256i words) {
 }
 
 template <class T>
-QORI_INLINE Pairs gatherPairs(const uint8_t* row, __m256i offsets, __m256i shifts) {
+QORI_INLINE Pairs gatherPairs(const uint8_t* row, __m256i offsets) {
     if constexpr (std::is_same_v<T, float>) {
         // In the order of warp::Columns, so that one shuffle puts them in their own.
         const auto* quads = reinterpret_cast<const long long*>(row);
@@ -48,8 +45,7 @@ QORI_INLINE Pairs gatherPairs(const uint8_t* row, __m256i offsets, __m256i shift
         const __m256 high = _mm256_castsi256_ps(_mm256_i32gather_epi64(quads, _mm256_extracti128_si256(order, 1), 1));
         return {_mm256_shuffle_ps(low, high, 0x88), _mm256_shuffle_ps(low, high, 0xDD)};
     } else {
-        const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(row), offsets, 1);
-        return pairsOf<T>(sizeof(T) == 1 ? _mm256_srlv_epi32(words, shifts) : words);
+        return pairsOf<T>(_mm256_i32gather_epi32(reinterpret_cast<const int*>(row), offsets, 1));
     }
 }
 
@@ -61,12 +57,9 @@ QORI_INLINE void storeEight(uint8_t* dst, __m256 v, int n) {
     } else {
         const __m256i whole = _mm256_cvtps_epi32(v);
         const __m128i low = _mm256_castsi256_si128(whole), high = _mm256_extracti128_si256(whole, 1);
-        __m128i packed = std::is_signed_v<T> ? _mm_packs_epi32(low, high) : _mm_packus_epi32(low, high);
-        if constexpr (sizeof(T) == 1) packed = _mm_packus_epi16(packed, packed);
+        const __m128i packed = std::is_signed_v<T> ? _mm_packs_epi32(low, high) : _mm_packus_epi32(low, high);
         if (n < 8)
             detail::storeBelow16(dst, packed, n * static_cast<int>(sizeof(T)));
-        else if constexpr (sizeof(T) == 1)
-            _mm_storel_epi64(reinterpret_cast<__m128i*>(dst), packed);
         else
             _mm_storeu_si128(reinterpret_cast<__m128i*>(dst), packed);
     }
@@ -79,20 +72,15 @@ void linearGray(const WarpSource& source, const WarpLine& line, const WarpBox& b
     const auto down = vertical<anywhere>(line, box);
     const uint8_t *const origin = source.origin, *const below = origin + source.step;
     const auto step = static_cast<int32_t>(source.step);
-    const __m256i lastWord = _mm256_set1_epi32(source.right - 3);  // 8 bits: four pixels
-    forEights(first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
-        const Places x = across.at(columns), y = down.at(columns);
-        __m256i offsets = offsetsOf<sizeof(T)>(x.whole, y.whole, step), shifts = _mm256_setzero_si256();
-        if constexpr (anywhere && sizeof(T) == 1) {
-            const __m256i surplus = _mm256_max_epi32(_mm256_sub_epi32(x.whole, lastWord), shifts);
-            offsets = _mm256_sub_epi32(offsets, surplus);
-            shifts = _mm256_slli_epi32(surplus, 3);
-        }
-        const Pairs top = gatherPairs<T>(origin, offsets, shifts), bottom = gatherPairs<T>(below, offsets, shifts);
-        const __m256 fx = toFloat(x.fraction), fy = toFloat(y.fraction);
-        storeEight<T>(dst, mix(mix(top.left, bottom.left, fy), mix(top.right, bottom.right, fy), fx), n);
-        dst += n * static_cast<int>(sizeof(T));
-    });
+    forEights(
+        first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
+            const Places x = across.at(columns), y = down.at(columns);
+            const __m256i offsets = offsetsOf<sizeof(T)>(x.whole, y.whole, step);
+            const Pairs top = gatherPairs<T>(origin, offsets), bottom = gatherPairs<T>(below, offsets);
+            const __m256 fx = toFloat(x.fraction), fy = toFloat(y.fraction);
+            storeEight<T>(dst, mix(mix(top.left, bottom.left, fy), mix(top.right, bottom.right, fy), fx), n);
+            dst += n * static_cast<int>(sizeof(T));
+        });
 }
 
 // --- packed pixels, one by one --------------------------------------------------------------------------------------
@@ -105,13 +93,14 @@ struct Batch {
     template <int pixelBytes, bool clamps>
     QORI_INLINE void prepare(const Axis<clamps>& across, const Axis<clamps>& down, int32_t step, int32_t first, int n) {
         int at = 0;
-        forEights(first, n, [&](Columns columns, int) __attribute__((always_inline)) {
-            const Places px = across.at(columns), py = down.at(columns);
-            store(offsets + at, Vec<int32_t>{offsetsOf<pixelBytes>(px.whole, py.whole, step)});
-            store(x + at, Vec<float>{toFloat(px.fraction)});
-            store(y + at, Vec<float>{toFloat(py.fraction)});
-            at += 8;
-        });
+        forEights(
+            first, n, [&](Columns columns, int) __attribute__((always_inline)) {
+                const Places px = across.at(columns), py = down.at(columns);
+                store(offsets + at, Vec<int32_t>{offsetsOf<pixelBytes>(px.whole, py.whole, step)});
+                store(x + at, Vec<float>{toFloat(px.fraction)});
+                store(y + at, Vec<float>{toFloat(py.fraction)});
+                at += 8;
+            });
     }
 };
 
@@ -245,17 +234,25 @@ WarpKernels linearKernels() {
     if constexpr (std::is_same_v<T, double>) {
         constexpr WarpKernel any = linearDoubles<channels>;
         return {any, any, any, 0, 0, 1, 1};
+    } else if constexpr (sizeof(T) == 1) {  // words of 4 or 8 bytes are read
+        constexpr int32_t right = channels == 1 ? 3 : channels == 3 ? 2 : 1;
+        return {linearBytes<channels, false>, linearBytes<channels, true>, linearFar<T, channels>, 0, 0, right, 1};
     } else if constexpr (channels == 1) {
-        return {linearGray<T, false>, linearGray<T, true>, linearFar<T, 1>, 0, 0, sizeof(T) == 1 ? 3 : 1, 1};
+        return {linearGray<T, false>, linearGray<T, true>, linearFar<T, 1>, 0, 0, 1, 1};
     } else {  // of three channels eight elements are read, six of which are the pair
-        return {linearPacked<T, channels, false>, linearPacked<T, channels, true>, linearFar<T, channels>, 0, 0,
-                channels == 3 ? 2 : 1, 1};
+        return {linearPacked<T, channels, false>,
+                linearPacked<T, channels, true>,
+                linearFar<T, channels>,
+                0,
+                0,
+                channels == 3 ? 2 : 1,
+                1};
     }
 }
 
-#define QORI_LINEAR(T)                            \
-    template WarpKernels linearKernels<T, 1>();   \
-    template WarpKernels linearKernels<T, 3>();   \
+#define QORI_LINEAR(T)                          \
+    template WarpKernels linearKernels<T, 1>(); \
+    template WarpKernels linearKernels<T, 3>(); \
     template WarpKernels linearKernels<T, 4>();
 QORI_LINEAR(uint8_t)
 QORI_LINEAR(uint16_t)

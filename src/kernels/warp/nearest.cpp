@@ -13,9 +13,7 @@ template <int pixelBytes>
 constexpr int kWord = pixelBytes <= 4 ? 4 : 8;
 
 constexpr __m256i shufflePattern(auto byteAt) {
-    alignas(kVectorBytes) struct {
-        uint8_t at[kVectorBytes];
-    } table{};
+    alignas(kVectorBytes) struct { uint8_t at[kVectorBytes]; } table{};
     for (int i = 0; i < kVectorBytes; ++i) table.at[i] = static_cast<uint8_t>(byteAt(i % kBlockBytes));
     return __builtin_bit_cast(__m256i, table);
 }
@@ -115,10 +113,11 @@ void nearestRun(const WarpSource& source, const WarpLine& line, const WarpBox& b
     const auto down = vertical<anywhere>(line, box);
     using Way = std::conditional_t<pixelBytes <= 8, Gather<pixelBytes, anywhere>, Moves<pixelBytes>>;
     const Way way(source);
-    forEights(first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
-        way(across.at(columns).whole, down.at(columns).whole, n, dst);
-        dst += n * pixelBytes;
-    });
+    forEights(
+        first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
+            way(across.at(columns).whole, down.at(columns).whole, n, dst);
+            dst += n * pixelBytes;
+        });
 }
 
 template <int pixelBytes>

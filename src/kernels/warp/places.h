@@ -3,16 +3,16 @@
 // depends on the pixel alone and on nothing that was computed before it.
 //
 // To a position a bias is added whose exponent leaves the mantissa so many bits below the point: the sum is rounded to
-// a fixed-point number, whose words are the whole part and the fraction without any conversion. With the fine bias these
-// are 32 bits each: whole parts from -2^19 to 2^19, fractions right to 2^-32 (the row's share and the column's are each
-// rounded by 2^-33 at most). Positions that leave the range, whatever their size, remain doubles that compare.
+// a fixed-point number, whose words are the whole part and the fraction without any conversion. With the fine bias
+// these are 32 bits each: whole parts from -2^19 to 2^19, fractions right to 2^-32 (the row's share and the column's
+// are each rounded by 2^-33 at most). Positions that leave the range, whatever their size, remain doubles that compare.
 #pragma once
 #include "kernels/simd.h"
 
 namespace qori::kernels {
 
-inline constexpr double kFineBias = 0x1.8p20;    ///< 32 bits below the point.
-inline constexpr double kCoarseBias = 0x1.8p32;  ///< 20 bits, for whole parts to 2^31.
+inline constexpr double kFineBias = 0x1.8p20;           ///< 32 bits below the point.
+inline constexpr double kCoarseBias = 0x1.8p32;         ///< 20 bits, for whole parts to 2^31.
 inline constexpr int32_t kFineLength = (1 << 19) - 16;  ///< Sides of images that the fine bias serves are below it.
 constexpr double unitOfBias(double bias) { return bias == kFineBias ? 0x1p-32 : 0x1p-20; }
 
@@ -54,7 +54,8 @@ struct WarpKernels {
     WarpKernel inside;
     /// For any position: reads are moved into the source.
     WarpKernel anywhere;
-    /// The same for sources that 32-bit offsets or 19 bits of whole parts do not cover, or with rows below kNearRowBytes.
+    /// The same for sources that 32-bit offsets or 19 bits of whole parts do not cover, or with rows below
+    /// kNearRowBytes.
     WarpKernel far;
     int32_t left, top, right, bottom;
 };
