@@ -17,13 +17,13 @@ public:
         const int32_t width = plan.src.width, height = plan.src.height;
         const bool isCubic = !isNearest && plan.interpolation == interpCubic;
         const bool readsAround = isCubic && plan.border == WarpBorder::none;
-        source_ = {images.src, images.srcStep, 0, 0, width - 1, height - 1, &plan.cubic};
+        source_ = {images.src, images.srcStep, 0, 0, width - 1, height - 1, &plan.cubic, ahead()};
         rectangle_ = geometry_.rectangle();
         const double unit = kernels::unitOfBias(geometry_.bias());
         fast_ = {static_cast<double>(kernels.left), static_cast<double>(kernels.top), width - kernels.right - unit,
                  height - kernels.bottom - unit};
         if (readsAround) {
-            source_ = {images.src, images.srcStep, -1, -1, width + 1, height + 1, &plan.cubic};
+            source_ = {images.src, images.srcStep, -1, -1, width + 1, height + 1, &plan.cubic, ahead()};
             fast_ = rectangle_;
         }
         isNear_ = geometry_.bias() == kernels::kFineBias &&
@@ -74,6 +74,15 @@ private:
         return slope * kMost <= kSourceRows    ? kMost
                : slope * kLeast >= kSourceRows ? kLeast
                                                : static_cast<int32_t>(kSourceRows / slope) / kLeast * kLeast;
+    }
+
+    /// Kernels prefetch for a row this far below; 0 where that is not worth an address.
+    ptrdiff_t ahead() const {
+        constexpr double kRows = 8, kMost = 1 << 28;
+        const double down = __builtin_rint(kRows * plan_.backward.yy),
+                     across = __builtin_rint(kRows * plan_.backward.xy);
+        const double bytes = down * images_.srcStep + across * images_.pixelBytes;
+        return __builtin_fabs(bytes) <= kMost ? static_cast<ptrdiff_t>(bytes) : 0;
     }
 
     void prepare(Row& row, int32_t y) {

@@ -47,9 +47,11 @@ struct Gray {
     }
 
     QORI_INLINE static void make(const uint8_t* origin, ptrdiff_t step, __m256i offsets, __m256i shifts,
-                                 __m256i weights, __m256 f, int n, uint8_t* dst) {
+                                 __m256i weights, __m256 f, ptrdiff_t ahead, int n, uint8_t* dst) {
         const __m256i top = sums(origin, offsets, shifts, weights),
                       bottom = sums(origin + step, offsets, shifts, weights);
+        prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(offsets)), ahead);
+        prefetchAhead(origin + _mm256_extract_epi32(offsets, 4), ahead);
         const __m256i first = inBothBlocks(_mm_setr_epi8(0, 4, 8, 12, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
         const __m256i packed = _mm256_permutevar8x32_epi32(_mm256_shuffle_epi8(mixRows(top, bottom, f), first),
                                                            _mm256_setr_epi32(0, 4, 1, 1, 1, 1, 1, 1));
@@ -98,7 +100,7 @@ struct Packed {
     }
 
     QORI_INLINE static void make(const uint8_t* origin, ptrdiff_t step, __m256i offsets, __m256i shifts,
-                                 __m256i weights, __m256 f, int n, uint8_t* dst) {
+                                 __m256i weights, __m256 f, ptrdiff_t ahead, int n, uint8_t* dst) {
         __m256i made[4];
         if constexpr (anywhere) {
             // Pixels 0, 1, 4, 5 and 2, 3, 6, 7.
@@ -113,6 +115,8 @@ struct Packed {
             alignas(kVectorBytes) int32_t at[8];
             qori::store(at, Vec<int32_t>{offsets});
             __asm__("" : "+m"(at));  // to be loaded: moves out of the vector would take the shuffles' ports
+            prefetchAhead(origin + at[0], ahead);
+            prefetchAhead(origin + at[4], ahead);
             made[0] = mix<0>(readBlocks(origin, step, at), false, weights, f);
             made[1] = mix<1>(readBlocks(origin, step, at + 1), false, weights, f);
             made[2] = mix<2>(readBlocks(origin, step, at + 2), false, weights, f);
@@ -145,7 +149,7 @@ void linearBytes(const WarpSource& source, const WarpLine& line, const WarpBox& 
     const auto across = horizontal<anywhere>(line, box);
     const auto down = vertical<anywhere>(line, box);
     const uint8_t* const origin = source.origin;
-    const ptrdiff_t apart = source.step;
+    const ptrdiff_t apart = source.step, ahead = source.ahead;
     const auto step = static_cast<int32_t>(apart);
     const __m256i lastWord = _mm256_set1_epi32((source.right + 1) * channels - Way::kWord);
     forEights(
@@ -158,7 +162,8 @@ void linearBytes(const WarpSource& source, const WarpLine& line, const WarpBox& 
                 offsets = _mm256_sub_epi32(offsets, surplus);
                 shifts = _mm256_slli_epi32(surplus, 3);
             }
-            Way::make(origin, apart, offsets, shifts, pairsOfWeights(x.fraction), toFraction(y.fraction), n, dst);
+            Way::make(origin, apart, offsets, shifts, pairsOfWeights(x.fraction), toFraction(y.fraction), ahead, n,
+                      dst);
             dst += n * channels;
         });
 }

@@ -40,6 +40,7 @@ struct WarpSource {
     ptrdiff_t step;
     int32_t left, top, right, bottom;  ///< The first and last columns and rows that may be.
     const CubicWeights* cubic;         ///< Of the cubic kernels.
+    ptrdiff_t ahead;                   ///< Bytes from a pixel to where the destination some rows below reads; a hint.
 };
 
 /// Makes count pixels from column first on. Positions are moved into the box where they leave it, unless the kernel
@@ -182,6 +183,13 @@ DoubleAxis verticalDoubles(const WarpLine& line, const WarpBox& box, double most
 
 QORI_INLINE int32_t clampIndex(int32_t index, int32_t first, int32_t last) {
     return index < first ? first : index > last ? last : index;
+}
+
+/// Has the line that will be read some rows later brought near: tilted rows cross many lines, in no order that the
+/// processor foresees.
+QORI_INLINE void prefetchAhead(const uint8_t* at, ptrdiff_t ahead) {
+    _mm_prefetch(reinterpret_cast<const char*>(reinterpret_cast<uintptr_t>(at) + static_cast<uintptr_t>(ahead)),
+                 _MM_HINT_T0);
 }
 
 /// A pixel of fixed size, moved.
