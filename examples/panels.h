@@ -24,5 +24,6 @@ std::span<const Panel> resizePanels();
 std::span<const Panel> statsPanels();
 std::span<const Panel> tablePanels();
 std::span<const Panel> thresholdPanels();
+std::span<const Panel> warpPanels();
 
 }  // namespace demo

@@ -6827,9 +6827,9 @@ QORI_API const QorLibraryVersion* QORI_CALL qoriGetLibVersion(void);
  *            and offsets in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
  *  Notes     With a = c00 c11 and b = c01 c10 a matrix is singular where |a| > 1e-200 and |(a - b) / a| <=
- *            1e-10, or where |a| <= 1e-200 and |b| <= 1e-10: a turn by 90 degrees that reduces by 1e-5 or more
- *            is refused with them. So is a matrix with a coefficient that is not finite, and one whose inverse
- *            is not. The query takes side flags on every border kind.
+ *            1e-10, or where |a| <= 1e-200 and |b| <= 1e-10: a turn by 90 degrees with a scale below 1e-5 is
+ *            refused with them. So is a matrix with a coefficient that is not finite, and one whose inverse is
+ *            not. The query takes side flags on every border kind.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a length below 1),
  *            QOR_ERR_DATA_TYPE (dataType not a QorDataType), QOR_ERR_INTERPOLATION (not nearest, linear or
  *            cubic), QOR_ERR_DIRECTION (warpDirection not 0 or 1), QOR_ERR_COEFFS (a singular matrix),
@@ -6977,7 +6977,8 @@ QORI_API QorResult QORI_CALL qoriWarpAffineNearest_64f_C4R(const double* pSrc, i
 
 /** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single.
  *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
- *  Elements  Fractions have 24 bits, 53 for 64f. Integers round to nearest, ties to even.
+ *  Elements  Fractions have 24 bits, 53 for 64f; for 8u 15 along rows and 23 down columns, so that a result is
+ *            off its rounding by 0.008 at most. Integers round to nearest, ties to even.
  *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
  *            and offsets in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.

@@ -106,7 +106,9 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_WEIGHT", QOR_ERR_WEIGHT},
                                 {"QOR_ERR_STEP_ALIGN", QOR_ERR_STEP_ALIGN},
                                 {"QOR_ERR_BORDER", QOR_ERR_BORDER},
-                                {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED}};
+                                {"QOR_ERR_CHANNELS_UNSUPPORTED", QOR_ERR_CHANNELS_UNSUPPORTED},
+                                {"QOR_ERR_DIRECTION", QOR_ERR_DIRECTION},
+                                {"QOR_ERR_COEFFS", QOR_ERR_COEFFS}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
 
