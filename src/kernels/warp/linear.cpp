@@ -76,6 +76,7 @@ void linearGray(const WarpSource& source, const WarpLine& line, const WarpBox& b
         first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
             const Places x = across.at(columns), y = down.at(columns);
             const __m256i offsets = offsetsOf<sizeof(T)>(x.whole, y.whole, step);
+            if constexpr (!anywhere) prefetchAhead(origin, offsets, source.ahead);
             const Pairs top = gatherPairs<T>(origin, offsets), bottom = gatherPairs<T>(below, offsets);
             const __m256 fx = toFloat(x.fraction), fy = toFloat(y.fraction);
             storeEight<T>(dst, mix(mix(top.left, bottom.left, fy), mix(top.right, bottom.right, fy), fx), n);
@@ -131,6 +132,7 @@ void linearPacked(const WarpSource& source, const WarpLine& line, const WarpBox&
         batch.prepare<pixelBytes>(across, down, static_cast<int32_t>(source.step), first, n);
         const auto pixel = [&](int i) __attribute__((always_inline)) {
             const uint8_t* p = source.origin + batch.offsets[i];
+            if (!anywhere && i % 2 == 0) prefetchAhead(p, source.ahead);
             const __m256 top = loadPair<T, channels, anywhere>(p);
             const __m256 bottom = loadPair<T, channels, anywhere>(p + source.step);
             const __m256 pair = mix(top, bottom, _mm256_broadcast_ss(batch.y + i));

@@ -50,8 +50,7 @@ struct Gray {
                                  __m256i weights, __m256 f, ptrdiff_t ahead, int n, uint8_t* dst) {
         const __m256i top = sums(origin, offsets, shifts, weights),
                       bottom = sums(origin + step, offsets, shifts, weights);
-        prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(offsets)), ahead);
-        prefetchAhead(origin + _mm256_extract_epi32(offsets, 4), ahead);
+        prefetchAhead(origin, offsets, ahead);
         const __m256i first = inBothBlocks(_mm_setr_epi8(0, 4, 8, 12, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
         const __m256i packed = _mm256_permutevar8x32_epi32(_mm256_shuffle_epi8(mixRows(top, bottom, f), first),
                                                            _mm256_setr_epi32(0, 4, 1, 1, 1, 1, 1, 1));

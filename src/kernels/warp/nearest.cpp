@@ -45,11 +45,13 @@ template <int pixelBytes, bool anywhere>
 struct Gather {
     const uint8_t* origin;
     int32_t step, lastWord;
+    ptrdiff_t ahead;
 
     QORI_INLINE explicit Gather(const WarpSource& source)
         : origin(source.origin),
           step(static_cast<int32_t>(source.step)),
-          lastWord((source.right + 1) * pixelBytes - kWord<pixelBytes>) {}
+          lastWord((source.right + 1) * pixelBytes - kWord<pixelBytes>),
+          ahead(source.ahead) {}
 
     QORI_INLINE void operator()(__m256i columns, __m256i rows, int n, uint8_t* dst) const {
         __m256i offsets = offsetsOf<pixelBytes>(columns, rows, step), shifts = _mm256_setzero_si256();
@@ -59,6 +61,7 @@ struct Gather {
             offsets = _mm256_sub_epi32(offsets, surplus);
             shifts = _mm256_slli_epi32(surplus, 3);
         }
+        if constexpr (!anywhere) prefetchAhead(origin, offsets, ahead);
         if constexpr (kWord<pixelBytes> == 4) {
             const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), offsets, 1);
             write<8>(_mm256_srlv_epi32(words, shifts), n, dst);
@@ -90,13 +93,17 @@ template <int pixelBytes>
 struct Moves {
     const uint8_t* origin;
     int32_t step;
+    ptrdiff_t ahead;
 
     QORI_INLINE explicit Moves(const WarpSource& source)
-        : origin(source.origin), step(static_cast<int32_t>(source.step)) {}
+        : origin(source.origin), step(static_cast<int32_t>(source.step)), ahead(source.ahead) {}
 
     QORI_INLINE void operator()(__m256i columns, __m256i rows, int n, uint8_t* dst) const {
         alignas(kVectorBytes) int32_t offsets[8];
         store(offsets, Vec<int32_t>{offsetsOf<pixelBytes>(columns, rows, step)});
+        __asm__("" : "+m"(offsets));  // to be loaded, not moved out of the vector
+        prefetchAhead(origin + offsets[0], ahead);
+        prefetchAhead(origin + offsets[4], ahead);
         for (int i = 0; i < n; ++i) movePixel<pixelBytes>(dst + i * pixelBytes, origin + offsets[i]);
     }
 };

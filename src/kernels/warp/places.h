@@ -192,6 +192,12 @@ QORI_INLINE void prefetchAhead(const uint8_t* at, ptrdiff_t ahead) {
                  _MM_HINT_T0);
 }
 
+/// For two of eight pixels, between which there are few lines at most angles.
+QORI_INLINE void prefetchAhead(const uint8_t* origin, __m256i offsets, ptrdiff_t ahead) {
+    prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(offsets)), ahead);
+    prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_extracti128_si256(offsets, 1)), ahead);
+}
+
 /// A pixel of fixed size, moved.
 template <int bytes>
 QORI_INLINE void movePixel(uint8_t* to, const uint8_t* from) {
