@@ -92,9 +92,9 @@ void run(const char* photoFile, const char* sheetFile, const char* fontFile) {
     const Picture photo = readPicture(photoFile);
     const Typeface type(fontFile);
     std::vector<Panel> panels;
-    for (const auto& family :
-         {copyPanels(), borderPanels(), arithPanels(), thresholdPanels(), tablePanels(), statsPanels(), filterPanels(),
-          morphologyPanels(), medianPanels(), resizePanels(), fourierPanels(), dctPanels(), matchingPanels(), featuresPanels()})
+    for (const auto& family : {copyPanels(), borderPanels(), arithPanels(), thresholdPanels(), tablePanels(),
+                               statsPanels(), filterPanels(), morphologyPanels(), medianPanels(), resizePanels(),
+                               warpPanels(), fourierPanels(), dctPanels(), matchingPanels(), featuresPanels()})
         panels.insert(panels.end(), family.begin(), family.end());
 
     const int rows = (static_cast<int>(panels.size()) + kColumns - 1) / kColumns;

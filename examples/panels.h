@@ -28,5 +28,6 @@ std::span<const Panel> thresholdPanels();
 std::span<const Panel> dctPanels();
 std::span<const Panel> matchingPanels();
 std::span<const Panel> featuresPanels();
+std::span<const Panel> warpPanels();
 
 }  // namespace demo

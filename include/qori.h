@@ -336,6 +336,11 @@ typedef struct QorHogConfig {
  *  memory: see Plans above. */
 typedef struct QorHogPlan QorHogPlan;
 
+/** An affine warp, in the caller's memory: as many bytes as qoriWarpAffineGetSize reports, at any address. The plan begins
+ *  at the next multiple of 64 and may be copied to a block whose address is equal modulo 64. Once filled it is only read:
+ *  any number of threads may use it at once. It is trusted memory: see Plans above. */
+typedef struct QorWarpPlan QorWarpPlan;
+
 /* ---- Arithmetic of two images --------------------------------------------------------------------------------- */
 
 /** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even.
@@ -8565,6 +8570,256 @@ QORI_API QorResult QORI_CALL qoriThresholdAdaptiveGauss_8u_C1IR(uint8_t* pSrcDst
  *  Returns   The same pointer on every call, never null. The record is constant: do not modify or free it.
  */
 QORI_API const QorLibraryVersion* QORI_CALL qoriGetLibVersion(void);
+
+/* ---- Affine warp ---------------------------------------------------------------------------------------------- */
+
+/** Reports how many bytes a plan and the buffer for its initialisation take (the latter for cubic plans only).
+ *  Elements  coeffs: c00, c01, c02, c10, c11, c12, which take (x, y) to (c00 x + c01 y + c02, c10 x + c11 y +
+ *            c12). warpDirection: 0 where they take source pixels to destination pixels, 1 where they take
+ *            destination pixels to source pixels. A pixel's position is that of its centre: the first is (0,
+ *            0).
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     With a = c00 c11 and b = c01 c10 a matrix is singular where |a| > 1e-200 and |(a - b) / a| <=
+ *            1e-10, or where |a| <= 1e-200 and |b| <= 1e-10: a turn by 90 degrees with a scale below 1e-5 is
+ *            refused with them. So is a matrix with a coefficient that is not finite, and one whose inverse is
+ *            not. The query takes side flags on every border kind.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (a length below 1),
+ *            QOR_ERR_DATA_TYPE (dataType not a QorDataType), QOR_ERR_INTERPOLATION (not nearest, linear or
+ *            cubic), QOR_ERR_DIRECTION (warpDirection not 0 or 1), QOR_ERR_COEFFS (a singular matrix),
+ *            QOR_ERR_BORDER (the kind is not 0, 1, 6 or 7), QOR_ERR_SIZE (source height of 2^30 and more for
+ *            8u, 2^29 for 16u and 16s, 2^28 for 32f, 2^27 for 64f); then nothing is written.
+ *  Example   const double turn[6] = {0.966, -0.259, 100, 0.259, 0.966, -40};   // source to destination
+ *            const double grey[3] = {128, 128, 128};
+ *            int32_t planBytes, initBytes, bufferBytes;
+ *            qoriWarpAffineGetSize(srcSize, dstSize, qor8u, turn, interpCubic, 0, borderConstant, &planBytes, &initBytes);
+ *            QorWarpPlan* plan = malloc(planBytes);
+ *            uint8_t* init = malloc(initBytes);
+ *            qoriWarpAffineCubicInit(srcSize, dstSize, qor8u, turn, 0, 3, 0.0, 0.5, borderConstant, grey, 0, plan, init);
+ *            qoriWarpGetBufferSize(plan, dstSize, &bufferBytes);
+ *            uint8_t* buffer = malloc(bufferBytes);
+ *            qoriWarpAffineCubic_8u_C3R(src, srcStep, dst, dstStep, (QorPoint2D){0, 0}, dstSize, plan, buffer);
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineGetSize(QorImageSize srcSize, QorImageSize dstSize, int32_t dataType,
+    const double coeffs[6], int32_t interpolation, int32_t warpDirection, int32_t borderType, int32_t* pPlanSize,
+    int32_t* pInitBufSize);
+
+/** Fills the plan of a warp by the nearest pixel. Arguments and statuses as for qoriWarpAffineLinearInit.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (coeffs or pPlan is null), QOR_ERR_SIZE (a length below 1),
+ *            QOR_ERR_DATA_TYPE (dataType not a QorDataType), QOR_ERR_DIRECTION (warpDirection not 0 or 1),
+ *            QOR_ERR_COEFFS (a singular matrix), QOR_ERR_BORDER (not borderConstant, borderReplicate,
+ *            borderReadAll or 7; side flags on the first two), QOR_ERR_NULL_PTR (borderConstant without a
+ *            value), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_UNSUPPORTED_MODE
+ *            (smoothEdge not 0), QOR_ERR_COEFFS (a source one pixel wide or high; one whose image has no area);
+ *            then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineNearestInit(QorImageSize srcSize, QorImageSize dstSize, int32_t dataType,
+    const double coeffs[6], int32_t warpDirection, int32_t numChannels, int32_t borderType, const double* pBorderValue,
+    int32_t smoothEdge, QorWarpPlan* pPlan);
+
+/** Fills the plan of a linear warp, for one element type and channel count.
+ *  Elements  borderConstant: destination pixels whose position is outside the source rectangle (first to last
+ *            pixel centre) get pBorderValue, numChannels doubles: rounded to nearest, ties to even, and
+ *            saturated for 8u, 16u and 16s (NaN gives the least value), as given for 32f and 64f.
+ *            borderReplicate: they get the nearest pixels. borderReadAll, and 7: they are not written. Taps
+ *            beyond the edge of positions inside are the nearest pixels; with borderReadAll they are read from
+ *            memory, as far as qoriWarpGetBorderSize says.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     Also returns QOR_WARN_WARP_EMPTY, with a plan that does nothing but return it, where borderReadAll
+ *            finds no destination pixel inside the source. smoothEdge must be 0. Without borderConstant
+ *            pBorderValue is not used and may be null. A map that takes pixels to pixels but for the rounding
+ *            of its coefficients (identity, whole shifts, quarter turns) moves them exactly.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (coeffs or pPlan is null), QOR_ERR_SIZE (a length below 1),
+ *            QOR_ERR_DATA_TYPE (dataType not a QorDataType), QOR_ERR_DIRECTION (warpDirection not 0 or 1),
+ *            QOR_ERR_COEFFS (a singular matrix), QOR_ERR_BORDER (not borderConstant, borderReplicate,
+ *            borderReadAll or 7; side flags on the first two), QOR_ERR_NULL_PTR (borderConstant without a
+ *            value), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_UNSUPPORTED_MODE
+ *            (smoothEdge not 0), QOR_ERR_COEFFS (a source one pixel wide or high; one whose image has no area);
+ *            then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineLinearInit(QorImageSize srcSize, QorImageSize dstSize, int32_t dataType,
+    const double coeffs[6], int32_t warpDirection, int32_t numChannels, int32_t borderType, const double* pBorderValue,
+    int32_t smoothEdge, QorWarpPlan* pPlan);
+
+/** Fills the plan of a cubic warp from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     valueB and valueC are not checked. Everything else as for qoriWarpAffineLinearInit.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (coeffs, pPlan or pInitBuf is null), QOR_ERR_SIZE (a length
+ *            below 1), QOR_ERR_DATA_TYPE (dataType not a QorDataType), QOR_ERR_DIRECTION (warpDirection not 0
+ *            or 1), QOR_ERR_COEFFS (a singular matrix), QOR_ERR_BORDER (not borderConstant, borderReplicate,
+ *            borderReadAll or 7; side flags on the first two), QOR_ERR_NULL_PTR (borderConstant without a
+ *            value), QOR_ERR_CHANNELS_UNSUPPORTED (numChannels not 1, 3 or 4), QOR_ERR_UNSUPPORTED_MODE
+ *            (smoothEdge not 0), QOR_ERR_COEFFS (a source one pixel wide or high; one whose image has no area);
+ *            then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineCubicInit(QorImageSize srcSize, QorImageSize dstSize, int32_t dataType,
+    const double coeffs[6], int32_t warpDirection, int32_t numChannels, double valueB, double valueC,
+    int32_t borderType, const double* pBorderValue, int32_t smoothEdge, QorWarpPlan* pPlan, uint8_t* pInitBuf);
+
+/** Reports how many bytes of work buffer a tile takes, at least 64; each thread needs a buffer of its own.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan of an affine
+ *            warp); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpGetBufferSize(const QorWarpPlan* pPlan, QorImageSize dstSize, int32_t* pBufSize);
+
+/** Reports the pixels around a position's own that the interpolation reads: cubic 1, 1, 2 and 2, else zeros.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     With borderReadAll a cubic warp reads as many columns and rows around the source.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_CONTEXT (no plan of an affine
+ *            warp); then nothing is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpGetBorderSize(const QorWarpPlan* pPlan, QorBorderExtent* pBorderSize);
+
+/** Warps a tile: each destination pixel is the source pixel nearest to its position, moved bit for bit.
+ *  Shapes    dstOffset and dstSize name the tile; pSrc points at the source's first pixel, pDst at the tile's.
+ *  Elements  Positions are computed per pixel from the plan, so that tiles join to the bytes of the whole, and
+ *            are right to 2^-31 pixel (sources of 2^19 columns or rows and more: 2^-19).
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     QOR_WARN_ADJUSTED where a part of the tile lay beyond the plan's destination and was left out;
+ *            QOR_WARN_WARP_EMPTY, and nothing is written, where the plan says so. Any number of threads may
+ *            make tiles by one plan.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan of this interpolation, element type and channel count),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (64f: row distances that are not multiples of
+ *            8), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_64f_C3R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineNearest_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+
+/** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single.
+ *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
+ *  Elements  Fractions have 24 bits, 53 for 64f; for 8u 15 along rows and 23 down columns, so that a result is
+ *            off its rounding by 0.008 at most. Integers round to nearest, ties to even.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     A source element that is not finite reaches every result whose 2 x 2 pixels hold it, whatever
+ *            their weights.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan of this interpolation, element type and channel count),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (64f: row distances that are not multiples of
+ *            8), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C3R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+
+/** Warps a tile by cubic filtering of 4 x 4 pixels: 64f in double precision, the others in single.
+ *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
+ *  Elements  Weights are computed in double precision. Integers round to nearest, ties to even, and saturate.
+ *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
+ *            and offsets in pixels.
+ *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
+ *  Notes     A source element that is not finite reaches every result whose 4 x 4 pixels hold it, whatever
+ *            their weights.
+ *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_WARN_NOTHING_TO_DO (width or
+ *            height is 0), QOR_ERR_CONTEXT (no plan of this interpolation, element type and channel count),
+ *            QOR_ERR_SIZE (width or height below 1), QOR_ERR_STEP (64f: row distances that are not multiples of
+ *            8), QOR_ERR_OUT_OF_RANGE (dstOffset is negative or outside the plan's destination); then nothing
+ *            is written.
+ */
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_8u_C1R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_8u_C3R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_8u_C4R(const uint8_t* pSrc, int32_t srcStep, uint8_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_16u_C1R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_16u_C3R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_16u_C4R(const uint16_t* pSrc, int32_t srcStep, uint16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_16s_C1R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_16s_C3R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_16s_C4R(const int16_t* pSrc, int32_t srcStep, int16_t* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_32f_C1R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_32f_C3R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_32f_C4R(const float* pSrc, int32_t srcStep, float* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_64f_C1R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_64f_C3R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
+QORI_API QorResult QORI_CALL qoriWarpAffineCubic_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
+    int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
 
 /* ---- Window sums ---------------------------------------------------------------------------------------------- */
 

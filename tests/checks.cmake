@@ -37,11 +37,13 @@ add_test(NAME companion COMMAND companion)
 
 # Tiles of one image made in several threads; the preset tsan watches them.
 find_package(Threads REQUIRED)
-add_executable(resize_threads checks/resize_threads.cpp)
-target_link_libraries(resize_threads PRIVATE qorik5_link qori_warnings Threads::Threads)
-target_link_options(resize_threads PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
-set_target_properties(resize_threads PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
-add_test(NAME resize_threads COMMAND resize_threads)
+foreach(family resize warp)
+    add_executable(${family}_threads checks/${family}_threads.cpp)
+    target_link_libraries(${family}_threads PRIVATE qorik5_link qori_warnings Threads::Threads)
+    target_link_options(${family}_threads PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
+    set_target_properties(${family}_threads PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
+    add_test(NAME ${family}_threads COMMAND ${family}_threads)
+endforeach()
 
 # The README's example is compiled and run as it stands there.
 set(readme ${PROJECT_SOURCE_DIR}/README.md)

@@ -111,7 +111,9 @@ constexpr Status kStatuses[] = {{"QOR_ERR_NULL_PTR", QOR_ERR_NULL_PTR},
                                 {"QOR_ERR_ORDER", QOR_ERR_ORDER},
                                 {"QOR_ERR_FLAG", QOR_ERR_FLAG},
                                 {"QOR_ERR_NO_MEMORY", QOR_ERR_NO_MEMORY},
-                                {"QOR_ERR_ALGORITHM", QOR_ERR_ALGORITHM}};
+                                {"QOR_ERR_ALGORITHM", QOR_ERR_ALGORITHM},
+                                {"QOR_ERR_DIRECTION", QOR_ERR_DIRECTION},
+                                {"QOR_ERR_COEFFS", QOR_ERR_COEFFS}};
 
 enum class Flaw { null, zeroSize, negativeSize, zeroStep };
 

@@ -252,6 +252,39 @@ const QorPoint2D* locations(Input& in) {
     return in.take<uint8_t>() >= 250 ? nullptr : points;
 }
 
+/// Turns, scales, shears and any doubles at all.
+const double* coefficients(Input& in) {
+    static double c[6];
+    for (double& v : c)
+        v = in.take<uint8_t>() % 8 == 0 ? in.take<double>() : static_cast<double>(in.take<int16_t>()) / 1024;
+    if (in.take<uint8_t>() % 2 == 0) {
+        c[0] = c[4] = 1;
+        c[1] = c[3] = 0;
+    }
+    return c;
+}
+
+/// A plan of any interpolation that is mostly for the type and channels of the export, or none where it is refused. The
+/// source is as large as the image may be.
+const QorWarpPlan* warpPlan(Input& in) {
+    static uint8_t init[64];
+    auto* plan = reinterpret_cast<QorWarpPlan*>(planMemory() + in.upTo(63));
+    const QorImageSize src{2 + in.upTo(kMostWidth), 2 + in.upTo(kMostHeight)}, dst = in.size();
+    const double* c = coefficients(in);
+    const double value[4] = {in.take<double>(), in.take<double>(), 3, 4};
+    const int32_t kind = in.upTo(2), direction = in.upTo(1), border = in.upTo(2) == 0 ? 6 : in.upTo(1),
+                  type = in.take<uint8_t>() % 16 == 0 ? qor8u : in.dataType,
+                  channels = in.take<uint8_t>() % 16 == 0 ? 4 : in.channels;
+    std::memset(planMemory(), 0, 1024);
+    if (kind == 2)
+        qoriWarpAffineCubicInit(src, dst, type, c, direction, channels, in.take<float>(), in.take<float>(), border,
+                                value, 0, plan, init);
+    else
+        (kind == 0 ? qoriWarpAffineNearestInit : qoriWarpAffineLinearInit)(src, dst, type, c, direction, channels,
+                                                                           border, value, 0, plan);
+    return plan;
+}
+
 template <class T>
 T argument(Input& in) {
     const bool isStep = std::exchange(in.stepFollows, false);
@@ -280,6 +313,8 @@ T argument(Input& in) {
     } else if constexpr (std::is_same_v<T, const QorPoint2D*>) {
         in.stepFollows = true;
         return locations(in);
+    } else if constexpr (std::is_same_v<T, const QorWarpPlan*>) {
+        return warpPlan(in);
     } else if constexpr (std::is_pointer_v<T> && std::is_pointer_v<std::remove_pointer_t<T>>) {
         // As many as the next integer may say, of four kinds.
         static uint8_t* planes[kMostStep];
@@ -298,11 +333,11 @@ T argument(Input& in) {
         // Anchors inside small kernels, offsets inside and outside small images; not every one is checked.
         return {in.upTo(5) - (in.upTo(9) == 0), in.upTo(5)};
     } else if constexpr (std::is_same_v<T, int32_t>) {
-        return isStep                        ? in.take<int16_t>() % kMostStep
-               : in.countsBits               ? in.take<int16_t>()
-               : in.countsReach              ? in.upTo(40) - 1
-               : in.isOrder                  ? in.upTo(9) - 1
-               : in.isAlgorithm              ? in.upTo(2) | in.upTo(2) << 8 | in.upTo(2) << 16 | (in.upTo(15) == 0 ? 3 : 0)
+        return isStep           ? in.take<int16_t>() % kMostStep
+               : in.countsBits  ? in.take<int16_t>()
+               : in.countsReach ? in.upTo(40) - 1
+               : in.isOrder     ? in.upTo(9) - 1
+               : in.isAlgorithm ? in.upTo(2) | in.upTo(2) << 8 | in.upTo(2) << 16 | (in.upTo(15) == 0 ? 3 : 0)
                : in.take<uint8_t>() % 4 == 0 ? in.take<int32_t>()
                : in.take<uint8_t>() % 2 == 0 ? in.upTo(5)  // codes and widths of frames
                                              : in.take<int8_t>();
@@ -314,8 +349,8 @@ T argument(Input& in) {
 bool isStatus(QorResult result) {
     return result == QOR_OK || result == QOR_WARN_DIV_BY_ZERO || result == QOR_WARN_LOG_ZERO ||
            result == QOR_WARN_LOG_NEGATIVE || result == QOR_WARN_NOTHING_TO_DO || result == QOR_WARN_ADJUSTED ||
-           result == QOR_WARN_EVEN_WEIGHT || (result <= QOR_ERR_BAD_ARG && result >= QOR_ERR_DIRECTION) ||
-           result == QOR_ERR_UNSUPPORTED_MODE;
+           result == QOR_WARN_EVEN_WEIGHT || result == QOR_WARN_WARP_EMPTY ||
+           (result <= QOR_ERR_BAD_ARG && result >= QOR_ERR_DIRECTION) || result == QOR_ERR_UNSUPPORTED_MODE;
 }
 
 template <class... Arguments>
@@ -349,6 +384,7 @@ template <class T>
 constexpr int32_t codeOf = std::is_same_v<T, uint16_t>  ? qor16u
                            : std::is_same_v<T, int16_t> ? qor16s
                            : std::is_same_v<T, float>   ? qor32f
+                           : std::is_same_v<T, double>  ? qor64f
                                                         : qor8u;
 
 enum Channels { C1 = 1, C2, C3, C4, AC4 = 4, P2 = 2, P3, P4, C3C = 3, C4C };

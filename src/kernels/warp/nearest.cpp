@@ -1,0 +1,165 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "nearest.h"
+
+#include "kernels/copy_rows.h"
+
+namespace qori::kernels {
+namespace {
+
+using namespace warp;
+
+/// Pixels of up to 8 bytes are gathered as words of 4 or 8, whose first bytes they are.
+template <int pixelBytes>
+constexpr int kWord = pixelBytes <= 4 ? 4 : 8;
+
+constexpr __m256i shufflePattern(auto byteAt) {
+    alignas(kVectorBytes) struct { uint8_t at[kVectorBytes]; } table{};
+    for (int i = 0; i < kVectorBytes; ++i) table.at[i] = static_cast<uint8_t>(byteAt(i % kBlockBytes));
+    return __builtin_bit_cast(__m256i, table);
+}
+
+/// Brings the first bytes of the words together, at the vector's beginning.
+template <int pixelBytes>
+QORI_INLINE Bytes packPixels(__m256i words) {
+    constexpr int word = kWord<pixelBytes>, inBlock = kBlockBytes / word * pixelBytes;
+    if constexpr (pixelBytes == word) return {words};
+    constexpr auto byteAt = [](int i) { return i < inBlock ? i / pixelBytes * word + i % pixelBytes : 0x80; };
+    const __m256i packed = _mm256_shuffle_epi8(words, shufflePattern(byteAt));
+    constexpr int words32 = inBlock / 4;  // of a block
+    const __m256i order = words32 == 1   ? _mm256_setr_epi32(0, 4, 1, 1, 1, 1, 1, 1)
+                          : words32 == 2 ? _mm256_setr_epi32(0, 1, 4, 5, 2, 2, 2, 2)
+                                         : _mm256_setr_epi32(0, 1, 2, 4, 5, 6, 3, 3);
+    return {_mm256_permutevar8x32_epi32(packed, order)};
+}
+
+template <int bytes>
+QORI_INLINE void storeFirst(uint8_t* dst, Bytes a) {
+    if constexpr (bytes == 32) return store(dst, a);
+    if constexpr (bytes >= 16) _mm_storeu_si128(reinterpret_cast<__m128i*>(dst), _mm256_castsi256_si128(a.v));
+    const __m128i rest = bytes >= 16 ? _mm256_extracti128_si256(a.v, 1) : _mm256_castsi256_si128(a.v);
+    if constexpr (bytes % 16 != 0) _mm_storel_epi64(reinterpret_cast<__m128i*>(dst + bytes / 16 * 16), rest);
+}
+
+/// Words that would end behind their row are read from further ahead, and shifted.
+template <int pixelBytes, bool anywhere>
+struct Gather {
+    const uint8_t* origin;
+    int32_t step, lastWord;
+    ptrdiff_t ahead;
+
+    QORI_INLINE explicit Gather(const WarpSource& source)
+        : origin(source.origin),
+          step(static_cast<int32_t>(source.step)),
+          lastWord((source.right + 1) * pixelBytes - kWord<pixelBytes>),
+          ahead(source.ahead) {}
+
+    QORI_INLINE void operator()(__m256i columns, __m256i rows, int n, uint8_t* dst) const {
+        __m256i offsets = offsetsOf<pixelBytes>(columns, rows, step), shifts = _mm256_setzero_si256();
+        if constexpr (anywhere && pixelBytes != kWord<pixelBytes>) {
+            const __m256i across = offsetsOf<pixelBytes>(columns, _mm256_setzero_si256(), 0);
+            const __m256i surplus = _mm256_max_epi32(_mm256_sub_epi32(across, _mm256_set1_epi32(lastWord)), shifts);
+            offsets = _mm256_sub_epi32(offsets, surplus);
+            shifts = _mm256_slli_epi32(surplus, 3);
+        }
+        if constexpr (!anywhere) prefetchAhead(origin, offsets, ahead);
+        if constexpr (kWord<pixelBytes> == 4) {
+            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), offsets, 1);
+            write<8>(_mm256_srlv_epi32(words, shifts), n, dst);
+        } else {
+            const auto half = [&](__m128i o, __m128i s) {
+                const __m256i words = _mm256_i32gather_epi64(reinterpret_cast<const long long*>(origin), o, 1);
+                return _mm256_srlv_epi64(words, _mm256_cvtepu32_epi64(s));
+            };
+            write<4>(half(_mm256_castsi256_si128(offsets), _mm256_castsi256_si128(shifts)), n, dst);
+            if (n > 4)
+                write<4>(half(_mm256_extracti128_si256(offsets, 1), _mm256_extracti128_si256(shifts, 1)), n - 4,
+                         dst + 4 * pixelBytes);
+        }
+    }
+
+private:
+    template <int pixels>
+    QORI_INLINE static void write(__m256i words, int n, uint8_t* dst) {
+        const Bytes packed = packPixels<pixelBytes>(words);
+        if (n >= pixels)
+            storeFirst<pixels * pixelBytes>(dst, packed);
+        else
+            storePartial(dst, packed, n * pixelBytes);
+    }
+};
+
+/// Larger pixels one by one.
+template <int pixelBytes>
+struct Moves {
+    const uint8_t* origin;
+    int32_t step;
+    ptrdiff_t ahead;
+
+    QORI_INLINE explicit Moves(const WarpSource& source)
+        : origin(source.origin), step(static_cast<int32_t>(source.step)), ahead(source.ahead) {}
+
+    QORI_INLINE void operator()(__m256i columns, __m256i rows, int n, uint8_t* dst) const {
+        alignas(kVectorBytes) int32_t offsets[8];
+        store(offsets, Vec<int32_t>{offsetsOf<pixelBytes>(columns, rows, step)});
+        __asm__("" : "+m"(offsets));  // to be loaded, not moved out of the vector
+        prefetchAhead(origin + offsets[0], ahead);
+        prefetchAhead(origin + offsets[4], ahead);
+        for (int i = 0; i < n; ++i) movePixel<pixelBytes>(dst + i * pixelBytes, origin + offsets[i]);
+    }
+};
+
+template <int pixelBytes, bool anywhere>
+void nearestRun(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
+                uint8_t* dst) {
+    if (!anywhere && line.alongX == 1 && line.alongY == 0) {
+        const auto x = static_cast<int32_t>(__builtin_floor(first + line.startX - kFineBias));
+        const auto y = static_cast<int32_t>(__builtin_floor(line.startY - kFineBias));
+        return copyRow(dst, source.origin + y * source.step + x * ptrdiff_t{pixelBytes}, count * ptrdiff_t{pixelBytes});
+    }
+    const auto across = horizontal<anywhere>(line, box);
+    const auto down = vertical<anywhere>(line, box);
+    using Way = std::conditional_t<pixelBytes <= 8, Gather<pixelBytes, anywhere>, Moves<pixelBytes>>;
+    const Way way(source);
+    forEights(
+        first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
+            way(across.at(columns).whole, down.at(columns).whole, n, dst);
+            dst += n * pixelBytes;
+        });
+}
+
+template <int pixelBytes>
+void nearestFar(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
+                uint8_t* dst) {
+    const DoubleAxis across{line.alongX, line.startX, line.bias, box.left, box.right, box.right};
+    const DoubleAxis down{line.alongY, line.startY, line.bias, box.top, box.bottom, box.bottom};
+    int32_t x[kBatch], y[kBatch];
+    double unused[kBatch];
+    for (int n; count > 0; count -= n, first += n) {
+        n = count < kBatch ? count : kBatch;
+        across.split(first, n, x, unused);
+        down.split(first, n, y, unused);
+        for (int i = 0; i < n; ++i, dst += pixelBytes)
+            movePixel<pixelBytes>(dst, nearestPixel<pixelBytes>(source, x[i], y[i]));
+    }
+}
+
+}  // namespace
+
+template <int pixelBytes>
+WarpKernels nearestKernels() {
+    constexpr int32_t behind = pixelBytes <= 8 ? (kWord<pixelBytes> - 1) / pixelBytes : 0;
+    return {nearestRun<pixelBytes, false>, nearestRun<pixelBytes, true>, nearestFar<pixelBytes>, 0, 0, behind, 0};
+}
+
+template WarpKernels nearestKernels<1>();
+template WarpKernels nearestKernels<2>();
+template WarpKernels nearestKernels<3>();
+template WarpKernels nearestKernels<4>();
+template WarpKernels nearestKernels<6>();
+template WarpKernels nearestKernels<8>();
+template WarpKernels nearestKernels<12>();
+template WarpKernels nearestKernels<16>();
+template WarpKernels nearestKernels<24>();
+template WarpKernels nearestKernels<32>();
+
+}  // namespace qori::kernels
