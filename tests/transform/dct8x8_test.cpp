@@ -196,6 +196,21 @@ TEST(Dct8x8, InverseWordsAroundTheEndOfTheLanes) {
     }
 }
 
+/// Rows that make a single large element: its products sum to 2^32, which 32 bits take for 0.
+TEST(Dct8x8, InverseOfRowsBeyond32Bits) {
+    for (int row : {1, 7})
+        for (int x = 0; x < 8; ++x)
+            for (int sign : {1, -1}) {
+                Words in{};
+                for (int u = 0; u < 8; ++u) {
+                    const double element = sign * 65536 / std::cos(std::acos(-1.0) / 16);
+                    const double coefficient = element * reference::CosineBasis(8)(u, x);
+                    in[static_cast<size_t>(8 * row + u)] = static_cast<int16_t>(reference::roundedWord(coefficient));
+                }
+                expectNear(reference::blockTransform(doubles(in), true), inverse(in), "element", x);
+            }
+}
+
 // --- accuracy of the inverse as IEEE 1180-1990 measures it ----------------------------------------------------------
 
 /// The standard's generator: integers from -low to high.
