@@ -7021,7 +7021,7 @@ QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C3R(const double* pSrc, in
 QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
 
-/** Warps a tile by cubic filtering of 4 x 4 pixels: 64f in double precision, the others in single.
+/** Warps a tile by cubic filtering of 4 x 4 pixels: 64f and 32f in double precision, integers in single.
  *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
  *  Elements  Weights are computed in double precision. Integers round to nearest, ties to even, and saturate.
  *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes

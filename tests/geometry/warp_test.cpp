@@ -197,7 +197,7 @@ void sweepWarp(const char* name, Function function, const std::vector<Method>& m
     for (int i = 0; i < kJobs && !testing::Test::HasFailure(); ++i)
         checkWarp<T, channels>(function, drawJob(methods[static_cast<size_t>(i) % methods.size()]));
     markSwept(name);
-    std::string init(name, std::strchr(name, '_'));
+    std::string init(name, static_cast<size_t>(std::strchr(name, '_') - name));
     init += "Init";
     for (const char* used : {init.c_str(), "qoriWarpAffineGetSize", "qoriWarpGetBufferSize"}) markSwept(used);
 }
