@@ -8732,8 +8732,8 @@ QORI_API QorResult QORI_CALL qoriWarpAffineNearest_64f_C4R(const double* pSrc, i
 
 /** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single.
  *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
- *  Elements  Fractions have 24 bits, 53 for 64f; for 8u 15 along rows and 23 down columns, so that a result is
- *            off its rounding by 0.008 at most. Integers round to nearest, ties to even.
+ *  Elements  Fractions have 24 bits, 53 for 64f and 15 for 8u, so that a result of bytes is off its rounding by
+ *            0.024 at most. Integers round to nearest, ties to even.
  *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
  *            and offsets in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
@@ -8776,7 +8776,7 @@ QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C3R(const double* pSrc, in
 QORI_API QorResult QORI_CALL qoriWarpAffineLinear_64f_C4R(const double* pSrc, int32_t srcStep, double* pDst,
     int32_t dstStep, QorPoint2D dstOffset, QorImageSize dstSize, const QorWarpPlan* pPlan, uint8_t* pBuffer);
 
-/** Warps a tile by cubic filtering of 4 x 4 pixels: 64f in double precision, the others in single.
+/** Warps a tile by cubic filtering of 4 x 4 pixels: 64f and 32f in double precision, integers in single.
  *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
  *  Elements  Weights are computed in double precision. Integers round to nearest, ties to even, and saturate.
  *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes

@@ -10,8 +10,13 @@ using namespace warp;
 
 constexpr int kTaps = 4;
 
+/// Floats too: sixteen roundings of sums that are larger than their result add up to more than 4 units in the last
+/// place.
 template <class T>
-using WeightOf = std::conditional_t<std::is_same_v<T, double>, double, float>;
+constexpr bool kInDoubles = std::is_floating_point_v<T>;
+
+template <class T>
+using WeightOf = std::conditional_t<kInDoubles<T>, double, float>;
 
 /// Whole parts and weights of up to kBatch pixels.
 template <class T>
@@ -35,7 +40,7 @@ private:
             __m256d w = _mm256_fmadd_pd(power(3), f, power(2));
             w = _mm256_fmadd_pd(w, f, power(1));
             w = _mm256_fmadd_pd(w, f, power(0));
-            if constexpr (std::is_same_v<T, double>)
+            if constexpr (kInDoubles<T>)
                 _mm256_store_pd(out[i], w);
             else
                 _mm_store_ps(out[i], _mm256_cvtpd_ps(w));
@@ -85,11 +90,15 @@ QORI_INLINE __m128 sumWindow(const uint8_t* p, ptrdiff_t step, const float* x, c
     }
 }
 
-/// Of doubles.
-template <int channels>
+/// The same in double precision.
+template <class T, int channels>
 QORI_INLINE __m256d sumDoubles(const uint8_t* p, ptrdiff_t step, const double* x, const double* y) {
     const auto at = [](const uint8_t* row, int element) __attribute__((always_inline)) {
-        return _mm256_loadu_pd(reinterpret_cast<const double*>(row) + element);
+        const T* const from = reinterpret_cast<const T*>(row) + element;
+        if constexpr (std::is_same_v<T, float>)
+            return _mm256_cvtps_pd(_mm_loadu_ps(from));
+        else
+            return _mm256_loadu_pd(from);
     };
     if constexpr (channels == 1) {
         __m256d sum = _mm256_mul_pd(at(p, 0), _mm256_broadcast_sd(y));
@@ -146,6 +155,20 @@ private:
     uint8_t memory_[anywhere ? 4 : 1][anywhere ? kTaps * kStep : 1];
 };
 
+/// The first n of four sums, n from 1 on.
+template <class T>
+QORI_INLINE void storeSums(uint8_t* dst, __m256d sums, int n) {
+    if constexpr (std::is_same_v<T, double>) {
+        storeUpTo(reinterpret_cast<double*>(dst), Vec<double>{sums}, n);
+    } else {
+        const __m128 floats = _mm256_cvtpd_ps(sums);
+        if (n == 4)
+            _mm_storeu_ps(reinterpret_cast<float*>(dst), floats);
+        else
+            storePartial(reinterpret_cast<float*>(dst), Vec<float>{_mm256_zextps128_ps256(floats)}, n);
+    }
+}
+
 /// One channel, four pixels at a time.
 template <class T, bool anywhere>
 void cubicGray(Windows<T, 1, anywhere>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
@@ -153,16 +176,16 @@ void cubicGray(Windows<T, 1, anywhere>& windows, const CubicBatch<T>& batch, int
         const auto sum = [&](int k) __attribute__((always_inline)) {
             const int at = i + k < n ? i + k : n - 1;
             const auto window = windows.at(batch.column[at], batch.row[at], k);
-            if constexpr (std::is_same_v<T, double>)
-                return sumDoubles<1>(window.first, window.step, batch.x[at], batch.y[at]);
+            if constexpr (kInDoubles<T>)
+                return sumDoubles<T, 1>(window.first, window.step, batch.x[at], batch.y[at]);
             else
                 return sumWindow<T, 1>(window.first, window.step, batch.x[at], batch.y[at]);
         };
         const auto a = sum(0), b = sum(1), c = sum(2), d = sum(3);
-        if constexpr (std::is_same_v<T, double>) {
+        if constexpr (kInDoubles<T>) {
             const __m256d low = _mm256_hadd_pd(a, b), high = _mm256_hadd_pd(c, d);  // a b a b, c d c d
             const __m256d crossed = _mm256_permute2f128_pd(low, high, 0x21), straight = _mm256_blend_pd(low, high, 12);
-            storeUpTo(reinterpret_cast<double*>(dst), Vec<double>{_mm256_add_pd(crossed, straight)}, n - i);
+            storeSums<T>(dst, _mm256_add_pd(crossed, straight), n - i < 4 ? n - i : 4);
         } else {
             const __m128i four = narrowFour<T>(clampTo<T>(_mm_hadd_ps(_mm_hadd_ps(a, b), _mm_hadd_ps(c, d))));
             if (n - i >= 4)
@@ -178,9 +201,9 @@ void cubicPacked(Windows<T, channels, anywhere>& windows, const CubicBatch<T>& b
     for (int i = 0; i < n; ++i, dst += channels * sizeof(T)) {
         const auto window = windows.at(batch.column[i], batch.row[i], 0);
         // Four elements at a time: the fourth of three is the next pixel's first, which is written next.
-        if constexpr (std::is_same_v<T, double>) {
-            const Vec<double> sum{sumDoubles<channels>(window.first, window.step, batch.x[i], batch.y[i])};
-            storeUpTo(reinterpret_cast<double*>(dst), sum, i + 1 < n ? 4 : channels);
+        if constexpr (kInDoubles<T>) {
+            const __m256d sum = sumDoubles<T, channels>(window.first, window.step, batch.x[i], batch.y[i]);
+            storeSums<T>(dst, sum, i + 1 < n ? 4 : channels);
         } else {
             const __m128 sum = sumWindow<T, channels>(window.first, window.step, batch.x[i], batch.y[i]);
             const __m128i pixel = narrowFour<T>(clampTo<T>(sum));

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Cubic filtering of 4 x 4 pixels: columns are summed first, then the row. Weights are computed in double precision;
-// sums are of doubles for doubles, else of floats.
+// sums are of doubles for floats and doubles, of floats for integers.
 #pragma once
 #include "kernels/cubic.h"
 #include "places.h"

@@ -6,30 +6,36 @@ namespace {
 
 using namespace warp;
 
-constexpr int32_t kSumOfWeights = 32767;
+/// Weights of the two pixels above and of the two below, as pairs of words: left, right. All four sum to 2^15.
+struct Weights {
+    __m256i top, bottom;
+};
 
-/// The words (32767 - f, f) of each fraction's upper 15 bits.
-QORI_INLINE __m256i pairsOfWeights(__m256i fraction) {
+constexpr int kWeightBits = 15;
+
+/// Fractions become odd multiples of 2^-15, so that none is 0 or 1 and each weight fits its word.
+QORI_INLINE Weights weightsOf(__m256i x, __m256i y) {
     const __m256i repeat =
         _mm256_broadcastsi128_si256(_mm_setr_epi8(2, 3, 2, 3, 6, 7, 6, 7, 10, 11, 10, 11, 14, 15, 14, 15));
-    const __m256i twice = _mm256_shuffle_epi8(_mm256_srli_epi32(fraction, 1), repeat);
-    return _mm256_xor_si256(twice, _mm256_set1_epi32(kSumOfWeights));
+    const auto odd = [&](__m256i fraction) __attribute__((always_inline)) {
+        return _mm256_or_si256(_mm256_shuffle_epi8(_mm256_srli_epi32(fraction, 1), repeat), _mm256_set1_epi16(1));
+    };
+    const __m256i across = _mm256_xor_si256(odd(x), _mm256_set1_epi32(0x7FFE));  // 2^15 - f, f
+    const __m256i above = _mm256_xor_si256(odd(y), _mm256_set1_epi16(0x7FFE));
+    const __m256i top = _mm256_mulhrs_epi16(across, above);
+    return {top, _mm256_sub_epi16(across, top)};
 }
 
-/// The upper 23 bits of a fraction.
-QORI_INLINE __m256 toFraction(__m256i fraction) {
-    const __m256 one = _mm256_set1_ps(1);
-    const __m256i raised = _mm256_or_si256(_mm256_srli_epi32(fraction, 9), _mm256_castps_si256(one));
-    return _mm256_sub_ps(_mm256_castsi256_ps(raised), one);
+/// The weighted pixels with the half that rounds.
+QORI_INLINE __m256i sumOf(__m256i top, __m256i topWeights, __m256i bottom, __m256i bottomWeights) {
+    const __m256i half = _mm256_set1_epi32(1 << (kWeightBits - 1));
+    const __m256i above = _mm256_add_epi32(_mm256_madd_epi16(top, topWeights), half);
+    return _mm256_add_epi32(above, _mm256_madd_epi16(bottom, bottomWeights));
 }
 
-/// top + f * (bottom - top) in the units of the weights, as a number in the low byte of each lane; the byte above is 0.
-QORI_INLINE __m256i mixRows(__m256i top, __m256i bottom, __m256 f) {
-    const __m256 above = _mm256_cvtepi32_ps(top), below = _mm256_cvtepi32_ps(bottom);
-    const __m256 sum = _mm256_fmadd_ps(f, _mm256_sub_ps(below, above), above);
-    // Rounded to a whole number where the mantissa ends.
-    const __m256 rounded = _mm256_fmadd_ps(sum, _mm256_set1_ps(1.0f / kSumOfWeights), _mm256_set1_ps(0x1p23f));
-    return _mm256_castps_si256(rounded);
+/// Of two sums, as words: the first in the lower half of each lane.
+QORI_INLINE __m256i joinSums(__m256i first, __m256i second) {
+    return _mm256_blend_epi16(_mm256_srli_epi32(first, kWeightBits), _mm256_slli_epi32(second, 16 - kWeightBits), 0xAA);
 }
 
 QORI_INLINE __m256i inBothBlocks(__m128i table) { return _mm256_broadcastsi128_si256(table); }
@@ -39,21 +45,21 @@ template <bool anywhere>
 struct Gray {
     static constexpr int kWord = 4;
 
-    QORI_INLINE static __m256i sums(const uint8_t* row, __m256i offsets, __m256i shifts, __m256i weights) {
+    QORI_INLINE static __m256i pairs(const uint8_t* row, __m256i offsets, __m256i shifts) {
         __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(row), offsets, 1);
         if constexpr (anywhere) words = _mm256_srlv_epi32(words, shifts);
         const __m256i widen = inBothBlocks(_mm_setr_epi8(0, -1, 1, -1, 4, -1, 5, -1, 8, -1, 9, -1, 12, -1, 13, -1));
-        return _mm256_madd_epi16(_mm256_shuffle_epi8(words, widen), weights);
+        return _mm256_shuffle_epi8(words, widen);
     }
 
     QORI_INLINE static void make(const uint8_t* origin, ptrdiff_t step, __m256i offsets, __m256i shifts,
-                                 __m256i weights, __m256 f, ptrdiff_t ahead, int n, uint8_t* dst) {
-        const __m256i top = sums(origin, offsets, shifts, weights),
-                      bottom = sums(origin + step, offsets, shifts, weights);
+                                 Weights weights, ptrdiff_t ahead, int n, uint8_t* dst) {
+        const __m256i top = pairs(origin, offsets, shifts), bottom = pairs(origin + step, offsets, shifts);
         prefetchAhead(origin, offsets, ahead);
-        const __m256i first = inBothBlocks(_mm_setr_epi8(0, 4, 8, 12, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
-        const __m256i packed = _mm256_permutevar8x32_epi32(_mm256_shuffle_epi8(mixRows(top, bottom, f), first),
-                                                           _mm256_setr_epi32(0, 4, 1, 1, 1, 1, 1, 1));
+        const __m256i sum = _mm256_slli_epi32(sumOf(top, weights.top, bottom, weights.bottom), 16 - kWeightBits);
+        const __m256i third = inBothBlocks(_mm_setr_epi8(2, 6, 10, 14, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
+        const __m256i packed =
+            _mm256_permutevar8x32_epi32(_mm256_shuffle_epi8(sum, third), _mm256_setr_epi32(0, 4, 1, 1, 1, 1, 1, 1));
         if (n == 8)
             _mm_storel_epi64(reinterpret_cast<__m128i*>(dst), _mm256_castsi256_si128(packed));
         else
@@ -86,43 +92,41 @@ struct Packed {
         return {at(origin), at(origin + step)};
     }
 
-    /// Four channels of either pixel, as mixRows leaves them.
+    /// Sums of four channels of either pixel.
     template <int k>
-    QORI_INLINE static __m256i mix(Words words, bool isHigh, __m256i weights, __m256 f) {
+    QORI_INLINE static __m256i mix(Words words, bool isHigh, Weights weights) {
         constexpr char c = channels;
         const __m256i low = inBothBlocks(_mm_setr_epi8(0, -1, c, -1, 1, -1, c + 1, -1, 2, -1, c + 2, -1, 3, -1, 7, -1));
         const __m256i widen = isHigh ? _mm256_add_epi8(low, inBothBlocks(_mm_set1_epi16(8))) : low;
-        const __m256i own = _mm256_shuffle_epi32(weights, 0x55 * k);
-        return mixRows(_mm256_madd_epi16(_mm256_shuffle_epi8(words.top, widen), own),
-                       _mm256_madd_epi16(_mm256_shuffle_epi8(words.bottom, widen), own),
-                       _mm256_permute_ps(f, 0x55 * k));
+        return sumOf(_mm256_shuffle_epi8(words.top, widen), _mm256_shuffle_epi32(weights.top, 0x55 * k),
+                     _mm256_shuffle_epi8(words.bottom, widen), _mm256_shuffle_epi32(weights.bottom, 0x55 * k));
     }
 
     QORI_INLINE static void make(const uint8_t* origin, ptrdiff_t step, __m256i offsets, __m256i shifts,
-                                 __m256i weights, __m256 f, ptrdiff_t ahead, int n, uint8_t* dst) {
+                                 Weights weights, ptrdiff_t ahead, int n, uint8_t* dst) {
         __m256i made[4];
         if constexpr (anywhere) {
             // Pixels 0, 1, 4, 5 and 2, 3, 6, 7.
             const __m256i at = _mm256_permute4x64_epi64(offsets, 0xD8), by = _mm256_permute4x64_epi64(shifts, 0xD8);
             const Words first = gather(origin, step, _mm256_castsi256_si128(at), _mm256_castsi256_si128(by));
             const Words last = gather(origin, step, _mm256_extracti128_si256(at, 1), _mm256_extracti128_si256(by, 1));
-            made[0] = mix<0>(first, false, weights, f);
-            made[1] = mix<1>(first, true, weights, f);
-            made[2] = mix<2>(last, false, weights, f);
-            made[3] = mix<3>(last, true, weights, f);
+            made[0] = mix<0>(first, false, weights);
+            made[1] = mix<1>(first, true, weights);
+            made[2] = mix<2>(last, false, weights);
+            made[3] = mix<3>(last, true, weights);
         } else {
             alignas(kVectorBytes) int32_t at[8];
             qori::store(at, Vec<int32_t>{offsets});
             __asm__("" : "+m"(at));  // to be loaded: moves out of the vector would take the shuffles' ports
             prefetchAhead(origin + at[0], ahead);
             prefetchAhead(origin + at[4], ahead);
-            made[0] = mix<0>(readBlocks(origin, step, at), false, weights, f);
-            made[1] = mix<1>(readBlocks(origin, step, at + 1), false, weights, f);
-            made[2] = mix<2>(readBlocks(origin, step, at + 2), false, weights, f);
-            made[3] = mix<3>(readBlocks(origin, step, at + 3), false, weights, f);
+            made[0] = mix<0>(readBlocks(origin, step, at), false, weights);
+            made[1] = mix<1>(readBlocks(origin, step, at + 1), false, weights);
+            made[2] = mix<2>(readBlocks(origin, step, at + 2), false, weights);
+            made[3] = mix<3>(readBlocks(origin, step, at + 3), false, weights);
         }
-        const __m256i low = _mm256_blend_epi16(made[0], _mm256_slli_epi32(made[1], 16), 0xAA);
-        const __m256i high = _mm256_blend_epi16(made[2], _mm256_slli_epi32(made[3], 16), 0xAA);
+        const __m256i low = joinSums(made[0], made[1]);
+        const __m256i high = joinSums(made[2], made[3]);
         // In a block now: channel by channel the pixels 0, 2, 1, 3.
         const __m256i bytes = _mm256_or_si256(low, _mm256_slli_epi16(high, 8));
         constexpr char x = -1;
@@ -161,8 +165,7 @@ void linearBytes(const WarpSource& source, const WarpLine& line, const WarpBox& 
                 offsets = _mm256_sub_epi32(offsets, surplus);
                 shifts = _mm256_slli_epi32(surplus, 3);
             }
-            Way::make(origin, apart, offsets, shifts, pairsOfWeights(x.fraction), toFraction(y.fraction), ahead, n,
-                      dst);
+            Way::make(origin, apart, offsets, shifts, weightsOf(x.fraction, y.fraction), ahead, n, dst);
             dst += n * channels;
         });
 }

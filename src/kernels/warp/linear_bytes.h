@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-// Linear interpolation of bytes: along rows with weights of 15 bits, which sum to 32767, down columns in single
-// precision with fractions of 23. Sums of a row are at most 255 * 32767 < 2^23, so floats hold them exactly; what is
-// lost before the last rounding are 2^-16 of the difference between neighbours at most.
+// Linear interpolation of bytes: one sum of four pixels in integers. Fractions are odd multiples of 2^-15, off by 2^-15
+// at most; weights are rounded to 2^-15 such that the two of a column sum to the column's and all four to 1. A result
+// is therefore off its rounding by 255 * 3 * 2^-15 < 0.024 at most. Sums are at most 255 * 2^15 + 2^14 < 2^23.
 #pragma once
 #include "places.h"
 
