@@ -67,6 +67,8 @@ void forSizes(bool isMain, Check check) {
                               {40, 128},
                               {3, 1201},
                               {1, 2309},
+                              {193, 2},
+                              {2, 149},
                               {89, 3}})
         check(size);
 }
