@@ -35,9 +35,9 @@ target_link_options(companion PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
 set_target_properties(companion PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 add_test(NAME companion COMMAND companion)
 
-# Tiles of one image made in several threads; the preset tsan watches them.
+# Several threads with one plan, on tiles of one image or on images of their own; the preset tsan watches them.
 find_package(Threads REQUIRED)
-foreach(family resize warp)
+foreach(family resize warp dft)
     add_executable(${family}_threads checks/${family}_threads.cpp)
     target_link_libraries(${family}_threads PRIVATE qorik5_link qori_warnings Threads::Threads)
     target_link_options(${family}_threads PRIVATE $<$<PLATFORM_ID:Windows>:-static>)
