@@ -10,7 +10,7 @@ template <class T>
 QORI_INLINE __m128 loadFour(const uint8_t* p) {
     if constexpr (std::is_same_v<T, float>) return _mm_loadu_ps(reinterpret_cast<const float*>(p));
     if constexpr (sizeof(T) == 1)
-        return _mm_cvtepi32_ps(_mm_cvtepu8_epi32(_mm_cvtsi32_si128(detail::loadWord<int32_t>(p))));
+        return _mm_cvtepi32_ps(_mm_cvtepu8_epi32(_mm_cvtsi32_si128(qori::detail::loadWord<int32_t>(p))));
     const __m128i words = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(p));
     return _mm_cvtepi32_ps(std::is_signed_v<T> ? _mm_cvtepi16_epi32(words) : _mm_cvtepu16_epi32(words));
 }
@@ -41,12 +41,12 @@ QORI_INLINE __m256 loadSix(const uint8_t* p) {
         const __m128 high = _mm_loadu_ps(reinterpret_cast<const float*>(p + two));
         return _mm256_insertf128_ps(_mm256_castps128_ps256(low), _mm_movehl_ps(high, high), 1);
     } else if constexpr (sizeof(T) == 1) {
-        const __m128i low = _mm_cvtsi32_si128(detail::loadWord<int32_t>(p));
-        const __m128i high = _mm_cvtsi32_si128(detail::loadWord<uint16_t>(p + 4));
+        const __m128i low = _mm_cvtsi32_si128(qori::detail::loadWord<int32_t>(p));
+        const __m128i high = _mm_cvtsi32_si128(qori::detail::loadWord<uint16_t>(p + 4));
         return widenEight<T>(_mm_unpacklo_epi32(low, high));
     } else {
         const __m128i low = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(p));
-        const __m128i high = _mm_cvtsi32_si128(detail::loadWord<int32_t>(p + 8));
+        const __m128i high = _mm_cvtsi32_si128(qori::detail::loadWord<int32_t>(p + 8));
         return widenEight<T>(_mm_unpacklo_epi64(low, high));
     }
 }
@@ -69,7 +69,7 @@ QORI_INLINE void storeFirst(uint8_t* dst, __m128i elements) {
     if constexpr (bytes == 16)
         _mm_storeu_si128(reinterpret_cast<__m128i*>(dst), elements);
     else
-        detail::storeBelow16(dst, elements, bytes);
+        qori::detail::storeBelow16(dst, elements, bytes);
 }
 
 /// Holds weighted sums to what T can have, so that their conversion does not overflow.

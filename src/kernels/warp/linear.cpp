@@ -59,7 +59,7 @@ QORI_INLINE void storeEight(uint8_t* dst, __m256 v, int n) {
         const __m128i low = _mm256_castsi256_si128(whole), high = _mm256_extracti128_si256(whole, 1);
         const __m128i packed = std::is_signed_v<T> ? _mm_packs_epi32(low, high) : _mm_packus_epi32(low, high);
         if (n < 8)
-            detail::storeBelow16(dst, packed, n * static_cast<int>(sizeof(T)));
+            qori::detail::storeBelow16(dst, packed, n * static_cast<int>(sizeof(T)));
         else
             _mm_storeu_si128(reinterpret_cast<__m128i*>(dst), packed);
     }
@@ -219,11 +219,11 @@ void linearFar(const WarpSource& source, const WarpLine& line, const WarpBox& bo
             const auto fx = static_cast<float>(x[i]), fy = static_cast<float>(y[i]);
             for (int c = 0; c < channels; ++c) {
                 const auto element = [=](const uint8_t* pixel) {
-                    return static_cast<float>(detail::loadWord<T>(pixel + c * static_cast<int>(sizeof(T))));
+                    return static_cast<float>(qori::detail::loadWord<T>(pixel + c * static_cast<int>(sizeof(T))));
                 };
                 const float left = mix(element(p), element(p + source.step), fy);
                 const float right = mix(element(p + pixelBytes), element(p + pixelBytes + source.step), fy);
-                detail::storeWord(dst + c * static_cast<int>(sizeof(T)), roundTo<T>(mix(left, right, fx)));
+                qori::detail::storeWord(dst + c * static_cast<int>(sizeof(T)), roundTo<T>(mix(left, right, fx)));
             }
         }
     }
