@@ -113,7 +113,7 @@ inline std::vector<Shape> extremeShapes() {
     return shapes;
 }
 
-/// Wide enough for several tiles of columns.
+/// Wide enough for several tiles of columns, of float pixels of three and four channels.
 constexpr Shape kTiled{.width = 2500, .height = 9, .padding = 7};
 
 }  // namespace qori::test
