@@ -107,7 +107,7 @@ private:
     }
     void runsAlong(const S* sums, T* to, ptrdiff_t elements) const {
         if constexpr (sizeof(S) == 2 && n == 1)
-            kernels::acrossPairs(sums, job_.mask.width, to, elements, kernels::FloatMean(job_.area()));
+            kernels::acrossPairs(sums, job_.mask.width, to, elements, job_.area());
         else
             kernels::acrossRunning<n, keepAlpha>(sums, job_.mask.width, to, elements, rule_);
     }
