@@ -157,6 +157,16 @@ TEST(Box, BytesChangeByAllThatTheyCan) {
     }
 }
 
+/// Rows of three channels run in pieces of two halves, from some width on.
+TEST(Box, ThreeChannelsOfAnyWidth) {
+    for (const int width : {63, 64, 65, 79, 80, 100, 511, 512, 513, 600, 1030})
+        for (const QorImageSize mask : {QorImageSize{9, 9}, QorImageSize{8, 40}, QorImageSize{67, 3}}) {
+            const Shape shape{.width = width, .height = 3, .padding = width % 7};
+            checkBox<uint8_t, Layout::C3, Kind::R>(shape, mask, drawAnchor(mask), qoriFilterBox_8u_C3R);
+            checkBox<uint8_t, Layout::C3, Kind::IR>(shape, mask, drawAnchor(mask), qoriFilterBox_8u_C3IR);
+        }
+}
+
 /// Sums beyond 2^24, 2^31 and 2^32: single windows of a constant with one other element.
 template <class T, class Function>
 void checkLarge(Function function, QorImageSize mask, T value) {
