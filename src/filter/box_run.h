@@ -5,6 +5,7 @@
 #include "box_chain.h"
 #include "box_sums.h"
 #include "kernels/box/across.h"
+#include "kernels/box/halves.h"
 #include "strips.h"
 
 namespace qori::filter {
@@ -106,8 +107,12 @@ private:
         runsAlong(sums, to, elements);
     }
     void runsAlong(const S* sums, T* to, ptrdiff_t elements) const {
+        if constexpr (sizeof(S) == 2 && n == 3)
+            if (job_.mask.height <= kernels::kRowsInHalves && elements >= kernels::kLeastForHalves &&
+                int64_t{job_.src.size.height} * elements <= kernels::kMostBytesInHalves)
+                return kernels::acrossHalves(sums, job_.mask.width, job_.area(), to, elements);
         if constexpr (sizeof(S) == 2 && n == 1)
-            kernels::acrossPairs(sums, job_.mask.width, to, elements, kernels::FloatMean(job_.area()));
+            kernels::acrossPairs(sums, job_.mask.width, to, elements, job_.area());
         else
             kernels::acrossRunning<n, keepAlpha>(sums, job_.mask.width, to, elements, rule_);
     }

@@ -123,6 +123,50 @@ TEST(Box, BytesRoundEverySumOfTheSquare) {
     EXPECT_EQ(0, wrong);
 }
 
+/// Columns of zeros and of 255, as many as a window has: sums change by all that they can, and reach all of 255.
+template <int channels, class Function>
+void checkSteepest(Function function, QorImageSize mask) {
+    SCOPED_TRACE(testing::Message() << channels << " channels, mask " << mask.width << "x" << mask.height);
+    const auto valueAt = [=](int x) { return x / mask.width % 2 == 0 ? 0 : 255; };
+    const int width = 2 * mask.width + 210;
+    const TestImage src(0, {.width = width + mask.width - 1, .height = mask.height + 1}, channels),
+        dst(1, {.width = width, .height = 2}, channels);
+    for (int y = 0; y <= mask.height; ++y)
+        for (int x = 0; x < width + mask.width - 1; ++x)
+            for (int c = 0; c < channels; ++c)
+                src.view<uint8_t>(channels).set(x, y, c, static_cast<uint8_t>(valueAt(x + c)));
+    ASSERT_EQ(QOR_OK, call(function, src.data<const uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(),
+                           QorImageSize{width, 2}, mask, QorPoint2D{0, 0}));
+    int wrong = 0;
+    for (int x = 0; x < width; ++x)
+        for (int c = 0; c < channels; ++c) {
+            int64_t sum = 0;
+            for (int i = 0; i < mask.width; ++i) sum += int64_t{valueAt(x + c + i)} * mask.height;
+            const int mean = reference::meanOf<uint8_t>(sum, int64_t{mask.width} * mask.height);
+            for (int y = 0; y < 2; ++y) wrong += dst.view<uint8_t>(channels).get(x, y, c) != mean;
+        }
+    EXPECT_EQ(0, wrong);
+}
+
+TEST(Box, BytesChangeByAllThatTheyCan) {
+    for (const QorImageSize mask : {QorImageSize{9, 64}, QorImageSize{9, 65}, QorImageSize{20, 128},
+                                    QorImageSize{700, 46}, QorImageSize{700, 48}, QorImageSize{700, 66}}) {
+        checkSteepest<1>(qoriFilterBox_8u_C1R, mask);
+        checkSteepest<3>(qoriFilterBox_8u_C3R, mask);
+        checkSteepest<4>(qoriFilterBox_8u_C4R, mask);
+    }
+}
+
+/// Rows of three channels run in pieces of two halves, from some width on.
+TEST(Box, ThreeChannelsOfAnyWidth) {
+    for (const int width : {63, 64, 65, 79, 80, 100, 511, 512, 513, 600, 1030})
+        for (const QorImageSize mask : {QorImageSize{9, 9}, QorImageSize{8, 40}, QorImageSize{67, 3}}) {
+            const Shape shape{.width = width, .height = 3, .padding = width % 7};
+            checkBox<uint8_t, Layout::C3, Kind::R>(shape, mask, drawAnchor(mask), qoriFilterBox_8u_C3R);
+            checkBox<uint8_t, Layout::C3, Kind::IR>(shape, mask, drawAnchor(mask), qoriFilterBox_8u_C3IR);
+        }
+}
+
 /// Sums beyond 2^24, 2^31 and 2^32: single windows of a constant with one other element.
 template <class T, class Function>
 void checkLarge(Function function, QorImageSize mask, T value) {

@@ -60,8 +60,8 @@ inline QorPoint2D drawAnchor(QorImageSize size) {
     return {along(size.width), along(size.height)};
 }
 
-/// Full rectangles, lines, rectangles inside empty margins, crosses, frames, ellipses, rows of runs, noise of any
-/// density: all that a mask can be taken for.
+/// Full rectangles, lines, rectangles and squares inside empty margins, crosses, frames, ellipses, rows of runs, noise
+/// of any density: all that a mask can be taken for.
 inline Mask drawMask(QorImageSize largest) {
     const QorImageSize size{1 + random().below(largest.width), 1 + random().below(largest.height)};
     const int w = size.width, h = size.height, x0 = random().below(w), y0 = random().below(h);
@@ -77,6 +77,7 @@ inline Mask drawMask(QorImageSize largest) {
         [=](int x, int y) { return x == 0 || y == 0 || x == w - 1 || y == h - 1; },
         [=](int x, int y) { return std::hypot((x + 0.5) / w - 0.5, (y + 0.5) / h - 0.5) <= 0.5; },
         [=](int x, int y) { return x == x0 && y == y0; },
+        [=](int x, int y) { return x >= x0 && x < x0 + 3 && y >= y0 && y < y0 + 3; },
         [=](int x, int y) { return (x / (1 + density) + y) % 2 == 0; },
         [=](int, int) { return random().below(8) < density; },
     };
@@ -112,7 +113,7 @@ inline std::vector<Shape> extremeShapes() {
     return shapes;
 }
 
-/// Wide enough for several tiles of columns.
+/// Wide enough for several tiles of columns, of float pixels of three and four channels.
 constexpr Shape kTiled{.width = 2500, .height = 9, .padding = 7};
 
 }  // namespace qori::test

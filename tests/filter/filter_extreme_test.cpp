@@ -38,6 +38,9 @@ void sweepRectangles(const char* name, Function function) {
     forShapes(extremeShapes(), [=](const Shape& shape) {
         check(shape, {8, 8});
         check(shape, {random().oneIn(4) ? 67 : 12, random().oneIn(4) ? 37 : 9});
+        const Mask square = rectangle({3, 3}, random().oneIn(2) ? QorPoint2D{1, 1} : drawAnchor({3, 3}));
+        checkRectangle<T, L, Kind::R, largest>(shape, square, function);
+        checkRectangle<T, L, Kind::IR, largest>(shape, square, function);
     });
     checkRectangle<T, L, Kind::R, largest>(kTiled, rectangle({5, 9}, {1, 8}), function);
     checkRectangle<T, L, Kind::R, largest>(kTiled, rectangle({30, 3}, {0, 0}), function);
@@ -104,6 +107,10 @@ TEST(FilterExtreme, WorksOnWithoutMemory) {
     const Shape shape{.width = 2000, .height = 5};
     qorTestFailAllocation(1);
     checkRectangle<uint8_t, Layout::C1, Kind::R, true>(shape, mask, qoriFilterMax_8u_C1R);
+    qorTestFailAllocation(0);
+    qorTestFailAllocation(1);
+    checkRectangle<uint8_t, Layout::C1, Kind::IR, true>({.width = 90, .height = 5}, rectangle({3, 3}, {1, 1}),
+                                                        qoriFilterMax_8u_C1R);
     qorTestFailAllocation(0);
     const TestImage image(0, {.width = 2000, .height = 1200}, 1), dst(1, {.width = 100, .height = 1}, 1);
     image.fill<uint8_t>(1, AnyValue<uint8_t>{});

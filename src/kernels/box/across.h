@@ -131,11 +131,14 @@ void alongRow(const S* row, ptrdiff_t columns, T* dst, ptrdiff_t elements, Rule 
     runAlong<channels, false, false>(row, columns * channels, first, dst + channels, elements - channels, rule);
 }
 
-/// As acrossRunning for bytes of one channel and columns below 2^15: two windows per lane.
-QORI_NOINLINE inline void acrossPairs(const uint16_t* sums, ptrdiff_t columns, uint8_t* dst, ptrdiff_t elements,
-                                      FloatMean rule) {
+namespace detail {
+
+/// `inUnits`: sums lie on top of the bits of 2^23 as a float, which saves their conversion.
+template <bool inUnits>
+QORI_NOINLINE void runPairs(const uint16_t* sums, ptrdiff_t columns, uint8_t* dst, ptrdiff_t elements, FloatMean rule) {
     const uint16_t* const before = sums - 1;
-    __m256i carry = detail::firstSums<1>(sums, columns - 1).v;
+    __m256i carry = firstSums<1>(sums, columns - 1).v;
+    if constexpr (inUnits) carry = _mm256_add_epi32(carry, _mm256_set1_epi32(kUnitsBits << 16));
     const __m256i both = _mm256_set1_epi32(0x00010001), second = _mm256_set1_epi32(0x00010000);
     forVectors<uint8_t>(
         elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
@@ -149,9 +152,21 @@ QORI_NOINLINE inline void acrossPairs(const uint16_t* sums, ptrdiff_t columns, u
                 even[v] = _mm256_sub_epi32(odd[v], _mm256_madd_epi16(change, second));
                 carry = lastOfChannels<1>(Vec<uint32_t>{odd[v]}).v;
             }
-            const auto mean = [&](__m256i s) __attribute__((always_inline)) { return rule.mean(Vec<uint32_t>{s}); };
-            storeUpTo(dst + i, detail::packPairs(mean(even[0]), mean(odd[0]), mean(even[1]), mean(odd[1])), count);
+            const auto mean = [&](__m256i s) __attribute__((always_inline)) {
+                return inUnits ? rule.meanOfUnits(s) : rule.mean(Vec<uint32_t>{s});
+            };
+            storeUpTo(dst + i, packPairs(mean(even[0]), mean(odd[0]), mean(even[1]), mean(odd[1])), count);
         });
+}
+
+}  // namespace detail
+
+/// As acrossRunning for bytes of one channel and columns below 2^15: two windows per lane.
+inline void acrossPairs(const uint16_t* sums, ptrdiff_t columns, uint8_t* dst, ptrdiff_t elements, int64_t area) {
+    if (area <= kMostInUnits)
+        detail::runPairs<true>(sums, columns, dst, elements, FloatMean(area));
+    else
+        detail::runPairs<false>(sums, columns, dst, elements, FloatMean(area));
 }
 
 }  // namespace qori::kernels

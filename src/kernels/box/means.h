@@ -53,6 +53,9 @@ private:
     }
 };
 
+/// The largest area whose sums of bytes the units of 2^23 hold.
+inline constexpr int64_t kMostInUnits = (1 << 23) / 255;
+
 /// Bytes: the sum as a float times the float reciprocal of the area, to nearest, ties to even. For odd areas below
 /// 8,000 this is the exact quotient's rounding: the product is off by less than 255 * 2^-23 = 3.1e-5 and the quotient
 /// stays 1 / (2 area) from the half.
