@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // Medians of rectangles over rows that exist: which way a mask goes, and in which pieces.
 #pragma once
-#include "frame/plan.h"
 #include "kernels/median/histograms.h"
 #include "kernels/median/ordinals.h"
 #include "kernels/median/search.h"
 #include "kernels/median/square5.h"
 #include "kernels/median/windows.h"
+#include "median_tiles.h"
 
 namespace qori::filter {
 
@@ -46,18 +46,6 @@ void medianByNetwork(QorImageSize mask, Source source, T* const* dst, int32_t ro
     if (rows == 4) return kernels::medianSquare3<4, keepAlpha>(src, dst, elements, apart);
     for (int32_t k = 0; k < rows; ++k) kernels::medianSquare3<1, keepAlpha>(src + k, dst + k, elements, apart);
 }
-
-/// What medians of any mask look at and make: the first window's first element, `apart` elements between neighbours,
-/// and destinations `apart` elements from each other too. Sources may not be destinations.
-template <class T>
-struct MedianJob {
-    Image<const T> windows;
-    Image<T> dst;
-    QorImageSize size, mask;
-    int32_t apart, channels;
-
-    int32_t below() const { return static_cast<int32_t>(int64_t{mask.width} * mask.height / 2); }
-};
 
 /// Bytes by histograms, in strips of columns from top to bottom.
 template <class Bins>
@@ -182,6 +170,8 @@ template <class T>
 QorResult medianOfAny(const MedianJob<T>& job) {
     using kernels::LargeBins;
     using kernels::SmallBins;
+    if constexpr (sizeof(T) < 8)
+        if (tilesPay<T>(job.size, job.mask)) return runMethod<TileMedians<T>>(job);
     const bool small = SmallBins::suffice(job.mask.width, job.mask.height);
     if constexpr (sizeof(T) == 1) {
         return small ? runMethod<ByteMedians<SmallBins>>(job) : runMethod<ByteMedians<LargeBins>>(job);

@@ -55,6 +55,13 @@ void median(const char* name, Function function) {
     // Several pieces, strips and bins of columns, both ways; the longer rows of 5 x 5.
     sweepRectangles<T, L>(function, {7, 3}, {{.width = 420, .height = 230}, {.width = 900, .height = 3, .padding = 3}});
     sweepRectangles<T, L>(function, {5, 5}, {{.width = 600, .height = 70}});
+    // Several vectors of tiles, the last ones in part, in both directions.
+    for (QorImageSize mask : {QorImageSize{7, 7}, {15, 15}, {7, 13}, {21, 3}, {3, 31}, {1, 9}, {17, 17}, {25, 11}})
+        if (random().oneIn(3))
+            sweepRectangles<T, L>(function, mask,
+                                  {{.width = (mask.width < 7 ? 70 : 270) + random().below(30),
+                                    .height = 33 + random().below(8),
+                                    .padding = 5}});
     markSwept(name);
 }
 
@@ -321,6 +328,50 @@ TEST(Median, EveryCountOfOnesInTheRowsOf5x5) {
             for (int k = 0; k < 5; ++k) sum += ones[static_cast<size_t>(p * kRows + y + k)];
             ASSERT_EQ(sum > 12 ? 255 : 0, patterns.result(p, y)) << "pattern " << p << ", row " << y;
         }
+}
+
+/// Zeros and ones of which every window has about as many, by counting: noise, and edges of all directions, so that
+/// columns and rows of windows have all or none.
+template <class T, class Function>
+void expectMajorities(Function function, QorImageSize mask, T zero, T one) {
+    const int width = 530, height = 45, columns = width + mask.width - 1, rows = height + mask.height - 1;
+    const auto at = [=](int x, int y) { return static_cast<size_t>(y * columns + x); };
+    std::vector<T> pixels(at(0, rows)), result(static_cast<size_t>(width * height));
+    const int kind = random().below(3), dx = random().below(9) - 4, dy = random().below(9) - 4;
+    const int period = std::max(1, (mask.width + mask.height) / 2);
+    for (int y = 0; y < rows; ++y)
+        for (int x = 0; x < columns; ++x) {
+            const int wave = (dx * x + dy * y + 100'000) / period % 2;
+            pixels[at(x, y)] = (kind == 0 || random().oneIn(9) ? random().oneIn(2) : wave == 0) ? one : zero;
+        }
+    ASSERT_EQ(QOR_OK, function(pixels.data(), columns * int{sizeof(T)}, result.data(), width * int{sizeof(T)},
+                               QorImageSize{width, height}, mask, QorPoint2D{0, 0}));
+    for (int x = 0; x < width; ++x)
+        for (int y = 0, ones = 0; y < height; ++y) {
+            const auto row = [&](int line) {
+                return static_cast<int>(std::count(&pixels[at(x, line)], &pixels[at(x, line)] + mask.width, one));
+            };
+            if (y == 0)
+                for (int k = 0; k < mask.height; ++k) ones += row(k);
+            else
+                ones += row(y + mask.height - 1) - row(y - 1);
+            ASSERT_EQ(ones > mask.width * mask.height / 2 ? one : zero, result[static_cast<size_t>(y * width + x)])
+                << mask.width << " x " << mask.height << " at " << x << ", " << y << " of kind " << kind;
+        }
+}
+
+TEST(Median, MajoritiesInTiles) {
+    for (int side = 7; side <= 17; side += 2)
+        for (int i = 0; i < 9; ++i) {
+            expectMajorities<uint8_t>(qoriFilterMedian_8u_C1R, {side, side}, 3, 255);
+            expectMajorities<uint16_t>(qoriFilterMedian_16u_C1R, {side, side}, 0x7FFF, 0x8000);
+            expectMajorities<int16_t>(qoriFilterMedian_16s_C1R, {side, side}, -1, 1);
+            expectMajorities<float>(qoriFilterMedian_32f_C1R, {side, side}, -2.0f, 1.0f);
+        }
+    for (int i = 0; i < 40; ++i) {
+        const QorImageSize mask{1 + 2 * random().below(12), 1 + 2 * random().below(12)};
+        if (mask.width * mask.height > 1) expectMajorities<uint16_t>(qoriFilterMedian_16u_C1R, mask, 0, 0xFFFF);
+    }
 }
 
 TEST(Median, EveryPatternOfCrosses) {

@@ -1,0 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tiles_run.h"
+
+template class qori::kernels::MedianTiles<int16_t>;
