@@ -14,8 +14,8 @@ namespace {
 /// Bytes of a strip's row of keys: five of them and a row of constants stay in the first-level cache, and on the stack.
 constexpr int32_t kStripBytes = 4096;
 
-/// The rows of keys that windows of one strip see. Rows enter one ahead of their first use: what has just been stored
-/// cannot be loaded at other alignments until it has reached the cache.
+/// The rows of keys that windows of one strip see. A row enters while codes are made of those before it: what has just
+/// been stored cannot be loaded at other alignments until it has reached the cache.
 template <class T, int reach>
 class KeyRows {
 public:
@@ -25,18 +25,19 @@ public:
     explicit KeyRows(const BorderedImage& strip)
         : strip_(strip), next_(strip.rule.open.top ? -reach : 0), end_(strip.size.height) {
         if (strip.rule.open.bottom) end_ += reach;
-        if (strip.rule.constant == nullptr) return;
-        T value;
-        __builtin_memcpy(&value, strip.rule.constant, sizeof value);
-        kernels::patternKeys(&value, &constantKey_, 1);
-        if (strip.rule.open.top && strip.rule.open.bottom) return;
-        for (int32_t x = -reach; x < strip.size.width + reach; ++x) constant_[kAhead + x] = constantKey_;
+        if (strip.rule.constant != nullptr) {
+            constantKey_ = keyAt(strip.rule.constant);
+            if (!strip.rule.open.top || !strip.rule.open.bottom)
+                for (int32_t x = -reach; x < strip.size.width + reach; ++x) constant_[kAhead + x] = constantKey_;
+        }
+        while (next_ <= reach && next_ < end_) {
+            kernels::patternKeys(pixels(next_), slot(next_), ptrdiff_t{strip_.size.width});
+            endRow();
+        }
     }
 
-    /// Points at the first pixel of the rows that windows of row y see. Rows are asked for from the top.
+    /// Points at the first pixel of the rows that windows of row y see. Rows are asked for from the top, each once.
     void rowsAround(int32_t y, const Key** rows) {
-        for (; next_ <= y + reach + 1 && next_ < end_; ++next_) enter(next_);
-        if (next_ < end_) kernels::prefetchRow(strip_.pixel(0, next_), ptrdiff_t{strip_.size.width} * elementBytes<T>);
         if (y >= reach && y + reach < strip_.size.height) {
             for (int32_t i = 0; i < kRows; ++i) rows[i] = slot(y - reach + i);
             return;
@@ -48,6 +49,21 @@ public:
         }
     }
 
+    /// The row whose whole blocks enter while codes of a row are made; when there is none, the last one enters a free
+    /// slot.
+    kernels::PatternRowAhead<T> ahead() {
+        const bool isMore = next_ + 1 < end_;
+        return {pixels(std::min(next_, end_ - 1)), slot(next_), isMore ? strip_.step : 0};
+    }
+
+    /// The rest of that row enters.
+    void enterRest() {
+        if (next_ >= end_) return;
+        const int32_t whole = strip_.size.width / kernels::kPatternBlock * kernels::kPatternBlock;
+        kernels::patternKeys(pixels(next_) + whole, slot(next_) + whole, ptrdiff_t{strip_.size.width} - whole);
+        endRow();
+    }
+
 private:
     /// Keys in front of a row's first pixel, which so begins on a vector, and behind its last block.
     static constexpr int32_t kAhead = 32;
@@ -55,21 +71,32 @@ private:
     static constexpr uint32_t kSlots = reach == 1 ? 4 : 8;
     static_assert(kSlots > kRows);
 
+    static Key keyAt(const uint8_t* pixel) {
+        T value;
+        __builtin_memcpy(&value, pixel, sizeof value);
+        return kernels::patternKey(value);
+    }
+
+    const T* pixels(int32_t y) const { return reinterpret_cast<const T*>(strip_.pixel(0, y)); }
     Key* slot(int32_t y) { return ring_[static_cast<uint32_t>(y) % kSlots] + kAhead; }
 
-    void enter(int32_t y) {
+    /// What windows see to both sides of the row that has entered. Open sides come first: narrow images mirror them.
+    void endRow() {
         const Sides& open = strip_.rule.open;
-        const int32_t width = strip_.size.width, left = open.left ? reach : 0, right = open.right ? reach : 0;
-        Key* const keys = slot(y);
-        kernels::patternKeys(reinterpret_cast<const T*>(strip_.pixel(-left, y)), keys - left,
-                             ptrdiff_t{width} + left + right);
+        const int32_t width = strip_.size.width;
+        Key* const keys = slot(next_);
         const auto synthesised = [&](int32_t x) {
             return strip_.rule.constant != nullptr ? constantKey_ : keys[strip_.seenColumn(x)];
         };
         for (int32_t i = 0; i < reach; ++i) {
+            if (open.left) keys[-1 - i] = keyAt(strip_.pixel(-1 - i, next_));
+            if (open.right) keys[width + i] = keyAt(strip_.pixel(width + i, next_));
+        }
+        for (int32_t i = 0; i < reach; ++i) {
             if (!open.left) keys[-1 - i] = synthesised(-1 - i);
             if (!open.right) keys[width + i] = synthesised(width + i);
         }
+        ++next_;
     }
 
     const BorderedImage& strip_;
@@ -86,7 +113,8 @@ void makeStrip(const BorderedImage& strip, Image<D> dst, MakeRow makeRow) {
     for (int32_t y = 0; y < strip.size.height; ++y) {
         const kernels::PatternKey<T>* rows[2 * reach + 1];
         keys.rowsAround(y, rows);
-        makeRow(rows, dst.row(y), ptrdiff_t{strip.size.width});
+        makeRow(rows, dst.row(y), ptrdiff_t{strip.size.width}, keys.ahead());
+        keys.enterRest();
     }
 }
 
@@ -128,8 +156,8 @@ QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t border
 template <int mode, int reach, class T, class D>
 QorResult lbpOfMode(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value) {
     return lbp<reach>(src, dst, roi, borderType, value, []<bool streaming>() {
-        return [](const kernels::PatternKey<T>* const* rows, D* to, ptrdiff_t width) {
-            kernels::patternRow<D, reach, mode, streaming>(rows, to, width);
+        return [](const kernels::PatternKey<T>* const* rows, D* to, ptrdiff_t width, auto ahead) {
+            kernels::patternRow<D, reach, mode, streaming>(rows, to, width, ahead);
         };
     });
 }
@@ -148,11 +176,11 @@ template <class T>
 QorResult lbpImageHorizCorr(Image<const T> src, Image<uint8_t> dst, QorImageSize roi, int32_t borderType, T value) {
     using Key = kernels::PatternKey<T>;
     return lbp<1>(src, dst, roi, borderType, value, []<bool streaming>() {
-        return [](const Key* const* rows, uint8_t* to, ptrdiff_t width) {
+        return [](const Key* const* rows, uint8_t* to, ptrdiff_t width, auto ahead) {
             constexpr ptrdiff_t kAhead = 16;
             alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
             kernels::patternColumnSums(rows, sums + kAhead, width);
-            kernels::correctedPatternRow<streaming>(rows, sums + kAhead, to, width);
+            kernels::correctedPatternRow<streaming>(rows, sums + kAhead, to, width, ahead);
         };
     });
 }

@@ -70,7 +70,7 @@ QORI_INLINE Bytes truths(const KeyBlock<Key>& centre, const KeyBlock<Key>& neigh
 template <class Key, class TruthOf>
 QORI_INLINE Bytes joinBits(TruthOf truthOf) {
     const auto enter = [](Bytes sum, Bytes truth) { return Bytes{_mm256_avg_epu8(sum.v, truth.v)}; };
-    Bytes upper = enter(zero<uint8_t>(), truthOf.template operator()<3>());
+    Bytes upper = truthOf.template operator()<3>() & splat<uint8_t>(128);
     upper = enter(upper, truthOf.template operator()<4>());
     upper = enter(upper, truthOf.template operator()<5>());
     upper = enter(upper, truthOf.template operator()<6>());
@@ -147,7 +147,15 @@ template <class T>
 using PatternKey = typename lbp::KeyOf<T>::type;
 
 template <class T>
-void patternKeys(const T* src, PatternKey<T>* keys, ptrdiff_t n) {
+PatternKey<T> patternKey(T value) {
+    if constexpr (std::is_floating_point_v<T>)
+        return value;
+    else
+        return static_cast<PatternKey<T>>(value ^ (T{1} << (8 * sizeof(T) - 1)));
+}
+
+template <class T>
+QORI_INLINE void patternKeys(const T* src, PatternKey<T>* keys, ptrdiff_t n) {
     if constexpr (std::is_floating_point_v<T>) {
         copyRow(reinterpret_cast<uint8_t*>(keys), reinterpret_cast<const uint8_t*>(src),
                 n * static_cast<ptrdiff_t>(sizeof(T)));
@@ -161,26 +169,59 @@ void patternKeys(const T* src, PatternKey<T>* keys, ptrdiff_t n) {
     }
 }
 
-/// A row that is read soon. Rows of strips are too short for the processor to see them coming.
-inline void prefetchRow(const uint8_t* row, ptrdiff_t bytes) {
-    constexpr ptrdiff_t kLine = 64;
-    for (ptrdiff_t i = 0; i < bytes; i += kLine) _mm_prefetch(reinterpret_cast<const char*>(row + i), _MM_HINT_T0);
+/// A row of pixels that becomes keys while codes are made of the rows before it, a block at a time: loads wait for
+/// memory and codes for arithmetic, so that either hides behind the other. Rows of strips are too short for the
+/// processor to see them coming: the row behind is fetched in passing.
+template <class T>
+struct PatternRowAhead {
+    const T* src;
+    PatternKey<T>* keys;
+    ptrdiff_t toNext;  ///< Bytes from src to the row behind it, or 0.
+
+    QORI_INLINE void enterBlock(ptrdiff_t x) const {
+        const auto* const next = reinterpret_cast<const char*>(src + x) + toNext;
+        _mm_prefetch(next, _MM_HINT_T0);
+        patternKeys(src + x, keys + x, kPatternBlock);
+    }
+};
+
+/// Where rows are read in place.
+struct NoPatternRowAhead {
+    QORI_INLINE void enterBlock(ptrdiff_t) const {}
+};
+
+namespace lbp {
+
+/// makeBlock(x, n) for each block and what is left of the row; whole blocks of the row ahead enter.
+template <class Ahead, class MakeBlock>
+QORI_INLINE void forEachBlock(ptrdiff_t width, const Ahead& ahead, MakeBlock makeBlock) {
+    ptrdiff_t x = 0;
+    for (; x + kPatternBlock <= width; x += kPatternBlock) {
+        makeBlock(x, ptrdiff_t{kPatternBlock});
+        ahead.enterBlock(x);
+    }
+    if (x < width) makeBlock(x, width - x);
 }
+
+}  // namespace lbp
 
 /// One row of codes of `count` neighbours on the square ring of radius `reach`, 8 or 16 of them. rows: at the first
 /// pixel, from `reach` above to `reach` below. Streaming: dst is 32-byte aligned.
-template <class D, int reach, int mode, bool streaming, class Key>
-void patternRow(const Key* const* rows, D* dst, ptrdiff_t width) {
+template <class D, int reach, int mode, bool streaming, class Key, class Ahead>
+void patternRow(const Key* const* rowsAround, D* dst, ptrdiff_t width, Ahead ahead) {
     constexpr int count = 8 * static_cast<int>(sizeof(D));
-    for (ptrdiff_t x = 0; x < width; x += kPatternBlock) {
-        const lbp::KeyBlock<Key> centre(rows[reach] + x);
-        const Bytes low = lbp::eightBits<Key, count, reach, mode, 0>(rows, centre, x);
-        if constexpr (count == 8)
-            lbp::storeCodes<streaming>(dst + x, low, width - x);
-        else
-            lbp::storeCodes<streaming>(dst + x, low, lbp::eightBits<Key, count, reach, mode, 8>(rows, centre, x),
-                                       width - x);
-    }
+    const Key* rows[2 * reach + 1];  // stores of codes cannot alias this copy
+    for (int i = 0; i < 2 * reach + 1; ++i) rows[i] = rowsAround[i];
+    lbp::forEachBlock(
+        width, ahead, [&](ptrdiff_t x, ptrdiff_t n) __attribute__((always_inline)) {
+            const lbp::KeyBlock<Key> centre(rows[reach] + x);
+            const Bytes low = lbp::eightBits<Key, count, reach, mode, 0>(rows, centre, x);
+            if constexpr (count == 8)
+                lbp::storeCodes<streaming>(dst + x, low, n);
+            else
+                lbp::storeCodes<streaming>(dst + x, low, lbp::eightBits<Key, count, reach, mode, 8>(rows, centre, x),
+                                           n);
+        });
 }
 
 /// Sums of three rows of keys, from one pixel to the left of the row to one beyond it, rounded up to blocks: within
@@ -194,33 +235,34 @@ void patternColumnSums(const Key* const* rows, Wider<Key>* sums, ptrdiff_t width
 
 /// Codes of the 3 x 3 neighbours as mode 0 has them, but for the left and the right one: their bits are set where the
 /// sum of that column is at least the pixel's own.
-template <bool streaming, class Key>
-void correctedPatternRow(const Key* const* rows, const Wider<Key>* sums, uint8_t* dst, ptrdiff_t width) {
+template <bool streaming, class Key, class Ahead>
+void correctedPatternRow(const Key* const* rows, const Wider<Key>* sums, uint8_t* dst, ptrdiff_t width, Ahead ahead) {
     using Sum = Wider<Key>;
-    for (ptrdiff_t x = 0; x < width; x += kPatternBlock) {
-        const lbp::KeyBlock<Key> centre(rows[1] + x);
-        const auto bySums = [&](ptrdiff_t dx) {
-            constexpr int lanes = Vec<Sum>::lanes;
-            const auto truth = [&](int k) {
-                const Sum* const at = sums + x + k * lanes;
-                return isLess(load(at + dx), load(at)).v;
+    lbp::forEachBlock(
+        width, ahead, [&](ptrdiff_t x, ptrdiff_t n) __attribute__((always_inline)) {
+            const lbp::KeyBlock<Key> centre(rows[1] + x);
+            const auto bySums = [&](ptrdiff_t dx) {
+                constexpr int lanes = Vec<Sum>::lanes;
+                const auto truth = [&](int k) {
+                    const Sum* const at = sums + x + k * lanes;
+                    return isLess(load(at + dx), load(at)).v;
+                };
+                constexpr int inOrder = 0xD8;
+                if constexpr (sizeof(Key) == 1)
+                    return Bytes{_mm256_permute4x64_epi64(_mm256_packs_epi16(truth(0), truth(1)), inOrder)};
+                const __m256i first = _mm256_permute4x64_epi64(_mm256_packs_epi32(truth(0), truth(1)), inOrder);
+                const __m256i second = _mm256_permute4x64_epi64(_mm256_packs_epi32(truth(2), truth(3)), inOrder);
+                return Bytes{_mm256_packs_epi16(first, second)};
             };
-            constexpr int inOrder = 0xD8;
-            if constexpr (sizeof(Key) == 1)
-                return Bytes{_mm256_permute4x64_epi64(_mm256_packs_epi16(truth(0), truth(1)), inOrder)};
-            const __m256i first = _mm256_permute4x64_epi64(_mm256_packs_epi32(truth(0), truth(1)), inOrder);
-            const __m256i second = _mm256_permute4x64_epi64(_mm256_packs_epi32(truth(2), truth(3)), inOrder);
-            return Bytes{_mm256_packs_epi16(first, second)};
-        };
-        const Bytes codes = lbp::joinBits<Key>([&]<int bit>() __attribute__((always_inline)) {
-            constexpr lbp::Place place = lbp::placeOfBit(bit, 8, 1, 0);
-            if constexpr (place.dy == 0)
-                return bySums(place.dx);
-            else
-                return lbp::truths(centre, lbp::KeyBlock<Key>(rows[1 + place.dy] + x + place.dx));
+            const Bytes codes = lbp::joinBits<Key>([&]<int bit>() __attribute__((always_inline)) {
+                constexpr lbp::Place place = lbp::placeOfBit(bit, 8, 1, 0);
+                if constexpr (place.dy == 0)
+                    return bySums(place.dx);
+                else
+                    return lbp::truths(centre, lbp::KeyBlock<Key>(rows[1 + place.dy] + x + place.dx));
+            });
+            lbp::storeCodes<streaming>(dst + x, codes, n);
         });
-        lbp::storeCodes<streaming>(dst + x, codes, width - x);
-    }
 }
 
 }  // namespace qori::kernels
