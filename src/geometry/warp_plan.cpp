@@ -128,7 +128,7 @@ bool Affine::isFinite() const {
 
 bool Affine::isSingular() const {
     const double a = xx * yy, b = xy * yx, magnitude = __builtin_fabs(a);
-    if (!isFinite() || !isNumber(a) || !isNumber(b)) return true;
+    if (!isNumber(a) || !isNumber(b)) return true;  // offsets show in the inverse
     if (magnitude <= 1e-200 ? __builtin_fabs(b) <= 1e-10 : __builtin_fabs((a - b) / a) <= 1e-10) return true;
     return !inverse().isFinite();
 }

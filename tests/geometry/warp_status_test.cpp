@@ -70,6 +70,7 @@ TEST(WarpStatus, MatricesWithoutInverseAreRefusedByQueryAndInitialiser) {
         EXPECT_EQ(QOR_OK, status({1e-5, 0, 0, 0, 1e-5, 0}, direction));  // no turn
         EXPECT_EQ(QOR_ERR_COEFFS, status({1e-100, 0, 0, 0, 1e-100, 0}, direction));
         EXPECT_EQ(QOR_ERR_COEFFS, status({1e200, 0, 0, 0, 1e200, 0}, direction));      // the product overflows
+        EXPECT_EQ(QOR_ERR_COEFFS, status({1, 1e200, 0, 1e200, 1, 0}, direction));      // so does the other
         EXPECT_EQ(QOR_ERR_COEFFS, status({1e-90, 0, 1e300, 0, 1e-90, 0}, direction));  // the inverse does
         for (size_t i = 0; i < 6; ++i)
             for (double bad : {kNan, kInfinite, -kInfinite}) {

@@ -185,11 +185,6 @@ struct PatternRowAhead {
     }
 };
 
-/// Where rows are read in place.
-struct NoPatternRowAhead {
-    QORI_INLINE void enterBlock(ptrdiff_t) const {}
-};
-
 namespace lbp {
 
 /// makeBlock(x, n) for each block and what is left of the row; whole blocks of the row ahead enter.
