@@ -161,7 +161,7 @@ Ladder sides(const char* operation, Function function, double power) {
                 }
                 return steps;
             },
-            "3 x 3 and 5 x 5 are networks, tiles of pixels above grow with the mask until histograms are faster"};
+            "3 x 3 and 5 x 5 are networks, up to 15 x 15 tiles of pixels whose cost grows with the mask, above histograms"};
 }
 const Ladders ladders{{sides<uint8_t>("median 8u, mask side", qoriFilterMedian_8u_C1R, 0),
                        sides<uint16_t>("median 16u, mask side", qoriFilterMedian_16u_C1R, 1),
