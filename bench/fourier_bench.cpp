@@ -89,27 +89,27 @@ const Rows complex{{row(Kind::complex, {64, 64}), row(Kind::complex, {256, 256},
                     row(Kind::complex, {512, 512}, 275), row(Kind::complex, {1024, 1024}, 233),
                     row(Kind::complex, {2048, 2048}, 192), row(Kind::complex, {4096, 4096}, 107)}};
 const Rows anySize{{row(Kind::forward, {640, 360}), row(Kind::forward, {1920, 1080}), row(Kind::forward, {1000, 1000}),
-                    row(Kind::forward, {509, 509}), row(Kind::complex, {1000, 1000}),
-                    row(Kind::complex, {509, 509})}};
+                    row(Kind::forward, {509, 509}), row(Kind::complex, {1000, 1000}), row(Kind::complex, {509, 509})}};
 
 /// Squares whose work is n log n.
 std::vector<Step> squares(const std::vector<int>& sides) {
     std::vector<Step> steps;
     for (int n : sides) {
         const double points = static_cast<double>(n) * n;
-        steps.push_back({std::to_string(n) + "x" + std::to_string(n), points * std::log2(points),
-                         jobOf(Kind::forward, {n, n})});
+        steps.push_back(
+            {std::to_string(n) + "x" + std::to_string(n), points * std::log2(points), jobOf(Kind::forward, {n, n})});
     }
     return steps;
 }
 
 const Ladders ladders{{
     {.operation = "DFT 32f forward, sides by factors",
-     .make = [] {
-         return squares({64,  67,  70,  81,  96,  101, 113, 121, 127, 128, 131, 144, 169, 180, 191, 200, 243,
-                         251, 256, 257, 289, 300, 331, 343, 361, 384, 409, 500, 509, 512, 521, 529, 600, 625,
-                         720, 841, 900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
-     },
+     .make =
+         [] {
+             return squares({64,  67,  70,  81,  96,  101, 113, 121,  127,  128,  131,  144,  169,  180,  191, 200,
+                             243, 251, 256, 257, 289, 300, 331, 343,  361,  384,  409,  500,  509,  512,  521, 529,
+                             600, 625, 720, 841, 900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
+         },
      .reason = "sides without small factors are convolved with chirps"},
 }};
 

@@ -147,21 +147,22 @@ const Rows rows{{
 /// Cost per pixel by the side of the mask.
 template <class T, class Function>
 Ladder sides(const char* operation, Function function, double power) {
-    return {operation,
-            [=] {
-                std::vector<Step> steps;
-                for (int side : {3, 5, 7, 9, 11, 13, 15, 17, 21, 25, 31, 37, 43, 49, 55, 61}) {
-                    const Size size{512, 512};
-                    const Noise<T> src(size, 1, side / 2);
-                    const Image<T> dst(size, 1);
-                    steps.push_back({std::to_string(side), power == 0 ? 1.0 : double(side), [=] {
-                                         must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
-                                                       QorImageSize{side, side}, QorPoint2D{side / 2, side / 2}));
-                                     }});
-                }
-                return steps;
-            },
-            "3 x 3 and 5 x 5 are networks, up to 15 x 15 tiles of pixels whose cost grows with the mask, above histograms"};
+    return {
+        operation,
+        [=] {
+            std::vector<Step> steps;
+            for (int side : {3, 5, 7, 9, 11, 13, 15, 17, 21, 25, 31, 37, 43, 49, 55, 61}) {
+                const Size size{512, 512};
+                const Noise<T> src(size, 1, side / 2);
+                const Image<T> dst(size, 1);
+                steps.push_back({std::to_string(side), power == 0 ? 1.0 : double(side), [=] {
+                                     must(function(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
+                                                   QorImageSize{side, side}, QorPoint2D{side / 2, side / 2}));
+                                 }});
+            }
+            return steps;
+        },
+        "3 x 3 and 5 x 5 are networks, up to 15 x 15 tiles of pixels whose cost grows with the mask, above histograms"};
 }
 const Ladders ladders{{sides<uint8_t>("median 8u, mask side", qoriFilterMedian_8u_C1R, 0),
                        sides<uint16_t>("median 16u, mask side", qoriFilterMedian_16u_C1R, 1),

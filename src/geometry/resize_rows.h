@@ -172,9 +172,7 @@ private:
 template <class T, int channels>
 class LineRows {
 public:
-    static bool suits(const ResizePlan& plan) {
-        return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps);
-    }
+    static bool suits(const ResizePlan& plan) { return kernels::suitsLines(plan.horizontal.ratio(), plan.columnTaps); }
 
     LineRows(const TileSource<T, channels>& source, WorkBuffer& buffer, int32_t stripElements = 2048)
         : source_(source), taps_(source, buffer), stripPixels_(wholeChunks(stripElements / channels)) {

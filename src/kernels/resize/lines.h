@@ -7,9 +7,10 @@
 
 namespace qori::kernels {
 
-/// Whether lines are the way for whole tiles of one channel. They gain 1.1 to 1.26 over turned rows where one channel is enlarged by
-/// few taps, and lose 0.84 to 0.95 with more taps or channels. Eight neighbouring results must look at sixteen
-/// neighbouring floats in any case, as they do up to a ratio of 1: pixels n apart look ceil(n * ratio) apart at most.
+/// Whether lines are the way for whole tiles of one channel. They gain 1.1 to 1.26 over turned rows where one channel
+/// is enlarged by few taps, and lose 0.84 to 0.95 with more taps or channels. Eight neighbouring results must look at
+/// sixteen neighbouring floats in any case, as they do up to a ratio of 1: pixels n apart look ceil(n * ratio) apart at
+/// most.
 constexpr bool suitsLines(double ratio, int32_t taps) { return ratio <= 1 && taps <= 4; }
 
 struct LineFilter {
