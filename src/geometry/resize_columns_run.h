@@ -23,11 +23,10 @@ public:
         : source_{plan, tile}, lines_(source_, buffer, kStripElements) {
         stripPixels_ = std::min(tile.width, lines_.stripPixels());
         const int64_t columns = lines_.columnsOf(stripPixels_) + kernels::LineFilter::kOverrun;
-        ring_.rows = kernels::kTapsPerBlock;
-        ring_.step = static_cast<ptrdiff_t>(roundUp(columns * channels, kernels::kTapBlock));
-        ring_.memory = buffer.take<float>(int64_t{ring_.rows} * ring_.step);
-        totals_ = RowTotals(plan, tile.height, ring_.step, buffer);
-        sums_ = buffer.take<float>(ring_.step);
+        const auto step = static_cast<ptrdiff_t>(roundUp(columns * channels, kernels::kTapBlock));
+        ring_ = Ring(buffer, kernels::kTapsPerBlock, step);
+        totals_ = RowTotals(plan, tile.height, step, buffer);
+        sums_ = buffer.take<float>(step);
         filtered_ = buffer.take<float>(roundUp(int64_t{stripPixels_} * channels, kernels::kTapBlock));
     }
     ColumnsFirstTile(const ColumnsFirstTile&) = delete;
@@ -67,7 +66,7 @@ private:
     TileSource<T, channels> source_;
     LineRows<T, channels> lines_;
     int32_t stripPixels_;
-    Ring ring_{};
+    Ring ring_;
     RowTotals totals_;
     float *sums_, *filtered_;
 };

@@ -13,11 +13,10 @@ class TapsTile {
 public:
     TapsTile(const ResizePlan& plan, Tile tile, WorkBuffer& buffer) : source_{plan, tile}, rows_(source_, buffer) {
         stripPixels_ = std::min({tile.width, rows_.stripPixels(), hasLongRows(plan) ? longStripPixels() : INT32_MAX});
-        ring_.rows = rowsInUse(plan) + Rows::kAtOnce - 1;
-        ring_.step = static_cast<ptrdiff_t>(roundUp(int64_t{stripPixels_} * channels, kBlock));
-        ring_.memory = buffer.take<float>(int64_t{ring_.rows} * ring_.step);
-        tapRows_ = buffer.take<const float*>(ring_.rows);
-        if (hasLongRows(plan)) totals_ = RowTotals(plan, tile.height, ring_.step, buffer);
+        ring_ = Ring(buffer, rowsInUse(plan) + Rows::kAtOnce - 1,
+                     static_cast<ptrdiff_t>(roundUp(int64_t{stripPixels_} * channels, kBlock)));
+        tapRows_ = buffer.take<const float*>(ring_.rows());
+        if (hasLongRows(plan)) totals_ = RowTotals(plan, tile.height, ring_.step(), buffer);
     }
     TapsTile(const TapsTile&) = delete;
     TapsTile& operator=(const TapsTile&) = delete;
@@ -44,7 +43,7 @@ private:
         const ResizePlan& plan = source_.plan;
         rows_.beginStrip(x, width);
         const ptrdiff_t at = ptrdiff_t{x} * channels * elementBytes<T>, elements = ptrdiff_t{width} * channels;
-        for (int32_t i = 0; i < ring_.rows; ++i) kernels::fillUpBlock(ring_.row(i), elements);
+        for (int32_t i = 0; i < ring_.rows(); ++i) kernels::fillUpBlock(ring_.row(i), elements);
         ring_.filtered = 0;
         RowSequence sequence(plan, source_.tile, source_.rows);
         const kernels::ColumnFinish finish{rowScale(plan), plan.bounded != 0};
@@ -71,7 +70,7 @@ private:
             const int32_t first = source_.rows.clamp(tap), last = source_.rows.clamp(tap + all - 1);
             needed.reach(first, last);
             while (ring_.filtered < needed.rows) rows_.filterNext(sequence, ring_);
-            listTapRows(tap, all, first, (needed.rows - (last - first + 1)) % ring_.rows);
+            listTapRows(tap, all, first, (needed.rows - (last - first + 1)) % ring_.rows());
             float fractions[2][2];
             const kernels::PairedTaps taps{plan.weights(plan.vertical, position, fractions[0]),
                                            isPair ? plan.weights(plan.vertical, position + 1, fractions[1]) : nullptr,
@@ -100,7 +99,7 @@ private:
     TileSource<T, channels> source_;
     Rows rows_;
     int32_t stripPixels_;
-    Ring ring_{};
+    Ring ring_;
     const float** tapRows_;
     RowTotals totals_;
 };

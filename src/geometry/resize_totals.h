@@ -5,20 +5,29 @@
 #pragma once
 #include <algorithm>
 
+#include "frame/row_window.h"
 #include "kernels/resize/taps_columns.h"
 #include "resize_run.h"
 
 namespace qori::geometry {
 
 /// Filtered rows, the last few of them, counted from the strip's first.
-struct Ring {
-    float* memory;
-    int32_t rows;
-    ptrdiff_t step;
-    int32_t filtered;
+class Ring {
+public:
+    Ring() = default;
+    Ring(WorkBuffer& buffer, int32_t rows, ptrdiff_t step)
+        : ring_{asBytes(buffer.take<float>(int64_t{rows} * step)), step * elementBytes<float>, rows}, step_(step) {}
 
-    float* row(int32_t place) const { return memory + place % rows * step; }
+    int32_t rows() const { return ring_.rows; }
+    ptrdiff_t step() const { return step_; }
+    float* row(int32_t place) const { return reinterpret_cast<float*>(ring_.row(place % ring_.rows)); }
     float* next() { return row(filtered++); }
+
+    int32_t filtered = 0;
+
+private:
+    RowRing ring_{};
+    ptrdiff_t step_ = 0;
 };
 
 class RowTotals {
