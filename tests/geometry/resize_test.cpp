@@ -220,11 +220,15 @@ QorImageSize drawLengths(int least, bool reducesOnly) {
     return {src, reducesOnly ? std::min(src, dst) : dst};
 }
 
+int leastLength(Method method) {
+    return method.interpolation == interpLanczos  ? 2 * method.lobes
+           : method.interpolation == interpCubic  ? 4
+           : method.interpolation == interpLinear ? 2
+                                                  : 1;
+}
+
 Job drawJob(Method method) {
-    const int least = method.interpolation == interpLanczos  ? 2 * method.lobes
-                      : method.interpolation == interpCubic  ? 4
-                      : method.interpolation == interpLinear ? 2
-                                                             : 1;
+    const int least = leastLength(method);
     const bool reduces = method.interpolation == interpSuper;
     const QorImageSize x = drawLengths(least, reduces);
     QorImageSize y = drawLengths(least, reduces);
@@ -261,6 +265,19 @@ Job drawWideJob(Method method) {
         src = from * half;
     }
     return {method, {src, 6 + random().below(3)}, {reduces ? std::min(src, dst) : dst, 1 + random().below(6)}};
+}
+
+/// A row or two of every width around the vectors, at ratios that have ways of their own and at odd ones in turn.
+constexpr int kEveryWidth = 70;
+
+Job widthJob(Method method, int width, int turn) {
+    static constexpr int kRatios[][2] = {{2, 1}, {3, 2}, {1, 2}, {7, 5}, {1, 1}, {5, 7}, {4, 1}};
+    const auto& ratio = kRatios[static_cast<size_t>(turn) % std::size(kRatios)];
+    const int height = 1 + turn % 2, least = leastLength(method);
+    const auto sourceOf = [&](int length) { return std::max((length * ratio[0] + ratio[1] - 1) / ratio[1], least); };
+    QorImageSize src{sourceOf(width), sourceOf(height)};
+    if (method.interpolation == interpSuper) src = {std::max(src.width, width), std::max(src.height, height)};
+    return {method, src, {width, height}};
 }
 
 void expectEach(std::initializer_list<std::pair<QorResult, QorResult>> expectedAndActual) {
@@ -318,6 +335,9 @@ void sweep(const char* name, Function function, const std::vector<Method>& metho
         const Method& method = methods[static_cast<size_t>(i) % methods.size()];
         checkJob<T, channels>(function, i < jobs ? drawJob(method) : drawWideJob(method));
     }
+    for (int width = 1; width <= kEveryWidth; ++width)
+        for (int turn : {2 * width, 2 * width + 1})
+            checkJob<T, channels>(function, widthJob(methods[static_cast<size_t>(turn) % methods.size()], width, turn));
     expectRefusals<T, channels>(function, methods[0]);
     markSwept(name);
     for (const Method& m : methods) markUsed<T>(m);
