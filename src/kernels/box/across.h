@@ -13,22 +13,29 @@ QORI_INLINE void storeMeans(T* to, Vec<T> means, ptrdiff_t count) {
     storeUpTo(to, means, count);
 }
 
-/// dst[i] = rule of term[0][i] + term[1][i] + ... The terms lie `pitch` elements apart from `sums` on; `terms` of them,
-/// or as many as `count` says where that is 0.
-template <int terms, bool keepAlpha, class S, class T, class Rule>
-QORI_NOINLINE void acrossTerms(const S* sums, ptrdiff_t pitch, ptrdiff_t many, T* dst, ptrdiff_t elements, Rule rule) {
+/// dst[i] = rule of the sums sumAt(i, count) of count elements.
+template <bool keepAlpha, class S, class T, class Rule, class SumAt>
+QORI_INLINE void acrossSums(T* dst, ptrdiff_t elements, Rule rule, SumAt sumAt) {
     constexpr int vectors = kSumVectors<S, T>;
     forVectors<T>(
         elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
             Vec<S> total[vectors];
-            for (int v = 0; v < vectors; ++v) {
-                const ptrdiff_t rest = count - v * Vec<S>::lanes;
-                const S* from = sums + i + v * Vec<S>::lanes;
-                total[v] = loadUpTo(from, rest);
-                const ptrdiff_t last = terms == 0 ? many : terms;
-                for (ptrdiff_t k = 1; k < last; ++k) total[v] = total[v] + loadUpTo(from + k * pitch, rest);
-            }
+            for (int v = 0; v < vectors; ++v)
+                total[v] = sumAt(i + v * Vec<S>::lanes, count - v * ptrdiff_t{Vec<S>::lanes});
             storeMeans<keepAlpha>(dst + i, rule(total, i, count), count);
+        });
+}
+
+/// dst[i] = rule of term[0][i] + term[1][i] + ... The terms lie `pitch` elements apart from `sums` on; `terms` of them,
+/// or as many as `count` says where that is 0.
+template <int terms, bool keepAlpha, class S, class T, class Rule>
+QORI_NOINLINE void acrossTerms(const S* sums, ptrdiff_t pitch, ptrdiff_t many, T* dst, ptrdiff_t elements, Rule rule) {
+    acrossSums<keepAlpha, S>(
+        dst, elements, rule, [=](ptrdiff_t i, ptrdiff_t rest) __attribute__((always_inline)) {
+            Vec<S> total = loadUpTo(sums + i, rest);
+            const ptrdiff_t last = terms == 0 ? many : terms;
+            for (ptrdiff_t k = 1; k < last; ++k) total = total + loadUpTo(sums + i + k * pitch, rest);
+            return total;
         });
 }
 
@@ -37,16 +44,11 @@ template <int terms, bool keepAlpha, class S, class T, class Rule>
 QORI_NOINLINE void acrossChain(const S* const* term, T* dst, ptrdiff_t elements, Rule rule) {
     const S* from[terms];
     for (int k = 0; k < terms; ++k) from[k] = term[k];
-    constexpr int vectors = kSumVectors<S, T>;
-    forVectors<T>(
-        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-            Vec<S> total[vectors];
-            for (int v = 0; v < vectors; ++v) {
-                const ptrdiff_t rest = count - v * Vec<S>::lanes, at = i + v * Vec<S>::lanes;
-                total[v] = loadUpTo(from[0] + at, rest);
-                for (int k = 1; k < terms; ++k) total[v] = total[v] + loadUpTo(from[k] + at, rest);
-            }
-            storeMeans<keepAlpha>(dst + i, rule(total, i, count), count);
+    acrossSums<keepAlpha, S>(
+        dst, elements, rule, [&](ptrdiff_t i, ptrdiff_t rest) __attribute__((always_inline)) {
+            Vec<S> total = loadUpTo(from[0] + i, rest);
+            for (int k = 1; k < terms; ++k) total = total + loadUpTo(from[k] + i, rest);
+            return total;
         });
 }
 

@@ -146,17 +146,11 @@ QORI_NOINLINE void sumBinomialRows(const T* above, const T* at, const T* below, 
 /// dst[i] = rule of sums[i] + 2 * sums[i + channels] + sums[i + 2 * channels].
 template <int channels, bool keepAlpha, class T, class S, class Rule>
 QORI_NOINLINE void acrossBinomial(const S* sums, T* dst, ptrdiff_t elements, Rule rule) {
-    constexpr int vectors = kSumVectors<S, T>;
-    forVectors<T>(
-        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-            Vec<S> total[vectors];
-            for (int v = 0; v < vectors; ++v) {
-                const ptrdiff_t rest = count - v * Vec<S>::lanes;
-                const S* const from = sums + i + v * Vec<S>::lanes;
-                const Vec<S> middle = loadUpTo(from + channels, rest);
-                total[v] = loadUpTo(from, rest) + loadUpTo(from + 2 * channels, rest) + middle + middle;
-            }
-            storeMeans<keepAlpha>(dst + i, rule(total, i, count), count);
+    acrossSums<keepAlpha, S>(
+        dst, elements, rule, [=](ptrdiff_t i, ptrdiff_t rest) __attribute__((always_inline)) {
+            const S* const from = sums + i;
+            const Vec<S> middle = loadUpTo(from + channels, rest);
+            return loadUpTo(from, rest) + loadUpTo(from + 2 * channels, rest) + middle + middle;
         });
 }
 

@@ -62,14 +62,25 @@ struct Convolution {
     ptrdiff_t points;
 };
 
+/// The convolution's stage that is the first forth and the last back. The block's points fill `filled` of its parts.
+template <int radix>
+struct OuterStage {
+    static constexpr int filled = (radix + 1) / 2;
+    ptrdiff_t part;
+    const float *turns, *twiddles;
+
+    explicit OuterStage(const FourierTable& inner)
+        : part(inner.stages[0].length / radix),
+          turns(inner.at<float>(inner.stages[0].turns)),
+          twiddles(inner.at<float>(inner.stages[0].twiddles)) {}
+};
+
 /// Reads the block's points, times the chirp, through the first stage; what is beyond them is 0.
 template <int radix>
 QORI_NOINLINE void enter(const Convolution& c, const float* block, float* lines) {
-    const FourierTable::Stage& stage = c.inner.stages[0];
-    const ptrdiff_t part = stage.length / radix;
-    const float* const turns = c.inner.at<float>(stage.turns);
-    const float* w = c.inner.at<float>(stage.twiddles);
-    constexpr int filled = (radix + 1) / 2;
+    const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
+    constexpr int filled = OuterStage<radix>::filled;
+    const float* w = twiddles;
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
         for (int q = 0; q < radix; ++q) {
@@ -88,11 +99,9 @@ QORI_NOINLINE void enter(const Convolution& c, const float* block, float* lines)
 /// The last stage back, and the chirp, of as many points as the block has.
 template <int radix>
 QORI_NOINLINE void leave(const Convolution& c, const float* lines, float* block) {
-    const FourierTable::Stage& stage = c.inner.stages[0];
-    const ptrdiff_t part = stage.length / radix;
-    const float* const turns = c.inner.at<float>(stage.turns);
-    const float* w = c.inner.at<float>(stage.twiddles);
-    constexpr int filled = (radix + 1) / 2;
+    const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
+    constexpr int filled = OuterStage<radix>::filled;
+    const float* w = twiddles;
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
         a[0] = line::loadLine(lines + j * kLineFloats);

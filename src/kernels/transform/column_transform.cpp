@@ -38,9 +38,9 @@ struct Frequencies {
     int32_t first, apart;
 };
 
-/// The last stage: blocks of `radix` lines to rows of the image.
-template <int radix, bool isExchanged>
-QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to) {
+/// The last stage, of blocks of `radix` lines: calls write(frequency, line) for each line of its results.
+template <int radix, class Write>
+QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Frequencies f, Write write) {
     const int32_t part = table.points / radix;
     const int32_t* const positions = table.positions();
     for (int32_t k = f.first; k < part; k += f.apart) {
@@ -48,41 +48,40 @@ QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Freque
         ComplexLine a[radix];
         for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * kLineFloats);
         line::butterfly(a);
-        for (int p = 0; p < radix; ++p) {
-            float* const row = rowOf(to, k + ptrdiff_t{p} * part);
+        for (int p = 0; p < radix; ++p) write(k + ptrdiff_t{p} * part, a[p]);
+    }
+}
+
+/// To rows of the image.
+template <int radix, bool isExchanged>
+QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to) {
+    lastStage<radix>(
+        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+            float* const row = rowOf(to, y);
             Vec<float> low, high;
-            line::interleave(exchangedIf<isExchanged>(a[p]), low, high);
+            line::interleave(exchangedIf<isExchanged>(a), low, high);
             store(row, low);
             store(row + kLineColumns, high);
-        }
-    }
+        });
 }
 
 /// The same into rows that begin an element earlier, on the boundaries of what was read.
 template <int radix>
 QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines, Frequencies f, float* carry,
                                   const LineColumns& to) {
-    const int32_t part = table.points / radix;
-    const int32_t* const positions = table.positions();
     const __m256i next = _mm256_setr_epi32(1, 2, 3, 4, 5, 6, 7, 0);
     constexpr int last = 0x80;
-    for (int32_t k = f.first; k < part; k += f.apart) {
-        const float* const x = lines + ptrdiff_t{positions[k]} * kLineFloats;
-        ComplexLine a[radix];
-        for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * kLineFloats);
-        line::butterfly(a);
-        for (int p = 0; p < radix; ++p) {
-            const ptrdiff_t y = k + ptrdiff_t{p} * part;
+    lastStage<radix>(
+        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             float* const row = rowOf(to, y);
             Vec<float> low, high;
-            line::interleave(a[p], low, high);
+            line::interleave(a, low, high);
             const __m256 behind = _mm256_broadcast_ss(carry + y);
             _mm_store_ss(carry + y, _mm256_castps256_ps128(low.v));
             const __m256 first = _mm256_permutevar8x32_ps(low.v, next), second = _mm256_permutevar8x32_ps(high.v, next);
             store(row, Vec<float>{_mm256_blend_ps(first, second, last)});
             store(row + kLineColumns, Vec<float>{_mm256_blend_ps(second, behind, last)});
-        }
-    }
+        });
 }
 
 /// The stages behind the first and before the last, then the last, of blocks that fit a cache.

@@ -177,22 +177,31 @@ QORI_INLINE void mixDoubles(const uint8_t* top, const uint8_t* bottom, double x,
     }
 }
 
-template <int channels>
-void linearDoubles(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
-                   uint8_t* dst) {
-    constexpr int pixelBytes = channels * 8;
-    const DoubleAxis across = acrossPairs<double>(line, box, source), down = downPairs<double>(line, box, source);
+/// Calls make(upper left pixel, fractions across and down, destination, whether it is the last of a batch).
+template <class T, int channels, class Make>
+QORI_INLINE void forPairs(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first,
+                          int32_t count, uint8_t* dst, Make make) {
+    constexpr int pixelBytes = channels * static_cast<int>(sizeof(T));
+    const DoubleAxis across = acrossPairs<T>(line, box, source), down = downPairs<T>(line, box, source);
     int32_t column[kBatch], row[kBatch];
     double x[kBatch], y[kBatch];
     for (int n; count > 0; count -= n, first += n) {
         n = count < kBatch ? count : kBatch;
         across.split(first, n, column, x);
         down.split(first, n, row, y);
-        for (int i = 0; i < n; ++i, dst += pixelBytes) {
-            const uint8_t* p = source.origin + row[i] * source.step + column[i] * ptrdiff_t{pixelBytes};
-            mixDoubles<channels>(p, p + source.step, x[i], y[i], dst, i + 1 == n);
-        }
+        for (int i = 0; i < n; ++i, dst += pixelBytes)
+            make(source.origin + row[i] * source.step + column[i] * ptrdiff_t{pixelBytes}, x[i], y[i], dst, i + 1 == n);
     }
+}
+
+template <int channels>
+void linearDoubles(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
+                   uint8_t* dst) {
+    forPairs<double, channels>(
+        source, line, box, first, count,
+        dst, [&](const uint8_t* p, double x, double y, uint8_t* to, bool isLast) __attribute__((always_inline)) {
+            mixDoubles<channels>(p, p + source.step, x, y, to, isLast);
+        });
 }
 
 // --- anything far ---------------------------------------------------------------------------------------------------
@@ -207,26 +216,18 @@ template <class T, int channels>
 void linearFar(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
                uint8_t* dst) {
     constexpr int pixelBytes = channels * static_cast<int>(sizeof(T));
-    const DoubleAxis across = acrossPairs<T>(line, box, source), down = downPairs<T>(line, box, source);
-    int32_t column[kBatch], row[kBatch];
-    double x[kBatch], y[kBatch];
-    for (int n; count > 0; count -= n, first += n) {
-        n = count < kBatch ? count : kBatch;
-        across.split(first, n, column, x);
-        down.split(first, n, row, y);
-        for (int i = 0; i < n; ++i, dst += pixelBytes) {
-            const uint8_t* p = source.origin + row[i] * source.step + column[i] * ptrdiff_t{pixelBytes};
-            const auto fx = static_cast<float>(x[i]), fy = static_cast<float>(y[i]);
+    forPairs<T, channels>(
+        source, line, box, first, count, dst, [&](const uint8_t* p, double x, double y, uint8_t* to, bool) {
+            const auto fx = static_cast<float>(x), fy = static_cast<float>(y);
             for (int c = 0; c < channels; ++c) {
                 const auto element = [=](const uint8_t* pixel) {
                     return static_cast<float>(qori::detail::loadWord<T>(pixel + c * static_cast<int>(sizeof(T))));
                 };
                 const float left = mix(element(p), element(p + source.step), fy);
                 const float right = mix(element(p + pixelBytes), element(p + pixelBytes + source.step), fy);
-                qori::detail::storeWord(dst + c * static_cast<int>(sizeof(T)), roundTo<T>(mix(left, right, fx)));
+                qori::detail::storeWord(to + c * static_cast<int>(sizeof(T)), roundTo<T>(mix(left, right, fx)));
             }
-        }
-    }
+        });
 }
 
 }  // namespace
