@@ -50,17 +50,16 @@ constexpr Comparator between(int32_t low, int32_t high) {
 
 /// Leaves out what no live place hears of, from the end; what lives is then what the elements before are needed for.
 constexpr void keepLive(Comparators& all, uint8_t* live) {
-    Comparator* const end = all.list + all.count;
-    Comparator* to = end;
-    for (Comparator* from = end; from != all.list;) {
-        --from;
-        uint8_t &low = live[from->low / kPlacesPerVector], &high = live[from->high / kPlacesPerVector];
+    int32_t to = all.count;
+    for (int32_t from = all.count - 1; from >= 0; --from) {
+        const Comparator c = all.list[from];
+        uint8_t &low = live[c.low / kPlacesPerVector], &high = live[c.high / kPlacesPerVector];
         if ((low | high) == 0) continue;
         low = high = 1;
-        *--to = *from;
+        all.list[--to] = c;
     }
-    all.count = static_cast<int32_t>(end - to);
-    std::copy(to, end, all.list);
+    for (int32_t i = to; i < all.count; ++i) all.list[i - to] = all.list[i];
+    all.count -= to;
 }
 
 /// Comparators that n elements take at most, to be sorted or merged.
@@ -86,14 +85,21 @@ constexpr void makeSort(int32_t n, Comparators& sort) {
         }
 }
 
-/// Both runs as halves of 2 * size places, the first one behind places of the smallest of all, the second one before
-/// places of the largest: comparators with such a place change nothing and are left out, whence any length.
-constexpr void makeMerge(Merge& merge) {
-    const int32_t size = 1 << log2Above(std::max(merge.first, merge.second));
-    const int32_t before = size - merge.first, end = size + merge.second;
+/// Of the halves of a merge, which are as long as its longer run rounded up to a power of two.
+constexpr int32_t halfOf(const Merge& merge) { return 1 << log2Above(std::max(merge.first, merge.second)); }
+
+/// The first step.
+constexpr void pairRuns(Merge& merge) {
+    const int32_t size = halfOf(merge);
     merge.paired = std::max(0, merge.length() - size);
-    merge.skipped = std::min(before, merge.second);
-    if (merge.rest.list == nullptr) return;
+    merge.skipped = std::min(size - merge.first, merge.second);
+}
+
+/// The other steps. Both runs as halves of 2 * size places, the first one behind places of the smallest of all, the
+/// second one before places of the largest: comparators with such a place change nothing and are left out, whence any
+/// length.
+constexpr void listSteps(Merge& merge) {
+    const int32_t size = halfOf(merge), before = size - merge.first, end = size + merge.second;
     merge.rest.count = 0;
     for (int32_t d = size / 2; d >= 1; d /= 2)
         for (int32_t block = d; block < 2 * size - d; block += 2 * d)

@@ -17,7 +17,8 @@ struct FixedMergeList {
     constexpr explicit FixedMergeList(const MergeShape& s) : merge{}, list{} {
         merge.first = s.first, merge.second = s.second, merge.begin = s.begin, merge.end = s.end;
         merge.rest.list = list;
-        comparators::makeMerge(merge);
+        comparators::pairRuns(merge);
+        comparators::listSteps(merge);
         merge.rest.list = nullptr;
     }
 };

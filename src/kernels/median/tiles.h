@@ -45,7 +45,8 @@ Merge mergeOf(Memory& memory, int32_t first, int32_t second, int32_t begin, int3
     Merge merge;
     merge.first = first, merge.second = second, merge.begin = begin, merge.end = end;
     merge.rest.list = memory.template take<Comparator>(comparators::mostToMerge(first, second));
-    comparators::makeMerge(merge);
+    comparators::pairRuns(merge);
+    if (merge.rest.list != nullptr) comparators::listSteps(merge);
     merge.fixed = numberOfFixed({first, second, begin, end});
     return merge;
 }
