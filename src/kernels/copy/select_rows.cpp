@@ -98,7 +98,10 @@ struct Masked {
 
     template <class Source>
     static QORI_INLINE void onePixel(uint8_t* dst, Source source, const uint8_t* mask) {
-        if (*mask != 0) __builtin_memcpy(dst, source.bytes(), selectedBytes);
+        if (*mask == 0) return;
+        uint8_t pixel[selectedBytes];  // images may overlap where the caller does not mind what comes out
+        __builtin_memcpy(pixel, source.bytes(), selectedBytes);
+        __builtin_memcpy(dst, pixel, selectedBytes);
     }
 
     /// The flags of the group's pixels at each byte of its vector k.

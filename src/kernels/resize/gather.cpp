@@ -248,7 +248,9 @@ QORI_NOINLINE void movePixels(const Gather& gather, const uint8_t* row, uint8_t*
     const Picks picks = gather.picks;
     const auto move = [&]<int bytes>(int32_t i) {
         const ptrdiff_t from = ptrdiff_t{picks.indices[i] - picks.first} * pixelBytes;
-        __builtin_memcpy(dst, row + from, bytes);
+        uint8_t pixel[bytes];  // images may overlap where the caller does not mind what comes out
+        __builtin_memcpy(pixel, row + from, bytes);
+        __builtin_memcpy(dst, pixel, bytes);
         dst += pixelBytes;
     };
     constexpr int kWide = pixelBytes % 3 == 0 ? pixelBytes / 3 * 4 : pixelBytes;

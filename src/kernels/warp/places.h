@@ -198,10 +198,12 @@ QORI_INLINE void prefetchAhead(const uint8_t* origin, __m256i offsets, ptrdiff_t
     prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_extracti128_si256(offsets, 1)), ahead);
 }
 
-/// A pixel of fixed size, moved.
+/// A pixel of fixed size, read before it is written: images may overlap where the caller does not mind what comes out.
 template <int bytes>
 QORI_INLINE void movePixel(uint8_t* to, const uint8_t* from) {
-    __builtin_memcpy(to, from, bytes);
+    uint8_t pixel[bytes];
+    __builtin_memcpy(pixel, from, bytes);
+    __builtin_memcpy(to, pixel, bytes);
 }
 
 /// Pixel (x, y), or the nearest one that may be read.
