@@ -16,7 +16,7 @@ inline constexpr int kHogSums = 16;
 /// Shares of one cell by bin. Votes of even and of odd columns are summed apart, since neighbours often vote for the
 /// same bin and each sum would wait for the one before. Beyond the last bin is one that is added to the first.
 struct CellShares {
-    static constexpr int kSets = 2, kBins = 17;
+    static constexpr int kSets = 2, kMostBins = 16, kBins = kMostBins + 1;
     alignas(kVectorBytes) float sum[kSets][kBins][kHogSums];
 };
 
@@ -30,7 +30,8 @@ inline void sumCell(const HogVotes& votes, ptrdiff_t step, int size, int nbins, 
     for (int y = 0; y < size; ++y) {
         const HogVotes row = votes.from(y * step);
         for (int x = 0; x < size; ++x, weights += kHogSums) {
-            float* const sums = shares.sum[x % CellShares::kSets][row.bin[x]];
+            // Whatever a caller whose images overlap the buffer has made of it, no bin is beyond the last.
+            float* const sums = shares.sum[x % CellShares::kSets][row.bin[x] & (CellShares::kMostBins - 1)];
             const Vec<float> first = splat(row.first[x]), second = splat(row.second[x]);
             const Vec<float> low = load(weights), high = load(weights + half);
             const auto add = [&](int at, Vec<float> weight, Vec<float> vote) {
