@@ -7,8 +7,7 @@
 
 namespace qori::transform {
 
-// --- sizes, plans
-// -----------------------------------------------------------------------------------------------------
+// --- sizes, plans ----------------------------------------------------------------------------------------------------
 
 template <Elements elements>
 QorResult reportFourierSizes(QorImageSize size, int32_t* planSize, int32_t* initSize, int32_t* bufferSize) {
@@ -71,8 +70,7 @@ QorResult planBufferSize(const QorFft2DPlan* plan, int32_t* bufferSize) {
     return QOR_OK;
 }
 
-// --- transforms
-// -------------------------------------------------------------------------------------------------------
+// --- transforms ------------------------------------------------------------------------------------------------------
 
 /// The checks of all transforms, then run(record, buffer) with the caller's buffer or one for the call.
 template <Family family, Elements elements, class Src, class Dst, class Run>

@@ -106,8 +106,7 @@ QorResult multiplyPackedConjugate(Image<const float> a, Image<const float> b, Im
     return multiplyFloats<true, layout>(a, b, dst, roi);
 }
 
-// --- images of every frequency
-// ----------------------------------------------------------------------------------------
+// --- images of every frequency ---------------------------------------------------------------------------------------
 
 /// Each frequency of the packed layout where it belongs, and its conjugate at the opposite place.
 template <Layout layout, class T, class Value>
@@ -157,8 +156,7 @@ QorResult phasePacked(Image<const T> src, Image<T> dst, QorImageSize roi, int32_
         return evaluatePacked<layout>(src, dst, roi, kernels::IntegerPhase<T>{scaleFactor});
 }
 
-// --- to complex images and back: moves, no arithmetic but signs
-// -------------------------------------------------------
+// --- to complex images and back: moves, no arithmetic but signs ------------------------------------------------------
 
 float negated(float v) { return -v; }
 int32_t negated(int32_t v) { return v == INT32_MIN ? INT32_MAX : -v; }
