@@ -1,179 +1,87 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <initializer_list>
 
-#include "fourier_cases.h"
+#include "fourier_members.h"
 
 namespace qori::test {
 namespace {
 
-constexpr PlanExports exportsOf(Elements elements) {
-    switch (elements) {
-        case Elements::real:
-            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
-                        return call(qoriDFTGetSize_R_32f, size, flag, 1, plan, init, buffer);
-                    },
-                    [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
-                        return call(qoriDFTInit_R_32f, size, flag, 2, plan, init);
-                    },
-                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
-                        return call(qoriDFTInitAlloc_R_32f, plan, size, flag, 1);
-                    },
-                    qoriDFTFree_R_32f, qoriDFTGetBufSize_R_32f};
-        case Elements::complex:
-            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
-                        return call(qoriDFTGetSize_C_32fc, size, flag, 1, plan, init, buffer);
-                    },
-                    [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
-                        return call(qoriDFTInit_C_32fc, size, flag, 2, plan, init);
-                    },
-                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
-                        return call(qoriDFTInitAlloc_C_32fc, plan, size, flag, 1);
-                    },
-                    qoriDFTFree_C_32fc, qoriDFTGetBufSize_C_32fc};
-        default:
-            return {nullptr, nullptr,
-                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
-                        return call(qoriDFTInitAlloc_R_32s, plan, size, flag, 1);
-                    },
-                    qoriDFTFree_R_32s, qoriDFTGetBufSize_R_32s};
+struct Dft {
+    static constexpr PlanExports exportsOf(Elements elements) {
+        switch (elements) {
+            case Elements::real:
+                return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+                            return call(qoriDFTGetSize_R_32f, size, flag, 1, plan, init, buffer);
+                        },
+                        [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
+                            return call(qoriDFTInit_R_32f, size, flag, 2, plan, init);
+                        },
+                        [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                            return call(qoriDFTInitAlloc_R_32f, plan, size, flag, 1);
+                        },
+                        qoriDFTFree_R_32f, qoriDFTGetBufSize_R_32f};
+            case Elements::complex:
+                return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+                            return call(qoriDFTGetSize_C_32fc, size, flag, 1, plan, init, buffer);
+                        },
+                        [](QorImageSize size, int32_t flag, QorFft2DPlan* plan, uint8_t* init) {
+                            return call(qoriDFTInit_C_32fc, size, flag, 2, plan, init);
+                        },
+                        [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                            return call(qoriDFTInitAlloc_C_32fc, plan, size, flag, 1);
+                        },
+                        qoriDFTFree_C_32fc, qoriDFTGetBufSize_C_32fc};
+            default:
+                return {nullptr, nullptr,
+                        [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                            return call(qoriDFTInitAlloc_R_32s, plan, size, flag, 1);
+                        },
+                        qoriDFTFree_R_32s, qoriDFTGetBufSize_R_32s};
+        }
     }
-}
 
-constexpr int32_t kFlags[] = {fftDivFwdByN, fftDivInvByN, fftDivBySqrtN, fftNoDiv};
-int32_t anyFlag() { return kFlags[random().below(4)]; }
-
-/// Every width and every height to 64 (of the main layout, else some), with another that changes; factors of all kinds,
-/// chirps in a whole side and in parts of it.
-template <class Check>
-void forSizes(bool isMain, Check check) {
-    for (int n = 1; n <= 64; ++n) {
-        if (isMain || random().oneIn(5)) check(QorImageSize{n, 1 + n * 7 % 23});
-        if (isMain || random().oneIn(5)) check(QorImageSize{1 + n * 5 % 19, n});
+    /// Every width and every height to 64 (of the main layout, else some), with another that changes; factors of all
+    /// kinds, chirps in a whole side and in parts of it.
+    template <class Check>
+    static void forSizes(bool isMain, Check check) {
+        for (int n = 1; n <= 64; ++n) {
+            if (isMain || random().oneIn(5)) check(QorImageSize{n, 1 + n * 7 % 23});
+            if (isMain || random().oneIn(5)) check(QorImageSize{1 + n * 5 % 19, n});
+        }
+        if (!isMain) return check(QorImageSize{202, 101});
+        for (QorImageSize size : {QorImageSize{360, 2},
+                                  {3, 1000},
+                                  {202, 17},
+                                  {101, 17},
+                                  {18, 206},
+                                  {17, 509},
+                                  {1009, 1},
+                                  {2, 1009},
+                                  {2022, 1},
+                                  {4099, 1},
+                                  {1155, 3},
+                                  {47, 64},
+                                  {96, 32},
+                                  {40, 128},
+                                  {3, 1201},
+                                  {1, 2309},
+                                  {193, 2},
+                                  {2, 149},
+                                  {89, 3}})
+            check(size);
     }
-    if (!isMain) return check(QorImageSize{202, 101});
-    for (QorImageSize size : {QorImageSize{360, 2},
-                              {3, 1000},
-                              {202, 17},
-                              {101, 17},
-                              {18, 206},
-                              {17, 509},
-                              {1009, 1},
-                              {2, 1009},
-                              {2022, 1},
-                              {4099, 1},
-                              {1155, 3},
-                              {47, 64},
-                              {96, 32},
-                              {40, 128},
-                              {3, 1201},
-                              {1, 2309},
-                              {193, 2},
-                              {2, 149},
-                              {89, 3}})
-        check(size);
-}
-
-template <Elements elements, Layout layout, Kind kind, class Check>
-void sweep(const char* name, Check check) {
-    forSizes(layout == Layout::C1 && kind == Kind::R, [=](QorImageSize size) {
-        if (!testing::Test::HasFailure()) check(exportsOf(elements), size);
-    });
-    markSwept(name);
-}
-
-// One function an operation, by the names of the registry.
-
-template <class, class, Layout layout, Kind kind, class Function>
-void forwardToPack(const char* name, Function function) {
-    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkReal<layout, kind, true>(function, exports, size, anyFlag());
-    });
-}
-template <class, class, Layout layout, Kind kind, class Function>
-void inverseFromPack(const char* name, Function function) {
-    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkReal<layout, kind, false>(function, exports, size, anyFlag());
-    });
-}
-template <class, class, Layout layout, Kind kind, class Function>
-void forwardComplex(const char* name, Function function) {
-    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkComplex<kind, true>(function, exports, size, anyFlag());
-    });
-}
-template <class, class, Layout layout, Kind kind, class Function>
-void inverseComplex(const char* name, Function function) {
-    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkComplex<kind, false>(function, exports, size, anyFlag());
-    });
-}
-template <class S, class D, Layout layout, Kind kind, class Function>
-void forwardToIntegers(const char* name, Function function) {
-    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkIntegers<S, D, layout, true>(function, exports, size, anyFlag(), random().below(9) - 4);
-    });
-}
-template <class S, class D, Layout layout, Kind kind, class Function>
-void inverseToBytes(const char* name, Function function) {
-    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkIntegers<S, D, layout, false>(function, exports, size, anyFlag(), random().below(9) - 2);
-    });
-}
-
-// Plans are made, measured and released by every one of these.
-template <class, class, Layout, Kind, class Function>
-void getSize(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void init(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void initAlloc(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void freePlan(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void planBufferSize(const char* name, Function) {
-    markSwept(name);
-}
+};
 
 TEST(Dft, AllMembers) {
-#define QORI_KIND_ Kind::none
-#define QORI_KIND_R Kind::R
-#define QORI_KIND_IR Kind::IR
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
-    operation<S, D, Layout::SL, QORI_KIND_##kind>(#name, &name);
+    FourierMembers<Dft>::operation<S, D, Layout::SL, QORI_KIND_##kind>(#name, &name);
 #include "members/dft.inc"
 #undef QORI_MEMBER
 }
 
 TEST(Dft, FailsInOrder) {
-    const PlanExports real = exportsOf(Elements::real), integers = exportsOf(Elements::integers),
-                      complex = exportsOf(Elements::complex);
-    checkOperation(
-        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
-            return call(qoriDFTFwd_RToPack_32f_C1R, static_cast<const float*>(src), srcStep, static_cast<float*>(dst),
-                        dstStep, plan, buffer);
-        },
-        real, {integers, complex});
-    checkOperation(
-        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
-            return call(qoriDFTInv_PackToR_32s8u_C1RSfs, static_cast<const int32_t*>(src), srcStep,
-                        static_cast<uint8_t*>(dst), dstStep, plan, 3, buffer);
-        },
-        integers, {real, complex});
-    checkOperation(
-        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
-            return call(qoriDFTInv_CToC_32fc_C1R, static_cast<const QorComplex32f*>(src), srcStep,
-                        static_cast<QorComplex32f*>(dst), dstStep, plan, buffer);
-        },
-        complex, {real, integers});
-    for (const PlanExports& exports : {real, integers, complex}) checkAllocations(exports, {1009, 1200});
+    FourierMembers<Dft>::checkFailures(qoriDFTFwd_RToPack_32f_C1R, qoriDFTInv_PackToR_32s8u_C1RSfs,
+                                       qoriDFTInv_CToC_32fc_C1R, {1009, 1200});
 }
 
 TEST(Dft, PlansAreRefusedInOrder) {
@@ -215,7 +123,7 @@ TEST(Dft, PlansAreRefusedInOrder) {
 /// Plans of powers of two are the other family's in all but their tag.
 TEST(Dft, AgreesWithFft) {
     const QorImageSize size{64, 32};
-    const Plan plan(exportsOf(Elements::real), size, fftDivBySqrtN);
+    const Plan plan(Dft::exportsOf(Elements::real), size, fftDivBySqrtN);
     QorFft2DPlan* other = nullptr;
     ASSERT_EQ(QOR_OK, call(qoriFFTInitAlloc_R_32f, &other, 6, 5, int32_t{fftDivBySqrtN}, 1));
     const Shape shape = shapeOf(size);

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <initializer_list>
 
-#include "fourier_cases.h"
+#include "fourier_members.h"
 
 namespace qori::test {
 namespace {
@@ -12,10 +12,12 @@ int32_t orderOf(int32_t n) {
     return order;
 }
 
-constexpr PlanExports exportsOf(Elements elements) {
-    switch (elements) {
-        case Elements::real:
-            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+struct Fft {
+    static constexpr PlanExports exportsOf(Elements elements) {
+        switch (elements) {
+            case Elements::real:
+                return {
+                    [](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
                         return call(qoriFFTGetSize_R_32f, orderOf(size.width), orderOf(size.height), flag, 1, plan,
                                     init, buffer);
                     },
@@ -26,8 +28,9 @@ constexpr PlanExports exportsOf(Elements elements) {
                         return call(qoriFFTInitAlloc_R_32f, plan, orderOf(size.width), orderOf(size.height), flag, 1);
                     },
                     qoriFFTFree_R_32f, qoriFFTGetBufSize_R_32f};
-        case Elements::complex:
-            return {[](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
+            case Elements::complex:
+                return {
+                    [](QorImageSize size, int32_t flag, int32_t* plan, int32_t* init, int32_t* buffer) {
                         return call(qoriFFTGetSize_C_32fc, orderOf(size.width), orderOf(size.height), flag, 1, plan,
                                     init, buffer);
                     },
@@ -38,131 +41,40 @@ constexpr PlanExports exportsOf(Elements elements) {
                         return call(qoriFFTInitAlloc_C_32fc, plan, orderOf(size.width), orderOf(size.height), flag, 1);
                     },
                     qoriFFTFree_C_32fc, qoriFFTGetBufSize_C_32fc};
-        default:
-            return {nullptr, nullptr,
-                    [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
-                        return call(qoriFFTInitAlloc_R_32s, plan, orderOf(size.width), orderOf(size.height), flag, 1);
-                    },
-                    qoriFFTFree_R_32s, qoriFFTGetBufSize_R_32s};
+            default:
+                return {nullptr, nullptr,
+                        [](QorFft2DPlan** plan, QorImageSize size, int32_t flag) {
+                            return call(qoriFFTInitAlloc_R_32s, plan, orderOf(size.width), orderOf(size.height), flag,
+                                        1);
+                        },
+                        qoriFFTFree_R_32s, qoriFFTGetBufSize_R_32s};
+        }
     }
-}
 
-constexpr int32_t kFlags[] = {fftDivFwdByN, fftDivInvByN, fftDivBySqrtN, fftNoDiv};
-int32_t anyFlag() { return kFlags[random().below(4)]; }
-
-/// Every pair of sides up to 64 (of the main layout, else some), some larger ones where tables come from the init
-/// buffer and blocks leave a cache.
-template <class Check>
-void forSizes(bool isMain, Check check) {
-    for (int x = 0; x <= 6; ++x)
-        for (int y = 0; y <= 6; ++y)
-            if (isMain || random().oneIn(4)) check(QorImageSize{1 << x, 1 << y});
-    if (!isMain) return check(QorImageSize{2048, 2});
-    for (QorImageSize size : {QorImageSize{128, 16}, {16, 256}, {512, 2}, {2, 1024}, {2048, 1}, {4, 2048}, {4096, 2}})
-        check(size);
-}
-
-template <Elements elements, Layout layout, Kind kind, class Check>
-void sweep(const char* name, Check check) {
-    forSizes(layout == Layout::C1 && kind == Kind::R, [=](QorImageSize size) {
-        if (!testing::Test::HasFailure()) check(exportsOf(elements), size);
-    });
-    markSwept(name);
-}
-
-// One function an operation, by the names of the registry.
-
-template <class, class, Layout layout, Kind kind, class Function>
-void forwardToPack(const char* name, Function function) {
-    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkReal<layout, kind, true>(function, exports, size, anyFlag());
-    });
-}
-template <class, class, Layout layout, Kind kind, class Function>
-void inverseFromPack(const char* name, Function function) {
-    sweep<Elements::real, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkReal<layout, kind, false>(function, exports, size, anyFlag());
-    });
-}
-template <class, class, Layout layout, Kind kind, class Function>
-void forwardComplex(const char* name, Function function) {
-    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkComplex<kind, true>(function, exports, size, anyFlag());
-    });
-}
-template <class, class, Layout layout, Kind kind, class Function>
-void inverseComplex(const char* name, Function function) {
-    sweep<Elements::complex, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkComplex<kind, false>(function, exports, size, anyFlag());
-    });
-}
-template <class S, class D, Layout layout, Kind kind, class Function>
-void forwardToIntegers(const char* name, Function function) {
-    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkIntegers<S, D, layout, true>(function, exports, size, anyFlag(), random().below(9) - 4);
-    });
-}
-template <class S, class D, Layout layout, Kind kind, class Function>
-void inverseToBytes(const char* name, Function function) {
-    sweep<Elements::integers, layout, kind>(name, [=](const PlanExports& exports, QorImageSize size) {
-        checkIntegers<S, D, layout, false>(function, exports, size, anyFlag(), random().below(9) - 2);
-    });
-}
-
-// Plans are made, measured and released by every one of these.
-template <class, class, Layout, Kind, class Function>
-void getSize(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void init(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void initAlloc(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void freePlan(const char* name, Function) {
-    markSwept(name);
-}
-template <class, class, Layout, Kind, class Function>
-void planBufferSize(const char* name, Function) {
-    markSwept(name);
-}
+    /// Every pair of sides up to 64 (of the main layout, else some), some larger ones where tables come from the init
+    /// buffer and blocks leave a cache.
+    template <class Check>
+    static void forSizes(bool isMain, Check check) {
+        for (int x = 0; x <= 6; ++x)
+            for (int y = 0; y <= 6; ++y)
+                if (isMain || random().oneIn(4)) check(QorImageSize{1 << x, 1 << y});
+        if (!isMain) return check(QorImageSize{2048, 2});
+        for (QorImageSize size :
+             {QorImageSize{128, 16}, {16, 256}, {512, 2}, {2, 1024}, {2048, 1}, {4, 2048}, {4096, 2}})
+            check(size);
+    }
+};
 
 TEST(Fft, AllMembers) {
-#define QORI_KIND_ Kind::none
-#define QORI_KIND_R Kind::R
-#define QORI_KIND_IR Kind::IR
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
-    operation<S, D, Layout::SL, QORI_KIND_##kind>(#name, &name);
+    FourierMembers<Fft>::operation<S, D, Layout::SL, QORI_KIND_##kind>(#name, &name);
 #include "members/fft.inc"
 #undef QORI_MEMBER
 }
 
 TEST(Fft, FailsInOrder) {
-    const PlanExports real = exportsOf(Elements::real), integers = exportsOf(Elements::integers),
-                      complex = exportsOf(Elements::complex);
-    checkOperation(
-        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
-            return call(qoriFFTFwd_RToPack_32f_C1R, static_cast<const float*>(src), srcStep, static_cast<float*>(dst),
-                        dstStep, plan, buffer);
-        },
-        real, {integers, complex});
-    checkOperation(
-        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
-            return call(qoriFFTInv_PackToR_32s8u_C1RSfs, static_cast<const int32_t*>(src), srcStep,
-                        static_cast<uint8_t*>(dst), dstStep, plan, 3, buffer);
-        },
-        integers, {real, complex});
-    checkOperation(
-        [](const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan, uint8_t* buffer) {
-            return call(qoriFFTInv_CToC_32fc_C1R, static_cast<const QorComplex32f*>(src), srcStep,
-                        static_cast<QorComplex32f*>(dst), dstStep, plan, buffer);
-        },
-        complex, {real, integers});
-    for (const PlanExports& exports : {real, integers, complex}) checkAllocations(exports, {2048, 4096});
+    FourierMembers<Fft>::checkFailures(qoriFFTFwd_RToPack_32f_C1R, qoriFFTInv_PackToR_32s8u_C1RSfs,
+                                       qoriFFTInv_CToC_32fc_C1R, {2048, 4096});
 }
 
 TEST(Fft, PlansAreRefusedInOrder) {
@@ -222,7 +134,7 @@ TEST(Fft, PlansAreRefusedInOrder) {
 TEST(Fft, ConstantsAreExact) {
     for (const auto& [flag, expected] : {std::pair{fftDivFwdByN, 3.0f}, {fftNoDiv, 3.0f * 32 * 16}}) {
         const QorImageSize size{32, 16};
-        const Plan plan(exportsOf(Elements::real), size, flag);
+        const Plan plan(Fft::exportsOf(Elements::real), size, flag);
         const TestImage image(kDst, shapeOf(size), 4);
         image.fill<float>(1, [] { return 3.0f; });
         EXPECT_EQ(QOR_OK,

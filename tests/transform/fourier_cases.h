@@ -4,6 +4,7 @@
 #pragma once
 #include <algorithm>
 #include <cmath>
+#include <functional>
 #include <vector>
 
 #include "harness/pixelwise.h"
@@ -255,15 +256,14 @@ void checkIntegers(Function function, const PlanExports& exports, QorImageSize s
     }
 }
 
-// --- statuses, memory
-// -------------------------------------------------------------------------------------------------
+// --- statuses, memory ------------------------------------------------------------------------------------------------
 
 /// An operation with everything but its plan and images fixed.
-using Operation = QorResult (*)(const void* src, int32_t srcStep, void* dst, int32_t dstStep, const QorFft2DPlan* plan,
-                                uint8_t* buffer);
+using Operation = std::function<QorResult(const void* src, int32_t srcStep, void* dst, int32_t dstStep,
+                                          const QorFft2DPlan* plan, uint8_t* buffer)>;
 
 /// `right` makes plans for the operation, `wrong` others.
-inline void checkOperation(Operation run, const PlanExports& right, const std::vector<PlanExports>& wrong) {
+inline void checkOperation(const Operation& run, const PlanExports& right, const std::vector<PlanExports>& wrong) {
     const QorImageSize size{8, 4};
     const TestImage src(kSrc, {.width = 64, .height = 4}, 1), dst(kDst, {.width = 64, .height = 4}, 1);
     QorFft2DPlan *plan = nullptr, *other = nullptr;
