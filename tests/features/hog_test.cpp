@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "harness/window.h"
+#include "reference/border_axis.h"
 #include "reference/hog.h"
 
 namespace qori::test {
@@ -43,19 +44,6 @@ private:
     TestImage block_;
 };
 
-/// One axis of the area: pixels beyond its closed sides are others of it, or missing.
-struct Axis {
-    int count;
-    bool openBefore, openBehind;
-
-    bool isMissing(int at) const { return (at < 0 && !openBefore) || (at >= count && !openBehind); }
-    int seen(int at, int32_t kind) const {
-        if (!isMissing(at)) return at;
-        if (kind == kMirror) return at < 0 ? -at : 2 * (count - 1) - at;
-        return std::clamp(at, 0, count - 1);
-    }
-};
-
 template <class T>
 struct Source {
     View<T> region;  ///< Its origin is pixel (0, 0).
@@ -66,11 +54,11 @@ struct Source {
 
     bool opens(int32_t flag) const { return (border & 15) == borderReadAll || (border & flag) != 0; }
     float at(int x, int y, int c) const {
-        const Axis columns{area.width, opens(borderReadLeft), opens(borderReadRight)};
-        const Axis rows{area.height, opens(borderReadTop), opens(borderReadBottom)};
+        const reference::BorderAxis columns{area.width, opens(borderReadLeft), opens(borderReadRight)};
+        const reference::BorderAxis rows{area.height, opens(borderReadTop), opens(borderReadBottom)};
         const int32_t kind = border & 15;
         if (kind == borderConstant && (columns.isMissing(x) || rows.isMissing(y))) return static_cast<float>(value[c]);
-        return static_cast<float>(region.get(columns.seen(x, kind), rows.seen(y, kind), c));
+        return static_cast<float>(region.get(columns.seen(x, kind == kMirror), rows.seen(y, kind == kMirror), c));
     }
     HogVote vote(int x, int y, int nbins) const {
         HogGradient best{};

@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "harness/window.h"
+#include "reference/border_axis.h"
 
 namespace qori::test {
 namespace {
@@ -32,20 +33,6 @@ std::vector<Neighbour> neighboursOf(int side, int bits, int mode) {
     return neighbours;
 }
 
-/// The coordinate that stands for one along an axis, or none with the constant.
-struct Axis {
-    int count;
-    bool openBefore, openBehind;
-
-    bool isMissing(int at) const { return (at < 0 && !openBefore) || (at >= count && !openBehind); }
-    int seen(int at, int32_t kind) const {
-        if (!isMissing(at)) return at;
-        if (kind != kMirror) return std::clamp(at, 0, count - 1);
-        if (count == 1 && !openBefore && !openBehind) return 0;
-        return seen(at < 0 ? -at : 2 * (count - 1) - at, kind);
-    }
-};
-
 struct Job {
     Shape shape;
     int reach;
@@ -54,8 +41,8 @@ struct Job {
     bool opens(int32_t flag) const {
         return (border & 15) == borderReadAll || (border & 0xF0) == 0xF0 || (border & flag) != 0;
     }
-    Axis columns() const { return {shape.width, opens(borderReadLeft), opens(borderReadRight)}; }
-    Axis rows() const { return {shape.height, opens(borderReadTop), opens(borderReadBottom)}; }
+    reference::BorderAxis columns() const { return {shape.width, opens(borderReadLeft), opens(borderReadRight)}; }
+    reference::BorderAxis rows() const { return {shape.height, opens(borderReadTop), opens(borderReadBottom)}; }
     Around around() const {
         const auto side = [&](int32_t flag) { return opens(flag) ? reach : 0; };
         return {side(borderReadLeft), side(borderReadTop), side(borderReadRight), side(borderReadBottom)};
@@ -85,14 +72,15 @@ void checkPatterns(const Job& job, Truth truth, Invoke invoke) {
     Snapshot expected = dst.snapshot();
     const View<T> from = src.view<T>(1);
     const View<D> to = expected.view<D>(1);
-    const Axis columns = job.columns(), rows = job.rows();
+    const reference::BorderAxis columns = job.columns(), rows = job.rows();
     const int32_t kind = job.border & 15;
     for (int y = 0; y < job.shape.height; ++y)
         for (int x = 0; x < job.shape.width; ++x)
             to.set(x, y, 0, static_cast<D>(truth([&](int dx, int dy) {
                        const bool missing = columns.isMissing(x + dx) || rows.isMissing(y + dy);
                        if (missing && kind == borderConstant) return value;
-                       return from.get(columns.seen(x + dx, kind) + around.left, rows.seen(y + dy, kind) + around.top);
+                       return from.get(columns.seen(x + dx, kind == kMirror) + around.left,
+                                       rows.seen(y + dy, kind == kMirror) + around.top);
                    })));
     const ptrdiff_t inside = around.top * ptrdiff_t{src.step()} + around.left * static_cast<ptrdiff_t>(sizeof(T));
     auto* const region = reinterpret_cast<const T*>(src.data<uint8_t>() + inside);
