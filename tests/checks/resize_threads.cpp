@@ -1,20 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 // Threads share a plan, a source and a destination, and take the destination's tiles as they come. The image is that of
 // one call; built for it, the thread sanitizer watches.
-#include <atomic>
 #include <cstdio>
-#include <cstring>
 #include <functional>
-#include <thread>
-#include <vector>
 
-#include "qori.h"
+#include "tiles_in_threads.h"
 
 namespace {
 
 constexpr QorImageSize kSrc{331, 217}, kDst{240, 160};
-constexpr int kTile = 37, kThreads = 4, kChannels = 3;
-using Bytes = std::vector<uint8_t>;
+constexpr int kTile = 37, kChannels = 3;
 
 /// One interpolation: how its plan is filled and how a tile of it is made.
 struct Way {
@@ -77,23 +72,12 @@ bool agrees(const Way& way) {
     auto* plan = reinterpret_cast<QorResizePlan*>(memory.data());
     if (way.init(plan, init.data()) != QOR_OK) return false;
     Bytes src(static_cast<size_t>(kSrcStep) * kSrc.height), whole(static_cast<size_t>(kDstStep) * kDst.height);
-    uint32_t state = 1;
-    for (uint8_t& byte : src) byte = static_cast<uint8_t>((state = state * 1664525u + 1013904223u) >> 24);
+    fillBytes(src);
     Bytes tiled = whole;
     if (!makeTile(way, plan, src, whole, {0, 0}, kDst)) return false;
 
-    constexpr int columns = (kDst.width + kTile - 1) / kTile, rows = (kDst.height + kTile - 1) / kTile;
-    std::atomic<int> next{0};
-    std::atomic<bool> succeeded{true};
-    std::vector<std::thread> threads;
-    for (int t = 0; t < kThreads; ++t)
-        threads.emplace_back([&] {
-            for (int i = next++; i < columns * rows; i = next++) {
-                const QorPoint2D at{i % columns * kTile, i / columns * kTile};
-                if (!makeTile(way, plan, src, tiled, at, {kTile, kTile})) succeeded = false;
-            }
-        });
-    for (std::thread& thread : threads) thread.join();
+    const bool succeeded = makeTilesInThreads(
+        kDst, kTile, [&](QorPoint2D at, QorImageSize size) { return makeTile(way, plan, src, tiled, at, size); });
     return succeeded && tiled == whole;
 }
 
