@@ -12,8 +12,10 @@ option(QORI_WERROR "Treat warnings as errors" OFF)
 
 find_program(QORI_CCACHE ccache)
 if(QORI_CCACHE)
-    set(CMAKE_C_COMPILER_LAUNCHER ${QORI_CCACHE})
-    set(CMAKE_CXX_COMPILER_LAUNCHER ${QORI_CCACHE})
+    # Without these a precompiled header keeps its users out of the cache.
+    set(launcher ${CMAKE_COMMAND} -E env CCACHE_SLOPPINESS=pch_defines,time_macros ${QORI_CCACHE})
+    set(CMAKE_C_COMPILER_LAUNCHER ${launcher})
+    set(CMAKE_CXX_COMPILER_LAUNCHER ${launcher})
 endif()
 
 add_library(qori_warnings INTERFACE)
