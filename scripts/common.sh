@@ -28,3 +28,16 @@ start_wine() {
         fi
     fi
 }
+
+# Keeps Wine's own processes running until stop_wine. A test that started them would hand them its output, and whoever
+# reads that would wait for their end: the first test of a run seemed to last as long as all the others.
+hold_wine() {
+    local -r held=$WINEPREFIX/held
+    [[ -p $held ]] || mkfifo "$held"
+    exec {wine_input}<>"$held"
+    wine cmd <&"$wine_input" >/dev/null 2>&1 &
+    # It is up when it has answered once.
+    wine cmd /c exit >/dev/null 2>&1
+}
+
+stop_wine() { wineserver -k || true; }
