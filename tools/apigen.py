@@ -65,6 +65,9 @@ def reference_page(family):
     for group in family.groups:
         brief, fields = documentation(group)
         lines += [f"## {brief}", ""]
+        names = {m.operation.snake: None for m in group.members if m.purpose == "operation"}
+        if names:
+            lines += ["**In Python and C++.** " + ", ".join(f"`{name}`" for name in names), ""]
         for label, text in fields:
             if label == "Example":
                 lines += ["**Example**", "", "```c", text.strip(), "```", ""]

@@ -5,6 +5,8 @@ import tomllib
 from dataclasses import dataclass, field
 from pathlib import Path
 
+import roles
+
 ROOT = Path(__file__).resolve().parent.parent
 LAYOUT = re.compile(r"^(?P<src>AC4|AC1|[CP][1-4]|AP4)(?P<dst>C3C|C4C|AC4|A0C4|[CP][1-4]|AP4|C)?$")
 
@@ -29,6 +31,12 @@ class Member:
     call: str = ""
     stack_bytes: int = 0
     checks: list = field(default_factory=list)
+    types: str = ""                 # codes as in the name
+    layout: str = ""
+    c_operation: str = ""           # op and variant, the key of api/roles.toml
+    operation: roles.Operation = None
+    arguments: list = field(default_factory=list)
+    purpose: str = ""
 
     @property
     def prototype(self):
@@ -107,7 +115,8 @@ def checks_of(keys):
 
 
 def make_member(group, keys, forms, name, kind="", types=None, layout=None):
-    member = Member(name=name, group=group, kind=kind)
+    member = Member(name=name, group=group, kind=kind, types=types or "", layout=layout or "")
+    member.c_operation = "_".join(filter(None, [keys["op"], keys.get("variant")])) if "op" in keys else name[4:]
     values = dict(keys.get("vars", {}), K=kind, T=types or "", L="Layout::C1", DL="Layout::C1")
     if types:
         member.source, member.target = split_types(types, forms["types"])
@@ -165,7 +174,7 @@ def load(folder):
     forms = tomllib.loads((folder / "forms.toml").read_text())
     families = []
     for path in sorted(folder.glob("*.toml")):
-        if path.name == "forms.toml":
+        if path.name in ("forms.toml", "roles.toml"):
             continue
         data = tomllib.loads(path.read_text())
         data["texts"] = forms["texts"] | data.get("texts", {})
@@ -173,11 +182,23 @@ def load(folder):
         for keys in data.pop("group"):
             family.groups.append(expand_group(family, data | keys, forms))
         families.append(family)
-    names = [m.name for m in all_members(families)]
-    twice = [a for a, b in zip(names, names[1:]) if a == b]
+    members = all_members(families)
+    twice = [a.name for a, b in zip(members, members[1:]) if a.name == b.name]
     if twice:
         raise RegistryError(f"listed twice: {twice[:5]}")
+    give_roles(families, tomllib.loads((folder / "roles.toml").read_text()))
     return families
+
+
+def give_roles(families, table):
+    enums = roles.enumerations((ROOT / "api" / "header.h.in").read_text())
+    try:
+        for family in families:
+            for member in (m for g in family.groups for m in g.members):
+                roles.apply(member, family.stem, table, enums)
+        roles.check(all_members(families))
+    except roles.RoleError as error:
+        raise RegistryError(str(error)) from error
 
 
 def all_members(families):
