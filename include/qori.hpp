@@ -183,6 +183,9 @@ public:
 
     template <class U, detail::If<std::is_same_v<const U, T>> = 0>
     constexpr View(const View<U, L>& other) noexcept : View(other.data(), other.step(), other.size()) {}
+    /** What is const stays so. */
+    template <class U, detail::If<std::is_same_v<U, const T>> = 0>
+    View(const View<U, L>& other) = delete;
 
     /** Rows without gaps in a span, an array class or a vector: nothing where it is too short for the size. */
     template <class S, detail::If<detail::isSpan<S, T>> = 0>
@@ -571,8 +574,6 @@ struct Anything {
 };
 template <class F>
 inline constexpr bool found = !std::is_same_v<F, Missing>;
-template <unsigned>
-inline constexpr bool never = false;
 
 /** Reads and writes of images, as keys are made of them. */
 template <class A>
@@ -660,6 +661,8 @@ struct Argument {
 };
 template <class R, class... P, unsigned I>
 struct Argument<R(QORI_CALL*)(P...), I> : Nth<I, P...> {};
+template <class R, class... P, unsigned I>
+struct Argument<R(QORI_CALL*)(P...) noexcept, I> : Nth<I, P...> {};
 template <class F, unsigned I>
 using Arg = typename Argument<F, I>::type;
 template <class A, class B>
@@ -832,12 +835,13 @@ template <unsigned k> constexpr auto allocate_0() noexcept {
     "qori::allocate: no such call. allocate(width, height, step) of 8u, 16u, 16s, 32s, 32f, 32sc, 32fc: C1 C2 " \
     "C3 C4 AC4"
 /** Allocates an image whose rows start on 64-byte boundaries. C: qoriMalloc. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::allocate_0<k>())>
+template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::allocate_0<k>()), bool
+    exists = false>
 [[nodiscard]] T* allocate(int32_t width, int32_t height, int32_t* step) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::allocate_0<k>()(width, height, step);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return nullptr;
     }
 }
@@ -1055,7 +1059,8 @@ template <unsigned k> constexpr auto add_7() noexcept {
 /** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even. Adds constants to an image: saturate((src
  *  + value) * 2^-scaleFactor), ties to even. C: qoriAdd, qoriAddC. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::add_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::add_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult add(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1065,13 +1070,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::add_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::add_2<k>()), class F1 = decltype(detail::add_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1086,12 +1091,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         if (detail::differ(aV, bV, dstV)) return QOR_ERR_SIZE;
         return detail::add_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1099,12 +1104,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::add_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::add_3<k>()), class F1 = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::add_3<k>()), class F1 = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1117,12 +1123,12 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::add_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::add_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0>
+    decltype(detail::add_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -1131,13 +1137,13 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::add_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
     decltype(detail::add_6<k>()), class F1 = decltype(detail::add_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>,
     k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -1151,24 +1157,24 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::add_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::add_5<k>())>
+    decltype(detail::add_5<k>()), bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::add_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::add_7<k>()), class F1 = decltype(detail::add_5<k>())>
+    decltype(detail::add_7<k>()), class F1 = decltype(detail::add_5<k>()), bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
     detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
@@ -1178,14 +1184,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::add_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult add(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult add(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1324,7 +1330,8 @@ template <unsigned k> constexpr auto subtract_7() noexcept {
 /** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even. Subtracts
  *  constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even. C: qoriSub, qoriSubC. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1334,13 +1341,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::subtract_0<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(),
             aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::subtract_2<k>()), class F1 = decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1357,12 +1364,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::subtract_0<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(),
             aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const B& b, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1370,13 +1377,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::subtract_1<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
     = decltype(detail::subtract_3<k>()), class F1 = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>>
-    = 0>
+    = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const B& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1389,12 +1396,12 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::subtract_1<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0>
+    decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -1404,13 +1411,13 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::subtract_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
     decltype(detail::subtract_6<k>()), class F1 = decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1,
     2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -1424,24 +1431,24 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::subtract_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::subtract_5<k>())>
+    decltype(detail::subtract_5<k>()), bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t
     scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::subtract_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::subtract_7<k>()), class F1 = decltype(detail::subtract_5<k>())>
+    decltype(detail::subtract_7<k>()), class F1 = decltype(detail::subtract_5<k>()), bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
     detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
@@ -1451,14 +1458,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::subtract_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult subtract(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult subtract(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1597,7 +1604,8 @@ template <unsigned k> constexpr auto multiply_7() noexcept {
 /** Multiplies two images: saturate(src1 * src2 * 2^-scaleFactor), ties to even. Multiplies an image by constants:
  *  saturate(src * value * 2^-scaleFactor), ties to even. C: qoriMul, qoriMulC. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1607,13 +1615,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::multiply_2<k>()), class F1 = decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1630,12 +1638,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1643,13 +1651,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
     = decltype(detail::multiply_3<k>()), class F1 = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>>
-    = 0>
+    = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1662,12 +1670,12 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0>
+    decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -1677,13 +1685,13 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::multiply_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
     decltype(detail::multiply_6<k>()), class F1 = decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1,
     2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -1697,24 +1705,24 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::multiply_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_5<k>())>
+    decltype(detail::multiply_5<k>()), bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t
     scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_7<k>()), class F1 = decltype(detail::multiply_5<k>())>
+    decltype(detail::multiply_7<k>()), class F1 = decltype(detail::multiply_5<k>()), bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
     detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
@@ -1724,14 +1732,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::multiply_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult multiply(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult multiply(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1790,7 +1798,7 @@ template <unsigned k> constexpr auto multiply_fraction_3() noexcept {
  *  qoriMulCScale. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::multiply_fraction_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1800,12 +1808,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_fraction_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_fraction_1<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::multiply_fraction_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1813,12 +1821,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_fraction_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_fraction_2<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0>
+    decltype(detail::multiply_fraction_2<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult multiply_fraction(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst) noexcept
     {
     if constexpr (detail::found<F0>) {
@@ -1828,26 +1837,26 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::multiply_fraction_2<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(),
             aV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_fraction_3<k>())>
+    decltype(detail::multiply_fraction_3<k>()), bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_fraction_3<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult multiply_fraction(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult multiply_fraction(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2018,7 +2027,7 @@ template <unsigned k> constexpr auto divide_9() noexcept {
  *  the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even. Divides the second image by the first, rounding
  *  as told: saturate(round(src2 / src1 * 2^-scaleFactor)). C: qoriDivC, qoriDiv, qoriDiv_Round. */
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0>
+    decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -2028,13 +2037,13 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::divide_0<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
     decltype(detail::divide_2<k>()), class F1 = decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>,
     k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -2048,24 +2057,24 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::divide_0<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::divide_1<k>())>
+    decltype(detail::divide_1<k>()), bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::divide_1<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::divide_3<k>()), class F1 = decltype(detail::divide_1<k>())>
+    decltype(detail::divide_3<k>()), class F1 = decltype(detail::divide_1<k>()), bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
     detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
@@ -2075,12 +2084,13 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::divide_1<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_4<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::divide_4<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2090,13 +2100,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_4<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::divide_6<k>()), class F1 = decltype(detail::divide_4<k>()), class F2 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2119,12 +2130,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_8<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             roundNearestEven, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_5<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::divide_5<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2132,13 +2143,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_5<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
     = decltype(detail::divide_7<k>()), class F1 = decltype(detail::divide_5<k>()), class F2 =
-    decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0>
+    decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2156,12 +2167,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_9<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), roundNearestEven, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2171,12 +2183,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_8<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             rounding, scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2186,12 +2199,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_8<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             rounding, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding, int32_t scale) noexcept
     {
     if constexpr (detail::found<F0>) {
@@ -2200,12 +2213,12 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_9<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), rounding, scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2213,14 +2226,14 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_9<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), rounding, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult divide(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult divide(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2253,7 +2266,7 @@ template <unsigned k> constexpr auto absolute_1() noexcept {
     "qori::absolute: no such call. absolute(src, dst) or absolute(in_place(src)) of 16s, 32f: C1 C3 C4 AC4"
 /** Takes the absolute value. C: qoriAbs. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::absolute_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::absolute_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult absolute(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2261,25 +2274,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::absolute_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::absolute_1<k>())>
+    decltype(detail::absolute_1<k>()), bool exists = false>
 [[nodiscard]] QorResult absolute(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::absolute_1<k>()(srcV.data(), srcV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult absolute(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult absolute(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2335,7 +2348,7 @@ template <unsigned k> constexpr auto square_3() noexcept {
     "C1 C3 C4 AC4. square(src, dst) or square(in_place(src)) of 32f: C1 C3 C4 AC4"
 /** Squares: dst = saturate(round(src * src * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C: qoriSqr. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::square_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::square_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult square(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2343,13 +2356,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::square_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::square_2<k>()), class F1 = decltype(detail::square_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult square(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2362,23 +2375,23 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::square_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::square_1<k>())>
+    decltype(detail::square_1<k>()), bool exists = false>
 [[nodiscard]] QorResult square(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::square_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::square_3<k>()), class F1 = decltype(detail::square_1<k>())>
+    decltype(detail::square_3<k>()), class F1 = decltype(detail::square_1<k>()), bool exists = false>
 [[nodiscard]] QorResult square(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2387,14 +2400,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::square_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult square(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult square(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2444,7 +2457,7 @@ template <unsigned k> constexpr auto sqrt_3() noexcept {
 /** Square root: dst = saturate(round(sqrt(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C:
  *  qoriSqrt. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult sqrt(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2452,13 +2465,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::sqrt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::sqrt_2<k>()), class F1 = decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult sqrt(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2471,23 +2484,23 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::sqrt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::sqrt_1<k>())>
+    decltype(detail::sqrt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult sqrt(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::sqrt_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::sqrt_3<k>()), class F1 = decltype(detail::sqrt_1<k>())>
+    decltype(detail::sqrt_3<k>()), class F1 = decltype(detail::sqrt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult sqrt(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2496,14 +2509,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::sqrt_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult sqrt(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult sqrt(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2543,7 +2556,7 @@ template <unsigned k> constexpr auto exp_3() noexcept {
     "exp(src, dst) or exp(in_place(src)) of 32f: C1 C3"
 /** Exponential: dst = saturate(round(e^src * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C: qoriExp. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult exp(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2551,13 +2564,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::exp_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::exp_2<k>()), class F1 = decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult exp(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2570,23 +2583,23 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::exp_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::exp_1<k>())>
+    decltype(detail::exp_1<k>()), bool exists = false>
 [[nodiscard]] QorResult exp(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::exp_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::exp_3<k>()), class F1 = decltype(detail::exp_1<k>())>
+    decltype(detail::exp_3<k>()), class F1 = decltype(detail::exp_1<k>()), bool exists = false>
 [[nodiscard]] QorResult exp(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2595,14 +2608,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::exp_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult exp(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult exp(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2643,7 +2656,7 @@ template <unsigned k> constexpr auto log_3() noexcept {
 /** Natural logarithm: dst = saturate(round(ln(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C:
  *  qoriLn. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::log_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::log_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult log(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2651,13 +2664,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::log_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::log_2<k>()), class F1 = decltype(detail::log_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult log(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2670,23 +2683,23 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::log_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::log_1<k>())>
+    decltype(detail::log_1<k>()), bool exists = false>
 [[nodiscard]] QorResult log(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::log_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::log_3<k>()), class F1 = decltype(detail::log_1<k>())>
+    decltype(detail::log_3<k>()), class F1 = decltype(detail::log_1<k>()), bool exists = false>
 [[nodiscard]] QorResult log(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2695,14 +2708,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::log_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult log(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult log(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2737,7 +2750,8 @@ template <unsigned k> constexpr auto pad_constant_0() noexcept {
     "C3 C4 AC4"
 /** Copies an image into a larger one and fills the frame around it with a constant pixel. C: qoriCopyConstBorder. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pad_constant_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::pad_constant_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult pad_constant(const A& src, B&& dst, int32_t top, int32_t left, const
     detail::Value<detail::Arg<F0, 8>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -2746,14 +2760,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::pad_constant_0<k>()(srcV.data(), srcV.step(), srcV.size(), dstV.data(), dstV.step(),
             dstV.size(), top, left, detail::pass(value));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult pad_constant(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult pad_constant(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2812,7 +2826,8 @@ template <unsigned k> constexpr auto pad_replicate_1() noexcept {
 /** Copies an image into a larger one and repeats its outermost pixels in the frame around it. Repeats the outermost
  *  pixels of an image in the frame around it, inside a larger image. C: qoriCopyReplicateBorder. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pad_replicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::pad_replicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult pad_replicate(const A& src, B&& dst, int32_t top, int32_t left) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2820,26 +2835,26 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::pad_replicate_0<k>()(srcV.data(), srcV.step(), srcV.size(), dstV.data(), dstV.step(),
             dstV.size(), top, left);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::pad_replicate_1<k>())>
+    decltype(detail::pad_replicate_1<k>()), bool exists = false>
 [[nodiscard]] QorResult pad_replicate(const InPlace<TA, LA>& src, QorImageSize dst_roi_size, int32_t top, int32_t
     left) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::pad_replicate_1<k>()(srcV.data(), srcV.step(), srcV.size(), dst_roi_size, top, left);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2891,7 +2906,8 @@ template <unsigned k> constexpr auto filter_box_1() noexcept {
 /** The mean of the window of maskSize around each pixel, channel by channel. The mean of the window of maskSize
  *  around each pixel, in place. C: qoriFilterBox. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_box(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2900,25 +2916,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size.size(),
             size.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::filter_box_1<k>())>
+    decltype(detail::filter_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult filter_box(const InPlace<TA, LA>& src, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::filter_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size.size(), size.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_box(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_box(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2957,7 +2973,8 @@ template <unsigned k> constexpr auto filter_box_border_0() noexcept {
 /** The mean of the centred window of maskSize around each pixel, channel by channel, with a border. C:
  *  qoriFilterBoxBorder. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size, const detail::Edge<detail::Arg<F0,
     7>, k>& border, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -2971,12 +2988,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size, const detail::Edge<detail::Arg<F0,
     7>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
@@ -2991,12 +3009,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3011,14 +3030,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_box_border(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_box_border(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3150,7 +3169,7 @@ template <unsigned k> constexpr auto convert_3() noexcept {
  *  saturate(round(src * 2^-scaleFactor)); the product is exact. C: qoriConvert. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::convert_0<k>()), class F1 = decltype(detail::convert_2<k>()), class F2 =
-    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3170,12 +3189,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::convert_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             roundNearestEven, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3184,13 +3203,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::convert_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), rounding,
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::convert_2<k>()), class F1 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3203,47 +3222,47 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::convert_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), rounding, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>())>
+    decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::convert_3<k>()(srcV.data(), srcV.step(), srcV.size(), rounding, scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>())>
+    decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::convert_3<k>()(srcV.data(), srcV.step(), srcV.size(), rounding, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>())>
+    decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::convert_3<k>()(srcV.data(), srcV.step(), srcV.size(), roundNearestEven, 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult convert(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult convert(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3258,7 +3277,8 @@ template <unsigned k> constexpr auto unpack_bits_0() noexcept {
     "qori::unpack_bits: no such call. unpack_bits(src, dst, [bit_offset]) of 8u: C1"
 /** Unpacks bits into bytes: a set bit gives 255, a clear one 0. C: qoriConvert. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult unpack_bits(const A& src, B&& dst, int32_t bit_offset) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3267,12 +3287,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::unpack_bits_0<k>()(srcV.data(), srcV.step(), bit_offset, dstV.data(), dstV.step(),
             dstV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult unpack_bits(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3281,14 +3302,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (!detail::holdsBits(srcV.size(), bit_offset, dstV.size())) return QOR_ERR_SIZE;
         return detail::unpack_bits_0<k>()(srcV.data(), srcV.step(), 0, dstV.data(), dstV.step(), dstV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3409,7 +3430,7 @@ template <unsigned k> constexpr auto copy_1() noexcept {
  *  Other threads must not write them meanwhile: kept elements less than 32 bytes from a copied one may be rewritten
  *  with their own value. C: qoriCopy. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::copy_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult copy(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3417,12 +3438,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::copy_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::copy_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult copy(const A& src, B&& dst, const View<const uint8_t, C1>& mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3432,14 +3453,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::copy_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), maskV.data(),
             maskV.step());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult copy(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult copy(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3454,7 +3475,8 @@ template <unsigned k> constexpr auto copy_managed_0() noexcept {
     "qori::copy_managed: no such call. copy_managed(src, dst, [flags]) of 8u: C1"
 /** Copies a region of bytes with the caller's advice on the use of the cache. C: qoriCopyManaged. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult copy_managed(const A& src, B&& dst, int32_t flags) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3462,12 +3484,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::copy_managed_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), flags);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult copy_managed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3475,14 +3498,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::copy_managed_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult copy_managed(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult copy_managed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3498,7 +3521,7 @@ template <unsigned k> constexpr auto duplicate_0() noexcept {
     "qori::duplicate: no such call. duplicate(src, dst) of 8u: C1->C3 C1->C4"
 /** Writes every element of a single-channel image to all channels of the destination pixel. C: qoriDup. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::duplicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::duplicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult duplicate(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3506,14 +3529,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::duplicate_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult duplicate(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3544,7 +3567,7 @@ template <unsigned k> constexpr auto cross_corr_norm_1() noexcept {
  *  qoriCrossCorrNorm. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_norm_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, Buffer& buffer)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -3562,13 +3585,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_0<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), algorithm, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_norm_0<k>()), class F1 = decltype(detail::cross_corr_norm_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3601,13 +3624,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), 0, algorithm, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, int32_t scale,
     Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3625,13 +3648,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), scale, algorithm, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, int32_t scale)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -3650,14 +3673,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), scale, algorithm, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_norm(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult cross_corr_norm(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3696,7 +3719,7 @@ template <unsigned k> constexpr auto cross_corr_full_norm_1() noexcept {
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrFull_Norm. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_full_norm_0<k>()), class F1 = decltype(detail::cross_corr_full_norm_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3715,13 +3738,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_full_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3732,14 +3755,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_full_norm(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult cross_corr_full_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3778,7 +3801,7 @@ template <unsigned k> constexpr auto cross_corr_same_norm_1() noexcept {
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrSame_Norm. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_same_norm_0<k>()), class F1 = decltype(detail::cross_corr_same_norm_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3795,13 +3818,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_same_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3811,14 +3834,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_same_norm(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult cross_corr_same_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3857,7 +3880,7 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_1() noexcept {
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrValid_Norm. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_valid_norm_0<k>()), class F1 = decltype(detail::cross_corr_valid_norm_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3876,13 +3899,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_valid_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3893,14 +3916,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_valid_norm(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult cross_corr_valid_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3943,7 +3966,7 @@ template <unsigned k> constexpr auto cross_corr_full_norm_level_1() noexcept {
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_full_norm_level_0<k>()), class F1 =
     decltype(detail::cross_corr_full_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3962,13 +3985,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_full_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3979,14 +4002,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_full_norm_level(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult cross_corr_full_norm_level(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4028,7 +4051,7 @@ template <unsigned k> constexpr auto cross_corr_same_norm_level_1() noexcept {
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_same_norm_level_0<k>()), class F1 =
     decltype(detail::cross_corr_same_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4045,13 +4068,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_same_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4061,14 +4084,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_same_norm_level(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult cross_corr_same_norm_level(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4111,7 +4134,7 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_level_1() noexcept {
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_valid_norm_level_0<k>()), class F1 =
     decltype(detail::cross_corr_valid_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4130,13 +4153,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_valid_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4147,14 +4170,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_valid_norm_level(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult cross_corr_valid_norm_level(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4174,7 +4197,7 @@ template <unsigned k> constexpr auto cross_corr_valid_0() noexcept {
 /** Correlation with a template at the placements inside the source: dst = sum s t. C: qoriCrossCorrValid. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::cross_corr_valid_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4185,14 +4208,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_0<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult cross_corr_valid(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4272,21 +4295,21 @@ template <unsigned k> constexpr auto dct_fwd_0() noexcept {
     "qori::dct_fwd: no such call. dct_fwd(src, dst, plan, buffer) of 32f: C1 C3 C4 AC4"
 /** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C: qoriDCTFwd. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_fwd_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dct_fwd_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_fwd(const A& src, B&& dst, const QorDct2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::dct_fwd_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_fwd(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dct_fwd(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4304,21 +4327,21 @@ template <unsigned k> constexpr auto dct_inv_0() noexcept {
     "qori::dct_inv: no such call. dct_inv(src, dst, plan, buffer) of 32f: C1 C3 C4 AC4"
 /** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C: qoriDCTInv. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_inv_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dct_inv_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_inv(const A& src, B&& dst, const QorDct2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::dct_inv_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_inv(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dct_inv(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4350,53 +4373,53 @@ template <unsigned k> constexpr auto dct_8x8_forward_3() noexcept {
 /** The forward cosine transform of a block of floats. The forward cosine transform of 8x8 pixels of an image. The
  *  forward cosine transform of 8x8 pixels of an image, with a value added to each. C: qoriDCT8x8Fwd, qoriDCT8x8FwdLS. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_0<k>())>
+    decltype(detail::dct_8x8_forward_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_forward_1<k>())>
+    decltype(detail::dct_8x8_forward_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_2<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::dct_8x8_forward_2<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A& src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         if (!detail::isSize(srcV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_forward_2<k>()(srcV.data(), srcV.step(), dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_3<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::dct_8x8_forward_3<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A& src, B* dst, int16_t shift) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         if (!detail::isSize(srcV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_forward_3<k>()(srcV.data(), srcV.step(), dst, shift);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_forward(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dct_8x8_forward(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4429,53 +4452,53 @@ template <unsigned k> constexpr auto dct_8x8_inverse_3() noexcept {
  *  inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two bounds. C:
  *  qoriDCT8x8Inv, qoriDCT8x8InvLSClip. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_0<k>())>
+    decltype(detail::dct_8x8_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_1<k>())>
+    decltype(detail::dct_8x8_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2<k>()), detail::If<detail::isImage<B>> = 0>
+    decltype(detail::dct_8x8_inverse_2<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
         if (!detail::isSize(dstV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_inverse_2<k>()(src, dstV.data(), dstV.step());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_8x8_inverse_3<k>()), detail::If<detail::isImage<B>> = 0>
+    decltype(detail::dct_8x8_inverse_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B&& dst, int16_t shift, uint8_t low, uint8_t high) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
         if (!detail::isSize(dstV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_inverse_3<k>()(src, dstV.data(), dstV.step(), shift, low, high);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_inverse(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dct_8x8_inverse(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4496,29 +4519,29 @@ template <unsigned k> constexpr auto dct_8x8_inverse_2x2_1() noexcept {
 /** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4. C:
  *  qoriDCT8x8Inv_2x2. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2x2_0<k>())>
+    decltype(detail::dct_8x8_inverse_2x2_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_2x2(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2x2_1<k>())>
+    decltype(detail::dct_8x8_inverse_2x2_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_2x2(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_inverse_2x2(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dct_8x8_inverse_2x2(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4539,29 +4562,29 @@ template <unsigned k> constexpr auto dct_8x8_inverse_4x4_1() noexcept {
 /** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4. C:
  *  qoriDCT8x8Inv_4x4. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_4x4_0<k>())>
+    decltype(detail::dct_8x8_inverse_4x4_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_4x4(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_4x4_1<k>())>
+    decltype(detail::dct_8x8_inverse_4x4_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_4x4(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_inverse_4x4(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dct_8x8_inverse_4x4(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4582,29 +4605,29 @@ template <unsigned k> constexpr auto dct_8x8_inverse_10bit_1() noexcept {
 /** The inverse cosine transform of a block of 16-bit coefficients, for pixels of ten bits and more. C:
  *  qoriDCT8x8Inv_A10. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_10bit_0<k>())>
+    decltype(detail::dct_8x8_inverse_10bit_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_10bit(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_10bit_1<k>())>
+    decltype(detail::dct_8x8_inverse_10bit_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_10bit(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_inverse_10bit(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dct_8x8_inverse_10bit(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4624,29 +4647,29 @@ template <unsigned k> constexpr auto dct_8x8_to_2x2_inverse_1() noexcept {
     "dct_8x8_to_2x2_inverse(src) of 16s: C1"
 /** Makes 2x2 pixels of a block's coefficients, a quarter of its size in each direction. C: qoriDCT8x8To2x2Inv. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_to_2x2_inverse_0<k>())>
+    decltype(detail::dct_8x8_to_2x2_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_2x2_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_to_2x2_inverse_1<k>())>
+    decltype(detail::dct_8x8_to_2x2_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_2x2_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_to_2x2_inverse(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dct_8x8_to_2x2_inverse(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4666,29 +4689,29 @@ template <unsigned k> constexpr auto dct_8x8_to_4x4_inverse_1() noexcept {
     "dct_8x8_to_4x4_inverse(src) of 16s: C1"
 /** Makes 4x4 pixels of a block's coefficients, half of its size in each direction. C: qoriDCT8x8To4x4Inv. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_to_4x4_inverse_0<k>())>
+    decltype(detail::dct_8x8_to_4x4_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_4x4_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_to_4x4_inverse_1<k>())>
+    decltype(detail::dct_8x8_to_4x4_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_4x4_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_1<k>()(src);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dct_8x8_to_4x4_inverse(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dct_8x8_to_4x4_inverse(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4703,19 +4726,19 @@ template <unsigned k> constexpr auto zigzag_8x8_forward_0() noexcept {
     "qori::zigzag_8x8_forward: no such call. zigzag_8x8_forward(src, dst) of 16s: C1"
 /** Puts a block's coefficients in zig-zag order. C: qoriZigzagFwd8x8. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::zigzag_8x8_forward_0<k>())>
+    decltype(detail::zigzag_8x8_forward_0<k>()), bool exists = false>
 [[nodiscard]] QorResult zigzag_8x8_forward(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_forward_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult zigzag_8x8_forward(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult zigzag_8x8_forward(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4730,19 +4753,19 @@ template <unsigned k> constexpr auto zigzag_8x8_inverse_0() noexcept {
     "qori::zigzag_8x8_inverse: no such call. zigzag_8x8_inverse(src, dst) of 16s: C1"
 /** Puts coefficients in zig-zag order back into rows. C: qoriZigzagInv8x8. */
 template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::zigzag_8x8_inverse_0<k>())>
+    decltype(detail::zigzag_8x8_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult zigzag_8x8_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_inverse_0<k>()(src, dst);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult zigzag_8x8_inverse(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4853,31 +4876,33 @@ template <unsigned k> constexpr auto dft_fwd_r_to_pack_2() noexcept {
 /** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an 8u
  *  image, each channel by itself, packed, in 32s. C: qoriDFTFwd_RToPack. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::dft_fwd_r_to_pack_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_1<k>())>
+    decltype(detail::dft_fwd_r_to_pack_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -4886,14 +4911,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::dft_fwd_r_to_pack_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dft_fwd_r_to_pack(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dft_fwd_r_to_pack(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4928,31 +4953,33 @@ template <unsigned k> constexpr auto dft_inv_pack_to_r_2() noexcept {
 /** The real image of a packed spectrum, each channel by itself. The 8u image of a packed spectrum of 32s, each
  *  channel by itself. C: qoriDFTInv_PackToR. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::dft_inv_pack_to_r_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_1<k>())>
+    decltype(detail::dft_inv_pack_to_r_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -4961,14 +4988,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::dft_inv_pack_to_r_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dft_inv_pack_to_r(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dft_inv_pack_to_r(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4988,33 +5015,34 @@ template <unsigned k> constexpr auto dft_fwd_c_to_c_1() noexcept {
     "dft_fwd_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The spectrum of a complex image, frequency (u, v) at pixel (u, v). C: qoriDFTFwd_CToC. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult dft_fwd_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::dft_fwd_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_fwd_c_to_c_1<k>())>
+    decltype(detail::dft_fwd_c_to_c_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
     {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5034,33 +5062,34 @@ template <unsigned k> constexpr auto dft_inv_c_to_c_1() noexcept {
     "dft_inv_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The complex image of a complex spectrum. C: qoriDFTInv_CToC. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult dft_inv_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::dft_inv_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_inv_c_to_c_1<k>())>
+    decltype(detail::dft_inv_c_to_c_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
     {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5090,20 +5119,20 @@ template <unsigned k> constexpr auto min_0() noexcept {
     "qori::min: no such call. min(src, min) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Smallest element of each channel. C: qoriMin. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::min_0<k>()),
-    detail::If<detail::isImage<A>> = 0>
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::min_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult min(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult min(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5133,20 +5162,20 @@ template <unsigned k> constexpr auto max_0() noexcept {
     "qori::max: no such call. max(src, max) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest element of each channel. C: qoriMax. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::max_0<k>()),
-    detail::If<detail::isImage<A>> = 0>
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult max(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::max_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5176,21 +5205,21 @@ template <unsigned k> constexpr auto min_max_0() noexcept {
     "qori::min_max: no such call. min_max(src, min, max) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Smallest and largest element of each channel, in one pass. C: qoriMinMax. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::min_max_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::min_max_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min_max(const A& src, detail::Result<detail::Arg<F0, 3>, k> min,
     detail::Result<detail::Arg<F0, 4>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::min_max_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data, max.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5221,21 +5250,21 @@ template <unsigned k> constexpr auto min_index_0() noexcept {
 /** Smallest element of each channel and the first pixel, from the top and then from the left, that holds it. C:
  *  qoriMinIndx. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::min_index_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::min_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min_index(const A& src, detail::Result<detail::Arg<F0, 3>, k> min,
     detail::Result<detail::Arg<F0, 4>, k> column, detail::Result<detail::Arg<F0, 5>, k> row) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::min_index_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data, column.data, row.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult min_index(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult min_index(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5266,21 +5295,21 @@ template <unsigned k> constexpr auto max_index_0() noexcept {
 /** Largest element of each channel and the first pixel, from the top and then from the left, that holds it. C:
  *  qoriMaxIndx. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::max_index_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::max_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult max_index(const A& src, detail::Result<detail::Arg<F0, 3>, k> max,
     detail::Result<detail::Arg<F0, 4>, k> column, detail::Result<detail::Arg<F0, 5>, k> row) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::max_index_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data, column.data, row.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult max_index(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult max_index(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5300,7 +5329,7 @@ template <unsigned k> constexpr auto block_min_max_0() noexcept {
 /** Smallest and largest element of every block of a grid, and of the whole region. C: qoriBlockMinMax. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B, C>>, class F0 =
     decltype(detail::block_min_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>>
-    = 0>
+    = 0, bool exists = false>
 [[nodiscard]] QorResult block_min_max(const A& src, B&& min, C&& max, QorImageSize block,
     detail::Result<detail::Arg<F0, 8>, k> global_min, detail::Result<detail::Arg<F0, 9>, k> global_max) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5311,14 +5340,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::block_min_max_0<k>()(srcV.data(), srcV.step(), srcV.size(), minV.data(), minV.step(),
             maxV.data(), maxV.step(), block, global_min.data, global_max.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult block_min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult block_min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5338,7 +5367,7 @@ template <unsigned k> constexpr auto count_in_range_0() noexcept {
     "qori::count_in_range: no such call. count_in_range(src, count, lower, upper) of 8u, 32f: C1 C3 AC4"
 /** Counts the pixels of each channel with lowerBound <= value <= upperBound. C: qoriCountInRange. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::count_in_range_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::count_in_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult count_in_range(const A& src, detail::Result<detail::Arg<F0, 3>, k> count, const
     detail::Value<detail::Arg<F0, 4>, k>& lower, const detail::Value<detail::Arg<F0, 5>, k>& upper) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5346,14 +5375,14 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return detail::count_in_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), count.data, detail::pass(lower),
             detail::pass(upper));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult count_in_range(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult count_in_range(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5464,31 +5493,33 @@ template <unsigned k> constexpr auto fft_fwd_r_to_pack_2() noexcept {
 /** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an 8u
  *  image, each channel by itself, packed, in 32s. C: qoriFFTFwd_RToPack. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::fft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::fft_fwd_r_to_pack_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_1<k>())>
+    decltype(detail::fft_fwd_r_to_pack_1<k>()), bool exists = false>
 [[nodiscard]] QorResult fft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::fft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5497,14 +5528,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::fft_fwd_r_to_pack_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult fft_fwd_r_to_pack(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult fft_fwd_r_to_pack(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5539,31 +5570,33 @@ template <unsigned k> constexpr auto fft_inv_pack_to_r_2() noexcept {
 /** The real image of a packed spectrum, each channel by itself. The 8u image of a packed spectrum of 32s, each
  *  channel by itself. C: qoriFFTInv_PackToR. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::fft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::fft_inv_pack_to_r_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_1<k>())>
+    decltype(detail::fft_inv_pack_to_r_1<k>()), bool exists = false>
 [[nodiscard]] QorResult fft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::fft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5572,14 +5605,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::fft_inv_pack_to_r_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult fft_inv_pack_to_r(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult fft_inv_pack_to_r(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5599,33 +5632,34 @@ template <unsigned k> constexpr auto fft_fwd_c_to_c_1() noexcept {
     "fft_fwd_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The spectrum of a complex image, frequency (u, v) at pixel (u, v). C: qoriFFTFwd_CToC. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::fft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult fft_fwd_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::fft_fwd_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_fwd_c_to_c_1<k>())>
+    decltype(detail::fft_fwd_c_to_c_1<k>()), bool exists = false>
 [[nodiscard]] QorResult fft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
     {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5645,33 +5679,34 @@ template <unsigned k> constexpr auto fft_inv_c_to_c_1() noexcept {
     "fft_inv_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The complex image of a complex spectrum. C: qoriFFTInv_CToC. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::fft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult fft_inv_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         return detail::fft_inv_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_inv_c_to_c_1<k>())>
+    decltype(detail::fft_inv_c_to_c_1<k>()), bool exists = false>
 [[nodiscard]] QorResult fft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
     {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5798,7 +5833,7 @@ template <unsigned k> constexpr auto filter_linear_3_bytes() noexcept {
  *  saturate(round(sum)) by a rounding mode. C: qoriFilter, qoriFilter_Round16s, qoriFilter_Round32f. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
     decltype(detail::filter_linear_0<k>()), class F1 = decltype(detail::filter_linear_2<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5818,14 +5853,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), divisor, roundNearestEven, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
     decltype(detail::filter_linear_1<k>()), class F1 = decltype(detail::filter_linear_0<k>()), class F2 =
     decltype(detail::filter_linear_3<k>()), class F3 = decltype(detail::filter_linear_2<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5862,12 +5897,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), 1, roundNearestEven, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor, QorRoundingMode
     rounding, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5881,12 +5917,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), divisor, rounding, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor, QorRoundingMode
     rounding) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5901,12 +5938,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), divisor, rounding, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, QorRoundingMode rounding,
     Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5920,12 +5958,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_3<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), rounding, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, QorRoundingMode rounding)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -5940,14 +5979,14 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_3<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), rounding, buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5967,13 +6006,13 @@ template <unsigned k> constexpr auto filter_round_get_buf_size16s_0() noexcept {
 /** Reports the bytes of work buffer of qoriFilter_Round16s: 16 * kw * kh + 4 * w * channels + 15. C:
  *  qoriFilterRoundGetBufSize16s. */
 template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size16s_0<k>())>
+    decltype(detail::filter_round_get_buf_size16s_0<k>()), bool exists = false>
 [[nodiscard]] QorResult filter_round_get_buf_size16s(QorImageSize kernel_size, int32_t roi_width, int32_t*
     buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size16s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6002,13 +6041,13 @@ template <unsigned k> constexpr auto filter_round_get_buf_size32f_0() noexcept {
 /** Reports the bytes of work buffer of qoriFilter_Round32f: 16 * kw * kh + 8 * w * channels + 43, for four channels +
  *  15. C: qoriFilterRoundGetBufSize32f. */
 template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size32f_0<k>())>
+    decltype(detail::filter_round_get_buf_size32f_0<k>()), bool exists = false>
 [[nodiscard]] QorResult filter_round_get_buf_size32f(QorImageSize kernel_size, int32_t roi_width, int32_t*
     buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32f_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6033,13 +6072,13 @@ template <unsigned k> constexpr auto filter_round_get_buf_size32s_0() noexcept {
 /** Reports the bytes of work buffer of qoriFilter_Round32s: 16 * kw * kh + 4 * w * channels + 31 for 16s, 16 * kw *
  *  kh + 8 * w * channels + 43 for 16u. C: qoriFilterRoundGetBufSize32s. */
 template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size32s_0<k>())>
+    decltype(detail::filter_round_get_buf_size32s_0<k>()), bool exists = false>
 [[nodiscard]] QorResult filter_round_get_buf_size32s(QorImageSize kernel_size, int32_t roi_width, int32_t*
     buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6055,13 +6094,14 @@ template <unsigned k> constexpr auto filter_get_buf_size_0() noexcept {
     "qori::filter_get_buf_size: no such call. filter_get_buf_size(kernel_size, roi_width, buffer_size) of 64f: " \
     "C1"
 /** Reports 0: the 64f filter takes no work buffer. C: qoriFilterGetBufSize. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::filter_get_buf_size_0<k>())>
+template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::filter_get_buf_size_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult filter_get_buf_size(QorImageSize kernel_size, int32_t roi_width, int32_t* buffer_size)
     noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_get_buf_size_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6109,7 +6149,8 @@ template <unsigned k> constexpr auto filter_border_0() noexcept {
 /** Convolves with the kernel of a plan: dst(x, y) = sum of K(i, j) * src(x + ax - i, y + ay - j), divided and rounded
  *  as the plan says. C: qoriFilterBorder. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_border(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border, const
     QorLinearFilterPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6119,14 +6160,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 6>>(border), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_border(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_border(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6156,7 +6197,8 @@ template <unsigned k> constexpr auto filter_min_0() noexcept {
     "qori::filter_min: no such call. filter_min(src, dst, size) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The smallest element of a rectangle around each pixel, channel by channel. C: qoriFilterMin. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_min_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_min_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_min(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6165,14 +6207,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_min_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size.size(),
             size.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_min(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_min(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6202,7 +6244,8 @@ template <unsigned k> constexpr auto filter_max_0() noexcept {
     "qori::filter_max: no such call. filter_max(src, dst, size) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The largest element of a rectangle around each pixel, channel by channel. C: qoriFilterMax. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_max(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6211,14 +6254,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_max_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size.size(),
             size.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_max(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6248,7 +6291,8 @@ template <unsigned k> constexpr auto filter_gauss_0() noexcept {
     "qori::filter_gauss: no such call. filter_gauss(src, dst, mask) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The mean of 3 x 3 or 5 x 5 pixels with Gaussian weights, channel by channel. C: qoriFilterGauss. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_gauss(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6256,14 +6300,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::filter_gauss_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), mask);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6295,7 +6339,7 @@ template <unsigned k> constexpr auto histogram_range_0() noexcept {
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1]. C:
  *  qoriHistogramRange. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult histogram_range(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels, const
     detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6303,14 +6347,14 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return detail::histogram_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
             detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult histogram_range(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult histogram_range(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6338,7 +6382,7 @@ template <unsigned k> constexpr auto histogram_even_0() noexcept {
 /** Counts the pixels between levels spaced evenly from lowerLevel to upperLevel, and returns the levels. C:
  *  qoriHistogramEven. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult histogram_even(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels, const
     detail::Value<detail::Arg<F0, 5>, k>& n_levels, const detail::Value<detail::Arg<F0, 6>, k>& lower, const
     detail::Value<detail::Arg<F0, 7>, k>& upper) noexcept {
@@ -6347,14 +6391,14 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return detail::histogram_even_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
             detail::pass(n_levels), detail::pass(lower), detail::pass(upper));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult histogram_even(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6403,21 +6447,21 @@ template <unsigned k> constexpr auto histogram_0() noexcept {
     "qori::histogram: no such call. histogram(src, hist, plan, buffer) of 8u, 16u, 16s, 32f: C1 C3 C4"
 /** Counts the pixels between the levels of a prepared histogram. C: qoriHistogram. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::histogram_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult histogram(const A& src, detail::Arg<F0, 3> hist, const QorHistogramSpec* plan, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult histogram(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult histogram(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6462,7 +6506,7 @@ template <unsigned k> constexpr auto hog_0() noexcept {
     " C1 C3"
 /** Descriptors of windows by the orientations of their gradients (Dalal and Triggs 2005). C: qoriHOG. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::hog_0<k>()),
-    detail::If<detail::isImage<A>> = 0>
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult hog(const A& src, const QorPoint2D* locations, int32_t n_locations, float* dst, const
     QorHogPlan* plan, const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6470,14 +6514,14 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return detail::hog_0<k>()(srcV.data(), srcV.step(), srcV.size(), locations, n_locations, dst, plan,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult hog(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult hog(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6501,7 +6545,7 @@ template <unsigned k> constexpr auto lbp_3x3_1() noexcept {
  *  binary patterns of the eight neighbours, whose order the caller chooses. C: qoriLBPImage3x3, qoriLBPImageMode3x3. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Either<detail::Arg<F0, 6>,
     detail::Arg<F1, 7>>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6517,13 +6561,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_3x3_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6540,12 +6584,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_3x3_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border, uint8_t
     mode) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6555,14 +6599,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_3x3_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), mode,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lbp_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult lbp_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6591,7 +6635,7 @@ template <unsigned k> constexpr auto lbp_5x5_1() noexcept {
  *  qoriLBPImageMode5x5. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Either<detail::Arg<F0, 6>,
     detail::Arg<F1, 7>>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6607,13 +6651,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_5x5_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6630,12 +6674,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_5x5_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border, uint8_t
     mode) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6645,14 +6689,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_5x5_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), mode,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lbp_5x5(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult lbp_5x5(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6669,7 +6713,8 @@ template <unsigned k> constexpr auto lbp_horizontal_0() noexcept {
 /** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three rows. C:
  *  qoriLBPImageHorizCorr. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -6679,12 +6724,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_horizontal_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 6>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6694,14 +6740,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_horizontal_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 6>>(border));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6751,7 +6797,7 @@ template <unsigned k> constexpr auto lut_1() noexcept {
     "n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to constants: dst = pValues[k] where pLevels[k] <= src < pLevels[k + 1], else src. C: qoriLUT. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lut(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
     detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6761,26 +6807,26 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), values, levels,
             detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_1<k>())>
+    decltype(detail::lut_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels, const
     detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::lut_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels, detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lut(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult lut(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6831,7 +6877,8 @@ template <unsigned k> constexpr auto lut_linear_1() noexcept {
 /** Maps intervals to straight lines from pValues[k] at pLevels[k] to pValues[k + 1] at pLevels[k + 1]; else dst =
  *  src. C: qoriLUT_Linear. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lut_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult lut_linear(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
     detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6841,12 +6888,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_linear_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), values,
             levels, detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_linear_1<k>())>
+    decltype(detail::lut_linear_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut_linear(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
     const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6854,14 +6901,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::lut_linear_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels,
             detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lut_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6911,7 +6958,7 @@ template <unsigned k> constexpr auto lut_cubic_1() noexcept {
     "values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to cubics through the nodes (pLevels, pValues) around them; else dst = src. C: qoriLUT_Cubic. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lut_cubic(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
     detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6921,12 +6968,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_cubic_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), values,
             levels, detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_cubic_1<k>())>
+    decltype(detail::lut_cubic_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut_cubic(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
     const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6934,14 +6981,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::lut_cubic_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels,
             detail::pass(n_levels));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6972,7 +7019,8 @@ template <unsigned k> constexpr auto filter_median_0() noexcept {
     " C4; 64f: C1"
 /** The median of a rectangle around an anchor, channel by channel. C: qoriFilterMedian. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult filter_median(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6981,14 +7029,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size.size(), size.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_median(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7028,7 +7076,8 @@ template <unsigned k> constexpr auto filter_median_horiz_0() noexcept {
     "qori::filter_median_horiz: no such call. filter_median_horiz(src, dst, mask) of 8u, 16s, 16u: C1 C3 C4 AC4"
 /** The median of 3 or 5 pixels of a row (mask3x1, mask5x1), channel by channel. C: qoriFilterMedianHoriz. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_horiz_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_horiz_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_horiz(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7037,14 +7086,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_horiz_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median_horiz(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_median_horiz(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7070,7 +7119,8 @@ template <unsigned k> constexpr auto filter_median_vert_0() noexcept {
     "qori::filter_median_vert: no such call. filter_median_vert(src, dst, mask) of 8u, 16s, 16u: C1 C3 C4 AC4"
 /** The median of 3 or 5 pixels of a column (mask1x3, mask1x5), channel by channel. C: qoriFilterMedianVert. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_vert_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_vert_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult filter_median_vert(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7079,14 +7129,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_vert_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median_vert(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_median_vert(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7110,7 +7160,8 @@ template <unsigned k> constexpr auto filter_median_cross_0() noexcept {
 /** The median of a pixel and those up to one or two away in its row and its column (mask3x3: 5 pixels, mask5x5: 9).
  *  C: qoriFilterMedianCross. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_cross_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_cross_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_cross(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7119,14 +7170,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_cross_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median_cross(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_median_cross(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7147,7 +7198,8 @@ template <unsigned k> constexpr auto filter_median_color_0() noexcept {
 /** The colour median of a square: of its 9 or 25 pixels, the one with the smallest sum of distances to the others. C:
  *  qoriFilterMedianColor. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_color_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_color_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_color(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7156,14 +7208,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_color_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median_color(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult filter_median_color(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7178,7 +7230,8 @@ template <unsigned k> constexpr auto filter_median_weighted_0() noexcept {
     "qori::filter_median_weighted: no such call. filter_median_weighted(src, dst, weight) of 8u: C1"
 /** The median of 3 x 3 pixels of which the middle one counts `weight` times. C: qoriFilterMedianWeightedCenter3x3. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_weighted_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_weighted_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_weighted(const A& src, B&& dst, int32_t weight) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7187,14 +7240,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_weighted_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             weight);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median_weighted(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult filter_median_weighted(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7219,7 +7272,8 @@ template <unsigned k> constexpr auto filter_median_border_0() noexcept {
     "16u, 16s, 32f: C1"
 /** The median of a rectangle centred on each pixel, of odd sides, with a border. C: qoriFilterMedianBorder. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size, const
     detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -7233,12 +7287,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size, const
     detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
@@ -7253,12 +7308,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7273,14 +7329,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult filter_median_border(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult filter_median_border(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7339,7 +7395,7 @@ template <unsigned k> constexpr auto mirror_1() noexcept {
 /** Reflects an image about its horizontal or vertical axis, both, or a diagonal. Reflects an image about its
  *  horizontal or vertical axis, or both, in place. C: qoriMirror. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::mirror_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::mirror_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult mirror(const A& src, B&& dst, QorFlipAxis axis) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7348,25 +7404,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             srcV.width())) return QOR_ERR_SIZE;
         return detail::mirror_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), axis);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::mirror_1<k>())>
+    decltype(detail::mirror_1<k>()), bool exists = false>
 [[nodiscard]] QorResult mirror(const InPlace<TA, LA>& src, QorFlipAxis axis) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::mirror_1<k>()(srcV.data(), srcV.step(), srcV.size(), axis);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult mirror(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult mirror(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7410,7 +7466,7 @@ template <unsigned k> constexpr auto erode_3x3_1() noexcept {
 /** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel. Erosion by
  *  the 3 x 3 square in place. C: qoriErode3x3. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::erode_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::erode_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult erode_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7418,25 +7474,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::erode_3x3_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::erode_3x3_1<k>())>
+    decltype(detail::erode_3x3_1<k>()), bool exists = false>
 [[nodiscard]] QorResult erode_3x3(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::erode_3x3_1<k>()(srcV.data(), srcV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7480,7 +7536,8 @@ template <unsigned k> constexpr auto dilate_3x3_1() noexcept {
 /** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel. Dilation by
  *  the 3 x 3 square in place. C: qoriDilate3x3. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dilate_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dilate_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult dilate_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7488,25 +7545,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::dilate_3x3_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dilate_3x3_1<k>())>
+    decltype(detail::dilate_3x3_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dilate_3x3(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dilate_3x3_1<k>()(srcV.data(), srcV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7546,7 +7603,7 @@ template <unsigned k> constexpr auto erode_1() noexcept {
 /** Erosion by a mask of bytes: the smallest of the pixels under its non-zero bytes, channel by channel. Erosion by a
  *  mask of bytes in place. C: qoriErode. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::erode_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::erode_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult erode(const A& src, B&& dst, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7555,26 +7612,26 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::erode_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), structure.data(),
             structure.size(), structure.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::erode_1<k>())>
+    decltype(detail::erode_1<k>()), bool exists = false>
 [[nodiscard]] QorResult erode(const InPlace<TA, LA>& src, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::erode_1<k>()(srcV.data(), srcV.step(), srcV.size(), structure.data(), structure.size(),
             structure.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult erode(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult erode(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7614,7 +7671,7 @@ template <unsigned k> constexpr auto dilate_1() noexcept {
 /** Dilation by a mask of bytes: the largest of the pixels under its non-zero bytes, channel by channel. Dilation by a
  *  mask of bytes in place. C: qoriDilate. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dilate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dilate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dilate(const A& src, B&& dst, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7623,12 +7680,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::dilate_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             structure.data(), structure.size(), structure.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dilate_1<k>())>
+    decltype(detail::dilate_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dilate(const InPlace<TA, LA>& src, const detail::Weights<const uint8_t*>& structure) noexcept
     {
     if constexpr (detail::found<F0>) {
@@ -7636,14 +7693,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::dilate_1<k>()(srcV.data(), srcV.step(), srcV.size(), structure.data(), structure.size(),
             structure.anchor());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dilate(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dilate(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7677,7 +7734,7 @@ template <unsigned k> constexpr auto sum_1() noexcept {
     "C4 AC4"
 /** Adds the elements of each channel. C: qoriSum. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::sum_0<k>()),
-    class F1 = decltype(detail::sum_1<k>()), detail::If<detail::isImage<A>> = 0>
+    class F1 = decltype(detail::sum_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult sum(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k>
     sum) noexcept {
     if constexpr (detail::found<F0>) {
@@ -7687,25 +7744,25 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::sum_1<k>()(srcV.data(), srcV.step(), srcV.size(), sum.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::sum_1<k>()),
-    detail::If<detail::isImage<A>> = 0>
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult sum(const A& src, detail::Result<detail::Arg<F0, 3>, k> sum, QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::sum_1<k>()(srcV.data(), srcV.step(), srcV.size(), sum.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult sum(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult sum(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7739,7 +7796,7 @@ template <unsigned k> constexpr auto mean_1() noexcept {
     "C1 C3 C4 AC4"
 /** Averages the elements of each channel: their sum over width * height. C: qoriMean. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::mean_0<k>()),
-    class F1 = decltype(detail::mean_1<k>()), detail::If<detail::isImage<A>> = 0>
+    class F1 = decltype(detail::mean_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k>
     mean) noexcept {
     if constexpr (detail::found<F0>) {
@@ -7749,26 +7806,26 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::mean_1<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::mean_1<k>()),
-    detail::If<detail::isImage<A>> = 0>
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Arg<F0, 3>, k> mean, QorAccuracyHint hint) noexcept
     {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::mean_1<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult mean(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult mean(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7799,20 +7856,20 @@ template <unsigned k> constexpr auto norm_inf_0() noexcept {
     "qori::norm_inf: no such call. norm_inf(src, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4; 32s: C1"
 /** Largest magnitude of each channel: max |src|. C: qoriNorm_Inf. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_inf_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::norm_inf_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_inf(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_inf_0<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult norm_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7846,7 +7903,8 @@ template <unsigned k> constexpr auto norm_l1_1() noexcept {
     "of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of each channel: sum |src|. C: qoriNorm_L1. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l1_0<k>()), class F1 = decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::norm_l1_0<k>()), class F1 = decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>,
     k> norm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -7856,26 +7914,26 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::norm_l1_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm, QorAccuracyHint hint)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l1_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult norm_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7909,7 +7967,8 @@ template <unsigned k> constexpr auto norm_l2_1() noexcept {
     "of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of each channel: the square root of sum src^2. C: qoriNorm_L2. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l2_0<k>()), class F1 = decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::norm_l2_0<k>()), class F1 = decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>,
     k> norm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -7919,26 +7978,26 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::norm_l2_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm, QorAccuracyHint hint)
     noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l2_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult norm_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7968,7 +8027,8 @@ template <unsigned k> constexpr auto norm_diff_inf_0() noexcept {
     "qori::norm_diff_inf: no such call. norm_diff_inf(a, b, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest magnitude of the difference in each channel: max |src1 - src2|. C: qoriNormDiff_Inf. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::norm_diff_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult norm_diff_inf(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -7976,14 +8036,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_diff_inf_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8018,7 +8078,7 @@ template <unsigned k> constexpr auto norm_diff_l1_1() noexcept {
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|. C: qoriNormDiff_L1. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
     decltype(detail::norm_diff_l1_0<k>()), class F1 = decltype(detail::norm_diff_l1_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
     detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8033,12 +8093,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return detail::norm_diff_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data,
             hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::norm_diff_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8047,14 +8108,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_diff_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8089,7 +8150,7 @@ template <unsigned k> constexpr auto norm_diff_l2_1() noexcept {
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2. C: qoriNormDiff_L2. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
     decltype(detail::norm_diff_l2_0<k>()), class F1 = decltype(detail::norm_diff_l2_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
     detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8104,12 +8165,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return detail::norm_diff_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data,
             hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::norm_diff_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8118,14 +8180,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_diff_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8155,7 +8217,8 @@ template <unsigned k> constexpr auto norm_rel_inf_0() noexcept {
     "qori::norm_rel_inf: no such call. norm_rel_inf(a, b, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest magnitude of the difference over that of src2, per channel. C: qoriNormRel_Inf. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::norm_rel_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult norm_rel_inf(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -8163,14 +8226,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_inf_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8205,7 +8268,7 @@ template <unsigned k> constexpr auto norm_rel_l1_1() noexcept {
 /** Sum of magnitudes of the difference over that of src2, per channel. C: qoriNormRel_L1. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
     decltype(detail::norm_rel_l1_0<k>()), class F1 = decltype(detail::norm_rel_l1_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
     detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8219,12 +8282,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::norm_rel_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8233,14 +8297,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8276,7 +8340,7 @@ template <unsigned k> constexpr auto norm_rel_l2_1() noexcept {
  *  qoriNormRel_L2. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
     decltype(detail::norm_rel_l2_0<k>()), class F1 = decltype(detail::norm_rel_l2_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
     detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8290,12 +8354,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::norm_rel_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8304,14 +8369,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8358,7 +8423,7 @@ template <unsigned k> constexpr auto dot_1() noexcept {
 /** Dot product of two images, per channel: sum src1 * src2. C: qoriDotProd. */
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
     decltype(detail::dot_0<k>()), class F1 = decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1,
     5>>, k> dot) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8372,12 +8437,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::dot_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), dot.data, hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> dot, QorAccuracyHint hint)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -8386,14 +8451,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::dot_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), dot.data, hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult dot(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8420,20 +8485,20 @@ template <unsigned k> constexpr auto otsu_threshold_0() noexcept {
 /** The threshold by Otsu's method: the level that sets the elements up to it and those above it furthest apart. C:
  *  qoriComputeThreshold_Otsu. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::otsu_threshold_0<k>()), detail::If<detail::isImage<A>> = 0>
+    decltype(detail::otsu_threshold_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult otsu_threshold(const A& src, detail::Result<detail::Arg<F0, 3>, k> threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::otsu_threshold_0<k>()(srcV.data(), srcV.step(), srcV.size(), threshold.data);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8468,7 +8533,8 @@ template <unsigned k> constexpr auto lut_palette_1() noexcept {
 /** Looks elements up in a palette: dst = pTable[src AND (2^nBitSize - 1)]. Looks three channels up in palettes of
  *  their own and puts alpha before them. C: qoriLUTPalette. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lut_palette_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult lut_palette(const A& src, B&& dst, detail::Arg<F0, 5> table, int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -8477,12 +8543,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_palette_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), table,
             n_bit_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lut_palette_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult lut_palette(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table, int32_t
     n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8492,14 +8559,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_palette_1<k>()(srcV.data(), srcV.step(), alpha, dstV.data(), dstV.step(), srcV.size(),
             table, n_bit_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lut_palette(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult lut_palette(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8516,7 +8583,8 @@ template <unsigned k> constexpr auto lut_palette_swap_0() noexcept {
     "C3->C4"
 /** Looks three channels up in palettes of their own, reverses them and puts alpha behind. C: qoriLUTPaletteSwap. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_swap_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::lut_palette_swap_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult lut_palette_swap(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table, int32_t
     n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8526,14 +8594,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_palette_swap_0<k>()(srcV.data(), srcV.step(), alpha, dstV.data(), dstV.step(), srcV.size(),
             table, n_bit_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult lut_palette_swap(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult lut_palette_swap(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8552,13 +8620,14 @@ template <unsigned k> constexpr auto resize_get_size_0() noexcept {
     "qori::resize_get_size: no such call. resize_get_size(src_size, dst_size, interpolation, antialias, " \
     "plan_size, init_buf_size) of 8u, 16u, 16s, 32f, 64f: C1"
 /** Reports how many bytes a plan and the buffer for its initialisation take. C: qoriResizeGetSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_size_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_size_0<k>()), bool exists =
+    false>
 [[nodiscard]] QorResult resize_get_size(QorImageSize src_size, QorImageSize dst_size, QorInterpolationKind
     interpolation, int32_t antialias, int32_t* plan_size, int32_t* init_buf_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_size_0<k>()(src_size, dst_size, interpolation, antialias, plan_size, init_buf_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8579,13 +8648,14 @@ template <unsigned k> constexpr auto resize_get_buffer_size_0() noexcept {
     " of 8u, 16u, 16s, 32f, 64f: C1"
 /** Reports how many bytes of work buffer a tile takes; each thread needs a buffer of its own. C:
  *  qoriResizeGetBufferSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_buffer_size_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_buffer_size_0<k>()), bool
+    exists = false>
 [[nodiscard]] QorResult resize_get_buffer_size(const QorResizePlan* plan, QorImageSize dst_size, int32_t num_channels,
     int32_t* buf_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_buffer_size_0<k>()(plan, dst_size, num_channels, buf_size);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8606,12 +8676,13 @@ template <unsigned k> constexpr auto resize_get_border_size_0() noexcept {
     "64f: C1"
 /** Reports how many pixels around the source the filter of a plan may reach; zeros for nearest and super. C:
  *  qoriResizeGetBorderSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_border_size_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_border_size_0<k>()), bool
+    exists = false>
 [[nodiscard]] QorResult resize_get_border_size(const QorResizePlan* plan, QorBorderExtent* border) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_border_size_0<k>()(plan, border);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8632,13 +8703,14 @@ template <unsigned k> constexpr auto resize_get_src_offset_0() noexcept {
     " 16s, 32f, 64f: C1"
 /** Reports the source pixel at which pSrc must point for a tile: floor(dstOffset * source length / destination
  *  length). C: qoriResizeGetSrcOffset. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_offset_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_offset_0<k>()), bool
+    exists = false>
 [[nodiscard]] QorResult resize_get_src_offset(const QorResizePlan* plan, QorPoint2D dst_offset, QorPoint2D*
     src_offset) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_src_offset_0<k>()(plan, dst_offset, src_offset);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8659,13 +8731,14 @@ template <unsigned k> constexpr auto resize_get_src_roi_0() noexcept {
     "16s, 32f, 64f: C1"
 /** Reports the smallest source rectangle that holds every pixel that a destination rectangle is made of. C:
  *  qoriResizeGetSrcRoi. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_roi_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_roi_0<k>()), bool exists
+    = false>
 [[nodiscard]] QorResult resize_get_src_roi(const QorResizePlan* plan, QorImageRect rect, QorImageRect* src_rect,
     QorImageRect* dst_rect) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_src_roi_0<k>()(plan, rect, src_rect, dst_rect);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8685,13 +8758,14 @@ template <unsigned k> constexpr auto resize_nearest_init_0() noexcept {
     "32f: C1"
 /** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination - 1e-10).
  *  C: qoriResizeNearestInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_nearest_init_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_nearest_init_0<k>()), bool exists
+    = false>
 [[nodiscard]] QorResult resize_nearest_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan)
     noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_nearest_init_0<k>()(src_size, dst_size, plan);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8712,13 +8786,14 @@ template <unsigned k> constexpr auto resize_linear_init_0() noexcept {
     " 64f: C1"
 /** Fills the plan of a linear resize. The 8u plan holds 14-bit weights and serves 8u only; the others are one. C:
  *  qoriResizeLinearInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_linear_init_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_linear_init_0<k>()), bool exists
+    = false>
 [[nodiscard]] QorResult resize_linear_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan) noexcept
     {
     if constexpr (detail::found<F0>) {
         return detail::resize_linear_init_0<k>()(src_size, dst_size, plan);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8738,13 +8813,14 @@ template <unsigned k> constexpr auto resize_cubic_init_0() noexcept {
     "16u, 16s, 32f: C1"
 /** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline. C:
  *  qoriResizeCubicInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_cubic_init_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_cubic_init_0<k>()), bool exists =
+    false>
 [[nodiscard]] QorResult resize_cubic_init(QorImageSize src_size, QorImageSize dst_size, float b, float c,
     QorResizePlan* plan, uint8_t* init_buf) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_cubic_init_0<k>()(src_size, dst_size, b, c, plan, init_buf);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8764,13 +8840,14 @@ template <unsigned k> constexpr auto resize_lanczos_init_0() noexcept {
     " 8u, 16u, 16s, 32f: C1"
 /** Fills the plan of a Lanczos resize with 2 or 3 lobes; the weights of each position sum to 1. C:
  *  qoriResizeLanczosInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_lanczos_init_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_lanczos_init_0<k>()), bool exists
+    = false>
 [[nodiscard]] QorResult resize_lanczos_init(QorImageSize src_size, QorImageSize dst_size, uint32_t lobes,
     QorResizePlan* plan, uint8_t* init_buf) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_lanczos_init_0<k>()(src_size, dst_size, lobes, plan, init_buf);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8790,13 +8867,14 @@ template <unsigned k> constexpr auto resize_super_init_0() noexcept {
     "C1"
 /** Fills the plan of a super-sampling reduction: each pixel is the mean of the source area that it covers. C:
  *  qoriResizeSuperInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_super_init_0<k>())>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_super_init_0<k>()), bool exists =
+    false>
 [[nodiscard]] QorResult resize_super_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan) noexcept
     {
     if constexpr (detail::found<F0>) {
         return detail::resize_super_init_0<k>()(src_size, dst_size, plan);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8845,7 +8923,8 @@ template <unsigned k> constexpr auto resize_nearest_0() noexcept {
     "C1 C3 C4"
 /** Resizes a tile by the nearest source pixel, moved bit for bit. C: qoriResizeNearest. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::resize_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult resize_nearest(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8854,14 +8933,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_nearest_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8888,7 +8967,8 @@ template <unsigned k> constexpr auto resize_super_0() noexcept {
     " C4"
 /** Reduces a tile to means of areas; integers round to nearest, ties to even. C: qoriResizeSuper. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_super_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::resize_super_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult resize_super(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8897,14 +8977,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_super_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult resize_super(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult resize_super(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8935,7 +9015,8 @@ template <unsigned k> constexpr auto resize_linear_0() noexcept {
 /** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single precision.
  *  C: qoriResizeLinear. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::resize_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult resize_linear(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0, 7>,
     k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8944,14 +9025,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_linear_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult resize_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult resize_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8979,7 +9060,8 @@ template <unsigned k> constexpr auto resize_cubic_0() noexcept {
 /** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and saturate. C:
  *  qoriResizeCubic. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::resize_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult resize_cubic(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0, 7>,
     k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8988,14 +9070,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_cubic_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9022,7 +9104,8 @@ template <unsigned k> constexpr auto resize_lanczos_0() noexcept {
     "16s, 32f: C1 C3 C4"
 /** Resizes a tile by Lanczos filtering; integers round to nearest, ties to even, and saturate. C: qoriResizeLanczos. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_lanczos_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::resize_lanczos_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult resize_lanczos(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0,
     7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9031,14 +9114,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_lanczos_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9066,7 +9149,8 @@ template <unsigned k> constexpr auto resize_antialiasing_0() noexcept {
 /** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and saturate. C:
  *  qoriResizeAntialiasing. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_antialiasing_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::resize_antialiasing_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult resize_antialiasing(const A& src, B&& dst, QorPoint2D offset, const
     detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9075,14 +9159,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_antialiasing_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult resize_antialiasing(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult resize_antialiasing(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9139,7 +9223,7 @@ template <unsigned k> constexpr auto rescale_2() noexcept {
  *  0..255. C: qoriScale. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::rescale_0<k>()), class F1 = decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0>
+    detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9152,12 +9236,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::rescale_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), hintFast);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::rescale_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst, float low, float high) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9165,12 +9249,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::rescale_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), low, high);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst, QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9178,14 +9262,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::rescale_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), hint);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult rescale(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult rescale(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9255,18 +9339,18 @@ template <unsigned k> constexpr auto fill_1() noexcept {
  *  value. Other threads must not write them meanwhile: kept elements less than 32 bytes from a filled one may be
  *  rewritten with their own value. C: qoriSet. */
 template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class F0 = decltype(detail::fill_0<k>()),
-    detail::If<detail::isImage<B>> = 0>
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult fill(const detail::Value<detail::Arg<F0, 0>, k>& value, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
         return detail::fill_0<k>()(detail::pass(value), dstV.data(), dstV.step(), dstV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class F0 = decltype(detail::fill_1<k>()),
-    detail::If<detail::isImage<B>> = 0>
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult fill(const detail::Value<detail::Arg<F0, 0>, k>& value, B&& dst, const View<const uint8_t,
     C1>& mask) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9276,14 +9360,14 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
         return detail::fill_1<k>()(detail::pass(value), dstV.data(), dstV.step(), dstV.size(), maskV.data(),
             maskV.step());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult fill(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult fill(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9333,7 +9417,7 @@ template <unsigned k> constexpr auto multiply_packed_3() noexcept {
 /** Multiplies two packed spectra, each channel by itself: a convolution of their images. C: qoriMulPack. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::multiply_packed_0<k>()), class F1 = decltype(detail::multiply_packed_2<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9350,13 +9434,13 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_packed_2<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
     = decltype(detail::multiply_packed_1<k>()), class F1 = decltype(detail::multiply_packed_3<k>()),
-    detail::If<detail::isImage<B>> = 0>
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -9369,13 +9453,13 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_packed_3<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::multiply_packed_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9385,12 +9469,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_packed_2<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_packed_3<k>()), detail::If<detail::isImage<B>> = 0>
+    = decltype(detail::multiply_packed_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -9398,14 +9482,14 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_packed_3<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult multiply_packed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult multiply_packed(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9432,7 +9516,7 @@ template <unsigned k> constexpr auto multiply_packed_conj_1() noexcept {
 /** Multiplies a packed spectrum by the conjugate of a second one: a correlation of their images. C: qoriMulPackConj. */
 template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
     decltype(detail::multiply_packed_conj_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0>
+    detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed_conj(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9442,12 +9526,12 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_packed_conj_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(),
             dstV.step(), aV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, detail::Out<InPlace<TB, LB>>>, class F0
-    = decltype(detail::multiply_packed_conj_1<k>()), detail::If<detail::isImage<A>> = 0>
+    = decltype(detail::multiply_packed_conj_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed_conj(const A& a, const InPlace<TB, LB>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9455,14 +9539,14 @@ template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::multiply_packed_conj_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult multiply_packed_conj(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult multiply_packed_conj(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9487,7 +9571,7 @@ template <unsigned k> constexpr auto magnitude_packed_1() noexcept {
 /** The magnitude of every frequency of a packed spectrum, as a full image. C: qoriMagnitudePack. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::magnitude_packed_0<k>()), class F1 = decltype(detail::magnitude_packed_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult magnitude_packed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9500,12 +9584,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::magnitude_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::magnitude_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::magnitude_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult magnitude_packed(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9514,14 +9599,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::magnitude_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult magnitude_packed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult magnitude_packed(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9546,7 +9631,7 @@ template <unsigned k> constexpr auto phase_packed_1() noexcept {
 /** The phase of every frequency of a packed spectrum, as a full image. C: qoriPhasePack. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
     decltype(detail::phase_packed_0<k>()), class F1 = decltype(detail::phase_packed_1<k>()),
-    detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult phase_packed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9559,12 +9644,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::phase_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::phase_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::phase_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult phase_packed(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9572,14 +9658,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::phase_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult phase_packed(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult phase_packed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9595,7 +9681,8 @@ template <unsigned k> constexpr auto unpack_spectrum_0() noexcept {
     "qori::unpack_spectrum: no such call. unpack_spectrum(src, dst) of 32f->32fc, 32s->32sc: C1"
 /** Every frequency of a packed spectrum, as a full complex image. C: qoriPackToCplxExtend. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::unpack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult unpack_spectrum(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9603,14 +9690,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::unpack_spectrum_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult unpack_spectrum(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult unpack_spectrum(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9630,7 +9717,8 @@ template <unsigned k> constexpr auto pack_spectrum_0() noexcept {
     "qori::pack_spectrum: no such call. pack_spectrum(src, dst) of 32fc->32f, 32sc->32s, 16sc->16s: C1 C3"
 /** Packs the spectrum of a real image that is given as a full complex one. C: qoriCplxExtendToPack. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::pack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult pack_spectrum(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9638,14 +9726,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::pack_spectrum_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9719,7 +9807,7 @@ template <unsigned k> constexpr auto threshold_3() noexcept {
 /** Clips to a threshold: dst = max(src, threshold) with cmpLess, min(src, threshold) with cmpGreater. Replaces what
  *  is less (cmpLess) or greater (cmpGreater) than a threshold by a value. C: qoriThreshold, qoriThreshold_Val. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9729,24 +9817,24 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), op);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_1<k>())>
+    decltype(detail::threshold_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>& threshold,
     QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold), op);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold, const
     detail::Value<detail::Arg<F0, 6>, k>& value, QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9756,12 +9844,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), detail::pass(value), op);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_3<k>())>
+    decltype(detail::threshold_3<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>& threshold,
     const detail::Value<detail::Arg<F0, 4>, k>& value, QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9769,14 +9857,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
             detail::pass(value), op);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9858,7 +9946,8 @@ template <unsigned k> constexpr auto threshold_gt_3() noexcept {
 /** Clips above a threshold: dst = src > threshold ? threshold : src. Replaces what exceeds a threshold: dst = src >
  *  threshold ? value : src. C: qoriThreshold_GT, qoriThreshold_GTVal. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_gt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_gt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult threshold_gt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -9868,24 +9957,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_gt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_gt_1<k>())>
+    decltype(detail::threshold_gt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
     threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_gt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_gt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_gt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult threshold_gt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     const detail::Value<detail::Arg<F0, 6>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9895,12 +9985,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_gt_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), detail::pass(value));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_gt_3<k>())>
+    decltype(detail::threshold_gt_3<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
     threshold, const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9908,14 +9998,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_gt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
             detail::pass(value));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9997,7 +10087,8 @@ template <unsigned k> constexpr auto threshold_lt_3() noexcept {
 /** Clips below a threshold: dst = src < threshold ? threshold : src. Replaces what falls below a threshold: dst = src
  *  < threshold ? value : src. C: qoriThreshold_LT, qoriThreshold_LTVal. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_lt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_lt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult threshold_lt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold)
     noexcept {
     if constexpr (detail::found<F0>) {
@@ -10007,24 +10098,25 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_lt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_lt_1<k>())>
+    decltype(detail::threshold_lt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
     threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_lt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_lt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_lt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult threshold_lt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     const detail::Value<detail::Arg<F0, 6>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10034,12 +10126,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_lt_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), detail::pass(value));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_lt_3<k>())>
+    decltype(detail::threshold_lt_3<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
     threshold, const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10047,14 +10139,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_lt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
             detail::pass(value));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
-    detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
+    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10098,7 +10190,8 @@ template <unsigned k> constexpr auto threshold_outside_1() noexcept {
 /** Replaces on both sides: dst = src < thresholdLT ? valueLT : src > thresholdGT ? valueGT : src. C:
  *  qoriThreshold_LTValGTVal. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_outside_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_outside_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult threshold_outside(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& below,
     const detail::Value<detail::Arg<F0, 6>, k>& value_below, const detail::Value<detail::Arg<F0, 7>, k>& above, const
     detail::Value<detail::Arg<F0, 8>, k>& value_above) noexcept {
@@ -10109,12 +10202,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_outside_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(below), detail::pass(value_below), detail::pass(above), detail::pass(value_above));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_outside_1<k>())>
+    decltype(detail::threshold_outside_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_outside(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
     below, const detail::Value<detail::Arg<F0, 4>, k>& value_below, const detail::Value<detail::Arg<F0, 5>, k>& above,
     const detail::Value<detail::Arg<F0, 6>, k>& value_above) noexcept {
@@ -10123,14 +10216,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_outside_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(below),
             detail::pass(value_below), detail::pass(above), detail::pass(value_above));
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult threshold_outside(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult threshold_outside(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10160,7 +10253,8 @@ template <unsigned k> constexpr auto threshold_adaptive_box_1() noexcept {
  *  where a pixel is greater than the mean of the square around it minus delta, else valLE. C:
  *  qoriThresholdAdaptiveBox. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10175,12 +10269,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
             buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10196,12 +10291,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
             buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10216,12 +10312,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 10>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10236,12 +10333,13 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10256,12 +10354,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>())>
+    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10273,12 +10371,12 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>())>
+    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10291,12 +10389,12 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>())>
+    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10309,12 +10407,12 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             0, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>())>
+    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
     detail::Edge<detail::Arg<F0, 8>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10327,12 +10425,12 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>())>
+    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10345,14 +10443,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult threshold_adaptive_box(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10388,7 +10486,8 @@ template <unsigned k> constexpr auto threshold_adaptive_gauss_1() noexcept {
  *  place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else valLE. C:
  *  qoriThresholdAdaptiveGauss. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::threshold_adaptive_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult threshold_adaptive_gauss(const A& src, B&& dst, float delta, uint8_t value_above, uint8_t
     value_below, const detail::Edge<detail::Arg<F0, 9>, k>& border, const QorAdaptiveGaussSpec* plan, uint8_t* buffer)
     noexcept {
@@ -10400,12 +10499,12 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             srcV.size(), delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 9>>(border),
             plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_gauss_1<k>())>
+    decltype(detail::threshold_adaptive_gauss_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_gauss(const InPlace<TA, LA>& src, float delta, uint8_t value_above, uint8_t
     value_below, const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorAdaptiveGaussSpec* plan, uint8_t* buffer)
     noexcept {
@@ -10414,14 +10513,14 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_gauss_1<k>()(srcV.data(), srcV.step(), srcV.size(), delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult threshold_adaptive_gauss(detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10501,7 +10600,8 @@ template <unsigned k> constexpr auto warp_affine_nearest_0() noexcept {
 /** Warps a tile: each destination pixel is the source pixel nearest to its position, moved bit for bit. C:
  *  qoriWarpAffineNearest. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::warp_affine_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
+    exists = false>
 [[nodiscard]] QorResult warp_affine_nearest(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
     uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10510,14 +10610,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::warp_affine_nearest_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult warp_affine_nearest(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult warp_affine_nearest(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10548,7 +10648,8 @@ template <unsigned k> constexpr auto warp_affine_linear_0() noexcept {
 /** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single. C:
  *  qoriWarpAffineLinear. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::warp_affine_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult warp_affine_linear(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10557,14 +10658,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::warp_affine_linear_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult warp_affine_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult warp_affine_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10595,7 +10696,8 @@ template <unsigned k> constexpr auto warp_affine_cubic_0() noexcept {
 /** Warps a tile by cubic filtering of 4 x 4 pixels: 64f and 32f in double precision, integers in single. C:
  *  qoriWarpAffineCubic. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::warp_affine_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult warp_affine_cubic(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan, uint8_t*
     buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10604,14 +10706,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::warp_affine_cubic_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), plan, buffer);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult warp_affine_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult warp_affine_cubic(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10636,7 +10738,8 @@ template <unsigned k> constexpr auto sum_window_row_0() noexcept {
 /** dst(x, y) = the sum of src(x - anchor, y) to src(x - anchor + maskSize - 1, y), channel by channel. C:
  *  qoriSumWindowRow. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sum_window_row_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::sum_window_row_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
+    false>
 [[nodiscard]] QorResult sum_window_row(const A& src, B&& dst, int32_t size, int32_t anchor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10645,14 +10748,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::sum_window_row_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             anchor);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
+    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10677,7 +10780,8 @@ template <unsigned k> constexpr auto sum_window_column_0() noexcept {
 /** dst(x, y) = the sum of src(x, y - anchor) to src(x, y - anchor + maskSize - 1), channel by channel. C:
  *  qoriSumWindowColumn. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sum_window_column_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0>
+    decltype(detail::sum_window_column_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
+    = false>
 [[nodiscard]] QorResult sum_window_column(const A& src, B&& dst, int32_t size, int32_t anchor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10686,14 +10790,14 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::sum_window_column_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             anchor);
     } else {
-        static_assert(detail::never<k>, QORI_WORDS);
+        static_assert(exists, QORI_WORDS);
         return QOR_ERR_BAD_ARG;
     }
 }
-template <unsigned k = 0> QorResult sum_window_column(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
-    static_assert(detail::never<k>, QORI_WORDS);
+template <bool exists = false> QorResult sum_window_column(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+    static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS

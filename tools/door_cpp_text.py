@@ -252,6 +252,7 @@ def template_head(signature, own, key, conditions):
     head += [f"class F{i} = decltype(detail::{c.form.name}<k>())" for i, c in enumerate(signature.choices)]
     if conditions:
         head.append(f"detail::If<{' && '.join(conditions)}> = 0")
+    head.append("bool exists = false")
     return f"template <{', '.join(head)}>"
 
 
@@ -281,7 +282,7 @@ def alternatives(signature, result="QOR_ERR_BAD_ARG"):
         lines.append(f"    {'} else ' if number else ''}if constexpr (detail::found<F{number}>) {{")
         for line in body(signature, choice, number):
             lines += wrapped(line.strip(), "        ")
-    return lines + ["    } else {", "        static_assert(detail::never<k>, QORI_WORDS);", f"        return {result};", "    }",
+    return lines + ["    } else {", "        static_assert(exists, QORI_WORDS);", f"        return {result};", "    }",
                     "}"]
 
 
@@ -314,8 +315,8 @@ MOST_ARGUMENTS = 10
 def otherwise(operation):
     """Takes whatever no other overload does and says what there is."""
     nothing = ", ".join(["detail::Anything = {}"] * MOST_ARGUMENTS)
-    return wrapped(f"template <unsigned k = 0> QorResult {operation}({nothing}) noexcept {{") + \
-        ["    static_assert(detail::never<k>, QORI_WORDS);", "    return QOR_ERR_BAD_ARG;", "}"]
+    return wrapped(f"template <bool exists = false> QorResult {operation}({nothing}) noexcept {{") + \
+        ["    static_assert(exists, QORI_WORDS);", "    return QOR_ERR_BAD_ARG;", "}"]
 
 
 def documentation(forms):

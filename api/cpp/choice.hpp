@@ -8,8 +8,6 @@ struct Anything {
 };
 template <class F>
 inline constexpr bool found = !std::is_same_v<F, Missing>;
-template <unsigned>
-inline constexpr bool never = false;
 
 /** Reads and writes of images, as keys are made of them. */
 template <class A>
@@ -97,6 +95,8 @@ struct Argument {
 };
 template <class R, class... P, unsigned I>
 struct Argument<R(QORI_CALL*)(P...), I> : Nth<I, P...> {};
+template <class R, class... P, unsigned I>
+struct Argument<R(QORI_CALL*)(P...) noexcept, I> : Nth<I, P...> {};
 template <class F, unsigned I>
 using Arg = typename Argument<F, I>::type;
 template <class A, class B>

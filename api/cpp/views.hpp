@@ -183,6 +183,9 @@ public:
 
     template <class U, detail::If<std::is_same_v<const U, T>> = 0>
     constexpr View(const View<U, L>& other) noexcept : View(other.data(), other.step(), other.size()) {}
+    /** What is const stays so. */
+    template <class U, detail::If<std::is_same_v<U, const T>> = 0>
+    View(const View<U, L>& other) = delete;
 
     /** Rows without gaps in a span, an array class or a vector: nothing where it is too short for the size. */
     template <class S, detail::If<detail::isSpan<S, T>> = 0>
