@@ -55,10 +55,11 @@ class View;
 namespace detail {
 
 /** What a layout is: its digit in keys, elements from pixel to pixel, channels that operations process, planes. */
-template <unsigned Digit, int Stride, int Channels, int Planes = 1>
+template <unsigned Digit, int Stride, std::size_t Channels, std::size_t Planes = 1>
 struct LayoutFacts {
     static constexpr unsigned digit = Digit;
-    static constexpr int stride = Stride, channels = Channels, planes = Planes;
+    static constexpr int stride = Stride;
+    static constexpr std::size_t channels = Channels, planes = Planes;
 };
 template <class L>
 struct Facts : LayoutFacts<0, 1, 1> {};
@@ -267,12 +268,12 @@ class PlanarView {
 public:
     using Element = T;
     using Layout = L;
-    static constexpr int planes = Facts<L>::planes;
+    static constexpr std::size_t planes = Facts<L>::planes;
 
     constexpr PlanarView() noexcept = default;
     constexpr PlanarView(T* const (&data)[planes], int32_t step, QorImageSize size) noexcept
         : step_(step), size_(size) {
-        for (int i = 0; i < planes; ++i) data_[i] = data[i];
+        for (std::size_t i = 0; i < planes; ++i) data_[i] = data[i];
     }
     /** Nothing where steps or sizes differ. */
     constexpr explicit PlanarView(const View<T, C1> (&planesOf)[planes]) noexcept
@@ -280,7 +281,7 @@ public:
         bool alike = true;
         for (const View<T, C1>& p : planesOf)
             alike = alike && p.step() == step_ && p.width() == size_.width && p.height() == size_.height;
-        for (int i = 0; i < planes; ++i) data_[i] = alike ? planesOf[i].data() : nullptr;
+        for (std::size_t i = 0; i < planes; ++i) data_[i] = alike ? planesOf[i].data() : nullptr;
     }
 
     constexpr T* const* data() const noexcept { return data_; }
@@ -292,7 +293,8 @@ public:
 
     /** A plane; nothing where there is none of the number. */
     constexpr View<T, C1> plane(int32_t index) const noexcept {
-        return index >= 0 && index < planes ? View<T, C1>(data_[index], step_, size_) : View<T, C1>();
+        return index >= 0 && index < int32_t(planes) ? View<T, C1>(data_[std::size_t(index)], step_, size_)
+                                                     : View<T, C1>();
     }
     View<T, L> crop(QorImageRect r) const noexcept {
         return each([&](View<T, C1> plane) { return plane.crop(r); });
@@ -305,7 +307,7 @@ private:
     template <class F>
     View<T, L> each(F&& change) const noexcept {
         View<T, C1> changed[planes];
-        for (int i = 0; i < planes; ++i) changed[i] = change(plane(i));
+        for (std::size_t i = 0; i < planes; ++i) changed[i] = change(plane(int32_t(i)));
         return View<T, L>(changed);
     }
     T* data_[planes] = {};
@@ -351,14 +353,14 @@ constexpr InPlace<T, L> in_place(const View<T, L>& image) noexcept {
 }
 
 /** One element per channel: {1, 2, 3}, or of one channel 1. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Pixel {
 public:
     constexpr Pixel() noexcept = default;
     template <class... U, detail::If<sizeof...(U) == N && (std::is_convertible_v<U, T> && ...)> = 0>
     constexpr Pixel(U... channels) noexcept : values_{static_cast<T>(channels)...} {}
     constexpr Pixel(const T (&channels)[N]) noexcept {
-        for (int i = 0; i < N; ++i) values_[i] = channels[i];
+        for (std::size_t i = 0; i < N; ++i) values_[i] = channels[i];
     }
     constexpr T& operator[](int channel) noexcept { return values_[channel]; }
     constexpr const T& operator[](int channel) const noexcept { return values_[channel]; }
@@ -373,11 +375,11 @@ private:
 namespace detail {
 
 /** Where an operation puts a result per channel: a variable (of one channel), an array, a Pixel or the like. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Results {
 public:
     constexpr Results(T (&results)[N]) noexcept : data(results) {}
-    template <int M = N, If<M == 1> = 0>
+    template <std::size_t M = N, If<M == 1> = 0>
     constexpr Results(T& result) noexcept : data(&result) {}
     template <class S, If<isSpan<S&, T> && sizeof(S) == N * sizeof(T)> = 0>
     constexpr Results(S& results) noexcept : data(results.data()) {}
@@ -424,7 +426,7 @@ private:
 };
 
 /** What lies beyond an image: borderReplicate and so on, or {borderConstant, value per channel}. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Border {
 public:
     constexpr Border(int32_t mode) noexcept : mode_(mode) {}
@@ -643,8 +645,8 @@ template <class T, class L = C1>
 inline constexpr unsigned keyOf = key<In<View<T, L>>, Out<>>;
 
 /** Channels that the members of a key process. */
-constexpr int channels(unsigned k) noexcept {
-    constexpr int counts[] = {1, 1, 2, 3, 4, 3, 3, 4, 1, 1, 1, 1, 1, 1, 1, 1};
+constexpr std::size_t channels(unsigned k) noexcept {
+    constexpr std::size_t counts[] = {1, 1, 2, 3, 4, 3, 3, 4, 1, 1, 1, 1, 1, 1, 1, 1};
     return counts[k & 15];
 }
 
@@ -676,11 +678,11 @@ struct Both<Anything, B> {
 template <class A, class B>
 using Either = typename Both<A, B>::type;
 
-template <class T, int N>
+template <class T, std::size_t N>
 struct ValueOf {
     using type = T;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct ValueOf<const T*, N> {
     using type = Pixel<T, N>;
 };
@@ -688,26 +690,26 @@ struct ValueOf<const T*, N> {
 template <class P, unsigned k>
 using Value = typename ValueOf<P, channels(k)>::type;
 
-template <class P, int N>
+template <class P, std::size_t N>
 struct ResultsOf {
     using type = P;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct ResultsOf<T*, N> {
     using type = Results<T, N>;
 };
 template <class P, unsigned k>
 using Result = typename ResultsOf<P, channels(k)>::type;
 
-template <class P, int N>
+template <class P, std::size_t N>
 struct BorderOf {
     using type = Border<P, N>;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct BorderOf<const T*, N> {
     using type = Border<T, N>;
 };
-template <int N>
+template <std::size_t N>
 struct BorderOf<Anything, N> {
     using type = Anything;
 };
@@ -725,7 +727,7 @@ struct KernelOf<const T*> {
 template <class P>
 using Weights = typename KernelOf<P>::type;
 
-template <class T, int N>
+template <class T, std::size_t N>
 constexpr const T* pass(const Pixel<T, N>& value) noexcept {
     return value.data();
 }
@@ -733,7 +735,7 @@ template <class T>
 constexpr T pass(T value) noexcept {
     return value;
 }
-template <class P, class T, int N>
+template <class P, class T, std::size_t N>
 constexpr P beyond(const Border<T, N>& border) noexcept {
     if constexpr (std::is_pointer_v<P>)
         return border.value().data();
@@ -2983,7 +2985,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterBoxBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -3004,7 +3006,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterBoxBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -3025,7 +3027,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterBoxBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -7282,7 +7284,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterMedianBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -7303,7 +7305,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterMedianBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -7324,7 +7326,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterMedianBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -10263,7 +10265,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
@@ -10285,7 +10287,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
@@ -10307,7 +10309,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
@@ -10328,7 +10330,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
@@ -10349,7 +10351,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
@@ -10366,7 +10368,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10384,7 +10386,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10402,7 +10404,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             0, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10420,7 +10422,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10438,7 +10440,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10817,9 +10819,9 @@ namespace detail {
 template <class Record>
 class Plan {
 public:
-    /** Of the making: QOR_OK, a warning or the error for which there is no plan. */
-    QorResult status() const noexcept { return status_; }
-    explicit operator bool() const noexcept { return memory_ && usable(); }
+    /** Of the making: QOR_OK, a warning or the error for which there is no plan; QOR_ERR_CONTEXT once it moved away. */
+    QorResult status() const noexcept { return usable() && !memory_ ? QorResult(QOR_ERR_CONTEXT) : status_; }
+    explicit operator bool() const noexcept { return usable() && memory_; }
     /** As the functions of qori.h take it. */
     const Record* get() const noexcept { return *this ? reinterpret_cast<const Record*>(memory_.data()) : nullptr; }
 
@@ -10920,7 +10922,8 @@ public:
         if (!detail::isSize(srcV.size(), src_.width, src_.height)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         QorPoint2D at{};
-        const QorResult query = resize_get_buffer_size<T>(this->get(), dstV.size(), detail::channels(k), &bytes);
+        const QorResult query =
+            resize_get_buffer_size<T>(this->get(), dstV.size(), int32_t(detail::channels(k)), &bytes);
         if (query == QOR_WARN_NOTHING_TO_DO) return query;
         if (const QorResult r = detail::need(buffer, query, bytes)) return r;
         if (const QorResult r = resize_get_src_offset<T>(this->get(), offset, &at)) return r;
@@ -10954,7 +10957,7 @@ private:
         }
         return QOR_ERR_UNSUPPORTED_MODE;
     }
-    template <unsigned k, class A, class B, int N>
+    template <unsigned k, class A, class B, std::size_t N>
     QorResult run(const A& s, const B& d, QorPoint2D at, const Border<T, N>& border, uint8_t* buffer) const noexcept {
         const QorResizePlan* plan = this->get();
         [[maybe_unused]] const auto bordered = [&](auto member) {
@@ -10981,14 +10984,15 @@ private:
  *  destination positions, inverse ones the other way. Nearest, linear or cubic. */
 template <class T, class L = C1>
 class WarpAffinePlan : public detail::Plan<QorWarpPlan> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
     static_assert(detail::found<decltype(detail::warp_affine_linear_0<k>())>,
                   "qori::WarpAffinePlan<T, L> of 8u 16u 16s 32f 64f: C1 C3 C4");
 
 public:
     WarpAffinePlan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
-                   const Border<double, channels>& border = {borderReplicate}, bool inverse = false) noexcept
+                   const Border<double, count>& border = {borderReplicate}, bool inverse = false) noexcept
         : src_(src), dst_(dst), kind_(how.kind) {
         int32_t bytes = 0, initBytes = 0;
         const int32_t type = detail::dataType<T>, mode = border.mode();
@@ -11042,7 +11046,8 @@ private:
  *  anchor, and turned by 180 degrees. */
 template <class T, class L = C1>
 class LinearFilterPlan : public detail::Plan<QorLinearFilterPlan> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static_assert(detail::found<decltype(detail::filter_border_0<detail::keyOf<T, L>>())>,
                   "qori::LinearFilterPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
 
@@ -11061,7 +11066,7 @@ public:
             return filter_border_init_32f(kernel.data(), kernel_, detail::dataType<T>, channels, rounding, plan);
         });
     }
-    [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst, const Border<T, channels>& border,
+    [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst, const Border<T, count>& border,
                                        Buffer& buffer) const noexcept {
         if (!*this) return this->status();
         if (detail::differ(src, dst)) return QOR_ERR_SIZE;
@@ -11071,7 +11076,7 @@ public:
         return filter_border(src, dst, border, this->get(), buffer.data());
     }
     [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst,
-                                       const Border<T, channels>& border = {borderReplicate}) const noexcept {
+                                       const Border<T, count>& border = {borderReplicate}) const noexcept {
         Buffer buffer;
         return (*this)(src, dst, border, buffer);
     }
@@ -11354,21 +11359,22 @@ public:
 /** Levels of histograms of images of T in the layout L, C1, C3 or C4. Counts are of levels, one more than bins. */
 template <class T, class L = C1>
 class HistogramPlan : public detail::Plan<QorHistogramSpec> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
     static_assert(detail::found<decltype(detail::histogram_0<k>())>,
                   "qori::HistogramPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
 
 public:
     /** Given levels, a list for each channel. */
-    HistogramPlan(const float* const (&levels)[channels], const Pixel<int32_t, channels>& counts) noexcept {
+    HistogramPlan(const float* const (&levels)[count], const Pixel<int32_t, count>& counts) noexcept {
         prepare(counts, 0, [&](QorHistogramSpec* plan, uint8_t*) {
             return histogram_init(detail::dataType<T>, levels, counts.data(), channels, plan);
         });
     }
     /** Levels spaced evenly from the lower to the upper one. */
-    HistogramPlan(const Pixel<float, channels>& lower, const Pixel<float, channels>& upper,
-                  const Pixel<int32_t, channels>& counts) noexcept {
+    HistogramPlan(const Pixel<float, count>& lower, const Pixel<float, count>& upper,
+                  const Pixel<int32_t, count>& counts) noexcept {
         prepare(counts, 1, [&](QorHistogramSpec* plan, uint8_t*) {
             return histogram_uniform_init(detail::dataType<T>, lower.data(), upper.data(), counts.data(), channels,
                                           plan);
@@ -11386,13 +11392,13 @@ public:
         return (*this)(src, hist, buffer);
     }
     /** The levels as they are used: a list for each channel. */
-    [[nodiscard]] QorResult levels(float* const (&lists)[channels]) const noexcept {
+    [[nodiscard]] QorResult levels(float* const (&lists)[count]) const noexcept {
         return *this ? histogram_get_levels(this->get(), lists) : this->status();
     }
 
 private:
     template <class Fill>
-    void prepare(const Pixel<int32_t, channels>& counts, int32_t uniform, Fill&& fill) noexcept {
+    void prepare(const Pixel<int32_t, count>& counts, int32_t uniform, Fill&& fill) noexcept {
         int32_t bytes = 0;
         const QorResult query =
             histogram_get_buffer_size(detail::dataType<T>, {1, 1}, counts.data(), channels, uniform, &bytes, &bytes_);

@@ -208,7 +208,7 @@ def work_memory(choice, images):
         elif c.kind == "data_type":
             texts.append("detail::dataType<detail::ElementOf<decltype(srcV)>>")
         elif c.kind == "channels":
-            texts.append("detail::channels(k)")
+            texts.append("int32_t(detail::channels(k))")
         elif c.kind == "columns":
             texts.append("dstV.width()")
         elif c.kind == "bytes":

@@ -1,6 +1,5 @@
 #include "recorder.h"
 
-
 namespace recorder {
 
 Call last;
