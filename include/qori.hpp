@@ -794,7 +794,7 @@ inline constexpr int32_t dataType<double> = qor64f;
 #define QORI_AT(key, member) if constexpr (k == key) return &member;
 
 namespace detail {
-template <unsigned k> constexpr auto allocate_0() noexcept {
+template <unsigned k> inline auto allocate_0() noexcept {
     QORI_AT(0x1111, qoriMalloc_8u_C1) else
     QORI_AT(0x1212, qoriMalloc_8u_C2) else
     QORI_AT(0x1313, qoriMalloc_8u_C3) else
@@ -928,7 +928,7 @@ View<const T, L> view(const Image<T, L>& image) noexcept {
 // --- operations, in the order of qori.h
 
 namespace detail {
-template <unsigned k> constexpr auto add_0() noexcept {
+template <unsigned k> inline auto add_0() noexcept {
     QORI_AT(0x1111, qoriAdd_8u_C1RSfs) else
     QORI_AT(0x1313, qoriAdd_8u_C3RSfs) else
     QORI_AT(0x1414, qoriAdd_8u_C4RSfs) else
@@ -949,7 +949,7 @@ template <unsigned k> constexpr auto add_0() noexcept {
     QORI_AT(0xa5a5, qoriAdd_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_1() noexcept {
+template <unsigned k> inline auto add_1() noexcept {
     QORI_AT(0x1111, qoriAdd_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriAdd_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriAdd_8u_C4IRSfs) else
@@ -970,7 +970,7 @@ template <unsigned k> constexpr auto add_1() noexcept {
     QORI_AT(0xa5a5, qoriAdd_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_2() noexcept {
+template <unsigned k> inline auto add_2() noexcept {
     QORI_AT(0x7171, qoriAdd_32f_C1R) else
     QORI_AT(0x7373, qoriAdd_32f_C3R) else
     QORI_AT(0x7474, qoriAdd_32f_C4R) else
@@ -980,7 +980,7 @@ template <unsigned k> constexpr auto add_2() noexcept {
     QORI_AT(0xb5b5, qoriAdd_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_3() noexcept {
+template <unsigned k> inline auto add_3() noexcept {
     QORI_AT(0x7171, qoriAdd_32f_C1IR) else
     QORI_AT(0x7373, qoriAdd_32f_C3IR) else
     QORI_AT(0x7474, qoriAdd_32f_C4IR) else
@@ -990,7 +990,7 @@ template <unsigned k> constexpr auto add_3() noexcept {
     QORI_AT(0xb5b5, qoriAdd_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_4() noexcept {
+template <unsigned k> inline auto add_4() noexcept {
     QORI_AT(0x1111, qoriAddC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriAddC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriAddC_8u_C4RSfs) else
@@ -1011,7 +1011,7 @@ template <unsigned k> constexpr auto add_4() noexcept {
     QORI_AT(0xa5a5, qoriAddC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_5() noexcept {
+template <unsigned k> inline auto add_5() noexcept {
     QORI_AT(0x1111, qoriAddC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriAddC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriAddC_8u_C4IRSfs) else
@@ -1032,7 +1032,7 @@ template <unsigned k> constexpr auto add_5() noexcept {
     QORI_AT(0xa5a5, qoriAddC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_6() noexcept {
+template <unsigned k> inline auto add_6() noexcept {
     QORI_AT(0x7171, qoriAddC_32f_C1R) else
     QORI_AT(0x7373, qoriAddC_32f_C3R) else
     QORI_AT(0x7474, qoriAddC_32f_C4R) else
@@ -1042,7 +1042,7 @@ template <unsigned k> constexpr auto add_6() noexcept {
     QORI_AT(0xb5b5, qoriAddC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_7() noexcept {
+template <unsigned k> inline auto add_7() noexcept {
     QORI_AT(0x7171, qoriAddC_32f_C1IR) else
     QORI_AT(0x7373, qoriAddC_32f_C3IR) else
     QORI_AT(0x7474, qoriAddC_32f_C4IR) else
@@ -1199,7 +1199,7 @@ template <bool exists = false> QorResult add(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto subtract_0() noexcept {
+template <unsigned k> inline auto subtract_0() noexcept {
     QORI_AT(0x1111, qoriSub_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSub_8u_C3RSfs) else
     QORI_AT(0x1414, qoriSub_8u_C4RSfs) else
@@ -1220,7 +1220,7 @@ template <unsigned k> constexpr auto subtract_0() noexcept {
     QORI_AT(0xa5a5, qoriSub_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_1() noexcept {
+template <unsigned k> inline auto subtract_1() noexcept {
     QORI_AT(0x1111, qoriSub_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSub_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriSub_8u_C4IRSfs) else
@@ -1241,7 +1241,7 @@ template <unsigned k> constexpr auto subtract_1() noexcept {
     QORI_AT(0xa5a5, qoriSub_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_2() noexcept {
+template <unsigned k> inline auto subtract_2() noexcept {
     QORI_AT(0x7171, qoriSub_32f_C1R) else
     QORI_AT(0x7373, qoriSub_32f_C3R) else
     QORI_AT(0x7474, qoriSub_32f_C4R) else
@@ -1251,7 +1251,7 @@ template <unsigned k> constexpr auto subtract_2() noexcept {
     QORI_AT(0xb5b5, qoriSub_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_3() noexcept {
+template <unsigned k> inline auto subtract_3() noexcept {
     QORI_AT(0x7171, qoriSub_32f_C1IR) else
     QORI_AT(0x7373, qoriSub_32f_C3IR) else
     QORI_AT(0x7474, qoriSub_32f_C4IR) else
@@ -1261,7 +1261,7 @@ template <unsigned k> constexpr auto subtract_3() noexcept {
     QORI_AT(0xb5b5, qoriSub_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_4() noexcept {
+template <unsigned k> inline auto subtract_4() noexcept {
     QORI_AT(0x1111, qoriSubC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSubC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriSubC_8u_C4RSfs) else
@@ -1282,7 +1282,7 @@ template <unsigned k> constexpr auto subtract_4() noexcept {
     QORI_AT(0xa5a5, qoriSubC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_5() noexcept {
+template <unsigned k> inline auto subtract_5() noexcept {
     QORI_AT(0x1111, qoriSubC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSubC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriSubC_8u_C4IRSfs) else
@@ -1303,7 +1303,7 @@ template <unsigned k> constexpr auto subtract_5() noexcept {
     QORI_AT(0xa5a5, qoriSubC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_6() noexcept {
+template <unsigned k> inline auto subtract_6() noexcept {
     QORI_AT(0x7171, qoriSubC_32f_C1R) else
     QORI_AT(0x7373, qoriSubC_32f_C3R) else
     QORI_AT(0x7474, qoriSubC_32f_C4R) else
@@ -1313,7 +1313,7 @@ template <unsigned k> constexpr auto subtract_6() noexcept {
     QORI_AT(0xb5b5, qoriSubC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_7() noexcept {
+template <unsigned k> inline auto subtract_7() noexcept {
     QORI_AT(0x7171, qoriSubC_32f_C1IR) else
     QORI_AT(0x7373, qoriSubC_32f_C3IR) else
     QORI_AT(0x7474, qoriSubC_32f_C4IR) else
@@ -1473,7 +1473,7 @@ template <bool exists = false> QorResult subtract(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_0() noexcept {
+template <unsigned k> inline auto multiply_0() noexcept {
     QORI_AT(0x1111, qoriMul_8u_C1RSfs) else
     QORI_AT(0x1313, qoriMul_8u_C3RSfs) else
     QORI_AT(0x1414, qoriMul_8u_C4RSfs) else
@@ -1494,7 +1494,7 @@ template <unsigned k> constexpr auto multiply_0() noexcept {
     QORI_AT(0xa5a5, qoriMul_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_1() noexcept {
+template <unsigned k> inline auto multiply_1() noexcept {
     QORI_AT(0x1111, qoriMul_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriMul_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriMul_8u_C4IRSfs) else
@@ -1515,7 +1515,7 @@ template <unsigned k> constexpr auto multiply_1() noexcept {
     QORI_AT(0xa5a5, qoriMul_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_2() noexcept {
+template <unsigned k> inline auto multiply_2() noexcept {
     QORI_AT(0x7171, qoriMul_32f_C1R) else
     QORI_AT(0x7373, qoriMul_32f_C3R) else
     QORI_AT(0x7474, qoriMul_32f_C4R) else
@@ -1525,7 +1525,7 @@ template <unsigned k> constexpr auto multiply_2() noexcept {
     QORI_AT(0xb5b5, qoriMul_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_3() noexcept {
+template <unsigned k> inline auto multiply_3() noexcept {
     QORI_AT(0x7171, qoriMul_32f_C1IR) else
     QORI_AT(0x7373, qoriMul_32f_C3IR) else
     QORI_AT(0x7474, qoriMul_32f_C4IR) else
@@ -1535,7 +1535,7 @@ template <unsigned k> constexpr auto multiply_3() noexcept {
     QORI_AT(0xb5b5, qoriMul_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_4() noexcept {
+template <unsigned k> inline auto multiply_4() noexcept {
     QORI_AT(0x1111, qoriMulC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriMulC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriMulC_8u_C4RSfs) else
@@ -1556,7 +1556,7 @@ template <unsigned k> constexpr auto multiply_4() noexcept {
     QORI_AT(0xa5a5, qoriMulC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_5() noexcept {
+template <unsigned k> inline auto multiply_5() noexcept {
     QORI_AT(0x1111, qoriMulC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriMulC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriMulC_8u_C4IRSfs) else
@@ -1577,7 +1577,7 @@ template <unsigned k> constexpr auto multiply_5() noexcept {
     QORI_AT(0xa5a5, qoriMulC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_6() noexcept {
+template <unsigned k> inline auto multiply_6() noexcept {
     QORI_AT(0x7171, qoriMulC_32f_C1R) else
     QORI_AT(0x7373, qoriMulC_32f_C3R) else
     QORI_AT(0x7474, qoriMulC_32f_C4R) else
@@ -1587,7 +1587,7 @@ template <unsigned k> constexpr auto multiply_6() noexcept {
     QORI_AT(0xb5b5, qoriMulC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_7() noexcept {
+template <unsigned k> inline auto multiply_7() noexcept {
     QORI_AT(0x7171, qoriMulC_32f_C1IR) else
     QORI_AT(0x7373, qoriMulC_32f_C3IR) else
     QORI_AT(0x7474, qoriMulC_32f_C4IR) else
@@ -1747,7 +1747,7 @@ template <bool exists = false> QorResult multiply(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_fraction_0() noexcept {
+template <unsigned k> inline auto multiply_fraction_0() noexcept {
     QORI_AT(0x1111, qoriMulScale_8u_C1R) else
     QORI_AT(0x1313, qoriMulScale_8u_C3R) else
     QORI_AT(0x1414, qoriMulScale_8u_C4R) else
@@ -1758,7 +1758,7 @@ template <unsigned k> constexpr auto multiply_fraction_0() noexcept {
     QORI_AT(0x3535, qoriMulScale_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_fraction_1() noexcept {
+template <unsigned k> inline auto multiply_fraction_1() noexcept {
     QORI_AT(0x1111, qoriMulScale_8u_C1IR) else
     QORI_AT(0x1313, qoriMulScale_8u_C3IR) else
     QORI_AT(0x1414, qoriMulScale_8u_C4IR) else
@@ -1769,7 +1769,7 @@ template <unsigned k> constexpr auto multiply_fraction_1() noexcept {
     QORI_AT(0x3535, qoriMulScale_16u_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_fraction_2() noexcept {
+template <unsigned k> inline auto multiply_fraction_2() noexcept {
     QORI_AT(0x1111, qoriMulCScale_8u_C1R) else
     QORI_AT(0x1313, qoriMulCScale_8u_C3R) else
     QORI_AT(0x1414, qoriMulCScale_8u_C4R) else
@@ -1780,7 +1780,7 @@ template <unsigned k> constexpr auto multiply_fraction_2() noexcept {
     QORI_AT(0x3535, qoriMulCScale_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_fraction_3() noexcept {
+template <unsigned k> inline auto multiply_fraction_3() noexcept {
     QORI_AT(0x1111, qoriMulCScale_8u_C1IR) else
     QORI_AT(0x1313, qoriMulCScale_8u_C3IR) else
     QORI_AT(0x1414, qoriMulCScale_8u_C4IR) else
@@ -1864,7 +1864,7 @@ template <bool exists = false> QorResult multiply_fraction(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto divide_0() noexcept {
+template <unsigned k> inline auto divide_0() noexcept {
     QORI_AT(0x1111, qoriDivC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriDivC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriDivC_8u_C4RSfs) else
@@ -1885,7 +1885,7 @@ template <unsigned k> constexpr auto divide_0() noexcept {
     QORI_AT(0xa5a5, qoriDivC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_1() noexcept {
+template <unsigned k> inline auto divide_1() noexcept {
     QORI_AT(0x1111, qoriDivC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriDivC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriDivC_8u_C4IRSfs) else
@@ -1906,7 +1906,7 @@ template <unsigned k> constexpr auto divide_1() noexcept {
     QORI_AT(0xa5a5, qoriDivC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_2() noexcept {
+template <unsigned k> inline auto divide_2() noexcept {
     QORI_AT(0x7171, qoriDivC_32f_C1R) else
     QORI_AT(0x7373, qoriDivC_32f_C3R) else
     QORI_AT(0x7474, qoriDivC_32f_C4R) else
@@ -1916,7 +1916,7 @@ template <unsigned k> constexpr auto divide_2() noexcept {
     QORI_AT(0xb5b5, qoriDivC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_3() noexcept {
+template <unsigned k> inline auto divide_3() noexcept {
     QORI_AT(0x7171, qoriDivC_32f_C1IR) else
     QORI_AT(0x7373, qoriDivC_32f_C3IR) else
     QORI_AT(0x7474, qoriDivC_32f_C4IR) else
@@ -1926,7 +1926,7 @@ template <unsigned k> constexpr auto divide_3() noexcept {
     QORI_AT(0xb5b5, qoriDivC_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_4() noexcept {
+template <unsigned k> inline auto divide_4() noexcept {
     QORI_AT(0x1111, qoriDiv_8u_C1RSfs) else
     QORI_AT(0x1313, qoriDiv_8u_C3RSfs) else
     QORI_AT(0x1414, qoriDiv_8u_C4RSfs) else
@@ -1947,7 +1947,7 @@ template <unsigned k> constexpr auto divide_4() noexcept {
     QORI_AT(0xa5a5, qoriDiv_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_5() noexcept {
+template <unsigned k> inline auto divide_5() noexcept {
     QORI_AT(0x1111, qoriDiv_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriDiv_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriDiv_8u_C4IRSfs) else
@@ -1968,7 +1968,7 @@ template <unsigned k> constexpr auto divide_5() noexcept {
     QORI_AT(0xa5a5, qoriDiv_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_6() noexcept {
+template <unsigned k> inline auto divide_6() noexcept {
     QORI_AT(0x7171, qoriDiv_32f_C1R) else
     QORI_AT(0x7373, qoriDiv_32f_C3R) else
     QORI_AT(0x7474, qoriDiv_32f_C4R) else
@@ -1978,7 +1978,7 @@ template <unsigned k> constexpr auto divide_6() noexcept {
     QORI_AT(0xb5b5, qoriDiv_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_7() noexcept {
+template <unsigned k> inline auto divide_7() noexcept {
     QORI_AT(0x7171, qoriDiv_32f_C1IR) else
     QORI_AT(0x7373, qoriDiv_32f_C3IR) else
     QORI_AT(0x7474, qoriDiv_32f_C4IR) else
@@ -1988,7 +1988,7 @@ template <unsigned k> constexpr auto divide_7() noexcept {
     QORI_AT(0xb5b5, qoriDiv_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_8() noexcept {
+template <unsigned k> inline auto divide_8() noexcept {
     QORI_AT(0x1111, qoriDiv_Round_8u_C1RSfs) else
     QORI_AT(0x1313, qoriDiv_Round_8u_C3RSfs) else
     QORI_AT(0x1414, qoriDiv_Round_8u_C4RSfs) else
@@ -2003,7 +2003,7 @@ template <unsigned k> constexpr auto divide_8() noexcept {
     QORI_AT(0x4545, qoriDiv_Round_16s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_9() noexcept {
+template <unsigned k> inline auto divide_9() noexcept {
     QORI_AT(0x1111, qoriDiv_Round_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriDiv_Round_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriDiv_Round_8u_C4IRSfs) else
@@ -2241,7 +2241,7 @@ template <bool exists = false> QorResult divide(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto absolute_0() noexcept {
+template <unsigned k> inline auto absolute_0() noexcept {
     QORI_AT(0x4141, qoriAbs_16s_C1R) else
     QORI_AT(0x4343, qoriAbs_16s_C3R) else
     QORI_AT(0x4444, qoriAbs_16s_C4R) else
@@ -2252,7 +2252,7 @@ template <unsigned k> constexpr auto absolute_0() noexcept {
     QORI_AT(0x7575, qoriAbs_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto absolute_1() noexcept {
+template <unsigned k> inline auto absolute_1() noexcept {
     QORI_AT(0x4141, qoriAbs_16s_C1IR) else
     QORI_AT(0x4343, qoriAbs_16s_C3IR) else
     QORI_AT(0x4444, qoriAbs_16s_C4IR) else
@@ -2300,7 +2300,7 @@ template <bool exists = false> QorResult absolute(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto square_0() noexcept {
+template <unsigned k> inline auto square_0() noexcept {
     QORI_AT(0x1111, qoriSqr_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSqr_8u_C3RSfs) else
     QORI_AT(0x1414, qoriSqr_8u_C4RSfs) else
@@ -2315,7 +2315,7 @@ template <unsigned k> constexpr auto square_0() noexcept {
     QORI_AT(0x4545, qoriSqr_16s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto square_1() noexcept {
+template <unsigned k> inline auto square_1() noexcept {
     QORI_AT(0x1111, qoriSqr_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSqr_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriSqr_8u_C4IRSfs) else
@@ -2330,14 +2330,14 @@ template <unsigned k> constexpr auto square_1() noexcept {
     QORI_AT(0x4545, qoriSqr_16s_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto square_2() noexcept {
+template <unsigned k> inline auto square_2() noexcept {
     QORI_AT(0x7171, qoriSqr_32f_C1R) else
     QORI_AT(0x7373, qoriSqr_32f_C3R) else
     QORI_AT(0x7474, qoriSqr_32f_C4R) else
     QORI_AT(0x7575, qoriSqr_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto square_3() noexcept {
+template <unsigned k> inline auto square_3() noexcept {
     QORI_AT(0x7171, qoriSqr_32f_C1IR) else
     QORI_AT(0x7373, qoriSqr_32f_C3IR) else
     QORI_AT(0x7474, qoriSqr_32f_C4IR) else
@@ -2415,7 +2415,7 @@ template <bool exists = false> QorResult square(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sqrt_0() noexcept {
+template <unsigned k> inline auto sqrt_0() noexcept {
     QORI_AT(0x1111, qoriSqrt_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSqrt_8u_C3RSfs) else
     QORI_AT(0x1515, qoriSqrt_8u_AC4RSfs) else
@@ -2427,7 +2427,7 @@ template <unsigned k> constexpr auto sqrt_0() noexcept {
     QORI_AT(0x4545, qoriSqrt_16s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sqrt_1() noexcept {
+template <unsigned k> inline auto sqrt_1() noexcept {
     QORI_AT(0x1111, qoriSqrt_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSqrt_8u_C3IRSfs) else
     QORI_AT(0x1515, qoriSqrt_8u_AC4IRSfs) else
@@ -2439,13 +2439,13 @@ template <unsigned k> constexpr auto sqrt_1() noexcept {
     QORI_AT(0x4545, qoriSqrt_16s_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sqrt_2() noexcept {
+template <unsigned k> inline auto sqrt_2() noexcept {
     QORI_AT(0x7171, qoriSqrt_32f_C1R) else
     QORI_AT(0x7373, qoriSqrt_32f_C3R) else
     QORI_AT(0x7575, qoriSqrt_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sqrt_3() noexcept {
+template <unsigned k> inline auto sqrt_3() noexcept {
     QORI_AT(0x7171, qoriSqrt_32f_C1IR) else
     QORI_AT(0x7373, qoriSqrt_32f_C3IR) else
     QORI_AT(0x7575, qoriSqrt_32f_AC4IR) else
@@ -2524,7 +2524,7 @@ template <bool exists = false> QorResult sqrt(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto exp_0() noexcept {
+template <unsigned k> inline auto exp_0() noexcept {
     QORI_AT(0x1111, qoriExp_8u_C1RSfs) else
     QORI_AT(0x1313, qoriExp_8u_C3RSfs) else
     QORI_AT(0x3131, qoriExp_16u_C1RSfs) else
@@ -2533,7 +2533,7 @@ template <unsigned k> constexpr auto exp_0() noexcept {
     QORI_AT(0x4343, qoriExp_16s_C3RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto exp_1() noexcept {
+template <unsigned k> inline auto exp_1() noexcept {
     QORI_AT(0x1111, qoriExp_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriExp_8u_C3IRSfs) else
     QORI_AT(0x3131, qoriExp_16u_C1IRSfs) else
@@ -2542,12 +2542,12 @@ template <unsigned k> constexpr auto exp_1() noexcept {
     QORI_AT(0x4343, qoriExp_16s_C3IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto exp_2() noexcept {
+template <unsigned k> inline auto exp_2() noexcept {
     QORI_AT(0x7171, qoriExp_32f_C1R) else
     QORI_AT(0x7373, qoriExp_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto exp_3() noexcept {
+template <unsigned k> inline auto exp_3() noexcept {
     QORI_AT(0x7171, qoriExp_32f_C1IR) else
     QORI_AT(0x7373, qoriExp_32f_C3IR) else
     return Missing{};
@@ -2623,7 +2623,7 @@ template <bool exists = false> QorResult exp(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto log_0() noexcept {
+template <unsigned k> inline auto log_0() noexcept {
     QORI_AT(0x1111, qoriLn_8u_C1RSfs) else
     QORI_AT(0x1313, qoriLn_8u_C3RSfs) else
     QORI_AT(0x3131, qoriLn_16u_C1RSfs) else
@@ -2632,7 +2632,7 @@ template <unsigned k> constexpr auto log_0() noexcept {
     QORI_AT(0x4343, qoriLn_16s_C3RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto log_1() noexcept {
+template <unsigned k> inline auto log_1() noexcept {
     QORI_AT(0x1111, qoriLn_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriLn_8u_C3IRSfs) else
     QORI_AT(0x3131, qoriLn_16u_C1IRSfs) else
@@ -2641,12 +2641,12 @@ template <unsigned k> constexpr auto log_1() noexcept {
     QORI_AT(0x4343, qoriLn_16s_C3IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto log_2() noexcept {
+template <unsigned k> inline auto log_2() noexcept {
     QORI_AT(0x7171, qoriLn_32f_C1R) else
     QORI_AT(0x7373, qoriLn_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto log_3() noexcept {
+template <unsigned k> inline auto log_3() noexcept {
     QORI_AT(0x7171, qoriLn_32f_C1IR) else
     QORI_AT(0x7373, qoriLn_32f_C3IR) else
     return Missing{};
@@ -2723,7 +2723,7 @@ template <bool exists = false> QorResult log(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto pad_constant_0() noexcept {
+template <unsigned k> inline auto pad_constant_0() noexcept {
     QORI_AT(0x1111, qoriCopyConstBorder_8u_C1R) else
     QORI_AT(0x1313, qoriCopyConstBorder_8u_C3R) else
     QORI_AT(0x1414, qoriCopyConstBorder_8u_C4R) else
@@ -2775,7 +2775,7 @@ template <bool exists = false> QorResult pad_constant(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto pad_replicate_0() noexcept {
+template <unsigned k> inline auto pad_replicate_0() noexcept {
     QORI_AT(0x1111, qoriCopyReplicateBorder_8u_C1R) else
     QORI_AT(0x1313, qoriCopyReplicateBorder_8u_C3R) else
     QORI_AT(0x1414, qoriCopyReplicateBorder_8u_C4R) else
@@ -2798,7 +2798,7 @@ template <unsigned k> constexpr auto pad_replicate_0() noexcept {
     QORI_AT(0x7575, qoriCopyReplicateBorder_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto pad_replicate_1() noexcept {
+template <unsigned k> inline auto pad_replicate_1() noexcept {
     QORI_AT(0x1111, qoriCopyReplicateBorder_8u_C1IR) else
     QORI_AT(0x1313, qoriCopyReplicateBorder_8u_C3IR) else
     QORI_AT(0x1414, qoriCopyReplicateBorder_8u_C4IR) else
@@ -2862,7 +2862,7 @@ template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_box_0() noexcept {
+template <unsigned k> inline auto filter_box_0() noexcept {
     QORI_AT(0x1111, qoriFilterBox_8u_C1R) else
     QORI_AT(0x1313, qoriFilterBox_8u_C3R) else
     QORI_AT(0x1414, qoriFilterBox_8u_C4R) else
@@ -2882,7 +2882,7 @@ template <unsigned k> constexpr auto filter_box_0() noexcept {
     QORI_AT(0x8181, qoriFilterBox_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_box_1() noexcept {
+template <unsigned k> inline auto filter_box_1() noexcept {
     QORI_AT(0x1111, qoriFilterBox_8u_C1IR) else
     QORI_AT(0x1313, qoriFilterBox_8u_C3IR) else
     QORI_AT(0x1414, qoriFilterBox_8u_C4IR) else
@@ -2949,7 +2949,7 @@ template <bool exists = false> QorResult filter_box(detail::Anything = {}, detai
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_box_border_0() noexcept {
+template <unsigned k> inline auto filter_box_border_0() noexcept {
     QORI_AT(0x1111, qoriFilterBoxBorder_8u_C1R) else
     QORI_AT(0x1313, qoriFilterBoxBorder_8u_C3R) else
     QORI_AT(0x1414, qoriFilterBoxBorder_8u_C4R) else
@@ -3045,7 +3045,7 @@ template <bool exists = false> QorResult filter_box_border(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto convert_0() noexcept {
+template <unsigned k> inline auto convert_0() noexcept {
     QORI_AT(0x1131, qoriConvert_8u16u_C1R) else
     QORI_AT(0x1333, qoriConvert_8u16u_C3R) else
     QORI_AT(0x1434, qoriConvert_8u16u_C4R) else
@@ -3114,7 +3114,7 @@ template <unsigned k> constexpr auto convert_0() noexcept {
     QORI_AT(0x6525, qoriConvert_32s8s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto convert_1() noexcept {
+template <unsigned k> inline auto convert_1() noexcept {
     QORI_AT(0x1121, qoriConvert_8u8s_C1RSfs) else
     QORI_AT(0x3121, qoriConvert_16u8s_C1RSfs) else
     QORI_AT(0x4121, qoriConvert_16s8s_C1RSfs) else
@@ -3134,7 +3134,7 @@ template <unsigned k> constexpr auto convert_1() noexcept {
     QORI_AT(0x7151, qoriConvert_32f32u_C1RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto convert_2() noexcept {
+template <unsigned k> inline auto convert_2() noexcept {
     QORI_AT(0x7111, qoriConvert_32f8u_C1R) else
     QORI_AT(0x7313, qoriConvert_32f8u_C3R) else
     QORI_AT(0x7414, qoriConvert_32f8u_C4R) else
@@ -3153,7 +3153,7 @@ template <unsigned k> constexpr auto convert_2() noexcept {
     QORI_AT(0x7545, qoriConvert_32f16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto convert_3() noexcept {
+template <unsigned k> inline auto convert_3() noexcept {
     QORI_AT(0x5151, qoriConvert_32f32u_C1IRSfs) else
     return Missing{};
 }
@@ -3270,7 +3270,7 @@ template <bool exists = false> QorResult convert(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto unpack_bits_0() noexcept {
+template <unsigned k> inline auto unpack_bits_0() noexcept {
     QORI_AT(0x1111, qoriConvert_1u8u_C1R) else
     return Missing{};
 }
@@ -3317,7 +3317,7 @@ template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, deta
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto copy_0() noexcept {
+template <unsigned k> inline auto copy_0() noexcept {
     QORI_AT(0x1111, qoriCopy_8u_C1R) else
     QORI_AT(0x1313, qoriCopy_8u_C3R) else
     QORI_AT(0x1414, qoriCopy_8u_C4R) else
@@ -3400,7 +3400,7 @@ template <unsigned k> constexpr auto copy_0() noexcept {
     QORI_AT(0x7774, qoriCopy_32f_P4C4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto copy_1() noexcept {
+template <unsigned k> inline auto copy_1() noexcept {
     QORI_AT(0x1111, qoriCopy_8u_C1MR) else
     QORI_AT(0x1313, qoriCopy_8u_C3MR) else
     QORI_AT(0x1414, qoriCopy_8u_C4MR) else
@@ -3468,7 +3468,7 @@ template <bool exists = false> QorResult copy(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto copy_managed_0() noexcept {
+template <unsigned k> inline auto copy_managed_0() noexcept {
     QORI_AT(0x1111, qoriCopyManaged_8u_C1R) else
     return Missing{};
 }
@@ -3513,7 +3513,7 @@ template <bool exists = false> QorResult copy_managed(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto duplicate_0() noexcept {
+template <unsigned k> inline auto duplicate_0() noexcept {
     QORI_AT(0x1113, qoriDup_8u_C1C3R) else
     QORI_AT(0x1114, qoriDup_8u_C1C4R) else
     return Missing{};
@@ -3551,13 +3551,13 @@ template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail
 }
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrNorm_8u32f_C1R) else
     QORI_AT(0x3171, qoriCrossCorrNorm_16u32f_C1R) else
     QORI_AT(0x7171, qoriCrossCorrNorm_32f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrNorm_8u_C1RSfs) else
     return Missing{};
 }
@@ -3688,7 +3688,7 @@ template <bool exists = false> QorResult cross_corr_norm(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_full_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrFull_Norm_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrFull_Norm_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrFull_Norm_8u32f_C4R) else
@@ -3707,7 +3707,7 @@ template <unsigned k> constexpr auto cross_corr_full_norm_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrFull_Norm_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_full_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrFull_Norm_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrFull_Norm_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrFull_Norm_8u_C4RSfs) else
@@ -3770,7 +3770,7 @@ template <bool exists = false> QorResult cross_corr_full_norm(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_same_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrSame_Norm_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrSame_Norm_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrSame_Norm_8u32f_C4R) else
@@ -3789,7 +3789,7 @@ template <unsigned k> constexpr auto cross_corr_same_norm_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrSame_Norm_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_same_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrSame_Norm_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrSame_Norm_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrSame_Norm_8u_C4RSfs) else
@@ -3849,7 +3849,7 @@ template <bool exists = false> QorResult cross_corr_same_norm(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_valid_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrValid_Norm_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrValid_Norm_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrValid_Norm_8u32f_C4R) else
@@ -3868,7 +3868,7 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrValid_Norm_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_valid_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrValid_Norm_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrValid_Norm_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrValid_Norm_8u_C4RSfs) else
@@ -3931,7 +3931,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm(detail::Anything 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_full_norm_level_0() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_level_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrFull_NormLevel_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrFull_NormLevel_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrFull_NormLevel_8u32f_C4R) else
@@ -3951,7 +3951,7 @@ template <unsigned k> constexpr auto cross_corr_full_norm_level_0() noexcept {
     QORI_AT(0x8181, qoriCrossCorrFull_NormLevel_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_full_norm_level_1() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_level_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrFull_NormLevel_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrFull_NormLevel_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrFull_NormLevel_8u_C4RSfs) else
@@ -4017,7 +4017,7 @@ template <bool exists = false> QorResult cross_corr_full_norm_level(detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_same_norm_level_0() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_level_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrSame_NormLevel_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrSame_NormLevel_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrSame_NormLevel_8u32f_C4R) else
@@ -4036,7 +4036,7 @@ template <unsigned k> constexpr auto cross_corr_same_norm_level_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrSame_NormLevel_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_same_norm_level_1() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_level_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrSame_NormLevel_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrSame_NormLevel_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrSame_NormLevel_8u_C4RSfs) else
@@ -4099,7 +4099,7 @@ template <bool exists = false> QorResult cross_corr_same_norm_level(detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_valid_norm_level_0() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_level_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrValid_NormLevel_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrValid_NormLevel_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrValid_NormLevel_8u32f_C4R) else
@@ -4119,7 +4119,7 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_level_0() noexcept {
     QORI_AT(0x8181, qoriCrossCorrValid_NormLevel_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_valid_norm_level_1() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_level_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrValid_NormLevel_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrValid_NormLevel_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrValid_NormLevel_8u_C4RSfs) else
@@ -4185,7 +4185,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm_level(detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_valid_0() noexcept {
+template <unsigned k> inline auto cross_corr_valid_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrValid_8u32f_C1R) else
     QORI_AT(0x2171, qoriCrossCorrValid_8s32f_C1R) else
     QORI_AT(0x3171, qoriCrossCorrValid_16u32f_C1R) else
@@ -4285,7 +4285,7 @@ template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {},
 }
 
 namespace detail {
-template <unsigned k> constexpr auto dct_fwd_0() noexcept {
+template <unsigned k> inline auto dct_fwd_0() noexcept {
     QORI_AT(0x7171, qoriDCTFwd_32f_C1R) else
     QORI_AT(0x7373, qoriDCTFwd_32f_C3R) else
     QORI_AT(0x7474, qoriDCTFwd_32f_C4R) else
@@ -4317,7 +4317,7 @@ template <bool exists = false> QorResult dct_fwd(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_inv_0() noexcept {
+template <unsigned k> inline auto dct_inv_0() noexcept {
     QORI_AT(0x7171, qoriDCTInv_32f_C1R) else
     QORI_AT(0x7373, qoriDCTInv_32f_C3R) else
     QORI_AT(0x7474, qoriDCTInv_32f_C4R) else
@@ -4349,22 +4349,22 @@ template <bool exists = false> QorResult dct_inv(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_forward_0() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_0() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Fwd_32f_C1) else
     QORI_AT(0x4141, qoriDCT8x8Fwd_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_forward_1() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_1() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Fwd_32f_C1I) else
     QORI_AT(0x4141, qoriDCT8x8Fwd_16s_C1I) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_forward_2() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_2() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Fwd_16s_C1R) else
     QORI_AT(0x1141, qoriDCT8x8Fwd_8u16s_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_forward_3() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_3() noexcept {
     QORI_AT(0x1141, qoriDCT8x8FwdLS_8u16s_C1R) else
     return Missing{};
 }
@@ -4427,22 +4427,22 @@ template <bool exists = false> QorResult dct_8x8_forward(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_0() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Inv_32f_C1) else
     QORI_AT(0x4141, qoriDCT8x8Inv_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_1() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Inv_32f_C1I) else
     QORI_AT(0x4141, qoriDCT8x8Inv_16s_C1I) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_2() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_2() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_16s_C1R) else
     QORI_AT(0x4111, qoriDCT8x8Inv_16s8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_3() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_3() noexcept {
     QORI_AT(0x4111, qoriDCT8x8InvLSClip_16s8u_C1R) else
     return Missing{};
 }
@@ -4506,11 +4506,11 @@ template <bool exists = false> QorResult dct_8x8_inverse(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_2x2_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_2x2_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_2x2_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_2x2_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_2x2_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_2x2_16s_C1I) else
     return Missing{};
 }
@@ -4549,11 +4549,11 @@ template <bool exists = false> QorResult dct_8x8_inverse_2x2(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_4x4_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_4x4_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_4x4_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_4x4_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_4x4_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_4x4_16s_C1I) else
     return Missing{};
 }
@@ -4592,11 +4592,11 @@ template <bool exists = false> QorResult dct_8x8_inverse_4x4(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_10bit_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_10bit_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_A10_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_10bit_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_10bit_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_A10_16s_C1I) else
     return Missing{};
 }
@@ -4635,11 +4635,11 @@ template <bool exists = false> QorResult dct_8x8_inverse_10bit(detail::Anything 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_to_2x2_inverse_0() noexcept {
+template <unsigned k> inline auto dct_8x8_to_2x2_inverse_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To2x2Inv_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_to_2x2_inverse_1() noexcept {
+template <unsigned k> inline auto dct_8x8_to_2x2_inverse_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To2x2Inv_16s_C1I) else
     return Missing{};
 }
@@ -4677,11 +4677,11 @@ template <bool exists = false> QorResult dct_8x8_to_2x2_inverse(detail::Anything
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_to_4x4_inverse_0() noexcept {
+template <unsigned k> inline auto dct_8x8_to_4x4_inverse_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To4x4Inv_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_to_4x4_inverse_1() noexcept {
+template <unsigned k> inline auto dct_8x8_to_4x4_inverse_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To4x4Inv_16s_C1I) else
     return Missing{};
 }
@@ -4719,7 +4719,7 @@ template <bool exists = false> QorResult dct_8x8_to_4x4_inverse(detail::Anything
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto zigzag_8x8_forward_0() noexcept {
+template <unsigned k> inline auto zigzag_8x8_forward_0() noexcept {
     QORI_AT(0x4141, qoriZigzagFwd8x8_16s_C1) else
     return Missing{};
 }
@@ -4746,7 +4746,7 @@ template <bool exists = false> QorResult zigzag_8x8_forward(detail::Anything = {
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto zigzag_8x8_inverse_0() noexcept {
+template <unsigned k> inline auto zigzag_8x8_inverse_0() noexcept {
     QORI_AT(0x4141, qoriZigzagInv8x8_16s_C1) else
     return Missing{};
 }
@@ -4849,21 +4849,21 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
 }
 
 namespace detail {
-template <unsigned k> constexpr auto dft_fwd_r_to_pack_0() noexcept {
+template <unsigned k> inline auto dft_fwd_r_to_pack_0() noexcept {
     QORI_AT(0x7171, qoriDFTFwd_RToPack_32f_C1R) else
     QORI_AT(0x7373, qoriDFTFwd_RToPack_32f_C3R) else
     QORI_AT(0x7474, qoriDFTFwd_RToPack_32f_C4R) else
     QORI_AT(0x7575, qoriDFTFwd_RToPack_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_fwd_r_to_pack_1() noexcept {
+template <unsigned k> inline auto dft_fwd_r_to_pack_1() noexcept {
     QORI_AT(0x7171, qoriDFTFwd_RToPack_32f_C1IR) else
     QORI_AT(0x7373, qoriDFTFwd_RToPack_32f_C3IR) else
     QORI_AT(0x7474, qoriDFTFwd_RToPack_32f_C4IR) else
     QORI_AT(0x7575, qoriDFTFwd_RToPack_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_fwd_r_to_pack_2() noexcept {
+template <unsigned k> inline auto dft_fwd_r_to_pack_2() noexcept {
     QORI_AT(0x1161, qoriDFTFwd_RToPack_8u32s_C1RSfs) else
     QORI_AT(0x1363, qoriDFTFwd_RToPack_8u32s_C3RSfs) else
     QORI_AT(0x1464, qoriDFTFwd_RToPack_8u32s_C4RSfs) else
@@ -4926,21 +4926,21 @@ template <bool exists = false> QorResult dft_fwd_r_to_pack(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dft_inv_pack_to_r_0() noexcept {
+template <unsigned k> inline auto dft_inv_pack_to_r_0() noexcept {
     QORI_AT(0x7171, qoriDFTInv_PackToR_32f_C1R) else
     QORI_AT(0x7373, qoriDFTInv_PackToR_32f_C3R) else
     QORI_AT(0x7474, qoriDFTInv_PackToR_32f_C4R) else
     QORI_AT(0x7575, qoriDFTInv_PackToR_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_inv_pack_to_r_1() noexcept {
+template <unsigned k> inline auto dft_inv_pack_to_r_1() noexcept {
     QORI_AT(0x7171, qoriDFTInv_PackToR_32f_C1IR) else
     QORI_AT(0x7373, qoriDFTInv_PackToR_32f_C3IR) else
     QORI_AT(0x7474, qoriDFTInv_PackToR_32f_C4IR) else
     QORI_AT(0x7575, qoriDFTInv_PackToR_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_inv_pack_to_r_2() noexcept {
+template <unsigned k> inline auto dft_inv_pack_to_r_2() noexcept {
     QORI_AT(0x6111, qoriDFTInv_PackToR_32s8u_C1RSfs) else
     QORI_AT(0x6313, qoriDFTInv_PackToR_32s8u_C3RSfs) else
     QORI_AT(0x6414, qoriDFTInv_PackToR_32s8u_C4RSfs) else
@@ -5003,11 +5003,11 @@ template <bool exists = false> QorResult dft_inv_pack_to_r(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dft_fwd_c_to_c_0() noexcept {
+template <unsigned k> inline auto dft_fwd_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriDFTFwd_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_fwd_c_to_c_1() noexcept {
+template <unsigned k> inline auto dft_fwd_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriDFTFwd_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5050,11 +5050,11 @@ template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dft_inv_c_to_c_0() noexcept {
+template <unsigned k> inline auto dft_inv_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriDFTInv_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_inv_c_to_c_1() noexcept {
+template <unsigned k> inline auto dft_inv_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriDFTInv_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5097,7 +5097,7 @@ template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto min_0() noexcept {
+template <unsigned k> inline auto min_0() noexcept {
     QORI_AT(0x1111, qoriMin_8u_C1R) else
     QORI_AT(0x1313, qoriMin_8u_C3R) else
     QORI_AT(0x1414, qoriMin_8u_C4R) else
@@ -5140,7 +5140,7 @@ template <bool exists = false> QorResult min(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto max_0() noexcept {
+template <unsigned k> inline auto max_0() noexcept {
     QORI_AT(0x1111, qoriMax_8u_C1R) else
     QORI_AT(0x1313, qoriMax_8u_C3R) else
     QORI_AT(0x1414, qoriMax_8u_C4R) else
@@ -5183,7 +5183,7 @@ template <bool exists = false> QorResult max(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto min_max_0() noexcept {
+template <unsigned k> inline auto min_max_0() noexcept {
     QORI_AT(0x1111, qoriMinMax_8u_C1R) else
     QORI_AT(0x1313, qoriMinMax_8u_C3R) else
     QORI_AT(0x1414, qoriMinMax_8u_C4R) else
@@ -5227,7 +5227,7 @@ template <bool exists = false> QorResult min_max(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto min_index_0() noexcept {
+template <unsigned k> inline auto min_index_0() noexcept {
     QORI_AT(0x1111, qoriMinIndx_8u_C1R) else
     QORI_AT(0x1313, qoriMinIndx_8u_C3R) else
     QORI_AT(0x1414, qoriMinIndx_8u_C4R) else
@@ -5272,7 +5272,7 @@ template <bool exists = false> QorResult min_index(detail::Anything = {}, detail
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto max_index_0() noexcept {
+template <unsigned k> inline auto max_index_0() noexcept {
     QORI_AT(0x1111, qoriMaxIndx_8u_C1R) else
     QORI_AT(0x1313, qoriMaxIndx_8u_C3R) else
     QORI_AT(0x1414, qoriMaxIndx_8u_C4R) else
@@ -5317,7 +5317,7 @@ template <bool exists = false> QorResult max_index(detail::Anything = {}, detail
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto block_min_max_0() noexcept {
+template <unsigned k> inline auto block_min_max_0() noexcept {
     QORI_AT(0x1111, qoriBlockMinMax_8u_C1R) else
     QORI_AT(0x3131, qoriBlockMinMax_16u_C1R) else
     QORI_AT(0x4141, qoriBlockMinMax_16s_C1R) else
@@ -5355,7 +5355,7 @@ template <bool exists = false> QorResult block_min_max(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto count_in_range_0() noexcept {
+template <unsigned k> inline auto count_in_range_0() noexcept {
     QORI_AT(0x1111, qoriCountInRange_8u_C1R) else
     QORI_AT(0x1313, qoriCountInRange_8u_C3R) else
     QORI_AT(0x1515, qoriCountInRange_8u_AC4R) else
@@ -5466,21 +5466,21 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
 }
 
 namespace detail {
-template <unsigned k> constexpr auto fft_fwd_r_to_pack_0() noexcept {
+template <unsigned k> inline auto fft_fwd_r_to_pack_0() noexcept {
     QORI_AT(0x7171, qoriFFTFwd_RToPack_32f_C1R) else
     QORI_AT(0x7373, qoriFFTFwd_RToPack_32f_C3R) else
     QORI_AT(0x7474, qoriFFTFwd_RToPack_32f_C4R) else
     QORI_AT(0x7575, qoriFFTFwd_RToPack_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_fwd_r_to_pack_1() noexcept {
+template <unsigned k> inline auto fft_fwd_r_to_pack_1() noexcept {
     QORI_AT(0x7171, qoriFFTFwd_RToPack_32f_C1IR) else
     QORI_AT(0x7373, qoriFFTFwd_RToPack_32f_C3IR) else
     QORI_AT(0x7474, qoriFFTFwd_RToPack_32f_C4IR) else
     QORI_AT(0x7575, qoriFFTFwd_RToPack_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_fwd_r_to_pack_2() noexcept {
+template <unsigned k> inline auto fft_fwd_r_to_pack_2() noexcept {
     QORI_AT(0x1161, qoriFFTFwd_RToPack_8u32s_C1RSfs) else
     QORI_AT(0x1363, qoriFFTFwd_RToPack_8u32s_C3RSfs) else
     QORI_AT(0x1464, qoriFFTFwd_RToPack_8u32s_C4RSfs) else
@@ -5543,21 +5543,21 @@ template <bool exists = false> QorResult fft_fwd_r_to_pack(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fft_inv_pack_to_r_0() noexcept {
+template <unsigned k> inline auto fft_inv_pack_to_r_0() noexcept {
     QORI_AT(0x7171, qoriFFTInv_PackToR_32f_C1R) else
     QORI_AT(0x7373, qoriFFTInv_PackToR_32f_C3R) else
     QORI_AT(0x7474, qoriFFTInv_PackToR_32f_C4R) else
     QORI_AT(0x7575, qoriFFTInv_PackToR_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_inv_pack_to_r_1() noexcept {
+template <unsigned k> inline auto fft_inv_pack_to_r_1() noexcept {
     QORI_AT(0x7171, qoriFFTInv_PackToR_32f_C1IR) else
     QORI_AT(0x7373, qoriFFTInv_PackToR_32f_C3IR) else
     QORI_AT(0x7474, qoriFFTInv_PackToR_32f_C4IR) else
     QORI_AT(0x7575, qoriFFTInv_PackToR_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_inv_pack_to_r_2() noexcept {
+template <unsigned k> inline auto fft_inv_pack_to_r_2() noexcept {
     QORI_AT(0x6111, qoriFFTInv_PackToR_32s8u_C1RSfs) else
     QORI_AT(0x6313, qoriFFTInv_PackToR_32s8u_C3RSfs) else
     QORI_AT(0x6414, qoriFFTInv_PackToR_32s8u_C4RSfs) else
@@ -5620,11 +5620,11 @@ template <bool exists = false> QorResult fft_inv_pack_to_r(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fft_fwd_c_to_c_0() noexcept {
+template <unsigned k> inline auto fft_fwd_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriFFTFwd_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_fwd_c_to_c_1() noexcept {
+template <unsigned k> inline auto fft_fwd_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriFFTFwd_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5667,11 +5667,11 @@ template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fft_inv_c_to_c_0() noexcept {
+template <unsigned k> inline auto fft_inv_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriFFTInv_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_inv_c_to_c_1() noexcept {
+template <unsigned k> inline auto fft_inv_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriFFTInv_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5714,7 +5714,7 @@ template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_linear_0() noexcept {
+template <unsigned k> inline auto filter_linear_0() noexcept {
     QORI_AT(0x61111, qoriFilter_8u_C1R) else
     QORI_AT(0x61313, qoriFilter_8u_C3R) else
     QORI_AT(0x61414, qoriFilter_8u_C4R) else
@@ -5729,7 +5729,7 @@ template <unsigned k> constexpr auto filter_linear_0() noexcept {
     QORI_AT(0x63535, qoriFilter_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_1() noexcept {
+template <unsigned k> inline auto filter_linear_1() noexcept {
     QORI_AT(0x77171, qoriFilter_32f_C1R) else
     QORI_AT(0x77373, qoriFilter_32f_C3R) else
     QORI_AT(0x77474, qoriFilter_32f_C4R) else
@@ -5761,7 +5761,7 @@ template <unsigned k> constexpr auto filter_linear_1() noexcept {
     QORI_AT(0x71444, qoriFilter32f_8u16s_C4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_2() noexcept {
+template <unsigned k> inline auto filter_linear_2() noexcept {
     QORI_AT(0x41111, qoriFilter_Round16s_8u_C1R) else
     QORI_AT(0x41313, qoriFilter_Round16s_8u_C3R) else
     QORI_AT(0x41414, qoriFilter_Round16s_8u_C4R) else
@@ -5776,7 +5776,7 @@ template <unsigned k> constexpr auto filter_linear_2() noexcept {
     QORI_AT(0x63535, qoriFilter_Round32s_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_2_bytes() noexcept {
+template <unsigned k> inline auto filter_linear_2_bytes() noexcept {
     QORI_AT(0x41111, qoriFilterRoundGetBufSize16s_8u_C1R) else
     QORI_AT(0x41313, qoriFilterRoundGetBufSize16s_8u_C3R) else
     QORI_AT(0x41414, qoriFilterRoundGetBufSize16s_8u_C4R) else
@@ -5791,7 +5791,7 @@ template <unsigned k> constexpr auto filter_linear_2_bytes() noexcept {
     QORI_AT(0x63535, qoriFilterRoundGetBufSize32s_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_3() noexcept {
+template <unsigned k> inline auto filter_linear_3() noexcept {
     QORI_AT(0x71111, qoriFilter_Round32f_8u_C1R) else
     QORI_AT(0x71313, qoriFilter_Round32f_8u_C3R) else
     QORI_AT(0x71414, qoriFilter_Round32f_8u_C4R) else
@@ -5806,7 +5806,7 @@ template <unsigned k> constexpr auto filter_linear_3() noexcept {
     QORI_AT(0x73535, qoriFilter_Round32f_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_3_bytes() noexcept {
+template <unsigned k> inline auto filter_linear_3_bytes() noexcept {
     QORI_AT(0x71111, qoriFilterRoundGetBufSize32f_8u_C1R) else
     QORI_AT(0x71313, qoriFilterRoundGetBufSize32f_8u_C3R) else
     QORI_AT(0x71414, qoriFilterRoundGetBufSize32f_8u_C4R) else
@@ -5994,7 +5994,7 @@ template <bool exists = false> QorResult filter_linear(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_round_get_buf_size16s_0() noexcept {
+template <unsigned k> inline auto filter_round_get_buf_size16s_0() noexcept {
     QORI_AT(0x1111, qoriFilterRoundGetBufSize16s_8u_C1R) else
     QORI_AT(0x1313, qoriFilterRoundGetBufSize16s_8u_C3R) else
     QORI_AT(0x1414, qoriFilterRoundGetBufSize16s_8u_C4R) else
@@ -6021,7 +6021,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_round_get_buf_size32f_0() noexcept {
+template <unsigned k> inline auto filter_round_get_buf_size32f_0() noexcept {
     QORI_AT(0x1111, qoriFilterRoundGetBufSize32f_8u_C1R) else
     QORI_AT(0x4141, qoriFilterRoundGetBufSize32f_16s_C1R) else
     QORI_AT(0x3131, qoriFilterRoundGetBufSize32f_16u_C1R) else
@@ -6056,7 +6056,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_round_get_buf_size32s_0() noexcept {
+template <unsigned k> inline auto filter_round_get_buf_size32s_0() noexcept {
     QORI_AT(0x4141, qoriFilterRoundGetBufSize32s_16s_C1R) else
     QORI_AT(0x4343, qoriFilterRoundGetBufSize32s_16s_C3R) else
     QORI_AT(0x4444, qoriFilterRoundGetBufSize32s_16s_C4R) else
@@ -6087,7 +6087,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_get_buf_size_0() noexcept {
+template <unsigned k> inline auto filter_get_buf_size_0() noexcept {
     QORI_AT(0x8181, qoriFilterGetBufSize_64f_C1R) else
     return Missing{};
 }
@@ -6129,7 +6129,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_border_0() noexcept {
+template <unsigned k> inline auto filter_border_0() noexcept {
     QORI_AT(0x1111, qoriFilterBorder_8u_C1R) else
     QORI_AT(0x1313, qoriFilterBorder_8u_C3R) else
     QORI_AT(0x1414, qoriFilterBorder_8u_C4R) else
@@ -6175,7 +6175,7 @@ template <bool exists = false> QorResult filter_border(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_min_0() noexcept {
+template <unsigned k> inline auto filter_min_0() noexcept {
     QORI_AT(0x1111, qoriFilterMin_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMin_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMin_8u_C4R) else
@@ -6222,7 +6222,7 @@ template <bool exists = false> QorResult filter_min(detail::Anything = {}, detai
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_max_0() noexcept {
+template <unsigned k> inline auto filter_max_0() noexcept {
     QORI_AT(0x1111, qoriFilterMax_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMax_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMax_8u_C4R) else
@@ -6269,7 +6269,7 @@ template <bool exists = false> QorResult filter_max(detail::Anything = {}, detai
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_gauss_0() noexcept {
+template <unsigned k> inline auto filter_gauss_0() noexcept {
     QORI_AT(0x1111, qoriFilterGauss_8u_C1R) else
     QORI_AT(0x1313, qoriFilterGauss_8u_C3R) else
     QORI_AT(0x1414, qoriFilterGauss_8u_C4R) else
@@ -6315,7 +6315,7 @@ template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto histogram_range_0() noexcept {
+template <unsigned k> inline auto histogram_range_0() noexcept {
     QORI_AT(0x1111, qoriHistogramRange_8u_C1R) else
     QORI_AT(0x1313, qoriHistogramRange_8u_C3R) else
     QORI_AT(0x1414, qoriHistogramRange_8u_C4R) else
@@ -6362,7 +6362,7 @@ template <bool exists = false> QorResult histogram_range(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto histogram_even_0() noexcept {
+template <unsigned k> inline auto histogram_even_0() noexcept {
     QORI_AT(0x1111, qoriHistogramEven_8u_C1R) else
     QORI_AT(0x1313, qoriHistogramEven_8u_C3R) else
     QORI_AT(0x1414, qoriHistogramEven_8u_C4R) else
@@ -6429,7 +6429,7 @@ template <bool exists = false> QorResult histogram_even(detail::Anything = {}, d
 }
 
 namespace detail {
-template <unsigned k> constexpr auto histogram_0() noexcept {
+template <unsigned k> inline auto histogram_0() noexcept {
     QORI_AT(0x1111, qoriHistogram_8u_C1R) else
     QORI_AT(0x1313, qoriHistogram_8u_C3R) else
     QORI_AT(0x1414, qoriHistogram_8u_C4R) else
@@ -6491,7 +6491,7 @@ template <bool exists = false> QorResult histogram(detail::Anything = {}, detail
 }
 
 namespace detail {
-template <unsigned k> constexpr auto hog_0() noexcept {
+template <unsigned k> inline auto hog_0() noexcept {
     QORI_AT(0x1111, qoriHOG_8u32f_C1R) else
     QORI_AT(0x3131, qoriHOG_16u32f_C1R) else
     QORI_AT(0x4141, qoriHOG_16s32f_C1R) else
@@ -6529,12 +6529,12 @@ template <bool exists = false> QorResult hog(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lbp_3x3_0() noexcept {
+template <unsigned k> inline auto lbp_3x3_0() noexcept {
     QORI_AT(0x1111, qoriLBPImage3x3_8u_C1R) else
     QORI_AT(0x7111, qoriLBPImage3x3_32f8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lbp_3x3_1() noexcept {
+template <unsigned k> inline auto lbp_3x3_1() noexcept {
     QORI_AT(0x1111, qoriLBPImageMode3x3_8u_C1R) else
     QORI_AT(0x7111, qoriLBPImageMode3x3_32f8u_C1R) else
     return Missing{};
@@ -6614,14 +6614,14 @@ template <bool exists = false> QorResult lbp_3x3(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lbp_5x5_0() noexcept {
+template <unsigned k> inline auto lbp_5x5_0() noexcept {
     QORI_AT(0x1111, qoriLBPImage5x5_8u_C1R) else
     QORI_AT(0x1131, qoriLBPImage5x5_8u16u_C1R) else
     QORI_AT(0x7111, qoriLBPImage5x5_32f8u_C1R) else
     QORI_AT(0x7131, qoriLBPImage5x5_32f16u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lbp_5x5_1() noexcept {
+template <unsigned k> inline auto lbp_5x5_1() noexcept {
     QORI_AT(0x1111, qoriLBPImageMode5x5_8u_C1R) else
     QORI_AT(0x1131, qoriLBPImageMode5x5_8u16u_C1R) else
     QORI_AT(0x7111, qoriLBPImageMode5x5_32f8u_C1R) else
@@ -6704,7 +6704,7 @@ template <bool exists = false> QorResult lbp_5x5(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lbp_horizontal_0() noexcept {
+template <unsigned k> inline auto lbp_horizontal_0() noexcept {
     QORI_AT(0x1111, qoriLBPImageHorizCorr_8u_C1R) else
     QORI_AT(0x3111, qoriLBPImageHorizCorr_16u_C1R) else
     return Missing{};
@@ -6755,7 +6755,7 @@ template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_0() noexcept {
+template <unsigned k> inline auto lut_0() noexcept {
     QORI_AT(0x1111, qoriLUT_8u_C1R) else
     QORI_AT(0x3131, qoriLUT_16u_C1R) else
     QORI_AT(0x4141, qoriLUT_16s_C1R) else
@@ -6774,7 +6774,7 @@ template <unsigned k> constexpr auto lut_0() noexcept {
     QORI_AT(0x7575, qoriLUT_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_1() noexcept {
+template <unsigned k> inline auto lut_1() noexcept {
     QORI_AT(0x1111, qoriLUT_8u_C1IR) else
     QORI_AT(0x3131, qoriLUT_16u_C1IR) else
     QORI_AT(0x4141, qoriLUT_16s_C1IR) else
@@ -6834,7 +6834,7 @@ template <bool exists = false> QorResult lut(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_linear_0() noexcept {
+template <unsigned k> inline auto lut_linear_0() noexcept {
     QORI_AT(0x1111, qoriLUT_Linear_8u_C1R) else
     QORI_AT(0x3131, qoriLUT_Linear_16u_C1R) else
     QORI_AT(0x4141, qoriLUT_Linear_16s_C1R) else
@@ -6853,7 +6853,7 @@ template <unsigned k> constexpr auto lut_linear_0() noexcept {
     QORI_AT(0x7575, qoriLUT_Linear_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_linear_1() noexcept {
+template <unsigned k> inline auto lut_linear_1() noexcept {
     QORI_AT(0x1111, qoriLUT_Linear_8u_C1IR) else
     QORI_AT(0x3131, qoriLUT_Linear_16u_C1IR) else
     QORI_AT(0x4141, qoriLUT_Linear_16s_C1IR) else
@@ -6916,7 +6916,7 @@ template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detai
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_cubic_0() noexcept {
+template <unsigned k> inline auto lut_cubic_0() noexcept {
     QORI_AT(0x1111, qoriLUT_Cubic_8u_C1R) else
     QORI_AT(0x3131, qoriLUT_Cubic_16u_C1R) else
     QORI_AT(0x4141, qoriLUT_Cubic_16s_C1R) else
@@ -6935,7 +6935,7 @@ template <unsigned k> constexpr auto lut_cubic_0() noexcept {
     QORI_AT(0x7575, qoriLUT_Cubic_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_cubic_1() noexcept {
+template <unsigned k> inline auto lut_cubic_1() noexcept {
     QORI_AT(0x1111, qoriLUT_Cubic_8u_C1IR) else
     QORI_AT(0x3131, qoriLUT_Cubic_16u_C1IR) else
     QORI_AT(0x4141, qoriLUT_Cubic_16s_C1IR) else
@@ -6996,7 +6996,7 @@ template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_0() noexcept {
+template <unsigned k> inline auto filter_median_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedian_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedian_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMedian_8u_C4R) else
@@ -7058,7 +7058,7 @@ template <bool exists = false> QorResult filter_median(detail::Anything = {}, de
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_horiz_0() noexcept {
+template <unsigned k> inline auto filter_median_horiz_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianHoriz_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedianHoriz_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMedianHoriz_8u_C4R) else
@@ -7101,7 +7101,7 @@ template <bool exists = false> QorResult filter_median_horiz(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_vert_0() noexcept {
+template <unsigned k> inline auto filter_median_vert_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianVert_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedianVert_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMedianVert_8u_C4R) else
@@ -7144,7 +7144,7 @@ template <bool exists = false> QorResult filter_median_vert(detail::Anything = {
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_cross_0() noexcept {
+template <unsigned k> inline auto filter_median_cross_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianCross_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedianCross_8u_C3R) else
     QORI_AT(0x1515, qoriFilterMedianCross_8u_AC4R) else
@@ -7185,7 +7185,7 @@ template <bool exists = false> QorResult filter_median_cross(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_color_0() noexcept {
+template <unsigned k> inline auto filter_median_color_0() noexcept {
     QORI_AT(0x1313, qoriFilterMedianColor_8u_C3R) else
     QORI_AT(0x1515, qoriFilterMedianColor_8u_AC4R) else
     QORI_AT(0x4343, qoriFilterMedianColor_16s_C3R) else
@@ -7223,7 +7223,7 @@ template <bool exists = false> QorResult filter_median_color(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_weighted_0() noexcept {
+template <unsigned k> inline auto filter_median_weighted_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianWeightedCenter3x3_8u_C1R) else
     return Missing{};
 }
@@ -7261,7 +7261,7 @@ template <bool exists = false> QorResult filter_median_weighted(detail::Anything
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_border_0() noexcept {
+template <unsigned k> inline auto filter_median_border_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianBorder_8u_C1R) else
     QORI_AT(0x3131, qoriFilterMedianBorder_16u_C1R) else
     QORI_AT(0x4141, qoriFilterMedianBorder_16s_C1R) else
@@ -7344,7 +7344,7 @@ template <bool exists = false> QorResult filter_median_border(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto mirror_0() noexcept {
+template <unsigned k> inline auto mirror_0() noexcept {
     QORI_AT(0x1111, qoriMirror_8u_C1R) else
     QORI_AT(0x1313, qoriMirror_8u_C3R) else
     QORI_AT(0x1414, qoriMirror_8u_C4R) else
@@ -7367,7 +7367,7 @@ template <unsigned k> constexpr auto mirror_0() noexcept {
     QORI_AT(0x7575, qoriMirror_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto mirror_1() noexcept {
+template <unsigned k> inline auto mirror_1() noexcept {
     QORI_AT(0x1111, qoriMirror_8u_C1IR) else
     QORI_AT(0x1313, qoriMirror_8u_C3IR) else
     QORI_AT(0x1414, qoriMirror_8u_C4IR) else
@@ -7430,7 +7430,7 @@ template <bool exists = false> QorResult mirror(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto erode_3x3_0() noexcept {
+template <unsigned k> inline auto erode_3x3_0() noexcept {
     QORI_AT(0x1111, qoriErode3x3_8u_C1R) else
     QORI_AT(0x1313, qoriErode3x3_8u_C3R) else
     QORI_AT(0x1414, qoriErode3x3_8u_C4R) else
@@ -7446,7 +7446,7 @@ template <unsigned k> constexpr auto erode_3x3_0() noexcept {
     QORI_AT(0x8181, qoriErode3x3_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto erode_3x3_1() noexcept {
+template <unsigned k> inline auto erode_3x3_1() noexcept {
     QORI_AT(0x1111, qoriErode3x3_8u_C1IR) else
     QORI_AT(0x1313, qoriErode3x3_8u_C3IR) else
     QORI_AT(0x1414, qoriErode3x3_8u_C4IR) else
@@ -7500,7 +7500,7 @@ template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dilate_3x3_0() noexcept {
+template <unsigned k> inline auto dilate_3x3_0() noexcept {
     QORI_AT(0x1111, qoriDilate3x3_8u_C1R) else
     QORI_AT(0x1313, qoriDilate3x3_8u_C3R) else
     QORI_AT(0x1414, qoriDilate3x3_8u_C4R) else
@@ -7516,7 +7516,7 @@ template <unsigned k> constexpr auto dilate_3x3_0() noexcept {
     QORI_AT(0x8181, qoriDilate3x3_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dilate_3x3_1() noexcept {
+template <unsigned k> inline auto dilate_3x3_1() noexcept {
     QORI_AT(0x1111, qoriDilate3x3_8u_C1IR) else
     QORI_AT(0x1313, qoriDilate3x3_8u_C3IR) else
     QORI_AT(0x1414, qoriDilate3x3_8u_C4IR) else
@@ -7571,7 +7571,7 @@ template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detai
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto erode_0() noexcept {
+template <unsigned k> inline auto erode_0() noexcept {
     QORI_AT(0x1111, qoriErode_8u_C1R) else
     QORI_AT(0x1313, qoriErode_8u_C3R) else
     QORI_AT(0x1414, qoriErode_8u_C4R) else
@@ -7586,7 +7586,7 @@ template <unsigned k> constexpr auto erode_0() noexcept {
     QORI_AT(0x7575, qoriErode_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto erode_1() noexcept {
+template <unsigned k> inline auto erode_1() noexcept {
     QORI_AT(0x1111, qoriErode_8u_C1IR) else
     QORI_AT(0x1313, qoriErode_8u_C3IR) else
     QORI_AT(0x1515, qoriErode_8u_AC4IR) else
@@ -7639,7 +7639,7 @@ template <bool exists = false> QorResult erode(detail::Anything = {}, detail::An
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dilate_0() noexcept {
+template <unsigned k> inline auto dilate_0() noexcept {
     QORI_AT(0x1111, qoriDilate_8u_C1R) else
     QORI_AT(0x1313, qoriDilate_8u_C3R) else
     QORI_AT(0x1414, qoriDilate_8u_C4R) else
@@ -7654,7 +7654,7 @@ template <unsigned k> constexpr auto dilate_0() noexcept {
     QORI_AT(0x7575, qoriDilate_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dilate_1() noexcept {
+template <unsigned k> inline auto dilate_1() noexcept {
     QORI_AT(0x1111, qoriDilate_8u_C1IR) else
     QORI_AT(0x1313, qoriDilate_8u_C3IR) else
     QORI_AT(0x1515, qoriDilate_8u_AC4IR) else
@@ -7708,7 +7708,7 @@ template <bool exists = false> QorResult dilate(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sum_0() noexcept {
+template <unsigned k> inline auto sum_0() noexcept {
     QORI_AT(0x1111, qoriSum_8u_C1R) else
     QORI_AT(0x1313, qoriSum_8u_C3R) else
     QORI_AT(0x1414, qoriSum_8u_C4R) else
@@ -7723,7 +7723,7 @@ template <unsigned k> constexpr auto sum_0() noexcept {
     QORI_AT(0x4545, qoriSum_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sum_1() noexcept {
+template <unsigned k> inline auto sum_1() noexcept {
     QORI_AT(0x7171, qoriSum_32f_C1R) else
     QORI_AT(0x7373, qoriSum_32f_C3R) else
     QORI_AT(0x7474, qoriSum_32f_C4R) else
@@ -7770,7 +7770,7 @@ template <bool exists = false> QorResult sum(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto mean_0() noexcept {
+template <unsigned k> inline auto mean_0() noexcept {
     QORI_AT(0x1111, qoriMean_8u_C1R) else
     QORI_AT(0x1313, qoriMean_8u_C3R) else
     QORI_AT(0x1414, qoriMean_8u_C4R) else
@@ -7785,7 +7785,7 @@ template <unsigned k> constexpr auto mean_0() noexcept {
     QORI_AT(0x4545, qoriMean_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto mean_1() noexcept {
+template <unsigned k> inline auto mean_1() noexcept {
     QORI_AT(0x7171, qoriMean_32f_C1R) else
     QORI_AT(0x7373, qoriMean_32f_C3R) else
     QORI_AT(0x7474, qoriMean_32f_C4R) else
@@ -7833,7 +7833,7 @@ template <bool exists = false> QorResult mean(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_inf_0() noexcept {
+template <unsigned k> inline auto norm_inf_0() noexcept {
     QORI_AT(0x1111, qoriNorm_Inf_8u_C1R) else
     QORI_AT(0x1313, qoriNorm_Inf_8u_C3R) else
     QORI_AT(0x1414, qoriNorm_Inf_8u_C4R) else
@@ -7877,7 +7877,7 @@ template <bool exists = false> QorResult norm_inf(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_l1_0() noexcept {
+template <unsigned k> inline auto norm_l1_0() noexcept {
     QORI_AT(0x1111, qoriNorm_L1_8u_C1R) else
     QORI_AT(0x1313, qoriNorm_L1_8u_C3R) else
     QORI_AT(0x1414, qoriNorm_L1_8u_C4R) else
@@ -7892,7 +7892,7 @@ template <unsigned k> constexpr auto norm_l1_0() noexcept {
     QORI_AT(0x4545, qoriNorm_L1_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_l1_1() noexcept {
+template <unsigned k> inline auto norm_l1_1() noexcept {
     QORI_AT(0x7171, qoriNorm_L1_32f_C1R) else
     QORI_AT(0x7373, qoriNorm_L1_32f_C3R) else
     QORI_AT(0x7474, qoriNorm_L1_32f_C4R) else
@@ -7941,7 +7941,7 @@ template <bool exists = false> QorResult norm_l1(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_l2_0() noexcept {
+template <unsigned k> inline auto norm_l2_0() noexcept {
     QORI_AT(0x1111, qoriNorm_L2_8u_C1R) else
     QORI_AT(0x1313, qoriNorm_L2_8u_C3R) else
     QORI_AT(0x1414, qoriNorm_L2_8u_C4R) else
@@ -7956,7 +7956,7 @@ template <unsigned k> constexpr auto norm_l2_0() noexcept {
     QORI_AT(0x4545, qoriNorm_L2_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_l2_1() noexcept {
+template <unsigned k> inline auto norm_l2_1() noexcept {
     QORI_AT(0x7171, qoriNorm_L2_32f_C1R) else
     QORI_AT(0x7373, qoriNorm_L2_32f_C3R) else
     QORI_AT(0x7474, qoriNorm_L2_32f_C4R) else
@@ -8005,7 +8005,7 @@ template <bool exists = false> QorResult norm_l2(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_diff_inf_0() noexcept {
+template <unsigned k> inline auto norm_diff_inf_0() noexcept {
     QORI_AT(0x1111, qoriNormDiff_Inf_8u_C1R) else
     QORI_AT(0x1313, qoriNormDiff_Inf_8u_C3R) else
     QORI_AT(0x1414, qoriNormDiff_Inf_8u_C4R) else
@@ -8051,7 +8051,7 @@ template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_diff_l1_0() noexcept {
+template <unsigned k> inline auto norm_diff_l1_0() noexcept {
     QORI_AT(0x1111, qoriNormDiff_L1_8u_C1R) else
     QORI_AT(0x1313, qoriNormDiff_L1_8u_C3R) else
     QORI_AT(0x1414, qoriNormDiff_L1_8u_C4R) else
@@ -8066,7 +8066,7 @@ template <unsigned k> constexpr auto norm_diff_l1_0() noexcept {
     QORI_AT(0x4545, qoriNormDiff_L1_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_diff_l1_1() noexcept {
+template <unsigned k> inline auto norm_diff_l1_1() noexcept {
     QORI_AT(0x7171, qoriNormDiff_L1_32f_C1R) else
     QORI_AT(0x7373, qoriNormDiff_L1_32f_C3R) else
     QORI_AT(0x7474, qoriNormDiff_L1_32f_C4R) else
@@ -8123,7 +8123,7 @@ template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_diff_l2_0() noexcept {
+template <unsigned k> inline auto norm_diff_l2_0() noexcept {
     QORI_AT(0x1111, qoriNormDiff_L2_8u_C1R) else
     QORI_AT(0x1313, qoriNormDiff_L2_8u_C3R) else
     QORI_AT(0x1414, qoriNormDiff_L2_8u_C4R) else
@@ -8138,7 +8138,7 @@ template <unsigned k> constexpr auto norm_diff_l2_0() noexcept {
     QORI_AT(0x4545, qoriNormDiff_L2_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_diff_l2_1() noexcept {
+template <unsigned k> inline auto norm_diff_l2_1() noexcept {
     QORI_AT(0x7171, qoriNormDiff_L2_32f_C1R) else
     QORI_AT(0x7373, qoriNormDiff_L2_32f_C3R) else
     QORI_AT(0x7474, qoriNormDiff_L2_32f_C4R) else
@@ -8195,7 +8195,7 @@ template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_rel_inf_0() noexcept {
+template <unsigned k> inline auto norm_rel_inf_0() noexcept {
     QORI_AT(0x1111, qoriNormRel_Inf_8u_C1R) else
     QORI_AT(0x1313, qoriNormRel_Inf_8u_C3R) else
     QORI_AT(0x1414, qoriNormRel_Inf_8u_C4R) else
@@ -8241,7 +8241,7 @@ template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_rel_l1_0() noexcept {
+template <unsigned k> inline auto norm_rel_l1_0() noexcept {
     QORI_AT(0x1111, qoriNormRel_L1_8u_C1R) else
     QORI_AT(0x1313, qoriNormRel_L1_8u_C3R) else
     QORI_AT(0x1414, qoriNormRel_L1_8u_C4R) else
@@ -8256,7 +8256,7 @@ template <unsigned k> constexpr auto norm_rel_l1_0() noexcept {
     QORI_AT(0x4545, qoriNormRel_L1_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_rel_l1_1() noexcept {
+template <unsigned k> inline auto norm_rel_l1_1() noexcept {
     QORI_AT(0x7171, qoriNormRel_L1_32f_C1R) else
     QORI_AT(0x7373, qoriNormRel_L1_32f_C3R) else
     QORI_AT(0x7474, qoriNormRel_L1_32f_C4R) else
@@ -8312,7 +8312,7 @@ template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, deta
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_rel_l2_0() noexcept {
+template <unsigned k> inline auto norm_rel_l2_0() noexcept {
     QORI_AT(0x1111, qoriNormRel_L2_8u_C1R) else
     QORI_AT(0x1313, qoriNormRel_L2_8u_C3R) else
     QORI_AT(0x1414, qoriNormRel_L2_8u_C4R) else
@@ -8327,7 +8327,7 @@ template <unsigned k> constexpr auto norm_rel_l2_0() noexcept {
     QORI_AT(0x4545, qoriNormRel_L2_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_rel_l2_1() noexcept {
+template <unsigned k> inline auto norm_rel_l2_1() noexcept {
     QORI_AT(0x7171, qoriNormRel_L2_32f_C1R) else
     QORI_AT(0x7373, qoriNormRel_L2_32f_C3R) else
     QORI_AT(0x7474, qoriNormRel_L2_32f_C4R) else
@@ -8384,7 +8384,7 @@ template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, deta
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dot_0() noexcept {
+template <unsigned k> inline auto dot_0() noexcept {
     QORI_AT(0x1111, qoriDotProd_8u64f_C1R) else
     QORI_AT(0x1313, qoriDotProd_8u64f_C3R) else
     QORI_AT(0x1414, qoriDotProd_8u64f_C4R) else
@@ -8411,7 +8411,7 @@ template <unsigned k> constexpr auto dot_0() noexcept {
     QORI_AT(0x6565, qoriDotProd_32s64f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dot_1() noexcept {
+template <unsigned k> inline auto dot_1() noexcept {
     QORI_AT(0x7171, qoriDotProd_32f64f_C1R) else
     QORI_AT(0x7373, qoriDotProd_32f64f_C3R) else
     QORI_AT(0x7474, qoriDotProd_32f64f_C4R) else
@@ -8477,7 +8477,7 @@ template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anyt
 }
 
 namespace detail {
-template <unsigned k> constexpr auto otsu_threshold_0() noexcept {
+template <unsigned k> inline auto otsu_threshold_0() noexcept {
     QORI_AT(0x1111, qoriComputeThreshold_Otsu_8u_C1R) else
     return Missing{};
 }
@@ -8506,7 +8506,7 @@ template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_palette_0() noexcept {
+template <unsigned k> inline auto lut_palette_0() noexcept {
     QORI_AT(0x1111, qoriLUTPalette_8u_C1R) else
     QORI_AT(0x3131, qoriLUTPalette_16u_C1R) else
     QORI_AT(0x1151, qoriLUTPalette_8u32u_C1R) else
@@ -8522,7 +8522,7 @@ template <unsigned k> constexpr auto lut_palette_0() noexcept {
     QORI_AT(0x3535, qoriLUTPalette_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_palette_1() noexcept {
+template <unsigned k> inline auto lut_palette_1() noexcept {
     QORI_AT(0x1314, qoriLUTPalette_8u_C3A0C4R) else
     QORI_AT(0x3334, qoriLUTPalette_16u_C3A0C4R) else
     return Missing{};
@@ -8574,7 +8574,7 @@ template <bool exists = false> QorResult lut_palette(detail::Anything = {}, deta
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_palette_swap_0() noexcept {
+template <unsigned k> inline auto lut_palette_swap_0() noexcept {
     QORI_AT(0x1314, qoriLUTPaletteSwap_8u_C3A0C4R) else
     QORI_AT(0x3334, qoriLUTPaletteSwap_16u_C3A0C4R) else
     return Missing{};
@@ -8609,7 +8609,7 @@ template <bool exists = false> QorResult lut_palette_swap(detail::Anything = {},
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_size_0() noexcept {
+template <unsigned k> inline auto resize_get_size_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetSize_8u) else
     QORI_AT(0x3131, qoriResizeGetSize_16u) else
     QORI_AT(0x4141, qoriResizeGetSize_16s) else
@@ -8636,7 +8636,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_buffer_size_0() noexcept {
+template <unsigned k> inline auto resize_get_buffer_size_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetBufferSize_8u) else
     QORI_AT(0x3131, qoriResizeGetBufferSize_16u) else
     QORI_AT(0x4141, qoriResizeGetBufferSize_16s) else
@@ -8664,7 +8664,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_border_size_0() noexcept {
+template <unsigned k> inline auto resize_get_border_size_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetBorderSize_8u) else
     QORI_AT(0x3131, qoriResizeGetBorderSize_16u) else
     QORI_AT(0x4141, qoriResizeGetBorderSize_16s) else
@@ -8691,7 +8691,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_src_offset_0() noexcept {
+template <unsigned k> inline auto resize_get_src_offset_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetSrcOffset_8u) else
     QORI_AT(0x3131, qoriResizeGetSrcOffset_16u) else
     QORI_AT(0x4141, qoriResizeGetSrcOffset_16s) else
@@ -8719,7 +8719,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_src_roi_0() noexcept {
+template <unsigned k> inline auto resize_get_src_roi_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetSrcRoi_8u) else
     QORI_AT(0x3131, qoriResizeGetSrcRoi_16u) else
     QORI_AT(0x4141, qoriResizeGetSrcRoi_16s) else
@@ -8747,7 +8747,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_nearest_init_0() noexcept {
+template <unsigned k> inline auto resize_nearest_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeNearestInit_8u) else
     QORI_AT(0x3131, qoriResizeNearestInit_16u) else
     QORI_AT(0x4141, qoriResizeNearestInit_16s) else
@@ -8774,7 +8774,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_linear_init_0() noexcept {
+template <unsigned k> inline auto resize_linear_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeLinearInit_8u) else
     QORI_AT(0x3131, qoriResizeLinearInit_16u) else
     QORI_AT(0x4141, qoriResizeLinearInit_16s) else
@@ -8802,7 +8802,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_cubic_init_0() noexcept {
+template <unsigned k> inline auto resize_cubic_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeCubicInit_8u) else
     QORI_AT(0x3131, qoriResizeCubicInit_16u) else
     QORI_AT(0x4141, qoriResizeCubicInit_16s) else
@@ -8829,7 +8829,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_lanczos_init_0() noexcept {
+template <unsigned k> inline auto resize_lanczos_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeLanczosInit_8u) else
     QORI_AT(0x3131, qoriResizeLanczosInit_16u) else
     QORI_AT(0x4141, qoriResizeLanczosInit_16s) else
@@ -8856,7 +8856,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_super_init_0() noexcept {
+template <unsigned k> inline auto resize_super_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeSuperInit_8u) else
     QORI_AT(0x3131, qoriResizeSuperInit_16u) else
     QORI_AT(0x4141, qoriResizeSuperInit_16s) else
@@ -8904,7 +8904,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 }
 
 namespace detail {
-template <unsigned k> constexpr auto resize_nearest_0() noexcept {
+template <unsigned k> inline auto resize_nearest_0() noexcept {
     QORI_AT(0x1111, qoriResizeNearest_8u_C1R) else
     QORI_AT(0x1313, qoriResizeNearest_8u_C3R) else
     QORI_AT(0x1414, qoriResizeNearest_8u_C4R) else
@@ -8948,7 +8948,7 @@ template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_super_0() noexcept {
+template <unsigned k> inline auto resize_super_0() noexcept {
     QORI_AT(0x1111, qoriResizeSuper_8u_C1R) else
     QORI_AT(0x1313, qoriResizeSuper_8u_C3R) else
     QORI_AT(0x1414, qoriResizeSuper_8u_C4R) else
@@ -8992,7 +8992,7 @@ template <bool exists = false> QorResult resize_super(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_linear_0() noexcept {
+template <unsigned k> inline auto resize_linear_0() noexcept {
     QORI_AT(0x1111, qoriResizeLinear_8u_C1R) else
     QORI_AT(0x1313, qoriResizeLinear_8u_C3R) else
     QORI_AT(0x1414, qoriResizeLinear_8u_C4R) else
@@ -9040,7 +9040,7 @@ template <bool exists = false> QorResult resize_linear(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_cubic_0() noexcept {
+template <unsigned k> inline auto resize_cubic_0() noexcept {
     QORI_AT(0x1111, qoriResizeCubic_8u_C1R) else
     QORI_AT(0x1313, qoriResizeCubic_8u_C3R) else
     QORI_AT(0x1414, qoriResizeCubic_8u_C4R) else
@@ -9085,7 +9085,7 @@ template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_lanczos_0() noexcept {
+template <unsigned k> inline auto resize_lanczos_0() noexcept {
     QORI_AT(0x1111, qoriResizeLanczos_8u_C1R) else
     QORI_AT(0x1313, qoriResizeLanczos_8u_C3R) else
     QORI_AT(0x1414, qoriResizeLanczos_8u_C4R) else
@@ -9129,7 +9129,7 @@ template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_antialiasing_0() noexcept {
+template <unsigned k> inline auto resize_antialiasing_0() noexcept {
     QORI_AT(0x1111, qoriResizeAntialiasing_8u_C1R) else
     QORI_AT(0x1313, qoriResizeAntialiasing_8u_C3R) else
     QORI_AT(0x1414, qoriResizeAntialiasing_8u_C4R) else
@@ -9174,7 +9174,7 @@ template <bool exists = false> QorResult resize_antialiasing(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto rescale_0() noexcept {
+template <unsigned k> inline auto rescale_0() noexcept {
     QORI_AT(0x1131, qoriScale_8u16u_C1R) else
     QORI_AT(0x1333, qoriScale_8u16u_C3R) else
     QORI_AT(0x1434, qoriScale_8u16u_C4R) else
@@ -9189,7 +9189,7 @@ template <unsigned k> constexpr auto rescale_0() noexcept {
     QORI_AT(0x1565, qoriScale_8u32s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto rescale_1() noexcept {
+template <unsigned k> inline auto rescale_1() noexcept {
     QORI_AT(0x1171, qoriScale_8u32f_C1R) else
     QORI_AT(0x1373, qoriScale_8u32f_C3R) else
     QORI_AT(0x1474, qoriScale_8u32f_C4R) else
@@ -9200,7 +9200,7 @@ template <unsigned k> constexpr auto rescale_1() noexcept {
     QORI_AT(0x7515, qoriScale_32f8u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto rescale_2() noexcept {
+template <unsigned k> inline auto rescale_2() noexcept {
     QORI_AT(0x3111, qoriScale_16u8u_C1R) else
     QORI_AT(0x3313, qoriScale_16u8u_C3R) else
     QORI_AT(0x3414, qoriScale_16u8u_C4R) else
@@ -9277,7 +9277,7 @@ template <bool exists = false> QorResult rescale(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fill_0() noexcept {
+template <unsigned k> inline auto fill_0() noexcept {
     QORI_AT(0x1111, qoriSet_8u_C1R) else
     QORI_AT(0x1313, qoriSet_8u_C3R) else
     QORI_AT(0x1414, qoriSet_8u_C4R) else
@@ -9310,7 +9310,7 @@ template <unsigned k> constexpr auto fill_0() noexcept {
     QORI_AT(0x7979, qoriSet_32f_C4CR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fill_1() noexcept {
+template <unsigned k> inline auto fill_1() noexcept {
     QORI_AT(0x1111, qoriSet_8u_C1MR) else
     QORI_AT(0x1313, qoriSet_8u_C3MR) else
     QORI_AT(0x1414, qoriSet_8u_C4MR) else
@@ -9375,21 +9375,21 @@ template <bool exists = false> QorResult fill(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_packed_0() noexcept {
+template <unsigned k> inline auto multiply_packed_0() noexcept {
     QORI_AT(0x7171, qoriMulPack_32f_C1R) else
     QORI_AT(0x7373, qoriMulPack_32f_C3R) else
     QORI_AT(0x7474, qoriMulPack_32f_C4R) else
     QORI_AT(0x7575, qoriMulPack_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_1() noexcept {
+template <unsigned k> inline auto multiply_packed_1() noexcept {
     QORI_AT(0x7171, qoriMulPack_32f_C1IR) else
     QORI_AT(0x7373, qoriMulPack_32f_C3IR) else
     QORI_AT(0x7474, qoriMulPack_32f_C4IR) else
     QORI_AT(0x7575, qoriMulPack_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_2() noexcept {
+template <unsigned k> inline auto multiply_packed_2() noexcept {
     QORI_AT(0x4141, qoriMulPack_16s_C1RSfs) else
     QORI_AT(0x4343, qoriMulPack_16s_C3RSfs) else
     QORI_AT(0x4444, qoriMulPack_16s_C4RSfs) else
@@ -9400,7 +9400,7 @@ template <unsigned k> constexpr auto multiply_packed_2() noexcept {
     QORI_AT(0x6565, qoriMulPack_32s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_3() noexcept {
+template <unsigned k> inline auto multiply_packed_3() noexcept {
     QORI_AT(0x4141, qoriMulPack_16s_C1IRSfs) else
     QORI_AT(0x4343, qoriMulPack_16s_C3IRSfs) else
     QORI_AT(0x4444, qoriMulPack_16s_C4IRSfs) else
@@ -9497,14 +9497,14 @@ template <bool exists = false> QorResult multiply_packed(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_packed_conj_0() noexcept {
+template <unsigned k> inline auto multiply_packed_conj_0() noexcept {
     QORI_AT(0x7171, qoriMulPackConj_32f_C1R) else
     QORI_AT(0x7373, qoriMulPackConj_32f_C3R) else
     QORI_AT(0x7474, qoriMulPackConj_32f_C4R) else
     QORI_AT(0x7575, qoriMulPackConj_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_conj_1() noexcept {
+template <unsigned k> inline auto multiply_packed_conj_1() noexcept {
     QORI_AT(0x7171, qoriMulPackConj_32f_C1IR) else
     QORI_AT(0x7373, qoriMulPackConj_32f_C3IR) else
     QORI_AT(0x7474, qoriMulPackConj_32f_C4IR) else
@@ -9554,12 +9554,12 @@ template <bool exists = false> QorResult multiply_packed_conj(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto magnitude_packed_0() noexcept {
+template <unsigned k> inline auto magnitude_packed_0() noexcept {
     QORI_AT(0x7171, qoriMagnitudePack_32f_C1R) else
     QORI_AT(0x7373, qoriMagnitudePack_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto magnitude_packed_1() noexcept {
+template <unsigned k> inline auto magnitude_packed_1() noexcept {
     QORI_AT(0x4141, qoriMagnitudePack_16s_C1RSfs) else
     QORI_AT(0x4343, qoriMagnitudePack_16s_C3RSfs) else
     QORI_AT(0x6161, qoriMagnitudePack_32s_C1RSfs) else
@@ -9614,12 +9614,12 @@ template <bool exists = false> QorResult magnitude_packed(detail::Anything = {},
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto phase_packed_0() noexcept {
+template <unsigned k> inline auto phase_packed_0() noexcept {
     QORI_AT(0x7171, qoriPhasePack_32f_C1R) else
     QORI_AT(0x7373, qoriPhasePack_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto phase_packed_1() noexcept {
+template <unsigned k> inline auto phase_packed_1() noexcept {
     QORI_AT(0x4141, qoriPhasePack_16s_C1RSfs) else
     QORI_AT(0x4343, qoriPhasePack_16s_C3RSfs) else
     QORI_AT(0x6161, qoriPhasePack_32s_C1RSfs) else
@@ -9673,7 +9673,7 @@ template <bool exists = false> QorResult phase_packed(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto unpack_spectrum_0() noexcept {
+template <unsigned k> inline auto unpack_spectrum_0() noexcept {
     QORI_AT(0x71b1, qoriPackToCplxExtend_32f32fc_C1R) else
     QORI_AT(0x61a1, qoriPackToCplxExtend_32s32sc_C1R) else
     return Missing{};
@@ -9705,7 +9705,7 @@ template <bool exists = false> QorResult unpack_spectrum(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto pack_spectrum_0() noexcept {
+template <unsigned k> inline auto pack_spectrum_0() noexcept {
     QORI_AT(0xb171, qoriCplxExtendToPack_32fc32f_C1R) else
     QORI_AT(0xb373, qoriCplxExtendToPack_32fc32f_C3R) else
     QORI_AT(0xa161, qoriCplxExtendToPack_32sc32s_C1R) else
@@ -9741,7 +9741,7 @@ template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, de
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_0() noexcept {
+template <unsigned k> inline auto threshold_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_8u_AC4R) else
@@ -9756,7 +9756,7 @@ template <unsigned k> constexpr auto threshold_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_1() noexcept {
+template <unsigned k> inline auto threshold_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_8u_AC4IR) else
@@ -9771,7 +9771,7 @@ template <unsigned k> constexpr auto threshold_1() noexcept {
     QORI_AT(0x7575, qoriThreshold_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_2() noexcept {
+template <unsigned k> inline auto threshold_2() noexcept {
     QORI_AT(0x1111, qoriThreshold_Val_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_Val_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_Val_8u_AC4R) else
@@ -9786,7 +9786,7 @@ template <unsigned k> constexpr auto threshold_2() noexcept {
     QORI_AT(0x7575, qoriThreshold_Val_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_3() noexcept {
+template <unsigned k> inline auto threshold_3() noexcept {
     QORI_AT(0x1111, qoriThreshold_Val_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_Val_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_Val_8u_AC4IR) else
@@ -9872,7 +9872,7 @@ template <bool exists = false> QorResult threshold(detail::Anything = {}, detail
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_gt_0() noexcept {
+template <unsigned k> inline auto threshold_gt_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_GT_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_GT_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_GT_8u_AC4R) else
@@ -9887,7 +9887,7 @@ template <unsigned k> constexpr auto threshold_gt_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_GT_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_gt_1() noexcept {
+template <unsigned k> inline auto threshold_gt_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_GT_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_GT_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_GT_8u_AC4IR) else
@@ -9902,7 +9902,7 @@ template <unsigned k> constexpr auto threshold_gt_1() noexcept {
     QORI_AT(0x7575, qoriThreshold_GT_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_gt_2() noexcept {
+template <unsigned k> inline auto threshold_gt_2() noexcept {
     QORI_AT(0x1111, qoriThreshold_GTVal_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_GTVal_8u_C3R) else
     QORI_AT(0x1414, qoriThreshold_GTVal_8u_C4R) else
@@ -9921,7 +9921,7 @@ template <unsigned k> constexpr auto threshold_gt_2() noexcept {
     QORI_AT(0x7575, qoriThreshold_GTVal_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_gt_3() noexcept {
+template <unsigned k> inline auto threshold_gt_3() noexcept {
     QORI_AT(0x1111, qoriThreshold_GTVal_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_GTVal_8u_C3IR) else
     QORI_AT(0x1414, qoriThreshold_GTVal_8u_C4IR) else
@@ -10013,7 +10013,7 @@ template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_lt_0() noexcept {
+template <unsigned k> inline auto threshold_lt_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_LT_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_LT_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_LT_8u_AC4R) else
@@ -10028,7 +10028,7 @@ template <unsigned k> constexpr auto threshold_lt_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_LT_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_lt_1() noexcept {
+template <unsigned k> inline auto threshold_lt_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_LT_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_LT_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_LT_8u_AC4IR) else
@@ -10043,7 +10043,7 @@ template <unsigned k> constexpr auto threshold_lt_1() noexcept {
     QORI_AT(0x7575, qoriThreshold_LT_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_lt_2() noexcept {
+template <unsigned k> inline auto threshold_lt_2() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTVal_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_LTVal_8u_C3R) else
     QORI_AT(0x1414, qoriThreshold_LTVal_8u_C4R) else
@@ -10062,7 +10062,7 @@ template <unsigned k> constexpr auto threshold_lt_2() noexcept {
     QORI_AT(0x7575, qoriThreshold_LTVal_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_lt_3() noexcept {
+template <unsigned k> inline auto threshold_lt_3() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTVal_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_LTVal_8u_C3IR) else
     QORI_AT(0x1414, qoriThreshold_LTVal_8u_C4IR) else
@@ -10154,7 +10154,7 @@ template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, det
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_outside_0() noexcept {
+template <unsigned k> inline auto threshold_outside_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTValGTVal_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_LTValGTVal_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_LTValGTVal_8u_AC4R) else
@@ -10169,7 +10169,7 @@ template <unsigned k> constexpr auto threshold_outside_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_LTValGTVal_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_outside_1() noexcept {
+template <unsigned k> inline auto threshold_outside_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTValGTVal_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_LTValGTVal_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_LTValGTVal_8u_AC4IR) else
@@ -10238,11 +10238,11 @@ template <bool exists = false> QorResult threshold_outside(detail::Anything = {}
 }
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_adaptive_box_0() noexcept {
+template <unsigned k> inline auto threshold_adaptive_box_0() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveBox_8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_adaptive_box_1() noexcept {
+template <unsigned k> inline auto threshold_adaptive_box_1() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveBox_8u_C1IR) else
     return Missing{};
 }
@@ -10471,11 +10471,11 @@ template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything
 }
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_adaptive_gauss_0() noexcept {
+template <unsigned k> inline auto threshold_adaptive_gauss_0() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveGauss_8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_adaptive_gauss_1() noexcept {
+template <unsigned k> inline auto threshold_adaptive_gauss_1() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveGauss_8u_C1IR) else
     return Missing{};
 }
@@ -10577,7 +10577,7 @@ template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anythi
 }
 
 namespace detail {
-template <unsigned k> constexpr auto warp_affine_nearest_0() noexcept {
+template <unsigned k> inline auto warp_affine_nearest_0() noexcept {
     QORI_AT(0x1111, qoriWarpAffineNearest_8u_C1R) else
     QORI_AT(0x1313, qoriWarpAffineNearest_8u_C3R) else
     QORI_AT(0x1414, qoriWarpAffineNearest_8u_C4R) else
@@ -10625,7 +10625,7 @@ template <bool exists = false> QorResult warp_affine_nearest(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto warp_affine_linear_0() noexcept {
+template <unsigned k> inline auto warp_affine_linear_0() noexcept {
     QORI_AT(0x1111, qoriWarpAffineLinear_8u_C1R) else
     QORI_AT(0x1313, qoriWarpAffineLinear_8u_C3R) else
     QORI_AT(0x1414, qoriWarpAffineLinear_8u_C4R) else
@@ -10673,7 +10673,7 @@ template <bool exists = false> QorResult warp_affine_linear(detail::Anything = {
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto warp_affine_cubic_0() noexcept {
+template <unsigned k> inline auto warp_affine_cubic_0() noexcept {
     QORI_AT(0x1111, qoriWarpAffineCubic_8u_C1R) else
     QORI_AT(0x1313, qoriWarpAffineCubic_8u_C3R) else
     QORI_AT(0x1414, qoriWarpAffineCubic_8u_C4R) else
@@ -10721,7 +10721,7 @@ template <bool exists = false> QorResult warp_affine_cubic(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sum_window_row_0() noexcept {
+template <unsigned k> inline auto sum_window_row_0() noexcept {
     QORI_AT(0x1171, qoriSumWindowRow_8u32f_C1R) else
     QORI_AT(0x1373, qoriSumWindowRow_8u32f_C3R) else
     QORI_AT(0x1474, qoriSumWindowRow_8u32f_C4R) else
@@ -10763,7 +10763,7 @@ template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, d
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sum_window_column_0() noexcept {
+template <unsigned k> inline auto sum_window_column_0() noexcept {
     QORI_AT(0x1171, qoriSumWindowColumn_8u32f_C1R) else
     QORI_AT(0x1373, qoriSumWindowColumn_8u32f_C3R) else
     QORI_AT(0x1474, qoriSumWindowColumn_8u32f_C4R) else

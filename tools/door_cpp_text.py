@@ -14,7 +14,7 @@ WIDTH = 118
 # --- choices among members ------------------------------------------------------------------------------------------
 
 def chain(name, members):
-    lines = [f"template <unsigned k> constexpr auto {name}() noexcept {{"]
+    lines = [f"template <unsigned k> inline auto {name}() noexcept {{"]
     lines += [f"    QORI_AT(0x{key:04x}, {member}) else" for key, member in members]
     return lines + ["    return Missing{};", "}"]
 

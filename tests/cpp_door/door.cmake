@@ -2,6 +2,8 @@
 set(door ${CMAKE_CURRENT_SOURCE_DIR}/cpp_door)
 set(door_include ${PROJECT_SOURCE_DIR}/include)
 
+add_test(NAME door_generator COMMAND ${python} ${door}/generator_test.py)
+
 # With exceptions, without, and of a later standard; run where the library runs.
 foreach(flavour throws ends later)
     add_executable(door_${flavour} ${door}/exceptions.cpp)
