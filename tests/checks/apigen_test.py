@@ -1,12 +1,15 @@
 """The generator on small registries: names, argument lists, stack sizes, order, and what it refuses."""
 import sys
 import tempfile
+import tomllib
 import unittest
 from pathlib import Path
 
 ROOT = Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(ROOT / "tools"))
 import apigen  # noqa: E402
+import registry  # noqa: E402
+import roles  # noqa: E402
 
 FAMILY = """
 title = "Sample"
@@ -43,9 +46,10 @@ brief = "Turns."
 """
 
 
-def load(text):
+def load(text, roles_text=(ROOT / "api" / "roles.toml").read_text()):
     with tempfile.TemporaryDirectory() as folder:
         (Path(folder) / "forms.toml").write_text((ROOT / "api" / "forms.toml").read_text())
+        (Path(folder) / "roles.toml").write_text(roles_text)
         (Path(folder) / "sample.toml").write_text(text)
         return apigen.load(Path(folder))
 
@@ -77,9 +81,9 @@ class Generator(unittest.TestCase):
                          "Image<float>{pSrcDst, srcDstStep}, roiSize", expressions)
 
     def test_alpha_layout_processes_three_channels(self):
-        self.assertEqual(3, apigen.processed("AC4"))
-        self.assertEqual(("C3", "C4"), apigen.split_layout("C3A0C4"))
-        self.assertEqual(("C4C", "C4C"), apigen.split_layout("C4C"))
+        self.assertEqual(3, registry.processed("AC4"))
+        self.assertEqual(("C3", "C4"), registry.split_layout("C3A0C4"))
+        self.assertEqual(("C4C", "C4C"), registry.split_layout("C4C"))
 
     def test_table_import_list_and_members_agree(self):
         members = apigen.all_members(self.families)
@@ -108,6 +112,53 @@ class Generator(unittest.TestCase):
                       ).replace('"64f", "32fc"', '"32f"'), FAMILY.replace('brief = "Fills."', "")):
             with self.assertRaises(apigen.RegistryError):
                 load(wrong)
+
+
+class Roles(unittest.TestCase):
+    @classmethod
+    def setUpClass(cls):
+        cls.members = {m.name: m for m in registry.all_members(registry.load(ROOT / "api"))}
+
+    def named(self, name):
+        return [(a.kind, a.name) for a in self.members[name].arguments if a.kind not in ("step", "region")]
+
+    def test_operands_stand_in_their_natural_order(self):
+        self.assertEqual([("image_in", "b"), ("image_in", "a"), ("image_out", "dst"), ("scalar", "scale")],
+                         self.named("qoriSub_8u_C1RSfs"))
+        self.assertEqual([("image_in", "b"), ("image_inout", "a")], self.named("qoriDiv_32f_C1IR"))
+        self.assertEqual([("image_in", "a"), ("image_inout", "b")], self.named("qoriAdd_32f_C1IR"))
+        self.assertEqual([("value", "b"), ("image_inout", "a")], self.named("qoriAddC_32f_C3IR"))
+
+    def test_declarations_complete_roles(self):
+        self.assertEqual(("planes_out", "dst"), self.named("qoriCopy_8u_C3P3R")[1])
+        self.assertEqual([("array_in", "src"), ("array_out", "dst")], self.named("qoriDCT8x8Fwd_32f_C1"))
+        self.assertEqual(("lists_out", "levels"), self.named("qoriHistogramEven_8u_C3R")[2])
+        self.assertEqual({"prepare", "allocate", "release", "query", "operation"},
+                         {m.purpose for name, m in self.members.items() if name.startswith("qoriFFT")})
+        self.assertEqual("inspect", self.members["qoriResizeGetSrcRoi_8u"].purpose)
+
+    def test_work_memory_is_measured_by_a_query_that_exists(self):
+        self.assertEqual("qoriFilterRoundGetBufSize32s_16u_AC4R",
+                         roles.buffer_query(self.members["qoriFilter_Round32s_16u_AC4R"]))
+        self.assertEqual("qoriDFTGetBufSize_R_32s", roles.buffer_query(self.members["qoriDFTInv_PackToR_32s8u_C1RSfs"]))
+
+    def test_every_entry_of_the_table_is_used(self):
+        table = tomllib.loads((ROOT / "api" / "roles.toml").read_text())
+        self.assertEqual([], roles.unused(self.members.values(), table))
+
+    def test_a_gap_is_an_error(self):
+        text = (ROOT / "api" / "roles.toml").read_text()
+
+        def named(entries):
+            return text.replace("[operations]", "[operations]\n" + entries)
+        strange = FAMILY.replace("int32_t scaleFactor", "int32_t strangeness").replace('cpp = "scaleFactor"', 'cpp = "0"')
+        sums = FAMILY.replace('op = "Turn"', 'op = "Sums"').replace('"8u32f"', '"32f"').replace(
+            '"C3P3"', '"C1"').replace("src dstPlanes roi", "src1 src2 dst roi")
+        for family, table in ((strange, text), (FAMILY, text.replace('pDst = "image_out', 'pDst = "picture')),
+                              (FAMILY, named('Sum = { reach = "9" }')), (FAMILY, named('Fill = { snake = "template" }')),
+                              (FAMILY, named('Fill = { buffer = "qoriNone" }')), (sums, named('Sums = { snake = "sum" }'))):
+            with self.assertRaises(registry.RegistryError):
+                load(family, table)
 
 
 if __name__ == "__main__":
