@@ -43,7 +43,7 @@ constexpr int32_t kFlags[] = {fftDivFwdByN, fftDivInvByN, fftDivBySqrtN, fftNoDi
 int32_t anyFlag() { return kFlags[random().below(4)]; }
 
 /// Every width and every height to 64 (of the main layout, else some), with another that changes; factors of all kinds,
-/// chirps in a whole side and in parts of it.
+/// convolutions of primes and with chirps in a whole side and in parts of it.
 template <class Check>
 void forSizes(bool isMain, Check check) {
     for (int n = 1; n <= 64; ++n) {
@@ -69,7 +69,11 @@ void forSizes(bool isMain, Check check) {
                               {1, 2309},
                               {193, 2},
                               {2, 149},
-                              {89, 3}})
+                              {89, 3},
+                              {73, 2},
+                              {214, 5},
+                              {2003, 2},
+                              {4001, 1}})
         check(size);
 }
 

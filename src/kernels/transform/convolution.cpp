@@ -1,11 +1,17 @@
 // SPDX-License-Identifier: Apache-2.0
-// Transforms of lengths with large prime factors: with jk = (j^2 + k^2 - (k - j)^2) / 2, the sum over j of
-// x(j) e^(-2 pi i jk / n) is a chirp times the convolution of x times the chirp with the chirp's conjugate (Bluestein:
-// A linear filtering approach to the computation of the discrete Fourier transform, 1970).
+// Transforms of blocks whose length has no small factors, as cyclic convolutions.
 //
-// The convolution is cyclic, of a length of small factors: transformed, multiplied by the spectrum of the conjugate,
-// transformed back through the same stages from the last to the first, so that nothing is ever put in order. Between
-// the exchanged parts of the way back the stages are forward ones, with their twiddles before the butterfly.
+// A prime p: with a generator g of the numbers modulo p, frequency g^-m is the first point and the sum over k of
+// x(g^k) e^(-2 pi i g^(k - m) / p), a convolution of p - 1 points (Rader: Discrete Fourier transforms when the number
+// of data samples is prime, 1968). It is used where p - 1 has small factors.
+//
+// Any n: with jk = (j^2 + k^2 - (k - j)^2) / 2, the sum over j of x(j) e^(-2 pi i jk / n) is a chirp times the
+// convolution of x times the chirp with the chirp's conjugate (Bluestein: A linear filtering approach to the
+// computation of the discrete Fourier transform, 1970). That is linear, and cyclic of any length from 2 n - 1 on.
+//
+// Convolutions are transformed, multiplied by the spectrum of what does not change, transformed back through the same
+// stages from the last to the first, so that nothing is ever put in order. Between the exchanged parts of the way back
+// the stages are forward ones, with their twiddles before the butterfly.
 #include "passes.h"
 
 namespace qori::kernels {
@@ -38,34 +44,74 @@ void stageBack(const FourierTable& table, const FourierTable::Stage& stage, floa
         case 3: return passBack<3>(lines, blocks, part, turns, twiddles);
         case 4: return passBack<4>(lines, blocks, part, turns, twiddles);
         case 5: return passBack<5>(lines, blocks, part, turns, twiddles);
-        default: return passBack<8>(lines, blocks, part, turns, twiddles);
+        case 7: return passBack<7>(lines, blocks, part, turns, twiddles);
+        case 8: return passBack<8>(lines, blocks, part, turns, twiddles);
+        default: return line::passBackPrime(table, stage, lines, blocks);
     }
 }
 
-/// The last stage, the product with the spectrum, which is in the order of the lines, and the first stage back.
-QORI_NOINLINE void turnBack(float* lines, ptrdiff_t blocks, const float* spectrum) {
-    constexpr int radix = 8;
+/// The last stage, the product with the spectrum, which is in the order of the lines, and the first stage back. With
+/// `first` the lines begin with frequency 0, the sum of the points: it is added to the first point, which was not among
+/// them, and that to all sums.
+template <int radix>
+QORI_NOINLINE void turnBack(float* lines, ptrdiff_t blocks, const float* spectrum, float* first) {
     for (ptrdiff_t block = 0; block < blocks; ++block, lines += radix * kLineFloats, spectrum += 2 * radix) {
         ComplexLine a[radix];
         for (int q = 0; q < radix; ++q) a[q] = line::loadLine(lines + q * kLineFloats);
         line::butterfly(a);
-        for (int q = 0; q < radix; ++q) a[q] = exchanged(line::times(a[q], spectrum + 2 * q));
+        const ComplexLine sum = a[0];
+        for (int q = 0; q < radix; ++q) a[q] = line::times(a[q], spectrum + 2 * q);
+        if (first != nullptr) {
+            const ComplexLine x = line::loadLine(first);
+            line::storeLine(first, line::operator+(x, sum));
+            a[0] = line::operator+(a[0], x);
+            first = nullptr;
+        }
+        for (int q = 0; q < radix; ++q) a[q] = exchanged(a[q]);
         line::butterfly(a);
         for (int q = 0; q < radix; ++q) line::storeLine(lines + q * kLineFloats, a[q]);
     }
 }
 
-/// A convolution and what of it is not points of the block: these are less than half of its lines.
+/// A block and what it is convolved with.
 struct Convolution {
     const FourierTable& inner;
-    const float *chirp, *spectrum;
-    ptrdiff_t points;
+    const float* spectrum;
+    float* block;
 };
 
-/// The convolution's stage that is the first forth and the last back. The block's points fill `filled` of its parts.
+/// Points times a chirp, which are less than half of the convolution's, 0 behind them; frequencies in order.
+struct ChirpOrder {
+    const float* chirp;
+    ptrdiff_t points;
+
+    /// How many of the parts of an outer stage hold points.
+    static constexpr int filled(int radix) { return (radix + 1) / 2; }
+    QORI_INLINE ComplexLine load(const float* block, ptrdiff_t i) const {
+        if (i >= points) return {zero<float>(), zero<float>()};
+        return line::times(line::loadLine(block + i * kLineFloats), chirp + 2 * i);
+    }
+    QORI_INLINE void store(float* block, ptrdiff_t i, ComplexLine a) const {
+        if (i < points) line::storeLine(block + i * kLineFloats, line::times(a, chirp + 2 * i));
+    }
+};
+
+/// All points but the first in the order of a generator's powers, frequencies in that of their inverses.
+struct RotatedOrder {
+    const int32_t *powers, *inverses;
+
+    static constexpr int filled(int radix) { return radix; }
+    QORI_INLINE ComplexLine load(const float* block, ptrdiff_t i) const {
+        return line::loadLine(block + ptrdiff_t{powers[i]} * kLineFloats);
+    }
+    QORI_INLINE void store(float* block, ptrdiff_t i, ComplexLine a) const {
+        line::storeLine(block + ptrdiff_t{inverses[i]} * kLineFloats, a);
+    }
+};
+
+/// The convolution's stage that is the first forth and the last back.
 template <int radix>
 struct OuterStage {
-    static constexpr int filled = (radix + 1) / 2;
     ptrdiff_t part;
     const float *turns, *twiddles;
 
@@ -75,20 +121,16 @@ struct OuterStage {
           twiddles(inner.at<float>(inner.stages[0].twiddles)) {}
 };
 
-/// Reads the block's points, times the chirp, through the first stage; what is beyond them is 0.
-template <int radix>
-QORI_NOINLINE void enter(const Convolution& c, const float* block, float* lines) {
+/// Reads the block's points through the first stage.
+template <int radix, class Order>
+QORI_NOINLINE void enter(const Convolution& c, Order order, float* lines) {
     const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
-    constexpr int filled = OuterStage<radix>::filled;
     const float* w = twiddles;
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
-        for (int q = 0; q < radix; ++q) {
-            const ptrdiff_t i = j + q * part;
-            a[q] = {zero<float>(), zero<float>()};
-            if (q < filled && i < c.points)
-                a[q] = line::times(line::loadLine(block + i * kLineFloats), c.chirp + 2 * i);
-        }
+        for (int q = 0; q < radix; ++q)
+            a[q] = q < Order::filled(radix) ? order.load(c.block, j + q * part)
+                                            : ComplexLine{zero<float>(), zero<float>()};
         line::butterflyOf<radix>(a, turns);
         line::storeLine(lines + j * kLineFloats, a[0]);
         for (int p = 1; p < radix; ++p)
@@ -96,11 +138,10 @@ QORI_NOINLINE void enter(const Convolution& c, const float* block, float* lines)
     }
 }
 
-/// The last stage back, and the chirp, of as many points as the block has.
-template <int radix>
-QORI_NOINLINE void leave(const Convolution& c, const float* lines, float* block) {
+/// The last stage back, of as many points as the block has.
+template <int radix, class Order>
+QORI_NOINLINE void leave(const Convolution& c, Order order, const float* lines) {
     const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
-    constexpr int filled = OuterStage<radix>::filled;
     const float* w = twiddles;
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
@@ -108,52 +149,80 @@ QORI_NOINLINE void leave(const Convolution& c, const float* lines, float* block)
         for (int p = 1; p < radix; ++p)
             a[p] = line::times(line::loadLine(lines + (j + p * part) * kLineFloats), w + 2 * p - 2);
         line::butterflyOf<radix>(a, turns);
-        for (int q = 0; q < filled; ++q) {
-            const ptrdiff_t i = j + q * part;
-            if (i < c.points) line::storeLine(block + i * kLineFloats, line::times(exchanged(a[q]), c.chirp + 2 * i));
-        }
+        for (int q = 0; q < Order::filled(radix); ++q) order.store(c.block, j + q * part, exchanged(a[q]));
+    }
+}
+
+/// The last stage forth and the first one back, by its radix.
+void turnBackBy(int32_t radix, float* lines, ptrdiff_t points, const float* spectrum, float* first) {
+    switch (radix) {
+        case 2: return turnBack<2>(lines, points / 2, spectrum, first);
+        case 4: return turnBack<4>(lines, points / 4, spectrum, first);
+        default: return turnBack<8>(lines, points / 8, spectrum, first);
     }
 }
 
 /// Forth and back from a stage on. Large blocks are divided first.
-void convolveBlock(const Convolution& c, int32_t first, float* lines, ptrdiff_t points, const float* spectrum) {
-    const FourierTable& inner = c.inner;
+void convolveBlock(const FourierTable& inner, int32_t stage, float* lines, ptrdiff_t points, const float* spectrum,
+                   float* first) {
     const int32_t last = inner.stageCount - 1;
-    if (first < last && points > line::kPointsAtOnce) {
-        const FourierTable::Stage& stage = inner.stages[first];
-        line::runStage(inner, stage, lines, 1);
-        const ptrdiff_t part = points / stage.radix;
-        for (ptrdiff_t i = 0; i < stage.radix; ++i)
-            convolveBlock(c, first + 1, lines + i * part * kLineFloats, part, spectrum + 2 * i * part);
-        return stageBack(inner, stage, lines, 1);
+    if (stage < last && points > line::kPointsAtOnce) {
+        const FourierTable::Stage& divided = inner.stages[stage];
+        line::runStage(inner, divided, lines, 1);
+        const ptrdiff_t part = points / divided.radix;
+        for (ptrdiff_t i = 0; i < divided.radix; ++i)
+            convolveBlock(inner, stage + 1, lines + i * part * kLineFloats, part, spectrum + 2 * i * part,
+                          i == 0 ? first : nullptr);
+        return stageBack(inner, divided, lines, 1);
     }
-    for (int32_t i = first; i < last; ++i)
+    for (int32_t i = stage; i < last; ++i)
         line::runStage(inner, inner.stages[i], lines, points / inner.stages[i].length);
-    turnBack(lines, points / inner.stages[last].length, spectrum);
-    for (int32_t i = last - 1; i >= first; --i)
+    turnBackBy(inner.stages[last].radix, lines, points, spectrum, first);
+    for (int32_t i = last - 1; i >= stage; --i)
         stageBack(inner, inner.stages[i], lines, points / inner.stages[i].length);
 }
 
-template <int radix>
-void convolveFrom(const Convolution& c, float* block, float* work) {
-    enter<radix>(c, block, work);
+/// first: the block's first point, where it is not among the convolution's.
+template <int radix, class Order>
+void convolveFrom(const Convolution& c, Order order, float* work, float* first) {
+    enter<radix>(c, order, work);
     const ptrdiff_t part = c.inner.points / radix;
     for (ptrdiff_t i = 0; i < radix; ++i)
-        convolveBlock(c, 1, work + i * part * kLineFloats, part, c.spectrum + 2 * i * part);
-    leave<radix>(c, work, block);
+        convolveBlock(c.inner, 1, work + i * part * kLineFloats, part, c.spectrum + 2 * i * part,
+                      i == 0 ? first : nullptr);
+    leave<radix>(c, order, work);
+}
+
+/// Where the first radix has no kernel of its own, points are put in order before and behind all stages.
+template <class Order>
+void convolveInOrder(const Convolution& c, Order order, float* work, float* first) {
+    for (ptrdiff_t i = 0; i < c.inner.points; ++i) line::storeLine(work + i * kLineFloats, order.load(c.block, i));
+    convolveBlock(c.inner, 0, work, c.inner.points, c.spectrum, first);
+    for (ptrdiff_t i = 0; i < c.inner.points; ++i)
+        order.store(c.block, i, exchanged(line::loadLine(work + i * kLineFloats)));
+}
+
+template <class Order>
+void convolve(const Convolution& c, Order order, float* work, float* first) {
+    switch (c.inner.stages[0].radix) {
+        case 3: return convolveFrom<3>(c, order, work, first);
+        case 4: return convolveFrom<4>(c, order, work, first);
+        case 5: return convolveFrom<5>(c, order, work, first);
+        case 7: return convolveFrom<7>(c, order, work, first);
+        case 8: return convolveFrom<8>(c, order, work, first);
+        default: return convolveInOrder(c, order, work, first);
+    }
 }
 
 }  // namespace
 
-void line::convolveWithChirp(const FourierTable& table, float* block, float* work) {
-    const Convolution c{*table.at<FourierTable>(table.inner), table.at<float>(table.chirpAt),
-                        table.at<float>(table.spectrumAt), table.chirpPoints};
-    switch (c.inner.stages[0].radix) {
-        case 3: return convolveFrom<3>(c, block, work);
-        case 4: return convolveFrom<4>(c, block, work);
-        case 5: return convolveFrom<5>(c, block, work);
-        default: return convolveFrom<8>(c, block, work);
+void line::transformByConvolution(const FourierTable& table, float* block, float* work) {
+    const Convolution c{*table.at<FourierTable>(table.inner), table.at<float>(table.spectrumAt), block};
+    if (table.isRotated) {
+        const auto* const powers = table.at<int32_t>(table.factorsAt);
+        return convolve(c, RotatedOrder{powers, powers + c.inner.points}, work, block);
     }
+    convolve(c, ChirpOrder{table.at<float>(table.factorsAt), table.convolvedPoints}, work, nullptr);
 }
 
 }  // namespace qori::kernels
