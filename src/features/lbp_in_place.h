@@ -3,6 +3,8 @@
 // read, then of those rows together the `reach` columns beside each closed side, from copies of the columns that they
 // see.
 #pragma once
+#include <algorithm>
+
 #include "frame/border.h"
 #include "kernels/lbp/tiles.h"
 
