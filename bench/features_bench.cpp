@@ -69,11 +69,11 @@ const Rows lbp{{
 
 /// Plan, buffer and destination of persons, 64 x 128, every eight pixels or ten by six of them.
 struct Persons {
-    static constexpr QorHogConfig config{0, 8, 16, 8, 9, 8.0f, 0.2f, {64, 128}};
     std::vector<QorPoint2D> windows;
     Block plan, buffer, descriptors;
 
-    Persons(Size size, bool all) {
+    Persons(Size size, bool all, int blockStride = 8) {
+        const QorHogConfig config{0, 8, 16, blockStride, 9, 8.0f, 0.2f, {64, 128}};
         const int stepX = all ? 8 : (size.width - 64) / 9, stepY = all ? 8 : (size.height - 128) / 5;
         for (int y = 0; y + 128 <= size.height; y += stepY)
             for (int x = 0; x + 64 <= size.width; x += stepX) windows.push_back({x, y});
@@ -93,10 +93,10 @@ struct Persons {
 constexpr Size kVideo{640, 480};
 
 template <class T, int channels, class Function>
-Row gradients(std::string name, bool all, double best, Function function) {
+Row gradients(std::string name, bool all, double best, Function function, int blockStride = 8) {
     const auto make = [=](Size size) {
         const Image<T> src(size, channels);
-        const Persons persons(size, all);
+        const Persons persons(size, all, blockStride);
         return Contenders{[=] {
                               const auto run = [&](auto value) {
                                   must(function(src.data(), src.step(), size.roi(), persons.windows.data(),
@@ -125,6 +125,8 @@ const Rows hog{{
     gradients<uint8_t, 1>("HOG 64x128 windows 8u32f C1, 60 windows", false, 80, qoriHOG_8u32f_C1R),
     gradients<uint16_t, 1>("HOG 64x128 windows 16u32f C1, 3285 windows", true, 0, qoriHOG_16u32f_C1R),
     gradients<float, 1>("HOG 64x128 windows 32f C1, 3285 windows", true, 0, qoriHOG_32f_C1R),
+    gradients<uint8_t, 1>("HOG 64x128 windows, blocks side by side 8u32f C1, 60 windows", false, 0, qoriHOG_8u32f_C1R,
+                          16),
 }};
 
 /// Windows side by side, over each other or alone; units are windows.

@@ -106,11 +106,12 @@ const Ladders ladders{{
     {.operation = "DFT 32f forward, sides by factors",
      .make =
          [] {
-             return squares({64,  67,  70,  81,  96,  101, 113, 121,  127,  128,  131,  144,  169,  180,  191, 200,
-                             243, 251, 256, 257, 289, 300, 331, 343,  361,  384,  409,  500,  509,  512,  521, 529,
-                             600, 625, 720, 841, 900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
+             return squares({64,  67,  70,  81,   83,   96,   101,  107,  113,  121,  127, 128, 131, 144,
+                             169, 180, 191, 193,  199,  200,  211,  227,  243,  251,  256, 257, 289, 300,
+                             331, 343, 361, 384,  409,  500,  509,  512,  521,  529,  600, 625, 720, 841,
+                             900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
          },
-     .reason = "sides without small factors are convolved with chirps"},
+     .reason = "primes are convolved, and with a chirp in more than twice their length where p - 1 has large factors"},
 }};
 
 }  // namespace

@@ -30,6 +30,7 @@ public:
           blocks_(blocks),
           overlaps_(plan.blockStride == plan.cellSize) {}
 
+    bool overlaps() const { return overlaps_; }
     int32_t count() const { return overlaps_ ? blocks_ + 1 : 2 * blocks_; }
     int32_t begin(int32_t i) const { return overlaps_ ? i * cell_ : i / 2 * stride_ + i % 2 * cell_; }
     int32_t end(int32_t i) const { return begin(i) + cell_; }
@@ -78,7 +79,11 @@ public:
                 vote({grid.origin.x + begin, grid.origin.y + rows.begin(row), width, plan_.cellSize});
                 for (int32_t i = first; i <= last; ++i) {
                     const kernels::HogVotes votes = votes_.from(columns.begin(i) - begin);
-                    kernels::sumCell(votes, width, plan_.cellSize, plan_.nbins, plan_.weights(), shares_);
+                    if (columns.overlaps())
+                        kernels::sumCell(votes, width, plan_.cellSize, plan_.nbins, plan_.weights(), shares_);
+                    else
+                        kernels::sumCellAt(i % 2 + row % 2 * 2, votes, width, plan_.cellSize, plan_.nbins,
+                                           plan_.weights(), shares_);
                     share(grid, columns, i, rows, row);
                 }
                 first = last + 1;

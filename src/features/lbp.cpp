@@ -1,12 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
-// Local binary patterns. Strips of columns go from top to bottom over a ring of rows of keys, which have whatever the
-// windows see beyond the region, so that kernels know no borders.
+// Local binary patterns: of eight neighbours and of floats straight from the image. For others, and for narrow images,
+// strips of columns go from top to bottom over a ring of rows of keys, which have whatever the windows see beyond the
+// region, so that kernels know no borders.
 #include "frame/border.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "frame/plan.h"
 #include "frame/streaming.h"
-#include "kernels/lbp/patterns.h"
+#include "lbp_in_place.h"
 
 namespace qori::features {
 namespace {
@@ -106,48 +107,49 @@ private:
     alignas(64) Key constant_[kRowKeys];
 };
 
-/// A kernel makes a row from the rows around it.
-template <class T, class D, int reach, class MakeRow>
-void makeStrip(const BorderedImage& strip, Image<D> dst, MakeRow makeRow) {
-    KeyRows<T, reach> keys(strip);
-    for (int32_t y = 0; y < strip.size.height; ++y) {
-        const kernels::PatternKey<T>* rows[2 * reach + 1];
-        keys.rowsAround(y, rows);
-        makeRow(rows, dst.row(y), ptrdiff_t{strip.size.width}, keys.ahead());
-        keys.enterRest();
-    }
-}
-
-/// Strips of equal widths, whole vectors but for the last.
-template <class T, class D, int reach, class MakeRow>
-void makeStrips(const BorderedImage& image, Image<D> dst, MakeRow makeRow) {
-    constexpr int32_t kUnit = kernels::kPatternBlock, kMost = kStripBytes / elementBytes<T>;
-    const int32_t strips = (image.size.width - 1) / kMost + 1;
-    const auto width = static_cast<int32_t>(roundUp((int64_t{image.size.width} + strips - 1) / strips, kUnit));
+/// Strips of equal widths, whole vectors but for the last: makeStrip(strip, its destination).
+template <class D, class MakeStrip>
+void makeStrips(const BorderedImage& image, Image<D> dst, int32_t most, MakeStrip makeStrip) {
+    const int32_t strips = (image.size.width - 1) / most + 1;
+    const auto width = static_cast<int32_t>(
+        roundUp((int64_t{image.size.width} + strips - 1) / strips, int32_t{kernels::kPatternBlock}));
     for (int64_t x = 0; x < image.size.width; x += width) {
         BorderedImage strip = image;
         strip.origin = image.pixel(static_cast<int32_t>(x), 0);
         strip.size.width = static_cast<int32_t>(std::min(int64_t{width}, image.size.width - x));
         strip.rule.open.left |= x > 0;
         strip.rule.open.right |= x + strip.size.width < image.size.width;
-        makeStrip<T, D, reach>(strip, {advance(dst.data, static_cast<ptrdiff_t>(x) * elementBytes<D>), dst.step},
-                               makeRow);
+        makeStrip(strip, Image<D>{advance(dst.data, static_cast<ptrdiff_t>(x) * elementBytes<D>), dst.step});
     }
 }
 
-/// rowMaker<streaming>() gives what makes a row.
-template <int reach, class T, class D, class RowMaker>
-QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value, RowMaker rowMaker) {
+/// A kernel makes a row from the rows of keys around it.
+template <class T, int reach, class D, class MakeRow>
+void makeFromKeys(const BorderedImage& image, Image<D> dst, MakeRow makeRow) {
+    makeStrips(image, dst, kStripBytes / elementBytes<T>, [&](const BorderedImage& strip, Image<D> to) {
+        KeyRows<T, reach> keys(strip);
+        for (int32_t y = 0; y < strip.size.height; ++y) {
+            const kernels::PatternKey<T>* rows[2 * reach + 1];
+            keys.rowsAround(y, rows);
+            makeRow(rows, to.row(y), ptrdiff_t{strip.size.width}, keys.ahead());
+            keys.enterRest();
+        }
+    });
+}
+
+/// maker<streaming>() gives what makes the image.
+template <class T, class D, class Maker>
+QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value, Maker maker) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const BorderedImage image{asBytes(src.data), src.step, roi, elementBytes<T>,
                               BorderRule::withMirror(Border::of(borderType), &value)};
     const bool isAligned = (reinterpret_cast<uintptr_t>(dst.data) | static_cast<uintptr_t>(dst.step)) % 32 == 0;
     return underControlOf<T>([&] {
         if (isAligned && streams(streamRules::copy, traffic(roi, elementBytes<T> + elementBytes<D>))) {
-            makeStrips<T, D, reach>(image, dst, rowMaker.template operator()<true>());
+            maker.template operator()<true>()(image, dst);
             streamFence();
         } else {
-            makeStrips<T, D, reach>(image, dst, rowMaker.template operator()<false>());
+            maker.template operator()<false>()(image, dst);
         }
         return QOR_OK;
     });
@@ -155,9 +157,18 @@ QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t border
 
 template <int mode, int reach, class T, class D>
 QorResult lbpOfMode(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value) {
-    return lbp<reach>(src, dst, roi, borderType, value, []<bool streaming>() {
-        return [](const kernels::PatternKey<T>* const* rows, D* to, ptrdiff_t width, auto ahead) {
-            kernels::patternRow<D, reach, mode, streaming>(rows, to, width, ahead);
+    return lbp(src, dst, roi, borderType, value, []<bool streaming>() {
+        return [](const BorderedImage& image, Image<D> to) {
+            if constexpr (std::is_floating_point_v<T> || sizeof(D) == 1) {
+                using InPlace = InPlacePatterns<T, D, reach, mode, streaming>;
+                if (image.size.width >= InPlace::kLeast)
+                    return makeStrips(image, to, InPlace::kStripPixels,
+                                      [](const BorderedImage& strip, Image<D> part) { InPlace(strip).make(part); });
+            }
+            makeFromKeys<T, reach>(image, to,
+                                   [](const kernels::PatternKey<T>* const* rows, D* row, ptrdiff_t width, auto ahead) {
+                                       kernels::patternRow<D, reach, mode, streaming>(rows, row, width, ahead);
+                                   });
         };
     });
 }
@@ -175,12 +186,14 @@ QorResult lbpImage(Image<const T> src, Image<D> dst, QorImageSize roi, uint8_t m
 template <class T>
 QorResult lbpImageHorizCorr(Image<const T> src, Image<uint8_t> dst, QorImageSize roi, int32_t borderType, T value) {
     using Key = kernels::PatternKey<T>;
-    return lbp<1>(src, dst, roi, borderType, value, []<bool streaming>() {
-        return [](const Key* const* rows, uint8_t* to, ptrdiff_t width, auto ahead) {
-            constexpr ptrdiff_t kAhead = 16;
-            alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
-            kernels::patternColumnSums(rows, sums + kAhead, width);
-            kernels::correctedPatternRow<streaming>(rows, sums + kAhead, to, width, ahead);
+    return lbp(src, dst, roi, borderType, value, []<bool streaming>() {
+        return [](const BorderedImage& image, Image<uint8_t> to) {
+            makeFromKeys<T, 1>(image, to, [](const Key* const* rows, uint8_t* row, ptrdiff_t width, auto ahead) {
+                constexpr ptrdiff_t kAhead = 16;
+                alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
+                kernels::patternColumnSums(rows, sums + kAhead, width);
+                kernels::correctedPatternRow<streaming>(rows, sums + kAhead, row, width, ahead);
+            });
         };
     });
 }

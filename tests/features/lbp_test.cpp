@@ -102,7 +102,10 @@ void sweepPatterns(int reach, int bytesPerPixel, const char* name, Check check) 
             for (int width = 1; width <= 4; ++width)
                 for (int height = 1; height <= 4; ++height)
                     check(Job{{.width = width, .height = height, .padding = 1}, reach, kind | sides});
-    for (int width : {1023, 1024, 1025, 2048, 4095, 4096, 4097, 4100, 8200})  // strips
+    for (int width : {63, 64, 65, 66, 97})  // made in place, some rows at a time
+        for (int height : {1, 3, 8, 31, 34, 65})
+            check(Job{{.width = width, .height = height, .padding = random().below(3)}, reach, drawBorder()});
+    for (int width : {1023, 1024, 1025, 2048, 4095, 4096, 4097, 4100, 8200, 16390})  // strips
         check(Job{{.width = width, .height = 4}, reach, drawBorder()});
     check(Job{{.width = 70, .height = 9, .padding = 3, .flipped = true}, reach, drawBorder()});
     forStreamingChoices(bytesPerPixel, 1 << 20, [&](const Shape& shape) { check(Job{shape, reach, drawBorder()}); });

@@ -1,6 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 // Warps as their callers set them up: queries, plan, buffers of exactly the reported sizes against guard pages.
 #pragma once
+#ifndef _WIN32
+#include <sys/mman.h>
+#endif
+
 #include <cmath>
 #include <numbers>
 
@@ -125,5 +129,40 @@ struct WarpSource {
         return image.view<T>(channels).get(before + x, before + y, c);
     }
 };
+
+/// Where a warp reads.
+template <class T>
+struct ReadAt {
+    const T* origin;
+    int32_t step;
+};
+
+#ifndef _WIN32
+/// The rows of a source half a gigabyte apart, in memory that is there where it is touched: from the fifth row on, byte
+/// offsets leave 32 bits.
+class FarRows {
+public:
+    static constexpr int32_t kStep = (1 << 29) + 64;
+
+    FarRows(const uint8_t* first, ptrdiff_t step, int rows, size_t rowBytes)
+        : size_(static_cast<size_t>(rows) * kStep),
+          begin_(mmap(nullptr, size_, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS | MAP_NORESERVE, -1, 0)) {
+        if (exists())
+            for (int y = 0; y < rows; ++y) std::memcpy(row(y), first + y * step, rowBytes);
+    }
+    ~FarRows() {
+        if (exists()) munmap(begin_, size_);
+    }
+    FarRows(const FarRows&) = delete;
+    FarRows& operator=(const FarRows&) = delete;
+
+    bool exists() const { return begin_ != MAP_FAILED; }
+    uint8_t* row(int y) const { return static_cast<uint8_t*>(begin_) + ptrdiff_t{y} * kStep; }
+
+private:
+    size_t size_;
+    void* begin_;
+};
+#endif
 
 }  // namespace qori::test

@@ -102,9 +102,8 @@ std::vector<QorImageRect> warpTiles(QorImageSize size) {
 }
 
 template <class T, int channels, class Function>
-void checkWarp(Function function, const WarpJob& job) {
+void checkWarp(Function function, const WarpJob& job, const WarpSource<T, channels>& source, ReadAt<T> at) {
     SCOPED_TRACE(describe(job));
-    const WarpSource<T, channels> source(job);
     const Snapshot sourceBefore = source.image.snapshot();
     const auto [plan, status] = makeWarpPlan(job, kTypeCode<T>, channels);
     ASSERT_TRUE(status == QOR_OK || (status == QOR_WARN_WARP_EMPTY && job.readsAll())) << status;
@@ -118,8 +117,8 @@ void checkWarp(Function function, const WarpJob& job) {
     const Snapshot clean = dst.snapshot();
     dst.fill<T>(channels, drawPixel<T>);
     const Snapshot before = dst.snapshot();
-    ASSERT_EQ(status, call(function, source.origin(), source.image.step(), dst.data<T>(), dst.step(), QorPoint2D{0, 0},
-                           job.dst, static_cast<const QorWarpPlan*>(plan), makeWarpBuffer(plan, job.dst)));
+    ASSERT_EQ(status, call(function, at.origin, at.step, dst.data<T>(), dst.step(), QorPoint2D{0, 0}, job.dst,
+                           static_cast<const QorWarpPlan*>(plan), makeWarpBuffer(plan, job.dst)));
     expectImage(job, source, before, dst);
     QORI_EXPECT_UNCHANGED(source.image, sourceBefore);
     // In tiles, from where the whole began: the same bytes.
@@ -135,12 +134,11 @@ void checkWarp(Function function, const WarpJob& job) {
         const bool atEdge = tile.x + tile.width == job.dst.width && exceeds;
         const QorImageSize size{tile.width + (atEdge ? 1 + random().below(50) : 0), tile.height};
         auto* to = dst.data<uint8_t>() + ptrdiff_t{dst.step()} * tile.y + ptrdiff_t{int{sizeof(T)} * channels} * tile.x;
-        ASSERT_EQ(
-            status != QOR_OK ? status
-            : atEdge         ? QOR_WARN_ADJUSTED
-                             : QOR_OK,
-            call(function, source.origin(), source.image.step(), reinterpret_cast<T*>(to), dst.step(),
-                 QorPoint2D{tile.x, tile.y}, size, static_cast<const QorWarpPlan*>(plan), makeWarpBuffer(plan, size)));
+        ASSERT_EQ(status != QOR_OK ? status
+                  : atEdge         ? QOR_WARN_ADJUSTED
+                                   : QOR_OK,
+                  call(function, at.origin, at.step, reinterpret_cast<T*>(to), dst.step(), QorPoint2D{tile.x, tile.y},
+                       size, static_cast<const QorWarpPlan*>(plan), makeWarpBuffer(plan, size)));
     }
     QORI_EXPECT_UNCHANGED(dst, whole);
     Snapshot around = whole;
@@ -150,6 +148,26 @@ void checkWarp(Function function, const WarpJob& job) {
             for (int c = 0; c < channels; ++c) blank.set(x, y, c, poison.get(x, y, c));
     EXPECT_EQ(clean.bytes, around.bytes) << "written around the destination";
 }
+
+template <class T, int channels, class Function>
+void checkWarp(Function function, const WarpJob& job) {
+    const WarpSource<T, channels> source(job);
+    checkWarp(function, job, source, {source.origin(), source.image.step()});
+}
+
+#ifndef _WIN32
+template <class T, int channels, class Function>
+void checkFarWarp(Function function, WarpJob job) {
+    job.src.height = 6 + random().below(15);
+    const WarpSource<T, channels> source(job);
+    constexpr ptrdiff_t kPixel = channels * int{sizeof(T)};
+    const int before = source.before, around = before + source.behind;
+    const FarRows rows(source.image.template data<uint8_t>(), source.image.step(), job.src.height + around,
+                       static_cast<size_t>((job.src.width + around) * kPixel));
+    ASSERT_TRUE(rows.exists());
+    checkWarp(function, job, source, {reinterpret_cast<const T*>(rows.row(before) + before * kPixel), FarRows::kStep});
+}
+#endif
 
 // --- what is drawn --------------------------------------------------------------------------------------------------
 
@@ -196,6 +214,10 @@ void sweepWarp(const char* name, Function function, const std::vector<Method>& m
     constexpr int kJobs = 60;
     for (int i = 0; i < kJobs && !testing::Test::HasFailure(); ++i)
         checkWarp<T, channels>(function, drawJob(methods[static_cast<size_t>(i) % methods.size()]));
+#ifndef _WIN32
+    for (int i = 0; i < 5 && !testing::Test::HasFailure(); ++i)
+        checkFarWarp<T, channels>(function, drawJob(methods[static_cast<size_t>(i) % methods.size()]));
+#endif
     markSwept(name);
     std::string init(name, static_cast<size_t>(std::strchr(name, '_') - name));
     init += "Init";

@@ -41,7 +41,7 @@ struct Dft {
     }
 
     /// Every width and every height to 64 (of the main layout, else some), with another that changes; factors of all
-    /// kinds, chirps in a whole side and in parts of it.
+    /// kinds, convolutions of primes and with chirps in a whole side and in parts of it.
     template <class Check>
     static void forSizes(bool isMain, Check check) {
         for (int n = 1; n <= 64; ++n) {
@@ -67,7 +67,11 @@ struct Dft {
                                   {1, 2309},
                                   {193, 2},
                                   {2, 149},
-                                  {89, 3}})
+                                  {89, 3},
+                                  {73, 2},
+                                  {214, 5},
+                                  {2003, 2},
+                                  {4001, 1}})
             check(size);
     }
 };

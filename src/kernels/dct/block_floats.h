@@ -95,8 +95,13 @@ QORI_INLINE void turnRows(FloatRows& x) {
     turnQuads(x + 4);
 }
 
+/// From registers: the compiler else sees a copy of memory, which it makes by way of general registers.
 QORI_INLINE void storeFloatRows(const FloatRows& x, float* block) {
-    for (int i = 0; i < 8; ++i) _mm256_storeu_ps(block + 8 * i, x[i]);
+    for (int i = 0; i < 8; ++i) {
+        __m256 row = x[i];
+        __asm__("" : "+x"(row));
+        _mm256_storeu_ps(block + 8 * i, row);
+    }
 }
 
 /// dst may be src.

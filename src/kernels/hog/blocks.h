@@ -2,9 +2,9 @@
 // Histograms of cells, which add up to blocks of 2 x 2 cells.
 //
 // A cell belongs to up to four blocks, in each of them at another place, and its pixels vote for the four cells of
-// each: 16 sums a bin, in two vectors, made in one pass over the pixels. A block is the sum of its cells' shares in
-// the order top-left, top-right, bottom-left, bottom-right, whichever windows it belongs to, so that it is the same bit
-// by bit wherever it is made.
+// each: 16 sums a bin, in two vectors, made in one pass over the pixels, or 4 where blocks do not overlap. A block is
+// the sum of its cells' shares in the order top-left, top-right, bottom-left, bottom-right, whichever windows it
+// belongs to, so that it is the same bit by bit wherever it is made.
 #pragma once
 #include "gradients.h"
 
@@ -20,34 +20,68 @@ struct CellShares {
     alignas(kVectorBytes) float sum[kSets][kBins][kHogSums];
 };
 
-/// Votes of size x size pixels, whose rows lie `step` pixels apart. weights: 16 floats a pixel.
-inline void sumCell(const HogVotes& votes, ptrdiff_t step, int size, int nbins, const float* weights,
-                    CellShares& shares) {
-    constexpr int half = kHogSums / 2;
+namespace hog {
+
+/// Adds weights times a vote to as many sums, each rounded once.
+template <int count>
+QORI_INLINE void addVote(float* sums, const float* weights, float vote) {
+    if constexpr (count == 4) {
+        _mm_store_ps(sums, _mm_fmadd_ps(_mm_loadu_ps(weights), _mm_set1_ps(vote), _mm_load_ps(sums)));
+    } else {
+        for (int k = 0; k < count; k += 8)
+            store(sums + k, Vec<float>{_mm256_fmadd_ps(load(weights + k).v, splat(vote).v, load(sums + k).v)});
+    }
+}
+
+/// In vectors as they are read: loads wait for two stores that they span.
+template <int count>
+QORI_INLINE void clearSums(float* sums) {
+    if constexpr (count == 4)
+        _mm_store_ps(sums, _mm_setzero_ps());
+    else
+        for (int k = 0; k < count; k += 8) store(sums + k, zero<float>());
+}
+
+template <int count>
+QORI_INLINE void addSums(float* sums, const float* more) {
+    if constexpr (count == 4)
+        _mm_store_ps(sums, _mm_add_ps(_mm_load_ps(sums), _mm_load_ps(more)));
+    else
+        for (int k = 0; k < count; k += 8) store(sums + k, load(sums + k) + load(more + k));
+}
+
+/// `count` sums of each bin, from the k-th on.
+template <int count>
+QORI_INLINE void sumCell(const HogVotes& votes, ptrdiff_t step, int size, int nbins, const float* weights,
+                         CellShares& shares, int k) {
     for (auto& set : shares.sum)
-        for (int bin = 0; bin <= nbins; ++bin)
-            for (int k = 0; k < kHogSums; k += half) store(set[bin] + k, zero<float>());
+        for (int bin = 0; bin <= nbins; ++bin) clearSums<count>(set[bin] + k);
+    weights += k;
     for (int y = 0; y < size; ++y) {
         const HogVotes row = votes.from(y * step);
         for (int x = 0; x < size; ++x, weights += kHogSums) {
             // Whatever a caller whose images overlap the buffer has made of it, no bin is beyond the last.
-            float* const sums = shares.sum[x % CellShares::kSets][row.bin[x] & (CellShares::kMostBins - 1)];
-            const Vec<float> first = splat(row.first[x]), second = splat(row.second[x]);
-            const Vec<float> low = load(weights), high = load(weights + half);
-            const auto add = [&](int at, Vec<float> weight, Vec<float> vote) {
-                store(sums + at, Vec<float>{_mm256_fmadd_ps(weight.v, vote.v, load(sums + at).v)});
-            };
-            add(0, low, first);
-            add(half, high, first);
-            add(kHogSums, low, second);
-            add(kHogSums + half, high, second);
+            float* const sums = shares.sum[x % CellShares::kSets][row.bin[x] & (CellShares::kMostBins - 1)] + k;
+            addVote<count>(sums, weights, row.first[x]);
+            addVote<count>(sums + kHogSums, weights, row.second[x]);
         }
     }
-    for (int k = 0; k < kHogSums; k += half) {
-        for (int bin = 0; bin <= nbins; ++bin)
-            store(shares.sum[0][bin] + k, load(shares.sum[0][bin] + k) + load(shares.sum[1][bin] + k));
-        store(shares.sum[0][0] + k, load(shares.sum[0][0] + k) + load(shares.sum[0][nbins] + k));
-    }
+    for (int bin = 0; bin <= nbins; ++bin) addSums<count>(shares.sum[0][bin] + k, shares.sum[1][bin] + k);
+    addSums<count>(shares.sum[0][0] + k, shares.sum[0][nbins] + k);
+}
+
+}  // namespace hog
+
+/// Votes of size x size pixels, whose rows lie `step` pixels apart. weights: kHogSums floats a pixel.
+inline void sumCell(const HogVotes& votes, ptrdiff_t step, int size, int nbins, const float* weights,
+                    CellShares& shares) {
+    hog::sumCell<kHogSums>(votes, step, size, nbins, weights, shares, 0);
+}
+
+/// The same of a cell that has but one place in blocks, whose share alone is made.
+inline void sumCellAt(int place, const HogVotes& votes, ptrdiff_t step, int size, int nbins, const float* weights,
+                      CellShares& shares) {
+    hog::sumCell<4>(votes, step, size, nbins, weights, shares, 4 * place);
 }
 
 /// The cell's share of the block in which it has a place (0 to 3), as four cells by bin. The first one begins the

@@ -6,7 +6,7 @@
 //
 // A block's truths are packed to a byte for each of 32 pixels, 0 or 255, in whatever order packing leaves them; the
 // order is put right once, at the end. Bits are joined in two ways, to keep all ports of the processor busy: the upper
-// five by averages, which shift a sum to the right and enter a truth on its left, the lower three by additions.
+// ones by averages, which shift a sum to the right and enter a truth on its left, the lower ones by additions.
 #pragma once
 #include "kernels/copy_rows.h"
 #include "kernels/vector_math.h"
@@ -64,21 +64,32 @@ QORI_INLINE Bytes truths(const KeyBlock<Key>& centre, const KeyBlock<Key>& neigh
         return {_mm256_packs_epi16(_mm256_packs_epi32(truth[0], truth[1]), _mm256_packs_epi32(truth[2], truth[3]))};
 }
 
+/// Bits from this one on enter by averages.
+template <class Key>
+constexpr int kFirstAveraged = isFloat<Key> ? 3 : 2;
+
 /// Bits 0 to 7 as a code, of pixels in order. truthOf.operator()<bit>() makes the truths of a bit. An average is
-/// (a + b + 1) / 2: of an even sum and 0 its half, of an even sum and 255 its half and 128; the fifth sum is a multiple
-/// of 8 still.
+/// (a + b + 1) / 2: of an even sum and 0 its half, of an even sum and 255 its half and 128; the sum before the last one
+/// is even still. Truths of integers are those of bits that are not set, and the complement of them all costs nothing:
+/// what the first average has beside its bit is 1 at the end, and 0 - 1 - bits is 255 - bits.
 template <class Key, class TruthOf>
 QORI_INLINE Bytes joinBits(TruthOf truthOf) {
-    const auto enter = [](Bytes sum, Bytes truth) { return Bytes{_mm256_avg_epu8(sum.v, truth.v)}; };
-    Bytes upper = truthOf.template operator()<3>() & splat<uint8_t>(128);
-    upper = enter(upper, truthOf.template operator()<4>());
-    upper = enter(upper, truthOf.template operator()<5>());
-    upper = enter(upper, truthOf.template operator()<6>());
-    upper = enter(upper, truthOf.template operator()<7>());
-    Bytes lower = truthOf.template operator()<2>();  // negative: a truth counts as -1
-    lower = lower + lower + truthOf.template operator()<1>();
+    constexpr int first = kFirstAveraged<Key>;
+    const auto average = [](Bytes a, Bytes b) { return Bytes{_mm256_avg_epu8(a.v, b.v)}; };
+    const Bytes begin = truthOf.template operator()<first>();
+    Bytes upper = isFloat<Key> ? begin & splat<uint8_t>(128) : average(begin, splat<uint8_t>(2 << (7 - first)));
+    if constexpr (first == 2) upper = average(upper, truthOf.template operator()<3>());
+    upper = average(upper, truthOf.template operator()<4>());
+    upper = average(upper, truthOf.template operator()<5>());
+    upper = average(upper, truthOf.template operator()<6>());
+    upper = average(upper, truthOf.template operator()<7>());
+    Bytes lower = truthOf.template operator()<1>();  // negative: a truth counts as -1
+    if constexpr (first == 3) {
+        const Bytes third = truthOf.template operator()<2>();
+        lower = third + third + lower;
+    }
     lower = lower + lower + truthOf.template operator()<0>();
-    const Bytes codes = isFloat<Key> ? upper - lower : lower - upper + splat<uint8_t>(255);
+    const Bytes codes = isFloat<Key> ? upper - lower : lower - upper;
     if constexpr (sizeof(Key) == 1)
         return codes;
     else if constexpr (sizeof(Key) == 2)
@@ -108,12 +119,23 @@ constexpr Place placeOfBit(int bit, int count, int reach, int mode) {
     return onRing((first + (mode % 2 == 1 ? bit : count - bit)) % count, count, reach);
 }
 
+/// The rows that a window sees, or its columns. Stores of codes cannot alias this copy.
+template <class Key, int reach>
+struct RowsAround {
+    const Key* at[2 * reach + 1];
+
+    QORI_INLINE explicit RowsAround(const Key* const* rows) {
+        for (int i = 0; i < 2 * reach + 1; ++i) at[i] = rows[i];
+    }
+};
+
 /// Eight bits of the code, from firstBit on.
-template <class Key, int count, int reach, int mode, int firstBit>
-QORI_INLINE Bytes eightBits(const Key* const* rows, const KeyBlock<Key>& centre, ptrdiff_t x) {
+template <int count, int reach, int mode, int firstBit, bool byColumns, class Key>
+QORI_INLINE Bytes eightBits(const RowsAround<Key, reach>& rows, const KeyBlock<Key>& centre, ptrdiff_t x) {
     return joinBits<Key>([&]<int bit>() __attribute__((always_inline)) {
         constexpr Place place = placeOfBit(firstBit + bit, count, reach, mode);
-        return truths(centre, KeyBlock<Key>(rows[reach + place.dy] + x + place.dx));
+        constexpr int row = byColumns ? place.dx : place.dy, column = byColumns ? place.dy : place.dx;
+        return truths(centre, KeyBlock<Key>(rows.at[reach + row] + x + column));
     });
 }
 
@@ -139,6 +161,18 @@ QORI_INLINE void storeCodes(uint16_t* dst, Bytes low, Bytes high, ptrdiff_t n) {
         storeUpTo(dst, first, n);
         storeUpTo(dst + half, second, n - half);
     }
+}
+
+/// A block of codes, or its first n, of `count` neighbours on the square ring of radius `reach`, 8 or 16 of them.
+template <class D, int reach, int mode, bool streaming, bool byColumns = false, class Key>
+QORI_INLINE void patternBlock(const RowsAround<Key, reach>& rows, D* dst, ptrdiff_t x, ptrdiff_t n) {
+    constexpr int count = 8 * static_cast<int>(sizeof(D));
+    const KeyBlock<Key> centre(rows.at[reach] + x);
+    const Bytes low = eightBits<count, reach, mode, 0, byColumns>(rows, centre, x);
+    if constexpr (count == 8)
+        storeCodes<streaming>(dst, low, n);
+    else
+        storeCodes<streaming>(dst, low, eightBits<count, reach, mode, 8, byColumns>(rows, centre, x), n);
 }
 
 }  // namespace lbp
@@ -200,22 +234,13 @@ QORI_INLINE void forEachBlock(ptrdiff_t width, const Ahead& ahead, MakeBlock mak
 
 }  // namespace lbp
 
-/// One row of codes of `count` neighbours on the square ring of radius `reach`, 8 or 16 of them. rows: at the first
-/// pixel, from `reach` above to `reach` below. Streaming: dst is 32-byte aligned.
+/// One row of codes. rows: at the first pixel, from `reach` above to `reach` below. Streaming: dst is 32-byte aligned.
 template <class D, int reach, int mode, bool streaming, class Key, class Ahead>
 void patternRow(const Key* const* rowsAround, D* dst, ptrdiff_t width, Ahead ahead) {
-    constexpr int count = 8 * static_cast<int>(sizeof(D));
-    const Key* rows[2 * reach + 1];  // stores of codes cannot alias this copy
-    for (int i = 0; i < 2 * reach + 1; ++i) rows[i] = rowsAround[i];
+    const lbp::RowsAround<Key, reach> rows(rowsAround);
     lbp::forEachBlock(
         width, ahead, [&](ptrdiff_t x, ptrdiff_t n) __attribute__((always_inline)) {
-            const lbp::KeyBlock<Key> centre(rows[reach] + x);
-            const Bytes low = lbp::eightBits<Key, count, reach, mode, 0>(rows, centre, x);
-            if constexpr (count == 8)
-                lbp::storeCodes<streaming>(dst + x, low, n);
-            else
-                lbp::storeCodes<streaming>(dst + x, low, lbp::eightBits<Key, count, reach, mode, 8>(rows, centre, x),
-                                           n);
+            lbp::patternBlock<D, reach, mode, streaming>(rows, dst + x, x, n);
         });
 }
 

@@ -118,9 +118,21 @@ QORI_INLINE void butterfly(ComplexLineOf<T> (&a)[8]) {
     a[7] = {negMulAdd(d.im, half, u1.re), mulAdd(d.re, half, u1.im)};
 }
 
+/// Of 3 points: products with the sine join the sums unrounded. turns: the cosine and the sine of a third of a turn.
+template <class T>
+QORI_INLINE void butterfly3(ComplexLineOf<T> (&a)[3], const T* turns) {
+    const ComplexLineOf<T> s = a[1] + a[2], d = a[1] - a[2];
+    const ComplexLineOf<T> even = mulAdd(s, splat(turns[0]), a[0]);
+    const Vec<T> sine = splat(turns[1]);
+    a[0] = a[0] + s;
+    a[1] = {mulAdd(d.im, sine, even.re), negMulAdd(d.re, sine, even.im)};
+    a[2] = {negMulAdd(d.im, sine, even.re), mulAdd(d.re, sine, even.im)};
+}
+
 /// Of p points, p odd: `turns` has the cosines and the sines of 2 pi k / p for 0 < k <= (p - 1) / 2.
 template <int p, class T>
 QORI_INLINE void butterfly(ComplexLineOf<T> (&a)[p], const T* turns) {
+    if constexpr (p == 3) return butterfly3(a, turns);
     constexpr int h = p / 2;
     ComplexLineOf<T> s[h], d[h];
     for (int q = 0; q < h; ++q) {

@@ -135,7 +135,7 @@ bool isWhole(const LineColumns& columns) {
 /// Powers of two from 32 on, and their products with others where those come in between.
 bool isFusible(const FourierTable& table) {
     const int32_t stages = table.stageCount;
-    return stages >= 2 && table.chirpPoints == 1 && table.stages[stages - 1].radix == 8 &&
+    return stages >= 2 && table.convolvedPoints == 1 && table.stages[stages - 1].radix == 8 &&
            (table.stages[0].radix == 8 || table.stages[0].radix == 4);
 }
 

@@ -36,9 +36,10 @@ QORI_INLINE void primeFrequencies(const PrimeSums& a, int half, int m, const flo
     }
 }
 
-/// A prime above those that have a kernel of their own.
-QORI_NOINLINE void passAnyPrime(float* lines, ptrdiff_t blocks, ptrdiff_t part, int radix, const float* turns,
-                                const float* twiddles) {
+/// A prime above those that have a kernel of their own. The way back has its twiddles before the sums.
+template <bool isBack>
+QORI_NOINLINE void passPrime(float* lines, ptrdiff_t blocks, ptrdiff_t part, int radix, const float* turns,
+                             const float* twiddles) {
     const ptrdiff_t apart = part * kLineFloats;
     const int half = radix / 2;
     PrimeSums a;
@@ -46,18 +47,21 @@ QORI_NOINLINE void passAnyPrime(float* lines, ptrdiff_t blocks, ptrdiff_t part, 
         const float* w = twiddles;
         for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
             float* const x = lines + j * kLineFloats;
+            const auto at = [=](int p) {
+                const ComplexLine y = line::loadLine(x + p * apart);
+                return isBack ? line::times(y, w + 2 * p - 2) : y;
+            };
             a.first = line::loadLine(x);
             ComplexLine total = a.first;
             for (int q = 0; q < half; ++q) {
-                const ComplexLine y = line::loadLine(x + (q + 1) * apart);
-                const ComplexLine z = line::loadLine(x + (radix - 1 - q) * apart);
+                const ComplexLine y = at(q + 1), z = at(radix - 1 - q);
                 a.sum[q] = line::operator+(y, z);
                 a.difference[q] = line::operator-(y, z);
                 total = line::operator+(total, a.sum[q]);
             }
             line::storeLine(x, total);
             const auto put = [=](int p, ComplexLine f) {
-                line::storeLine(x + p * apart, twiddles == nullptr ? f : line::times(f, w + 2 * p - 2));
+                line::storeLine(x + p * apart, isBack || twiddles == nullptr ? f : line::times(f, w + 2 * p - 2));
             };
             int m = 1;
             for (; m + 2 <= half; m += 3) primeFrequencies<3>(a, half, m, turns, put);
@@ -88,8 +92,13 @@ void line::runStage(const FourierTable& table, const FourierTable::Stage& stage,
         case 5: return passOf<5>(lines, blocks, part, turns, twiddles);
         case 7: return passOf<7>(lines, blocks, part, turns, twiddles);
         case 8: return passOf<8>(lines, blocks, part, turns, twiddles);
-        default: return passAnyPrime(lines, blocks, part, stage.radix, turns, twiddles);
+        default: return passPrime<false>(lines, blocks, part, stage.radix, turns, twiddles);
     }
+}
+
+void line::passBackPrime(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks) {
+    passPrime<true>(lines, blocks, stage.length / stage.radix, stage.radix, table.at<float>(stage.turns),
+                    table.at<float>(stage.twiddles));
 }
 
 namespace {
@@ -106,9 +115,9 @@ void transformBlock(const FourierTable& table, int32_t first, float* lines, ptrd
     }
     for (; first < table.stageCount; ++first)
         line::runStage(table, table.stages[first], lines, points / table.stages[first].length);
-    if (table.chirpPoints > 1)
-        for (ptrdiff_t i = 0; i < points; i += table.chirpPoints)
-            line::convolveWithChirp(table, lines + i * kLineFloats, work);
+    if (table.convolvedPoints > 1)
+        for (ptrdiff_t i = 0; i < points; i += table.convolvedPoints)
+            line::transformByConvolution(table, lines + i * kLineFloats, work);
 }
 
 QORI_INLINE float* lineAt(float* lines, int32_t position) { return lines + ptrdiff_t{position} * kLineFloats; }

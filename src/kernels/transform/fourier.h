@@ -28,7 +28,7 @@
 
 namespace qori::kernels {
 
-/// Primes up to this one are summed as they stand; beyond, a convolution with a chirp costs less.
+/// Primes up to this one are summed as they stand; beyond, a convolution costs less.
 inline constexpr int kMostPrimeFactor = 97;
 
 struct FourierTable {
@@ -42,10 +42,12 @@ struct FourierTable {
     };
 
     int32_t points, stageCount;
-    /// The length of the blocks that the stages leave; above 1 it is a product of large primes, and each block is
-    /// convolved with a chirp, by transforms of the table at `inner`.
-    int32_t chirpPoints;
-    int32_t positionsAt, chirpAt, spectrumAt, inner;
+    /// The length of the blocks that the stages leave; above 1 it is a prime whose predecessor has small factors
+    /// (isRotated), or a product of large primes. Each block is convolved, with roots of unity in the order of a
+    /// generator's powers or with a chirp, by transforms of the table at `inner`.
+    int32_t convolvedPoints;
+    bool isRotated;
+    int32_t positionsAt, factorsAt, spectrumAt, inner;
     Stage stages[kMostStages];
 
     const int32_t* positions() const { return at<int32_t>(positionsAt); }

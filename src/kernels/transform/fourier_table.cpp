@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Tables of transforms: factors of the length, twiddles, the order of frequencies, chirps.
+// Tables of transforms: factors of the length, twiddles, the order of frequencies, what blocks are convolved with.
 #include <initializer_list>
 
 #include "fourier.h"
@@ -11,30 +11,58 @@ namespace {
 /// Lengths up to this one make every root anew and take no memory for it.
 constexpr int64_t kMostWithoutMemory = 1024;
 
+/// Convolutions up to this length, those of primes that could be summed, take none either.
+constexpr int64_t kMostSmall = kMostPrimeFactor - 1;
+
 constexpr int64_t inLines(int64_t bytes) { return (bytes + kLineBytes - 1) / kLineBytes * kLineBytes; }
+
+constexpr bool isPrime(int64_t n) {
+    for (int64_t i = 3; i * i <= n; i += 2)
+        if (n % i == 0) return false;
+    return true;
+}
+
+/// Calls each(prime) for the prime factors of n up to a bound, as often as they divide it; returns what is left.
+template <class Each>
+constexpr int64_t forPrimeFactors(int64_t n, int64_t bound, Each each) {
+    for (int64_t prime = 2; prime <= bound; ++prime)
+        for (; n % prime == 0; n /= prime) each(prime);
+    return n;
+}
+
+/// Primes whose predecessor's factors without kernels of their own have a small sum are convolved: a stage of radix q
+/// costs about 2 q a point, forth and back, a convolution with a chirp 200 to 300 points' worth of vector operations
+/// for each of its own. Primes that could be summed, (p - 1)^2 / 2 operations, gain from 61 on where that sum is next
+/// to nothing.
+constexpr int64_t kLeastRotated = 61, kMostSum = 45, kMostSumOfSummed = 13;
+constexpr bool isRotatable(int64_t n) {
+    if (n < kLeastRotated) return false;
+    const int64_t most = n <= kMostPrimeFactor ? kMostSumOfSummed : kMostSum;
+    int64_t sum = 0;
+    const int64_t left = forPrimeFactors(n - 1, most, [&](int64_t prime) { sum += prime > 7 ? prime : 0; });
+    return left == 1 && sum <= most && isPrime(n);
+}
 
 struct Factors {
     int32_t radix[FourierTable::kMostStages];
     int32_t count = 0;
-    int64_t chirp;
+    int64_t convolved;
 
     /// Odd primes from the largest, then a 2 or 4s, then 8s, of which the last has no twiddles.
-    explicit Factors(int64_t n) : chirp(n) {
+    explicit Factors(int64_t n) : convolved(n) {
         for (int32_t prime = kMostPrimeFactor; prime >= 3; prime -= 2)
             if (isPrime(prime))
-                for (; chirp % prime == 0; chirp /= prime) radix[count++] = prime;
+                for (; convolved % prime == 0; convolved /= prime) radix[count++] = prime;
         int32_t twos = 0;
-        for (; chirp % 2 == 0; chirp /= 2) ++twos;
+        for (; convolved % 2 == 0; convolved /= 2) ++twos;
+        if (convolved == 1 && count > 0 && isRotatable(radix[0])) {
+            convolved = radix[0];
+            for (int32_t i = 1; i < count; ++i) radix[i - 1] = radix[i];
+            --count;
+        }
         if (twos == 1) radix[count++] = 2, twos = 0;
         for (; twos % 3 != 0; twos -= 2) radix[count++] = 4;
         for (; twos > 0; twos -= 3) radix[count++] = 8;
-    }
-
-private:
-    static constexpr bool isPrime(int32_t n) {
-        for (int32_t i = 3; i * i <= n; i += 2)
-            if (n % i == 0) return false;
-        return true;
     }
 };
 
@@ -63,7 +91,8 @@ struct FourierLayout {
         const Factors factors(n);
         table.points = static_cast<int32_t>(n);
         table.stageCount = factors.count;
-        table.chirpPoints = static_cast<int32_t>(factors.chirp);
+        table.convolvedPoints = static_cast<int32_t>(factors.convolved);
+        table.isRotated = isRotatable(factors.convolved);
         int64_t length = n;
         for (int32_t i = 0; i < factors.count; ++i) {
             const int32_t radix = factors.radix[i];
@@ -75,9 +104,9 @@ struct FourierLayout {
             length /= radix;
         }
         table.positionsAt = add(4 * n);
-        if (factors.chirp == 1) return;
-        convolution = convolutionPoints(factors.chirp);
-        table.chirpAt = add(8 * factors.chirp);
+        if (factors.convolved == 1) return;
+        convolution = table.isRotated ? factors.convolved - 1 : convolutionPoints(factors.convolved);
+        table.factorsAt = add(8 * factors.convolved);
         table.spectrumAt = add(8 * convolution);
         table.inner = add(FourierLayout(convolution).bytes);
     }
@@ -134,11 +163,13 @@ void transformDoubles(const Root* in, int64_t stride, Root* out, int64_t n, cons
         *out = *in;
         return;
     }
-    const int64_t radix = n % 2 == 0 ? 2 : n % 3 == 0 ? 3 : 5, part = n / radix;
+    int64_t radix = 2;
+    while (n % radix != 0) ++radix;
+    const int64_t part = n / radix;
     for (int64_t q = 0; q < radix; ++q)
         transformDoubles(in + q * stride, stride * radix, out + q * part, part, roots, ratio * radix);
     for (int64_t k = 0; k < part; ++k) {
-        Root sum[5] = {};
+        Root sum[kMostSum] = {};
         for (int64_t p = 0; p < radix; ++p)
             for (int64_t q = 0; q < radix; ++q) {
                 const Root term = out[q * part + k] * roots(q * (k + p * part) * ratio);
@@ -148,13 +179,21 @@ void transformDoubles(const Root* in, int64_t stride, Root* out, int64_t n, cons
     }
 }
 
-/// The chirp e^(-i pi j^2 / n), and the transform of its conjugate around 0, over the convolution's length, in the
-/// order that the inner transform leaves.
-void fillChirp(FourierTable* table, int64_t convolution, uint8_t* init) {
-    const int64_t n = table->chirpPoints;
-    auto* const wave = reinterpret_cast<Root*>(init);
+/// The transform of a wave of the convolution's length, in the order that the inner transform leaves. Behind the wave
+/// is memory for the transform, and unless each root is to be made anew, for roots.
+void fillSpectrum(FourierTable* table, int64_t convolution, Root* wave) {
     Root* const spectrum = wave + convolution;
-    auto* const chirp = table->at<float>(table->chirpAt);
+    const Roots roots(convolution, convolution > kMostSmall ? spectrum + convolution : nullptr);
+    transformDoubles(wave, 1, spectrum, convolution, roots, 1);
+    const int32_t* const positions = table->at<FourierTable>(table->inner)->positions();
+    for (int64_t k = 0; k < convolution; ++k)
+        storeRoot(table->at<float>(table->spectrumAt) + 2 * ptrdiff_t{positions[k]}, spectrum[k]);
+}
+
+/// The chirp e^(-i pi j^2 / n), and of the convolution its conjugate around 0.
+void fillChirp(FourierTable* table, int64_t convolution, Root* wave) {
+    const int64_t n = table->convolvedPoints;
+    auto* const chirp = table->at<float>(table->factorsAt);
     const auto scale = 1 / static_cast<double>(convolution);
     for (int64_t j = 0; j < convolution; ++j) wave[j] = {};
     for (int64_t j = 0; j < n; ++j) {
@@ -164,11 +203,40 @@ void fillChirp(FourierTable* table, int64_t convolution, uint8_t* init) {
         wave[j] = back;
         if (j > 0) wave[convolution - j] = back;
     }
-    const Roots roots(convolution, spectrum + convolution);
-    transformDoubles(wave, 1, spectrum, convolution, roots, 1);
-    const int32_t* const positions = table->at<FourierTable>(table->inner)->positions();
-    for (int64_t k = 0; k < convolution; ++k)
-        storeRoot(table->at<float>(table->spectrumAt) + 2 * ptrdiff_t{positions[k]}, spectrum[k]);
+    fillSpectrum(table, convolution, wave);
+}
+
+/// A number whose powers modulo a rotatable prime are all but 0: none of its powers by a factor less than p - 1 is 1.
+int64_t generatorOf(int64_t p) {
+    const auto isOne = [=](int64_t base, int64_t exponent) {
+        int64_t product = 1;
+        for (; exponent > 0; exponent /= 2, base = base * base % p)
+            if (exponent % 2 == 1) product = product * base % p;
+        return product == 1;
+    };
+    for (int64_t g = 2;; ++g) {
+        bool generates = true;
+        forPrimeFactors(p - 1, kMostSum, [&](int64_t prime) { generates &= !isOne(g, (p - 1) / prime); });
+        if (generates) return g;
+    }
+}
+
+/// The powers of a generator, which say where points come from, their inverses, where frequencies go, and of the
+/// convolution the roots of unity in the inverses' order.
+void fillRotation(FourierTable* table, Root* wave) {
+    const int64_t p = table->convolvedPoints, generator = generatorOf(p);
+    auto* const powers = table->at<int32_t>(table->factorsAt);
+    auto* const inverses = powers + (p - 1);
+    const auto scale = 1 / static_cast<double>(p - 1);
+    int64_t power = 1;
+    for (int64_t k = 0; k < p - 1; ++k, power = power * generator % p) {
+        const int64_t back = k == 0 ? 0 : p - 1 - k;
+        powers[k] = static_cast<int32_t>(power);
+        inverses[back] = static_cast<int32_t>(power);
+        const Root root = rootOfUnity(power, p);
+        wave[back] = {root.re * scale, root.im * scale};
+    }
+    fillSpectrum(table, p - 1, wave);
 }
 
 }  // namespace
@@ -178,9 +246,10 @@ int64_t fourierTableBytes(int64_t n) { return FourierLayout(n).bytes; }
 int64_t fourierInitBytes(int64_t n) {
     const int64_t convolution = FourierLayout(n).convolution;
     const int64_t own = n > kMostWithoutMemory ? Roots::bytes(n) : 0;
-    const int64_t ofChirp =
-        convolution == 0 ? 0 : 2 * convolution * static_cast<int64_t>(sizeof(Root)) + Roots::bytes(convolution);
-    return own > ofChirp ? own : ofChirp;
+    const int64_t ofConvolution =
+        convolution <= kMostSmall ? 0
+                                  : 2 * convolution * static_cast<int64_t>(sizeof(Root)) + Roots::bytes(convolution);
+    return own > ofConvolution ? own : ofConvolution;
 }
 
 int64_t fourierWorkBytes(int64_t n) { return kLineBytes * FourierLayout(n).convolution; }
@@ -196,7 +265,12 @@ void makeFourierTable(FourierTable* table, int32_t n, void* init) {
     const auto points = layout.convolution;
     fillStages(inner, Roots(points, points > kMostWithoutMemory ? init : nullptr));
     fillPositions(inner);
-    fillChirp(table, points, static_cast<uint8_t*>(init));
+    Root small[2 * kMostSmall];
+    Root* const wave = points > kMostSmall ? static_cast<Root*>(init) : small;
+    if (table->isRotated)
+        fillRotation(table, wave);
+    else
+        fillChirp(table, points, wave);
 }
 
 int64_t halfRootsInitBytes(int64_t n) { return n > kMostWithoutMemory ? Roots::bytes(n) : 0; }

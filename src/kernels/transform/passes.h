@@ -43,7 +43,10 @@ QORI_NOINLINE void passBlocks(T* lines, ptrdiff_t blocks, ptrdiff_t part, const 
 /// One stage of so many blocks.
 void runStage(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
 
-/// The chirpPoints points of a block by a convolution. work: the lines of the inner transform.
-void convolveWithChirp(const FourierTable& table, float* block, float* work);
+/// A stage on the way back of a convolution, of a prime radix that has no kernel of its own: twiddles first.
+void passBackPrime(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
+
+/// The convolvedPoints points of a block. work: the lines of the inner transform.
+void transformByConvolution(const FourierTable& table, float* block, float* work);
 
 }  // namespace qori::kernels::line

@@ -26,16 +26,16 @@ QORI_INLINE Weights weightsOf(__m256i x, __m256i y) {
     return {top, _mm256_sub_epi16(across, top)};
 }
 
-/// The weighted pixels with the half that rounds.
 QORI_INLINE __m256i sumOf(__m256i top, __m256i topWeights, __m256i bottom, __m256i bottomWeights) {
-    const __m256i half = _mm256_set1_epi32(1 << (kWeightBits - 1));
-    const __m256i above = _mm256_add_epi32(_mm256_madd_epi16(top, topWeights), half);
-    return _mm256_add_epi32(above, _mm256_madd_epi16(bottom, bottomWeights));
+    return _mm256_add_epi32(_mm256_madd_epi16(top, topWeights), _mm256_madd_epi16(bottom, bottomWeights));
 }
 
-/// Of two sums, as words: the first in the lower half of each lane.
+/// Of two sums, as words: the first in the lower half of each lane. Twice the results, rounded down, and their averages
+/// with 0, which are rounded up, are the results rounded to nearest.
 QORI_INLINE __m256i joinSums(__m256i first, __m256i second) {
-    return _mm256_blend_epi16(_mm256_srli_epi32(first, kWeightBits), _mm256_slli_epi32(second, 16 - kWeightBits), 0xAA);
+    const __m256i twice = _mm256_blend_epi16(_mm256_srli_epi32(first, kWeightBits - 1),
+                                             _mm256_slli_epi32(second, 17 - kWeightBits), 0xAA);
+    return _mm256_avg_epu16(twice, _mm256_setzero_si256());
 }
 
 QORI_INLINE __m256i inBothBlocks(__m128i table) { return _mm256_broadcastsi128_si256(table); }
@@ -56,7 +56,9 @@ struct Gray {
                                  Weights weights, ptrdiff_t ahead, int n, uint8_t* dst) {
         const __m256i top = pairs(origin, offsets, shifts), bottom = pairs(origin + step, offsets, shifts);
         prefetchAhead(origin, offsets, ahead);
-        const __m256i sum = _mm256_slli_epi32(sumOf(top, weights.top, bottom, weights.bottom), 16 - kWeightBits);
+        const __m256i half = _mm256_set1_epi32(1 << (kWeightBits - 1));
+        const __m256i rounded = _mm256_add_epi32(sumOf(top, weights.top, bottom, weights.bottom), half);
+        const __m256i sum = _mm256_slli_epi32(rounded, 16 - kWeightBits);
         const __m256i third = inBothBlocks(_mm_setr_epi8(2, 6, 10, 14, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
         const __m256i packed =
             _mm256_permutevar8x32_epi32(_mm256_shuffle_epi8(sum, third), _mm256_setr_epi32(0, 4, 1, 1, 1, 1, 1, 1));

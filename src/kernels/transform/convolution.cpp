@@ -1,0 +1,228 @@
+// SPDX-License-Identifier: Apache-2.0
+// Transforms of blocks whose length has no small factors, as cyclic convolutions.
+//
+// A prime p: with a generator g of the numbers modulo p, frequency g^-m is the first point and the sum over k of
+// x(g^k) e^(-2 pi i g^(k - m) / p), a convolution of p - 1 points (Rader: Discrete Fourier transforms when the number
+// of data samples is prime, 1968). It is used where p - 1 has small factors.
+//
+// Any n: with jk = (j^2 + k^2 - (k - j)^2) / 2, the sum over j of x(j) e^(-2 pi i jk / n) is a chirp times the
+// convolution of x times the chirp with the chirp's conjugate (Bluestein: A linear filtering approach to the
+// computation of the discrete Fourier transform, 1970). That is linear, and cyclic of any length from 2 n - 1 on.
+//
+// Convolutions are transformed, multiplied by the spectrum of what does not change, transformed back through the same
+// stages from the last to the first, so that nothing is ever put in order. Between the exchanged parts of the way back
+// the stages are forward ones, with their twiddles before the butterfly.
+#include "passes.h"
+
+namespace qori::kernels {
+namespace {
+
+QORI_INLINE ComplexLine exchanged(ComplexLine a) { return {a.im, a.re}; }
+
+/// A stage back: blocks of radix * part points.
+template <int radix>
+QORI_NOINLINE void passBack(float* lines, ptrdiff_t blocks, ptrdiff_t part, const float* turns, const float* twiddles) {
+    const ptrdiff_t apart = part * kLineFloats;
+    for (ptrdiff_t block = 0; block < blocks; ++block, lines += radix * apart) {
+        const float* w = twiddles;
+        for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
+            float* const x = lines + j * kLineFloats;
+            ComplexLine a[radix];
+            a[0] = line::loadLine(x);
+            for (int p = 1; p < radix; ++p) a[p] = line::times(line::loadLine(x + p * apart), w + 2 * p - 2);
+            line::butterflyOf<radix>(a, turns);
+            for (int q = 0; q < radix; ++q) line::storeLine(x + q * apart, a[q]);
+        }
+    }
+}
+
+void stageBack(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks) {
+    const float* const turns = table.at<float>(stage.turns);
+    const float* const twiddles = table.at<float>(stage.twiddles);
+    const ptrdiff_t part = stage.length / stage.radix;
+    switch (stage.radix) {
+        case 3: return passBack<3>(lines, blocks, part, turns, twiddles);
+        case 4: return passBack<4>(lines, blocks, part, turns, twiddles);
+        case 5: return passBack<5>(lines, blocks, part, turns, twiddles);
+        case 7: return passBack<7>(lines, blocks, part, turns, twiddles);
+        case 8: return passBack<8>(lines, blocks, part, turns, twiddles);
+        default: return line::passBackPrime(table, stage, lines, blocks);
+    }
+}
+
+/// The last stage, the product with the spectrum, which is in the order of the lines, and the first stage back. With
+/// `first` the lines begin with frequency 0, the sum of the points: it is added to the first point, which was not among
+/// them, and that to all sums.
+template <int radix>
+QORI_NOINLINE void turnBack(float* lines, ptrdiff_t blocks, const float* spectrum, float* first) {
+    for (ptrdiff_t block = 0; block < blocks; ++block, lines += radix * kLineFloats, spectrum += 2 * radix) {
+        ComplexLine a[radix];
+        for (int q = 0; q < radix; ++q) a[q] = line::loadLine(lines + q * kLineFloats);
+        line::butterfly(a);
+        const ComplexLine sum = a[0];
+        for (int q = 0; q < radix; ++q) a[q] = line::times(a[q], spectrum + 2 * q);
+        if (first != nullptr) {
+            const ComplexLine x = line::loadLine(first);
+            line::storeLine(first, line::operator+(x, sum));
+            a[0] = line::operator+(a[0], x);
+            first = nullptr;
+        }
+        for (int q = 0; q < radix; ++q) a[q] = exchanged(a[q]);
+        line::butterfly(a);
+        for (int q = 0; q < radix; ++q) line::storeLine(lines + q * kLineFloats, a[q]);
+    }
+}
+
+/// A block and what it is convolved with.
+struct Convolution {
+    const FourierTable& inner;
+    const float* spectrum;
+    float* block;
+};
+
+/// Points times a chirp, which are less than half of the convolution's, 0 behind them; frequencies in order.
+struct ChirpOrder {
+    const float* chirp;
+    ptrdiff_t points;
+
+    /// How many of the parts of an outer stage hold points.
+    static constexpr int filled(int radix) { return (radix + 1) / 2; }
+    QORI_INLINE ComplexLine load(const float* block, ptrdiff_t i) const {
+        if (i >= points) return {zero<float>(), zero<float>()};
+        return line::times(line::loadLine(block + i * kLineFloats), chirp + 2 * i);
+    }
+    QORI_INLINE void store(float* block, ptrdiff_t i, ComplexLine a) const {
+        if (i < points) line::storeLine(block + i * kLineFloats, line::times(a, chirp + 2 * i));
+    }
+};
+
+/// All points but the first in the order of a generator's powers, frequencies in that of their inverses.
+struct RotatedOrder {
+    const int32_t *powers, *inverses;
+
+    static constexpr int filled(int radix) { return radix; }
+    QORI_INLINE ComplexLine load(const float* block, ptrdiff_t i) const {
+        return line::loadLine(block + ptrdiff_t{powers[i]} * kLineFloats);
+    }
+    QORI_INLINE void store(float* block, ptrdiff_t i, ComplexLine a) const {
+        line::storeLine(block + ptrdiff_t{inverses[i]} * kLineFloats, a);
+    }
+};
+
+/// The convolution's stage that is the first forth and the last back.
+template <int radix>
+struct OuterStage {
+    ptrdiff_t part;
+    const float *turns, *twiddles;
+
+    explicit OuterStage(const FourierTable& inner)
+        : part(inner.stages[0].length / radix),
+          turns(inner.at<float>(inner.stages[0].turns)),
+          twiddles(inner.at<float>(inner.stages[0].twiddles)) {}
+};
+
+/// Reads the block's points through the first stage.
+template <int radix, class Order>
+QORI_NOINLINE void enter(const Convolution& c, Order order, float* lines) {
+    const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
+    const float* w = twiddles;
+    for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
+        ComplexLine a[radix];
+        for (int q = 0; q < radix; ++q)
+            a[q] = q < Order::filled(radix) ? order.load(c.block, j + q * part)
+                                            : ComplexLine{zero<float>(), zero<float>()};
+        line::butterflyOf<radix>(a, turns);
+        line::storeLine(lines + j * kLineFloats, a[0]);
+        for (int p = 1; p < radix; ++p)
+            line::storeLine(lines + (j + p * part) * kLineFloats, line::times(a[p], w + 2 * p - 2));
+    }
+}
+
+/// The last stage back, of as many points as the block has.
+template <int radix, class Order>
+QORI_NOINLINE void leave(const Convolution& c, Order order, const float* lines) {
+    const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
+    const float* w = twiddles;
+    for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
+        ComplexLine a[radix];
+        a[0] = line::loadLine(lines + j * kLineFloats);
+        for (int p = 1; p < radix; ++p)
+            a[p] = line::times(line::loadLine(lines + (j + p * part) * kLineFloats), w + 2 * p - 2);
+        line::butterflyOf<radix>(a, turns);
+        for (int q = 0; q < Order::filled(radix); ++q) order.store(c.block, j + q * part, exchanged(a[q]));
+    }
+}
+
+/// The last stage forth and the first one back, by its radix.
+void turnBackBy(int32_t radix, float* lines, ptrdiff_t points, const float* spectrum, float* first) {
+    switch (radix) {
+        case 2: return turnBack<2>(lines, points / 2, spectrum, first);
+        case 4: return turnBack<4>(lines, points / 4, spectrum, first);
+        default: return turnBack<8>(lines, points / 8, spectrum, first);
+    }
+}
+
+/// Forth and back from a stage on. Large blocks are divided first.
+void convolveBlock(const FourierTable& inner, int32_t stage, float* lines, ptrdiff_t points, const float* spectrum,
+                   float* first) {
+    const int32_t last = inner.stageCount - 1;
+    if (stage < last && points > line::kPointsAtOnce) {
+        const FourierTable::Stage& divided = inner.stages[stage];
+        line::runStage(inner, divided, lines, 1);
+        const ptrdiff_t part = points / divided.radix;
+        for (ptrdiff_t i = 0; i < divided.radix; ++i)
+            convolveBlock(inner, stage + 1, lines + i * part * kLineFloats, part, spectrum + 2 * i * part,
+                          i == 0 ? first : nullptr);
+        return stageBack(inner, divided, lines, 1);
+    }
+    for (int32_t i = stage; i < last; ++i)
+        line::runStage(inner, inner.stages[i], lines, points / inner.stages[i].length);
+    turnBackBy(inner.stages[last].radix, lines, points, spectrum, first);
+    for (int32_t i = last - 1; i >= stage; --i)
+        stageBack(inner, inner.stages[i], lines, points / inner.stages[i].length);
+}
+
+/// first: the block's first point, where it is not among the convolution's.
+template <int radix, class Order>
+void convolveFrom(const Convolution& c, Order order, float* work, float* first) {
+    enter<radix>(c, order, work);
+    const ptrdiff_t part = c.inner.points / radix;
+    for (ptrdiff_t i = 0; i < radix; ++i)
+        convolveBlock(c.inner, 1, work + i * part * kLineFloats, part, c.spectrum + 2 * i * part,
+                      i == 0 ? first : nullptr);
+    leave<radix>(c, order, work);
+}
+
+/// Where the first radix has no kernel of its own, points are put in order before and behind all stages.
+template <class Order>
+void convolveInOrder(const Convolution& c, Order order, float* work, float* first) {
+    for (ptrdiff_t i = 0; i < c.inner.points; ++i) line::storeLine(work + i * kLineFloats, order.load(c.block, i));
+    convolveBlock(c.inner, 0, work, c.inner.points, c.spectrum, first);
+    for (ptrdiff_t i = 0; i < c.inner.points; ++i)
+        order.store(c.block, i, exchanged(line::loadLine(work + i * kLineFloats)));
+}
+
+template <class Order>
+void convolve(const Convolution& c, Order order, float* work, float* first) {
+    switch (c.inner.stages[0].radix) {
+        case 3: return convolveFrom<3>(c, order, work, first);
+        case 4: return convolveFrom<4>(c, order, work, first);
+        case 5: return convolveFrom<5>(c, order, work, first);
+        case 7: return convolveFrom<7>(c, order, work, first);
+        case 8: return convolveFrom<8>(c, order, work, first);
+        default: return convolveInOrder(c, order, work, first);
+    }
+}
+
+}  // namespace
+
+void line::transformByConvolution(const FourierTable& table, float* block, float* work) {
+    const Convolution c{*table.at<FourierTable>(table.inner), table.at<float>(table.spectrumAt), block};
+    if (table.isRotated) {
+        const auto* const powers = table.at<int32_t>(table.factorsAt);
+        return convolve(c, RotatedOrder{powers, powers + c.inner.points}, work, block);
+    }
+    convolve(c, ChirpOrder{table.at<float>(table.factorsAt), table.convolvedPoints}, work, nullptr);
+}
+
+}  // namespace qori::kernels
