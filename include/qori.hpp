@@ -5161,7 +5161,7 @@ template <unsigned k> inline auto min_0() noexcept {
 /** Smallest element of each channel. C: qoriMin. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::min_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult min(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
+[[nodiscard]] QorResult (min)(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::min_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data);
@@ -5170,7 +5170,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult min(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult (min)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
@@ -5204,7 +5204,7 @@ template <unsigned k> inline auto max_0() noexcept {
 /** Largest element of each channel. C: qoriMax. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::max_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult max(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
+[[nodiscard]] QorResult (max)(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::max_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data);
@@ -5213,7 +5213,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult (max)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);

@@ -241,6 +241,11 @@ def body(signature, choice, number):
 
 # --- functions ------------------------------------------------------------------------------------------------------
 
+def declared(operation):
+    """The name where it is declared; in parentheses it is no macro."""
+    return f"({operation})" if operation in MACROS else operation
+
+
 def wrapped(text, indent=""):
     """Lines that break behind the commas of the outermost list, so that arguments of templates stay together."""
     bound, depth = [], 0
@@ -282,7 +287,7 @@ def by_images(signature):
             weight = f", {letter}"
     key = f"detail::key<detail::In<{', '.join(ins)}>, detail::Out<{', '.join(outs)}>{weight}>"
     lines = wrapped(template_head(signature, own, key, conditions))
-    lines += wrapped(f"[[nodiscard]] QorResult {signature.operation}({', '.join(parameters)}) noexcept {{")
+    lines += wrapped(f"[[nodiscard]] QorResult {declared(signature.operation)}({', '.join(parameters)}) noexcept {{")
     return lines + alternatives(signature)
 
 
@@ -320,12 +325,13 @@ def plain(signature):
 
 
 MOST_ARGUMENTS = 10
+MACROS = ("min", "max")      # of <windows.h>, where nobody prevents them
 
 
 def otherwise(operation):
     """Takes whatever no other overload does and says what there is."""
     nothing = ", ".join(["detail::Anything = {}"] * MOST_ARGUMENTS)
-    return wrapped(f"template <bool exists = false> QorResult {operation}({nothing}) noexcept {{") + \
+    return wrapped(f"template <bool exists = false> QorResult {declared(operation)}({nothing}) noexcept {{") + \
         ["    static_assert(exists, QORI_WORDS);", "    return QOR_ERR_BAD_ARG;", "}"]
 
 
