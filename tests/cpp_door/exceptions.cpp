@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // check() with exceptions and without: built once with each, and once more of C++20.
 #define min(a, b) ((a) < (b) ? (a) : (b))  // as <windows.h> has them
 #define max(a, b) ((a) > (b) ? (a) : (b))
