@@ -483,60 +483,73 @@ private:
 inline const char* status_text(QorResult status) noexcept {
     switch (status) {
         case QOR_OK: return "Success.";
-    case QOR_WARN_NOTHING_TO_DO: return "The arguments describe an empty job; nothing is written.";
-    case QOR_WARN_DIV_BY_ZERO: return "A zero divisor was met; the affected results follow the function's division-by-zero rule, all others are computed.";
-    case QOR_WARN_LOG_ZERO: return "The logarithm of 0 was requested; that result is set to the type's minimum (-32768 for 16s) and the rest computed.";
-    case QOR_WARN_LOG_NEGATIVE: return "The logarithm of a negative value was requested; that result is set to the type's minimum and the rest computed. Of 7 and 8, the kind of the first such element in the row decides the warning.";
-    case QOR_WARN_NO_INTERSECTION: return "The requested region does not intersect the source image; nothing is written.";
-    case QOR_WARN_WARP_EMPTY: return "Rotation, shear and warp functions report that they took their early exit without writing.";
-    case QOR_WARN_EVEN_WEIGHT: return "An even centre weight was lowered by one; the work was done.";
-    case QOR_WARN_ADJUSTED: return "An argument did not fit and was trimmed or adjusted; the work was done with the adjusted value (each function states what).";
-    case QOR_ERR_BAD_ARG: return "A scalar argument outside its domain.";
-    case QOR_ERR_SIZE: return "A width or height < 1.";
-    case QOR_ERR_BAD_RANGE: return "A lower bound exceeds the upper, or levels not strictly increasing.";
-    case QOR_ERR_NULL_PTR: return "A required pointer is null.";
-    case QOR_ERR_NO_MEMORY: return "An internal allocation failed.";
-    case QOR_ERR_DIV_BY_ZERO: return "A constant divisor is zero.";
-    case QOR_ERR_OUT_OF_RANGE: return "An integer argument outside its allowed range.";
-    case QOR_ERR_DATA_TYPE: return "The numeric data-type code is not supported.";
-    case QOR_ERR_SCALE_RANGE: return "Empty scaling range.";
-    case QOR_ERR_STEP: return "A row step < 1 (or smaller than one row where checked).";
-    case QOR_ERR_ORDER: return "Transform order out of range.";
-    case QOR_ERR_FLAG: return "A flag code outside its allowed set.";
-    case QOR_ERR_CONTEXT: return "A specification or state record does not carry its identifier.";
-    case QOR_ERR_THRESHOLD: return "Lower threshold above upper threshold.";
-    case QOR_ERR_ZERO_MOMENT: return "A moment needed as divisor is zero.";
-    case QOR_ERR_FLIP_AXIS: return "Mirror axis code not 0, 1 or 2.";
-    case QOR_ERR_INTERPOLATION: return "Interpolation code not supported.";
-    case QOR_ERR_RESIZE_FACTOR: return "A resize factor <= 0.";
-    case QOR_ERR_COUNT: return "An element count < 1.";
-    case QOR_ERR_MASK_SIZE: return "Mask or kernel size not supported.";
-    case QOR_ERR_ANCHOR: return "Anchor outside the mask.";
-    case QOR_ERR_EPSILON: return "Negative tolerance.";
-    case QOR_ERR_STEP_TOO_SMALL: return "A step too small for the ROI plus the border that the function touches.";
-    case QOR_ERR_CHANNELS: return "Channel count outside 1..4.";
-    case QOR_ERR_ALPHA_TYPE: return "Alpha-composition operation code above 11.";
-    case QOR_ERR_DIVISOR: return "A kernel divisor is zero.";
-    case QOR_ERR_CHANNELS_UNSUPPORTED: return "A channel count that this function does not support.";
-    case QOR_ERR_COEFFS: return "Transform coefficients map the rectangle to a degenerate quadrangle.";
-    case QOR_ERR_RECT: return "The source rectangle spans less than one pixel.";
-    case QOR_ERR_QUAD: return "The quadrangle is degenerate (collinear or crossing vertices).";
-    case QOR_ERR_ZERO_MASK: return "The structuring mask has no non-zero element.";
-    case QOR_ERR_CHANNEL_ORDER: return "A channel index of a channel order is negative or too large.";
-    case QOR_ERR_LUT_LEVELS: return "Fewer than 2 lookup-table levels.";
-    case QOR_ERR_HIST_LEVELS: return "Fewer than 2 histogram levels.";
-    case QOR_ERR_STEP_ALIGN: return "A row step that is not a multiple of the element size.";
-    case QOR_ERR_NOISE: return "Negative noise power.";
-    case QOR_ERR_RESIZE_RATIO: return "The resize ratio is below the minimum of the chosen method.";
-    case QOR_ERR_QUALITY_UNDEFINED: return "The quality index is undefined (zero denominator); a quiet NaN is stored as the result.";
-    case QOR_ERR_WEIGHT: return "Centre weight < 1.";
-    case QOR_ERR_DECIMATION: return "Decimation fraction code not 1 to 4.";
-    case QOR_ERR_ROUND_MODE: return "Rounding-mode code not 0, 1 or 2.";
-    case QOR_ERR_BORDER: return "Border type not supported.";
-    case QOR_ERR_ODD_VALUE: return "A size or offset that must be even is odd.";
-    case QOR_ERR_ALGORITHM: return "A field of the algorithm argument outside its values.";
-    case QOR_ERR_DIRECTION: return "Transform direction code not 0 or 1.";
-    case QOR_ERR_UNSUPPORTED_MODE: return "A combination of modes that the library does not support.";
+        case QOR_WARN_NOTHING_TO_DO: return "The arguments describe an empty job; nothing is written.";
+        case QOR_WARN_DIV_BY_ZERO:
+            return "A zero divisor was met; the affected results follow the function's division-by-zero rule, all "
+                   "others are computed.";
+        case QOR_WARN_LOG_ZERO:
+            return "The logarithm of 0 was requested; that result is set to the type's minimum (-32768 for 16s) and "
+                   "the rest computed.";
+        case QOR_WARN_LOG_NEGATIVE:
+            return "The logarithm of a negative value was requested; that result is set to the type's minimum and "
+                   "the rest computed. Of 7 and 8, the kind of the first such element in the row decides the "
+                   "warning.";
+        case QOR_WARN_NO_INTERSECTION:
+            return "The requested region does not intersect the source image; nothing is written.";
+        case QOR_WARN_WARP_EMPTY:
+            return "Rotation, shear and warp functions report that they took their early exit without writing.";
+        case QOR_WARN_EVEN_WEIGHT: return "An even centre weight was lowered by one; the work was done.";
+        case QOR_WARN_ADJUSTED:
+            return "An argument did not fit and was trimmed or adjusted; the work was done with the adjusted value "
+                   "(each function states what).";
+        case QOR_ERR_BAD_ARG: return "A scalar argument outside its domain.";
+        case QOR_ERR_SIZE: return "A width or height < 1.";
+        case QOR_ERR_BAD_RANGE: return "A lower bound exceeds the upper, or levels not strictly increasing.";
+        case QOR_ERR_NULL_PTR: return "A required pointer is null.";
+        case QOR_ERR_NO_MEMORY: return "An internal allocation failed.";
+        case QOR_ERR_DIV_BY_ZERO: return "A constant divisor is zero.";
+        case QOR_ERR_OUT_OF_RANGE: return "An integer argument outside its allowed range.";
+        case QOR_ERR_DATA_TYPE: return "The numeric data-type code is not supported.";
+        case QOR_ERR_SCALE_RANGE: return "Empty scaling range.";
+        case QOR_ERR_STEP: return "A row step < 1 (or smaller than one row where checked).";
+        case QOR_ERR_ORDER: return "Transform order out of range.";
+        case QOR_ERR_FLAG: return "A flag code outside its allowed set.";
+        case QOR_ERR_CONTEXT: return "A specification or state record does not carry its identifier.";
+        case QOR_ERR_THRESHOLD: return "Lower threshold above upper threshold.";
+        case QOR_ERR_ZERO_MOMENT: return "A moment needed as divisor is zero.";
+        case QOR_ERR_FLIP_AXIS: return "Mirror axis code not 0, 1 or 2.";
+        case QOR_ERR_INTERPOLATION: return "Interpolation code not supported.";
+        case QOR_ERR_RESIZE_FACTOR: return "A resize factor <= 0.";
+        case QOR_ERR_COUNT: return "An element count < 1.";
+        case QOR_ERR_MASK_SIZE: return "Mask or kernel size not supported.";
+        case QOR_ERR_ANCHOR: return "Anchor outside the mask.";
+        case QOR_ERR_EPSILON: return "Negative tolerance.";
+        case QOR_ERR_STEP_TOO_SMALL:
+            return "A step too small for the ROI plus the border that the function touches.";
+        case QOR_ERR_CHANNELS: return "Channel count outside 1..4.";
+        case QOR_ERR_ALPHA_TYPE: return "Alpha-composition operation code above 11.";
+        case QOR_ERR_DIVISOR: return "A kernel divisor is zero.";
+        case QOR_ERR_CHANNELS_UNSUPPORTED: return "A channel count that this function does not support.";
+        case QOR_ERR_COEFFS: return "Transform coefficients map the rectangle to a degenerate quadrangle.";
+        case QOR_ERR_RECT: return "The source rectangle spans less than one pixel.";
+        case QOR_ERR_QUAD: return "The quadrangle is degenerate (collinear or crossing vertices).";
+        case QOR_ERR_ZERO_MASK: return "The structuring mask has no non-zero element.";
+        case QOR_ERR_CHANNEL_ORDER: return "A channel index of a channel order is negative or too large.";
+        case QOR_ERR_LUT_LEVELS: return "Fewer than 2 lookup-table levels.";
+        case QOR_ERR_HIST_LEVELS: return "Fewer than 2 histogram levels.";
+        case QOR_ERR_STEP_ALIGN: return "A row step that is not a multiple of the element size.";
+        case QOR_ERR_NOISE: return "Negative noise power.";
+        case QOR_ERR_RESIZE_RATIO: return "The resize ratio is below the minimum of the chosen method.";
+        case QOR_ERR_QUALITY_UNDEFINED:
+            return "The quality index is undefined (zero denominator); a quiet NaN is stored as the result.";
+        case QOR_ERR_WEIGHT: return "Centre weight < 1.";
+        case QOR_ERR_DECIMATION: return "Decimation fraction code not 1 to 4.";
+        case QOR_ERR_ROUND_MODE: return "Rounding-mode code not 0, 1 or 2.";
+        case QOR_ERR_BORDER: return "Border type not supported.";
+        case QOR_ERR_ODD_VALUE: return "A size or offset that must be even is odd.";
+        case QOR_ERR_ALGORITHM: return "A field of the algorithm argument outside its values.";
+        case QOR_ERR_DIRECTION: return "Transform direction code not 0 or 1.";
+        case QOR_ERR_UNSUPPORTED_MODE: return "A combination of modes that the library does not support.";
         default: return "A status that this header does not know.";
     }
 }
@@ -837,8 +850,8 @@ template <unsigned k> inline auto allocate_0() noexcept {
     "qori::allocate: no such call. allocate(width, height, step) of 8u, 16u, 16s, 32s, 32f, 32sc, 32fc: C1 C2 " \
     "C3 C4 AC4"
 /** Allocates an image whose rows start on 64-byte boundaries. C: qoriMalloc. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::allocate_0<k>()), bool
-    exists = false>
+template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::allocate_0<k>()),
+    bool exists = false>
 [[nodiscard]] T* allocate(int32_t width, int32_t height, int32_t* step) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::allocate_0<k>()(width, height, step);
@@ -1058,11 +1071,11 @@ template <unsigned k> inline auto add_7() noexcept {
     "[scale]) or add(in_place(a), value, [scale]) of 8u, 16u, 16s: C1 C3 C4 AC4; 16sc, 32sc: C1 C3 AC4. add(a, " \
     "b, dst) or add(in_place(b), a) or add(a, value, dst) or add(in_place(a), value) of 32f: C1 C3 C4 AC4; " \
     "32fc: C1 C3 AC4"
-/** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even. Adds constants to an image: saturate((src
- *  + value) * 2^-scaleFactor), ties to even. C: qoriAdd, qoriAddC. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::add_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool
-    exists = false>
+/** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even. Adds constants to an image:
+ *  saturate((src + value) * 2^-scaleFactor), ties to even. C: qoriAdd, qoriAddC. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::add_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1076,9 +1089,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::add_2<k>()), class F1 = decltype(detail::add_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::add_2<k>()), class F1 = decltype(detail::add_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1097,8 +1110,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1110,9 +1123,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::add_3<k>()), class F1 = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool
-    exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_3<k>()), class F1 = decltype(detail::add_1<k>()),
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1129,10 +1142,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::add_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::add_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1143,11 +1157,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::add_6<k>()), class F1 = decltype(detail::add_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>,
-    k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::add_6<k>()), class F1 = decltype(detail::add_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult add(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1163,10 +1177,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::add_5<k>()), bool exists = false>
-[[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t scale)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_5<k>()), bool exists = false>
+[[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::add_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -1175,10 +1189,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::add_7<k>()), class F1 = decltype(detail::add_5<k>()), bool exists = false>
-[[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_7<k>()), class F1 = decltype(detail::add_5<k>()), bool exists = false>
+[[nodiscard]] QorResult add(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::add_7<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1330,10 +1344,11 @@ template <unsigned k> inline auto subtract_7() noexcept {
     "16sc, 32sc: C1 C3 AC4. subtract(a, b, dst) or subtract(in_place(a), b) or subtract(a, value, dst) or " \
     "subtract(in_place(a), value) of 32f: C1 C3 C4 AC4; 32fc: C1 C3 AC4"
 /** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even. Subtracts
- *  constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even. C: qoriSub, qoriSubC. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+ *  constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even. C: qoriSub, qoriSubC. Of two
+ *  images a is the second source of C, pSrc2 or in place pSrcDst, and b the first. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1347,9 +1362,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_2<k>()), class F1 = decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_2<k>()), class F1 = decltype(detail::subtract_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1370,8 +1385,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const B& b, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1383,9 +1398,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::subtract_3<k>()), class F1 = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>>
-    = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_3<k>()), class F1 = decltype(detail::subtract_1<k>()),
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const B& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1402,10 +1417,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1417,11 +1433,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_6<k>()), class F1 = decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1,
-    2>>, k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_6<k>()), class F1 = decltype(detail::subtract_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult subtract(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1437,10 +1453,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::subtract_5<k>()), bool exists = false>
-[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t
-    scale) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_5<k>()), bool exists = false>
+[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::subtract_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -1449,10 +1465,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::subtract_7<k>()), class F1 = decltype(detail::subtract_5<k>()), bool exists = false>
-[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_7<k>()), class F1 = decltype(detail::subtract_5<k>()), bool exists = false>
+[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::subtract_7<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1605,9 +1621,9 @@ template <unsigned k> inline auto multiply_7() noexcept {
     "multiply(in_place(a), value) of 32f: C1 C3 C4 AC4; 32fc: C1 C3 AC4"
 /** Multiplies two images: saturate(src1 * src2 * 2^-scaleFactor), ties to even. Multiplies an image by constants:
  *  saturate(src * value * 2^-scaleFactor), ties to even. C: qoriMul, qoriMulC. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1621,9 +1637,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_2<k>()), class F1 = decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_2<k>()), class F1 = decltype(detail::multiply_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1644,8 +1660,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1657,9 +1673,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_3<k>()), class F1 = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>>
-    = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_3<k>()), class F1 = decltype(detail::multiply_1<k>()),
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1676,10 +1692,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1691,11 +1708,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_6<k>()), class F1 = decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1,
-    2>>, k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_6<k>()), class F1 = decltype(detail::multiply_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult multiply(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1711,10 +1728,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_5<k>()), bool exists = false>
-[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t
-    scale) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_5<k>()), bool exists = false>
+[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -1723,10 +1740,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_7<k>()), class F1 = decltype(detail::multiply_5<k>()), bool exists = false>
-[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_7<k>()), class F1 = decltype(detail::multiply_5<k>()), bool exists = false>
+[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_7<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1795,12 +1812,12 @@ template <unsigned k> inline auto multiply_fraction_3() noexcept {
 #define QORI_WORDS \
     "qori::multiply_fraction: no such call. multiply_fraction(a, b, dst) or multiply_fraction(in_place(b), a) " \
     "or multiply_fraction(a, value, dst) or multiply_fraction(in_place(a), value) of 8u, 16u: C1 C3 C4 AC4"
-/** Multiplies two images as fractions of the largest value: round(src1 * src2 / max), max 255 or 65535. Multiplies an
- *  image by constants as fractions of the maximum: round(src * value / max), max 255 or 65535. C: qoriMulScale,
+/** Multiplies two images as fractions of the largest value: round(src1 * src2 / max), max 255 or 65535. Multiplies
+ *  an image by constants as fractions of the maximum: round(src * value / max), max 255 or 65535. C: qoriMulScale,
  *  qoriMulCScale. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_fraction_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_fraction_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1814,8 +1831,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_fraction_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_fraction_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1827,11 +1844,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_fraction_2<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult multiply_fraction(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst) noexcept
-    {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_fraction_2<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult multiply_fraction(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b,
+    C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1843,10 +1860,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_fraction_3<k>()), bool exists = false>
-[[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_fraction_3<k>()), bool exists = false>
+[[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Arg<F0, 0>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_fraction_3<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -2025,13 +2042,15 @@ template <unsigned k> inline auto divide_9() noexcept {
     "C1 C3 AC4. divide(a, value, dst) or divide(in_place(a), value) or divide(a, b, dst) or divide(in_place(a)," \
     " b) of 32f: C1 C3 C4 AC4; 32fc: C1 C3 AC4. divide(a, b, dst, [rounding], [scale]) or divide(in_place(a), " \
     "b, [rounding], [scale]) of 8u, 16u, 16s: C1 C3 C4 AC4"
-/** Divides an image by constants: saturate(src / value * 2^-scaleFactor), ties to even. Divides the second image by
- *  the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even. Divides the second image by the first, rounding
- *  as told: saturate(round(src2 / src1 * 2^-scaleFactor)). C: qoriDivC, qoriDiv, qoriDiv_Round. */
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+/** Divides an image by constants: saturate(src / value * 2^-scaleFactor), ties to even. Divides the second image
+ *  by the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even. Divides the second image by the first,
+ *  rounding as told: saturate(round(src2 / src1 * 2^-scaleFactor)). C: qoriDivC, qoriDiv, qoriDiv_Round. Of two
+ *  images a is the second source of C, pSrc2 or in place pSrcDst, and b the first. */
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -2043,11 +2062,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_2<k>()), class F1 = decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>,
-    k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_2<k>()), class F1 = decltype(detail::divide_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult divide(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -2063,10 +2082,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::divide_1<k>()), bool exists = false>
-[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t scale)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_1<k>()), bool exists = false>
+[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::divide_1<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -2075,10 +2094,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::divide_3<k>()), class F1 = decltype(detail::divide_1<k>()), bool exists = false>
-[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_3<k>()), class F1 = decltype(detail::divide_1<k>()), bool exists = false>
+[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::divide_3<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -2090,9 +2109,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_4<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2106,10 +2125,10 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_6<k>()), class F1 = decltype(detail::divide_4<k>()), class F2 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_6<k>()), class F1 = decltype(detail::divide_4<k>()),
+    class F2 = decltype(detail::divide_8<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2136,8 +2155,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_5<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_5<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2149,9 +2168,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_7<k>()), class F1 = decltype(detail::divide_5<k>()), class F2 =
-    decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_7<k>()), class F1 = decltype(detail::divide_5<k>()),
+    class F2 = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2173,9 +2192,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_8<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2189,9 +2208,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_8<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2205,10 +2224,10 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding, int32_t scale) noexcept
-    {
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -2219,8 +2238,8 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2267,8 +2286,9 @@ template <unsigned k> inline auto absolute_1() noexcept {
 #define QORI_WORDS \
     "qori::absolute: no such call. absolute(src, dst) or absolute(in_place(src)) of 16s, 32f: C1 C3 C4 AC4"
 /** Takes the absolute value. C: qoriAbs. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::absolute_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::absolute_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult absolute(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2280,8 +2300,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::absolute_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::absolute_1<k>()), bool exists = false>
 [[nodiscard]] QorResult absolute(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2349,8 +2369,9 @@ template <unsigned k> inline auto square_3() noexcept {
     "qori::square: no such call. square(src, dst, [scale]) or square(in_place(src), [scale]) of 8u, 16u, 16s: " \
     "C1 C3 C4 AC4. square(src, dst) or square(in_place(src)) of 32f: C1 C3 C4 AC4"
 /** Squares: dst = saturate(round(src * src * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C: qoriSqr. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::square_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::square_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult square(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2362,9 +2383,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::square_2<k>()), class F1 = decltype(detail::square_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::square_2<k>()), class F1 = decltype(detail::square_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult square(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2381,8 +2402,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::square_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::square_1<k>()), bool exists = false>
 [[nodiscard]] QorResult square(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2392,8 +2413,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::square_3<k>()), class F1 = decltype(detail::square_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::square_3<k>()), class F1 = decltype(detail::square_1<k>()), bool exists = false>
 [[nodiscard]] QorResult square(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2458,8 +2479,9 @@ template <unsigned k> inline auto sqrt_3() noexcept {
     "AC4. sqrt(src, dst) of 32f: C1 C3 AC4. sqrt(in_place(src)) of 32f: C1 C3 AC4 C4"
 /** Square root: dst = saturate(round(sqrt(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C:
  *  qoriSqrt. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult sqrt(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2471,9 +2493,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sqrt_2<k>()), class F1 = decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sqrt_2<k>()), class F1 = decltype(detail::sqrt_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult sqrt(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2490,8 +2512,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::sqrt_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::sqrt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult sqrt(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2501,8 +2523,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::sqrt_3<k>()), class F1 = decltype(detail::sqrt_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::sqrt_3<k>()), class F1 = decltype(detail::sqrt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult sqrt(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2557,8 +2579,9 @@ template <unsigned k> inline auto exp_3() noexcept {
     "qori::exp: no such call. exp(src, dst, [scale]) or exp(in_place(src), [scale]) of 8u, 16u, 16s: C1 C3. " \
     "exp(src, dst) or exp(in_place(src)) of 32f: C1 C3"
 /** Exponential: dst = saturate(round(e^src * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C: qoriExp. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult exp(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2570,9 +2593,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::exp_2<k>()), class F1 = decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::exp_2<k>()), class F1 = decltype(detail::exp_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult exp(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2589,8 +2612,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::exp_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::exp_1<k>()), bool exists = false>
 [[nodiscard]] QorResult exp(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2600,8 +2623,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::exp_3<k>()), class F1 = decltype(detail::exp_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::exp_3<k>()), class F1 = decltype(detail::exp_1<k>()), bool exists = false>
 [[nodiscard]] QorResult exp(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2657,8 +2680,9 @@ template <unsigned k> inline auto log_3() noexcept {
     "log(src, dst) or log(in_place(src)) of 32f: C1 C3"
 /** Natural logarithm: dst = saturate(round(ln(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C:
  *  qoriLn. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::log_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::log_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult log(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2670,9 +2694,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::log_2<k>()), class F1 = decltype(detail::log_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::log_2<k>()), class F1 = decltype(detail::log_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult log(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2689,8 +2713,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::log_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::log_1<k>()), bool exists = false>
 [[nodiscard]] QorResult log(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2700,8 +2724,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::log_3<k>()), class F1 = decltype(detail::log_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::log_3<k>()), class F1 = decltype(detail::log_1<k>()), bool exists = false>
 [[nodiscard]] QorResult log(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2751,11 +2775,11 @@ template <unsigned k> inline auto pad_constant_0() noexcept {
     "qori::pad_constant: no such call. pad_constant(src, dst, top, left, value) of 8u, 16u, 16s, 32s, 32f: C1 " \
     "C3 C4 AC4"
 /** Copies an image into a larger one and fills the frame around it with a constant pixel. C: qoriCopyConstBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pad_constant_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult pad_constant(const A& src, B&& dst, int32_t top, int32_t left, const
-    detail::Value<detail::Arg<F0, 8>, k>& value) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::pad_constant_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult pad_constant(const A& src, B&& dst, int32_t top, int32_t left,
+    const detail::Value<detail::Arg<F0, 8>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -2766,9 +2790,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult pad_constant(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult pad_constant(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -2825,11 +2849,11 @@ template <unsigned k> inline auto pad_replicate_1() noexcept {
 #define QORI_WORDS \
     "qori::pad_replicate: no such call. pad_replicate(src, dst, top, left) or pad_replicate(in_place(src), " \
     "dst_roi_size, top, left) of 8u, 16u, 16s, 32s, 32f: C1 C3 C4 AC4"
-/** Copies an image into a larger one and repeats its outermost pixels in the frame around it. Repeats the outermost
- *  pixels of an image in the frame around it, inside a larger image. C: qoriCopyReplicateBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pad_replicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+/** Copies an image into a larger one and repeats its outermost pixels in the frame around it. Repeats the
+ *  outermost pixels of an image in the frame around it, inside a larger image. C: qoriCopyReplicateBorder. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::pad_replicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult pad_replicate(const A& src, B&& dst, int32_t top, int32_t left) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2841,10 +2865,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::pad_replicate_1<k>()), bool exists = false>
-[[nodiscard]] QorResult pad_replicate(const InPlace<TA, LA>& src, QorImageSize dst_roi_size, int32_t top, int32_t
-    left) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::pad_replicate_1<k>()), bool exists = false>
+[[nodiscard]] QorResult pad_replicate(const InPlace<TA, LA>& src, QorImageSize dst_roi_size, int32_t top,
+    int32_t left) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::pad_replicate_1<k>()(srcV.data(), srcV.step(), srcV.size(), dst_roi_size, top, left);
@@ -2853,9 +2877,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -2907,9 +2931,9 @@ template <unsigned k> inline auto filter_box_1() noexcept {
     "filter_box(in_place(src), size) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** The mean of the window of maskSize around each pixel, channel by channel. The mean of the window of maskSize
  *  around each pixel, in place. C: qoriFilterBox. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_box(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2922,8 +2946,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::filter_box_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::filter_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult filter_box(const InPlace<TA, LA>& src, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2933,9 +2957,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_box(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_box(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -2943,8 +2967,8 @@ template <bool exists = false> QorResult filter_box(detail::Anything = {}, detai
 
 /** Reports how many bytes the buffer of a box filter with a border takes, at any alignment. C:
  *  qoriFilterBoxBorderGetBufferSize. */
-[[nodiscard]] inline QorResult filter_box_border_get_buffer_size(QorImageSize roi_size, QorImageSize size, int32_t
-    data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_box_border_get_buffer_size(QorImageSize roi_size, QorImageSize size,
+    int32_t data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterBoxBorderGetBufferSize(roi_size, size, data_type, num_channels, buffer_size);
 }
 
@@ -2974,11 +2998,11 @@ template <unsigned k> inline auto filter_box_border_0() noexcept {
     "16u, 32f: C1 C3 C4 AC4"
 /** The mean of the centred window of maskSize around each pixel, channel by channel, with a border. C:
  *  qoriFilterBoxBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size, const detail::Edge<detail::Arg<F0,
-    7>, k>& border, Buffer& buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -2994,11 +3018,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size, const detail::Edge<detail::Arg<F0,
-    7>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -3015,9 +3039,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3169,9 +3193,10 @@ template <unsigned k> inline auto convert_3() noexcept {
 /** Converts to a wider type, exactly. Converts integers: dst = saturate(round(src * 2^-scaleFactor)), rounding the
  *  magnitude. Converts float to integer: rounded by roundMode, saturated. Converts float to integer: dst =
  *  saturate(round(src * 2^-scaleFactor)); the product is exact. C: qoriConvert. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_0<k>()), class F1 = decltype(detail::convert_2<k>()), class F2 =
-    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::convert_0<k>()), class F1 = decltype(detail::convert_2<k>()),
+    class F2 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3195,8 +3220,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3209,9 +3235,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_2<k>()), class F1 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::convert_2<k>()), class F1 = decltype(detail::convert_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3228,8 +3254,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3239,8 +3265,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3250,8 +3276,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3278,9 +3304,9 @@ template <unsigned k> inline auto unpack_bits_0() noexcept {
 #define QORI_WORDS \
     "qori::unpack_bits: no such call. unpack_bits(src, dst, [bit_offset]) of 8u: C1"
 /** Unpacks bits into bytes: a set bit gives 255, a clear one 0. C: qoriConvert. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult unpack_bits(const A& src, B&& dst, int32_t bit_offset) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3293,9 +3319,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult unpack_bits(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3308,9 +3334,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -3429,10 +3455,11 @@ template <unsigned k> inline auto copy_1() noexcept {
     "ChannelOfC4->C1 C1->ChannelOfC3 C1->ChannelOfC4 ChannelOfC3 ChannelOfC4 AC4->C3 C3->AC4 C3->P3 C4->P4 " \
     "P3->C3 P4->C4. copy(src, dst, mask) of 8u, 16s, 16u, 32s, 32f: C1 C3 C4 AC4"
 /** Copies a region pixel by pixel. Copies the pixels whose mask element is not zero; all others keep their value.
- *  Other threads must not write them meanwhile: kept elements less than 32 bytes from a copied one may be rewritten
- *  with their own value. C: qoriCopy. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+ *  Other threads must not write them meanwhile: kept elements less than 32 bytes from a copied one may be
+ *  rewritten with their own value. C: qoriCopy. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3444,8 +3471,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy(const A& src, B&& dst, const View<const uint8_t, C1>& mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3476,9 +3504,9 @@ template <unsigned k> inline auto copy_managed_0() noexcept {
 #define QORI_WORDS \
     "qori::copy_managed: no such call. copy_managed(src, dst, [flags]) of 8u: C1"
 /** Copies a region of bytes with the caller's advice on the use of the cache. C: qoriCopyManaged. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy_managed(const A& src, B&& dst, int32_t flags) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3490,9 +3518,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy_managed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3504,9 +3532,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult copy_managed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult copy_managed(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -3522,8 +3550,9 @@ template <unsigned k> inline auto duplicate_0() noexcept {
 #define QORI_WORDS \
     "qori::duplicate: no such call. duplicate(src, dst) of 8u: C1->C3 C1->C4"
 /** Writes every element of a single-channel image to all channels of the destination pixel. C: qoriDup. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::duplicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::duplicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult duplicate(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3535,9 +3564,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -3567,11 +3596,11 @@ template <unsigned k> inline auto cross_corr_norm_1() noexcept {
     "16u->32f, 32f: C1. cross_corr_norm(src, pattern, dst, algorithm, [scale], [buffer]) of 8u: C1"
 /** Correlates a template with the source at every placement: plain, normalised or zero-mean normalised. C:
  *  qoriCrossCorrNorm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, Buffer& buffer)
-    noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm,
+    Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& patternV = detail::view(pattern);
@@ -3591,8 +3620,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_0<k>()), class F1 = decltype(detail::cross_corr_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_0<k>()), class F1 = decltype(detail::cross_corr_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3630,9 +3659,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, int32_t scale,
     Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3654,11 +3683,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, int32_t scale)
-    noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& patternV = detail::view(pattern);
@@ -3719,8 +3748,9 @@ template <unsigned k> inline auto cross_corr_full_norm_1() noexcept {
     "qori::cross_corr_full_norm: no such call. cross_corr_full_norm(src, pattern, dst) of 8u->32f, 8s->32f, " \
     "16u->32f, 32f: C1 C3 C4 AC4. cross_corr_full_norm(src, pattern, dst, [scale]) of 8u: C1 C3 C4 AC4"
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrFull_Norm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_0<k>()), class F1 = decltype(detail::cross_corr_full_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_0<k>()),
+    class F1 = decltype(detail::cross_corr_full_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3744,9 +3774,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3801,8 +3831,9 @@ template <unsigned k> inline auto cross_corr_same_norm_1() noexcept {
     "qori::cross_corr_same_norm: no such call. cross_corr_same_norm(src, pattern, dst) of 8u->32f, 8s->32f, " \
     "16u->32f, 32f: C1 C3 C4 AC4. cross_corr_same_norm(src, pattern, dst, [scale]) of 8u: C1 C3 C4 AC4"
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrSame_Norm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_0<k>()), class F1 = decltype(detail::cross_corr_same_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_0<k>()),
+    class F1 = decltype(detail::cross_corr_same_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3824,9 +3855,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3880,8 +3911,9 @@ template <unsigned k> inline auto cross_corr_valid_norm_1() noexcept {
     "qori::cross_corr_valid_norm: no such call. cross_corr_valid_norm(src, pattern, dst) of 8u->32f, 8s->32f, " \
     "16u->32f, 32f: C1 C3 C4 AC4. cross_corr_valid_norm(src, pattern, dst, [scale]) of 8u: C1 C3 C4 AC4"
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrValid_Norm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_0<k>()), class F1 = decltype(detail::cross_corr_valid_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_0<k>()),
+    class F1 = decltype(detail::cross_corr_valid_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3905,9 +3937,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3965,10 +3997,10 @@ template <unsigned k> inline auto cross_corr_full_norm_level_1() noexcept {
     "8u: C1 C3 C4 AC4"
 /** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n). C:
  *  qoriCrossCorrFull_NormLevel. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_level_0<k>()), class F1 =
-    decltype(detail::cross_corr_full_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_level_0<k>()),
+    class F1 = decltype(detail::cross_corr_full_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3991,9 +4023,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4050,10 +4082,10 @@ template <unsigned k> inline auto cross_corr_same_norm_level_1() noexcept {
     "C4 AC4"
 /** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n). C:
  *  qoriCrossCorrSame_NormLevel. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_level_0<k>()), class F1 =
-    decltype(detail::cross_corr_same_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_level_0<k>()),
+    class F1 = decltype(detail::cross_corr_same_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4074,9 +4106,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4133,10 +4165,10 @@ template <unsigned k> inline auto cross_corr_valid_norm_level_1() noexcept {
     "[scale]) of 8u: C1 C3 C4 AC4"
 /** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n). C:
  *  qoriCrossCorrValid_NormLevel. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_level_0<k>()), class F1 =
-    decltype(detail::cross_corr_valid_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_level_0<k>()),
+    class F1 = decltype(detail::cross_corr_valid_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4159,9 +4191,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4197,9 +4229,9 @@ template <unsigned k> inline auto cross_corr_valid_0() noexcept {
     "qori::cross_corr_valid: no such call. cross_corr_valid(src, pattern, dst) of 8u->32f, 8s->32f, 16u->32f, " \
     "32f: C1"
 /** Correlation with a template at the placements inside the source: dst = sum s t. C: qoriCrossCorrValid. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4250,15 +4282,15 @@ template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {},
 
 /** Makes a plan in memory from qorMalloc, to be released with qoriDCTFwdFree_32f or qoriDCTInvFree_32f. C:
  *  qoriDCTFwdInitAlloc_32f. */
-[[nodiscard]] inline QorResult dct_fwd_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size, QorAccuracyHint
-    hint) noexcept {
+[[nodiscard]] inline QorResult dct_fwd_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size,
+    QorAccuracyHint hint) noexcept {
     return qoriDCTFwdInitAlloc_32f(plan, roi_size, hint);
 }
 
 /** Makes a plan in memory from qorMalloc, to be released with qoriDCTFwdFree_32f or qoriDCTInvFree_32f. C:
  *  qoriDCTInvInitAlloc_32f. */
-[[nodiscard]] inline QorResult dct_inv_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size, QorAccuracyHint
-    hint) noexcept {
+[[nodiscard]] inline QorResult dct_inv_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size,
+    QorAccuracyHint hint) noexcept {
     return qoriDCTInvInitAlloc_32f(plan, roi_size, hint);
 }
 
@@ -4295,9 +4327,11 @@ template <unsigned k> inline auto dct_fwd_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::dct_fwd: no such call. dct_fwd(src, dst, plan, buffer) of 32f: C1 C3 C4 AC4"
-/** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C: qoriDCTFwd. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_fwd_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C:
+ *  qoriDCTFwd. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_fwd_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dct_fwd(const A& src, B&& dst, const QorDct2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4327,9 +4361,11 @@ template <unsigned k> inline auto dct_inv_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::dct_inv: no such call. dct_inv(src, dst, plan, buffer) of 32f: C1 C3 C4 AC4"
-/** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C: qoriDCTInv. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_inv_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C:
+ *  qoriDCTInv. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_inv_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dct_inv(const A& src, B&& dst, const QorDct2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4373,9 +4409,10 @@ template <unsigned k> inline auto dct_8x8_forward_3() noexcept {
     "qori::dct_8x8_forward: no such call. dct_8x8_forward(src, dst) or dct_8x8_forward(src) of 32f, 16s: C1. " \
     "dct_8x8_forward(src, dst) of 16s, 8u->16s: C1. dct_8x8_forward(src, dst, shift) of 8u->16s: C1"
 /** The forward cosine transform of a block of floats. The forward cosine transform of 8x8 pixels of an image. The
- *  forward cosine transform of 8x8 pixels of an image, with a value added to each. C: qoriDCT8x8Fwd, qoriDCT8x8FwdLS. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_0<k>()), bool exists = false>
+ *  forward cosine transform of 8x8 pixels of an image, with a value added to each. C: qoriDCT8x8Fwd,
+ *  qoriDCT8x8FwdLS. */
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_forward_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_0<k>()(src, dst);
@@ -4384,8 +4421,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_forward_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_forward_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_1<k>()(src);
@@ -4394,8 +4431,8 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, clas
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_2<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_forward_2<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A& src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4406,8 +4443,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_3<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_forward_3<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A& src, B* dst, int16_t shift) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4450,11 +4487,11 @@ template <unsigned k> inline auto dct_8x8_inverse_3() noexcept {
 #define QORI_WORDS \
     "qori::dct_8x8_inverse: no such call. dct_8x8_inverse(src, dst) or dct_8x8_inverse(src) of 32f, 16s: C1. " \
     "dct_8x8_inverse(src, dst) of 16s, 16s->8u: C1. dct_8x8_inverse(src, dst, shift, low, high) of 16s->8u: C1"
-/** The inverse cosine transform of a block of floats. The inverse cosine transform into 8x8 pixels of an image. The
- *  inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two bounds. C:
- *  qoriDCT8x8Inv, qoriDCT8x8InvLSClip. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_0<k>()), bool exists = false>
+/** The inverse cosine transform of a block of floats. The inverse cosine transform into 8x8 pixels of an image.
+ *  The inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two
+ *  bounds. C: qoriDCT8x8Inv, qoriDCT8x8InvLSClip. */
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_0<k>()(src, dst);
@@ -4463,8 +4500,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_1<k>()(src);
@@ -4473,8 +4510,8 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, clas
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_8x8_inverse_2<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
@@ -4485,8 +4522,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_8x8_inverse_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_8x8_inverse_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B&& dst, int16_t shift, uint8_t low, uint8_t high) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
@@ -4520,8 +4557,8 @@ template <unsigned k> inline auto dct_8x8_inverse_2x2_1() noexcept {
     " C1"
 /** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4. C:
  *  qoriDCT8x8Inv_2x2. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2x2_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_2x2_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_2x2(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_0<k>()(src, dst);
@@ -4530,8 +4567,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2x2_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_2x2_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_2x2(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_1<k>()(src);
@@ -4563,8 +4600,8 @@ template <unsigned k> inline auto dct_8x8_inverse_4x4_1() noexcept {
     " C1"
 /** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4. C:
  *  qoriDCT8x8Inv_4x4. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_4x4_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_4x4_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_4x4(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_0<k>()(src, dst);
@@ -4573,8 +4610,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_4x4_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_4x4_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_4x4(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_1<k>()(src);
@@ -4606,8 +4643,8 @@ template <unsigned k> inline auto dct_8x8_inverse_10bit_1() noexcept {
     "of 16s: C1"
 /** The inverse cosine transform of a block of 16-bit coefficients, for pixels of ten bits and more. C:
  *  qoriDCT8x8Inv_A10. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_10bit_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_10bit_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_10bit(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_0<k>()(src, dst);
@@ -4616,8 +4653,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_10bit_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_10bit_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_10bit(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_1<k>()(src);
@@ -4648,8 +4685,8 @@ template <unsigned k> inline auto dct_8x8_to_2x2_inverse_1() noexcept {
     "qori::dct_8x8_to_2x2_inverse: no such call. dct_8x8_to_2x2_inverse(src, dst) or " \
     "dct_8x8_to_2x2_inverse(src) of 16s: C1"
 /** Makes 2x2 pixels of a block's coefficients, a quarter of its size in each direction. C: qoriDCT8x8To2x2Inv. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_to_2x2_inverse_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_to_2x2_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_2x2_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_0<k>()(src, dst);
@@ -4658,8 +4695,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_to_2x2_inverse_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_to_2x2_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_2x2_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_1<k>()(src);
@@ -4690,8 +4727,8 @@ template <unsigned k> inline auto dct_8x8_to_4x4_inverse_1() noexcept {
     "qori::dct_8x8_to_4x4_inverse: no such call. dct_8x8_to_4x4_inverse(src, dst) or " \
     "dct_8x8_to_4x4_inverse(src) of 16s: C1"
 /** Makes 4x4 pixels of a block's coefficients, half of its size in each direction. C: qoriDCT8x8To4x4Inv. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_to_4x4_inverse_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_to_4x4_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_4x4_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_0<k>()(src, dst);
@@ -4700,8 +4737,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_to_4x4_inverse_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_to_4x4_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_4x4_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_1<k>()(src);
@@ -4727,8 +4764,8 @@ template <unsigned k> inline auto zigzag_8x8_forward_0() noexcept {
 #define QORI_WORDS \
     "qori::zigzag_8x8_forward: no such call. zigzag_8x8_forward(src, dst) of 16s: C1"
 /** Puts a block's coefficients in zig-zag order. C: qoriZigzagFwd8x8. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::zigzag_8x8_forward_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::zigzag_8x8_forward_0<k>()), bool exists = false>
 [[nodiscard]] QorResult zigzag_8x8_forward(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_forward_0<k>()(src, dst);
@@ -4754,8 +4791,8 @@ template <unsigned k> inline auto zigzag_8x8_inverse_0() noexcept {
 #define QORI_WORDS \
     "qori::zigzag_8x8_inverse: no such call. zigzag_8x8_inverse(src, dst) of 16s: C1"
 /** Puts coefficients in zig-zag order back into rows. C: qoriZigzagInv8x8. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::zigzag_8x8_inverse_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::zigzag_8x8_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult zigzag_8x8_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_inverse_0<k>()(src, dst);
@@ -4772,8 +4809,8 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
 }
 #undef QORI_WORDS
 
-/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call. C:
- *  qoriDFTGetSize_R_32f. */
+/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call.
+ *  C: qoriDFTGetSize_R_32f. */
 [[nodiscard]] inline QorResult dft_get_size_r_32f(QorImageSize roi_size, QorFftNormFlag norm, QorAccuracyHint hint,
     int32_t* plan_size, int32_t* init_buf_size, int32_t* buf_size) noexcept {
     return qoriDFTGetSize_R_32f(roi_size, norm, hint, plan_size, init_buf_size, buf_size);
@@ -4832,7 +4869,8 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
     return qoriDFTGetBufSize_R_32s(plan, buf_size);
 }
 
-/** Allocates and prepares a transform of complex images; qoriDFTFree_C_32fc releases it. C: qoriDFTInitAlloc_C_32fc. */
+/** Allocates and prepares a transform of complex images; qoriDFTFree_C_32fc releases it. C:
+ *  qoriDFTInitAlloc_C_32fc. */
 [[nodiscard]] inline QorResult dft_init_alloc_c_32fc(QorFft2DPlan** plan, QorImageSize roi_size, QorFftNormFlag norm,
     QorAccuracyHint hint) noexcept {
     return qoriDFTInitAlloc_C_32fc(plan, roi_size, norm, hint);
@@ -4843,7 +4881,8 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
     return qoriDFTFree_C_32fc(plan);
 }
 
-/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C: qoriDFTGetBufSize_C_32fc. */
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C:
+ *  qoriDFTGetBufSize_C_32fc. */
 [[nodiscard]] inline QorResult dft_get_buf_size_c_32fc(const QorFft2DPlan* plan, int32_t* buf_size) noexcept {
     return qoriDFTGetBufSize_C_32fc(plan, buf_size);
 }
@@ -4875,11 +4914,11 @@ template <unsigned k> inline auto dft_fwd_r_to_pack_2() noexcept {
     "qori::dft_fwd_r_to_pack: no such call. dft_fwd_r_to_pack(src, dst, plan, buffer) or " \
     "dft_fwd_r_to_pack(in_place(src), plan, buffer) of 32f: C1 C3 C4 AC4. dft_fwd_r_to_pack(src, dst, plan, " \
     "scale, buffer) of 8u->32s: C1 C3 C4 AC4"
-/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an 8u
- *  image, each channel by itself, packed, in 32s. C: qoriDFTFwd_RToPack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an
+ *  8u image, each channel by itself, packed, in 32s. C: qoriDFTFwd_RToPack. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4890,10 +4929,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_fwd_r_to_pack_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -4902,11 +4941,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -4954,9 +4993,9 @@ template <unsigned k> inline auto dft_inv_pack_to_r_2() noexcept {
     "scale, buffer) of 32s->8u: C1 C3 C4 AC4"
 /** The real image of a packed spectrum, each channel by itself. The 8u image of a packed spectrum of 32s, each
  *  channel by itself. C: qoriDFTInv_PackToR. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4967,10 +5006,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_inv_pack_to_r_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -4979,11 +5018,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5016,9 +5055,9 @@ template <unsigned k> inline auto dft_fwd_c_to_c_1() noexcept {
     "qori::dft_fwd_c_to_c: no such call. dft_fwd_c_to_c(src, dst, plan, buffer) or " \
     "dft_fwd_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The spectrum of a complex image, frequency (u, v) at pixel (u, v). C: qoriDFTFwd_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_fwd_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5029,10 +5068,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_fwd_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_fwd_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5041,9 +5080,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5063,9 +5102,9 @@ template <unsigned k> inline auto dft_inv_c_to_c_1() noexcept {
     "qori::dft_inv_c_to_c: no such call. dft_inv_c_to_c(src, dst, plan, buffer) or " \
     "dft_inv_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The complex image of a complex spectrum. C: qoriDFTInv_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_inv_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5076,10 +5115,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_inv_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_inv_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5088,9 +5127,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5122,7 +5161,7 @@ template <unsigned k> inline auto min_0() noexcept {
 /** Smallest element of each channel. C: qoriMin. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::min_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult min(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
+[[nodiscard]] QorResult (min)(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::min_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data);
@@ -5131,7 +5170,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult min(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult (min)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
@@ -5165,7 +5204,7 @@ template <unsigned k> inline auto max_0() noexcept {
 /** Largest element of each channel. C: qoriMax. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::max_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult max(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
+[[nodiscard]] QorResult (max)(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::max_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data);
@@ -5174,7 +5213,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult (max)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
@@ -5206,8 +5245,8 @@ template <unsigned k> inline auto min_max_0() noexcept {
 #define QORI_WORDS \
     "qori::min_max: no such call. min_max(src, min, max) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Smallest and largest element of each channel, in one pass. C: qoriMinMax. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::min_max_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::min_max_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min_max(const A& src, detail::Result<detail::Arg<F0, 3>, k> min,
     detail::Result<detail::Arg<F0, 4>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5251,8 +5290,8 @@ template <unsigned k> inline auto min_index_0() noexcept {
     "qori::min_index: no such call. min_index(src, min, column, row) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Smallest element of each channel and the first pixel, from the top and then from the left, that holds it. C:
  *  qoriMinIndx. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::min_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::min_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min_index(const A& src, detail::Result<detail::Arg<F0, 3>, k> min,
     detail::Result<detail::Arg<F0, 4>, k> column, detail::Result<detail::Arg<F0, 5>, k> row) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5263,9 +5302,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult min_index(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult min_index(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5296,8 +5335,8 @@ template <unsigned k> inline auto max_index_0() noexcept {
     "qori::max_index: no such call. max_index(src, max, column, row) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest element of each channel and the first pixel, from the top and then from the left, that holds it. C:
  *  qoriMaxIndx. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::max_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::max_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult max_index(const A& src, detail::Result<detail::Arg<F0, 3>, k> max,
     detail::Result<detail::Arg<F0, 4>, k> column, detail::Result<detail::Arg<F0, 5>, k> row) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5308,9 +5347,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult max_index(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult max_index(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5329,9 +5368,9 @@ template <unsigned k> inline auto block_min_max_0() noexcept {
     "qori::block_min_max: no such call. block_min_max(src, min, max, block, global_min, global_max) of 8u, 16u," \
     " 16s, 32f: C1"
 /** Smallest and largest element of every block of a grid, and of the whole region. C: qoriBlockMinMax. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B, C>>, class F0 =
-    decltype(detail::block_min_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>>
-    = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B, C>>,
+    class F0 = decltype(detail::block_min_max_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult block_min_max(const A& src, B&& min, C&& max, QorImageSize block,
     detail::Result<detail::Arg<F0, 8>, k> global_min, detail::Result<detail::Arg<F0, 9>, k> global_max) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5346,9 +5385,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult block_min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult block_min_max(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5368,10 +5407,10 @@ template <unsigned k> inline auto count_in_range_0() noexcept {
 #define QORI_WORDS \
     "qori::count_in_range: no such call. count_in_range(src, count, lower, upper) of 8u, 32f: C1 C3 AC4"
 /** Counts the pixels of each channel with lowerBound <= value <= upperBound. C: qoriCountInRange. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::count_in_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult count_in_range(const A& src, detail::Result<detail::Arg<F0, 3>, k> count, const
-    detail::Value<detail::Arg<F0, 4>, k>& lower, const detail::Value<detail::Arg<F0, 5>, k>& upper) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::count_in_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult count_in_range(const A& src, detail::Result<detail::Arg<F0, 3>, k> count,
+    const detail::Value<detail::Arg<F0, 4>, k>& lower, const detail::Value<detail::Arg<F0, 5>, k>& upper) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::count_in_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), count.data, detail::pass(lower),
@@ -5381,24 +5420,24 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult count_in_range(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult count_in_range(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
-/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call. C:
- *  qoriFFTGetSize_R_32f. */
+/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call.
+ *  C: qoriFFTGetSize_R_32f. */
 [[nodiscard]] inline QorResult fft_get_size_r_32f(int32_t order_x, int32_t order_y, QorFftNormFlag norm,
     QorAccuracyHint hint, int32_t* plan_size, int32_t* init_buf_size, int32_t* buf_size) noexcept {
     return qoriFFTGetSize_R_32f(order_x, order_y, norm, hint, plan_size, init_buf_size, buf_size);
 }
 
 /** Prepares a transform of real images of 32f. C: qoriFFTInit_R_32f. */
-[[nodiscard]] inline QorResult fft_init_r_32f(int32_t order_x, int32_t order_y, QorFftNormFlag norm, QorAccuracyHint
-    hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
+[[nodiscard]] inline QorResult fft_init_r_32f(int32_t order_x, int32_t order_y, QorFftNormFlag norm,
+    QorAccuracyHint hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
     return qoriFFTInit_R_32f(order_x, order_y, norm, hint, plan, init_buf);
 }
 
@@ -5410,8 +5449,8 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
 }
 
 /** Prepares a transform of complex images. C: qoriFFTInit_C_32fc. */
-[[nodiscard]] inline QorResult fft_init_c_32fc(int32_t order_x, int32_t order_y, QorFftNormFlag norm, QorAccuracyHint
-    hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
+[[nodiscard]] inline QorResult fft_init_c_32fc(int32_t order_x, int32_t order_y, QorFftNormFlag norm,
+    QorAccuracyHint hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
     return qoriFFTInit_C_32fc(order_x, order_y, norm, hint, plan, init_buf);
 }
 
@@ -5449,7 +5488,8 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
     return qoriFFTGetBufSize_R_32s(plan, buf_size);
 }
 
-/** Allocates and prepares a transform of complex images; qoriFFTFree_C_32fc releases it. C: qoriFFTInitAlloc_C_32fc. */
+/** Allocates and prepares a transform of complex images; qoriFFTFree_C_32fc releases it. C:
+ *  qoriFFTInitAlloc_C_32fc. */
 [[nodiscard]] inline QorResult fft_init_alloc_c_32fc(QorFft2DPlan** plan, int32_t order_x, int32_t order_y,
     QorFftNormFlag norm, QorAccuracyHint hint) noexcept {
     return qoriFFTInitAlloc_C_32fc(plan, order_x, order_y, norm, hint);
@@ -5460,7 +5500,8 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
     return qoriFFTFree_C_32fc(plan);
 }
 
-/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C: qoriFFTGetBufSize_C_32fc. */
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C:
+ *  qoriFFTGetBufSize_C_32fc. */
 [[nodiscard]] inline QorResult fft_get_buf_size_c_32fc(const QorFft2DPlan* plan, int32_t* buf_size) noexcept {
     return qoriFFTGetBufSize_C_32fc(plan, buf_size);
 }
@@ -5492,11 +5533,11 @@ template <unsigned k> inline auto fft_fwd_r_to_pack_2() noexcept {
     "qori::fft_fwd_r_to_pack: no such call. fft_fwd_r_to_pack(src, dst, plan, buffer) or " \
     "fft_fwd_r_to_pack(in_place(src), plan, buffer) of 32f: C1 C3 C4 AC4. fft_fwd_r_to_pack(src, dst, plan, " \
     "scale, buffer) of 8u->32s: C1 C3 C4 AC4"
-/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an 8u
- *  image, each channel by itself, packed, in 32s. C: qoriFFTFwd_RToPack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an
+ *  8u image, each channel by itself, packed, in 32s. C: qoriFFTFwd_RToPack. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5507,10 +5548,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_fwd_r_to_pack_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5519,11 +5560,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5571,9 +5612,9 @@ template <unsigned k> inline auto fft_inv_pack_to_r_2() noexcept {
     "scale, buffer) of 32s->8u: C1 C3 C4 AC4"
 /** The real image of a packed spectrum, each channel by itself. The 8u image of a packed spectrum of 32s, each
  *  channel by itself. C: qoriFFTInv_PackToR. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5584,10 +5625,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_inv_pack_to_r_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5596,11 +5637,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5633,9 +5674,9 @@ template <unsigned k> inline auto fft_fwd_c_to_c_1() noexcept {
     "qori::fft_fwd_c_to_c: no such call. fft_fwd_c_to_c(src, dst, plan, buffer) or " \
     "fft_fwd_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The spectrum of a complex image, frequency (u, v) at pixel (u, v). C: qoriFFTFwd_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_fwd_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5646,10 +5687,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_fwd_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_fwd_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5658,9 +5699,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5680,9 +5721,9 @@ template <unsigned k> inline auto fft_inv_c_to_c_1() noexcept {
     "qori::fft_inv_c_to_c: no such call. fft_inv_c_to_c(src, dst, plan, buffer) or " \
     "fft_inv_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The complex image of a complex spectrum. C: qoriFFTInv_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_inv_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5693,10 +5734,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_inv_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_inv_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5705,9 +5746,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -5830,11 +5871,11 @@ template <unsigned k> inline auto filter_linear_3_bytes() noexcept {
     "C3 C4 AC4. filter_linear(src, dst, kernel, [rounding], [buffer]) of 8u by 32f, 16s by 32f, 16u by 32f: C1 " \
     "C3 C4 AC4"
 /** Convolves with integers around an anchor: dst = saturate(round(sum / divisor)), ties to even. Convolves with
- *  floats around an anchor; sums are fused multiply-adds in the type of the pixels. Convolves with integers around an
- *  anchor: dst = saturate(round(sum / divisor)) by a rounding mode. Convolves with floats around an anchor: dst =
- *  saturate(round(sum)) by a rounding mode. C: qoriFilter, qoriFilter_Round16s, qoriFilter_Round32f. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_0<k>()), class F1 = decltype(detail::filter_linear_2<k>()),
+ *  floats around an anchor; sums are fused multiply-adds in the type of the pixels. Convolves with integers around
+ *  an anchor: dst = saturate(round(sum / divisor)) by a rounding mode. Convolves with floats around an anchor: dst
+ *  = saturate(round(sum)) by a rounding mode. C: qoriFilter, qoriFilter_Round16s, qoriFilter_Round32f. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_0<k>()), class F1 = decltype(detail::filter_linear_2<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5859,9 +5900,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_1<k>()), class F1 = decltype(detail::filter_linear_0<k>()), class F2 =
-    decltype(detail::filter_linear_3<k>()), class F3 = decltype(detail::filter_linear_2<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_1<k>()), class F1 = decltype(detail::filter_linear_0<k>()),
+    class F2 = decltype(detail::filter_linear_3<k>()), class F3 = decltype(detail::filter_linear_2<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5903,11 +5944,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor, QorRoundingMode
-    rounding, Buffer& buffer) noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor,
+    QorRoundingMode rounding, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5923,11 +5964,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor, QorRoundingMode
-    rounding) noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor,
+    QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5944,9 +5985,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, QorRoundingMode rounding,
     Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5964,11 +6005,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, QorRoundingMode rounding)
-    noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel,
+    QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5985,9 +6026,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6007,10 +6048,10 @@ template <unsigned k> inline auto filter_round_get_buf_size16s_0() noexcept {
     "buffer_size) of 8u: C1 C3 C4 AC4"
 /** Reports the bytes of work buffer of qoriFilter_Round16s: 16 * kw * kh + 4 * w * channels + 15. C:
  *  qoriFilterRoundGetBufSize16s. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size16s_0<k>()), bool exists = false>
-[[nodiscard]] QorResult filter_round_get_buf_size16s(QorImageSize kernel_size, int32_t roi_width, int32_t*
-    buffer_size) noexcept {
+template <class T, class L, unsigned k = detail::keyOf<T, L>,
+    class F0 = decltype(detail::filter_round_get_buf_size16s_0<k>()), bool exists = false>
+[[nodiscard]] QorResult filter_round_get_buf_size16s(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size16s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6040,12 +6081,12 @@ template <unsigned k> inline auto filter_round_get_buf_size32f_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_round_get_buf_size32f: no such call. filter_round_get_buf_size32f(kernel_size, roi_width, " \
     "buffer_size) of 8u, 16s, 16u: C1 C3 C4 AC4"
-/** Reports the bytes of work buffer of qoriFilter_Round32f: 16 * kw * kh + 8 * w * channels + 43, for four channels +
- *  15. C: qoriFilterRoundGetBufSize32f. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size32f_0<k>()), bool exists = false>
-[[nodiscard]] QorResult filter_round_get_buf_size32f(QorImageSize kernel_size, int32_t roi_width, int32_t*
-    buffer_size) noexcept {
+/** Reports the bytes of work buffer of qoriFilter_Round32f: 16 * kw * kh + 8 * w * channels + 43, for four
+ *  channels + 15. C: qoriFilterRoundGetBufSize32f. */
+template <class T, class L, unsigned k = detail::keyOf<T, L>,
+    class F0 = decltype(detail::filter_round_get_buf_size32f_0<k>()), bool exists = false>
+[[nodiscard]] QorResult filter_round_get_buf_size32f(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32f_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6071,12 +6112,12 @@ template <unsigned k> inline auto filter_round_get_buf_size32s_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_round_get_buf_size32s: no such call. filter_round_get_buf_size32s(kernel_size, roi_width, " \
     "buffer_size) of 16s, 16u: C1 C3 C4 AC4"
-/** Reports the bytes of work buffer of qoriFilter_Round32s: 16 * kw * kh + 4 * w * channels + 31 for 16s, 16 * kw *
- *  kh + 8 * w * channels + 43 for 16u. C: qoriFilterRoundGetBufSize32s. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size32s_0<k>()), bool exists = false>
-[[nodiscard]] QorResult filter_round_get_buf_size32s(QorImageSize kernel_size, int32_t roi_width, int32_t*
-    buffer_size) noexcept {
+/** Reports the bytes of work buffer of qoriFilter_Round32s: 16 * kw * kh + 4 * w * channels + 31 for 16s, 16 * kw
+ *  * kh + 8 * w * channels + 43 for 16u. C: qoriFilterRoundGetBufSize32s. */
+template <class T, class L, unsigned k = detail::keyOf<T, L>,
+    class F0 = decltype(detail::filter_round_get_buf_size32s_0<k>()), bool exists = false>
+[[nodiscard]] QorResult filter_round_get_buf_size32s(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6098,8 +6139,8 @@ template <unsigned k> inline auto filter_get_buf_size_0() noexcept {
 /** Reports 0: the 64f filter takes no work buffer. C: qoriFilterGetBufSize. */
 template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::filter_get_buf_size_0<k>()),
     bool exists = false>
-[[nodiscard]] QorResult filter_get_buf_size(QorImageSize kernel_size, int32_t roi_width, int32_t* buffer_size)
-    noexcept {
+[[nodiscard]] QorResult filter_get_buf_size(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_get_buf_size_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6111,20 +6152,22 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
 
 /** Reports how many bytes the plan of a general filter and the work buffer of its calls take. C:
  *  qoriFilterBorderGetSize. */
-[[nodiscard]] inline QorResult filter_border_get_size(QorImageSize kernel_size, QorImageSize dst_roi_size, int32_t
-    data_type, int32_t kernel_type, int32_t num_channels, int32_t* spec_size, int32_t* buffer_size) noexcept {
-    return qoriFilterBorderGetSize(kernel_size, dst_roi_size, data_type, kernel_type, num_channels, spec_size, buffer_size);
+[[nodiscard]] inline QorResult filter_border_get_size(QorImageSize kernel_size, QorImageSize dst_roi_size,
+    int32_t data_type, int32_t kernel_type, int32_t num_channels, int32_t* spec_size, int32_t* buffer_size) noexcept {
+    return qoriFilterBorderGetSize(kernel_size, dst_roi_size, data_type, kernel_type, num_channels, spec_size,
+        buffer_size);
 }
 
 /** Fills the plan of a filter by integers and a divisor. C: qoriFilterBorderInit_16s. */
-[[nodiscard]] inline QorResult filter_border_init_16s(const int16_t* kernel, QorImageSize kernel_size, int32_t
-    divisor, int32_t data_type, int32_t num_channels, QorRoundingMode rounding, QorLinearFilterPlan* plan) noexcept {
+[[nodiscard]] inline QorResult filter_border_init_16s(const int16_t* kernel, QorImageSize kernel_size,
+    int32_t divisor, int32_t data_type, int32_t num_channels, QorRoundingMode rounding,
+    QorLinearFilterPlan* plan) noexcept {
     return qoriFilterBorderInit_16s(kernel, kernel_size, divisor, data_type, num_channels, rounding, plan);
 }
 
 /** Fills the plan of a filter by floats. C: qoriFilterBorderInit_32f. */
-[[nodiscard]] inline QorResult filter_border_init_32f(const float* kernel, QorImageSize kernel_size, int32_t
-    data_type, int32_t num_channels, QorRoundingMode rounding, QorLinearFilterPlan* plan) noexcept {
+[[nodiscard]] inline QorResult filter_border_init_32f(const float* kernel, QorImageSize kernel_size,
+    int32_t data_type, int32_t num_channels, QorRoundingMode rounding, QorLinearFilterPlan* plan) noexcept {
     return qoriFilterBorderInit_32f(kernel, kernel_size, data_type, num_channels, rounding, plan);
 }
 
@@ -6148,13 +6191,13 @@ template <unsigned k> inline auto filter_border_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_border: no such call. filter_border(src, dst, border, plan, buffer) of 8u, 16s, 16u, 32f: C1 " \
     "C3 C4"
-/** Convolves with the kernel of a plan: dst(x, y) = sum of K(i, j) * src(x + ax - i, y + ay - j), divided and rounded
- *  as the plan says. C: qoriFilterBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_border(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border, const
-    QorLinearFilterPlan* plan, uint8_t* buffer) noexcept {
+/** Convolves with the kernel of a plan: dst(x, y) = sum of K(i, j) * src(x + ax - i, y + ay - j), divided and
+ *  rounded as the plan says. C: qoriFilterBorder. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_border(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border,
+    const QorLinearFilterPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6166,9 +6209,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_border(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_border(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6198,9 +6241,9 @@ template <unsigned k> inline auto filter_min_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_min: no such call. filter_min(src, dst, size) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The smallest element of a rectangle around each pixel, channel by channel. C: qoriFilterMin. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_min_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_min_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_min(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6213,9 +6256,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_min(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_min(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6245,9 +6288,9 @@ template <unsigned k> inline auto filter_max_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_max: no such call. filter_max(src, dst, size) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The largest element of a rectangle around each pixel, channel by channel. C: qoriFilterMax. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_max(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6260,9 +6303,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_max(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_max(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6292,9 +6335,9 @@ template <unsigned k> inline auto filter_gauss_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_gauss: no such call. filter_gauss(src, dst, mask) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The mean of 3 x 3 or 5 x 5 pixels with Gaussian weights, channel by channel. C: qoriFilterGauss. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_gauss(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6306,9 +6349,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6340,10 +6383,10 @@ template <unsigned k> inline auto histogram_range_0() noexcept {
     " C3 C4 AC4"
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1]. C:
  *  qoriHistogramRange. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult histogram_range(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels, const
-    detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult histogram_range(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels,
+    const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
@@ -6383,11 +6426,11 @@ template <unsigned k> inline auto histogram_even_0() noexcept {
     "16s: C1 C3 C4 AC4"
 /** Counts the pixels between levels spaced evenly from lowerLevel to upperLevel, and returns the levels. C:
  *  qoriHistogramEven. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult histogram_even(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels, const
-    detail::Value<detail::Arg<F0, 5>, k>& n_levels, const detail::Value<detail::Arg<F0, 6>, k>& lower, const
-    detail::Value<detail::Arg<F0, 7>, k>& upper) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult histogram_even(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels,
+    const detail::Value<detail::Arg<F0, 5>, k>& n_levels, const detail::Value<detail::Arg<F0, 6>, k>& lower,
+    const detail::Value<detail::Arg<F0, 7>, k>& upper) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_even_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
@@ -6397,17 +6440,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 /** Sizes of the record and of the scratch buffer of the prepared histograms. C: qoriHistogramGetBufferSize. */
-[[nodiscard]] inline QorResult histogram_get_buffer_size(int32_t data_type, QorImageSize roi_size, const int32_t*
-    n_levels, int32_t num_channels, int32_t uniform, int32_t* spec_size, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult histogram_get_buffer_size(int32_t data_type, QorImageSize roi_size,
+    const int32_t* n_levels, int32_t num_channels, int32_t uniform, int32_t* spec_size,
+    int32_t* buffer_size) noexcept {
     return qoriHistogramGetBufferSize(data_type, roi_size, n_levels, num_channels, uniform, spec_size, buffer_size);
 }
 
@@ -6418,8 +6462,8 @@ template <bool exists = false> QorResult histogram_even(detail::Anything = {}, d
 }
 
 /** Prepares a histogram with levels spaced uniformly from pLowerLevel to pUpperLevel. C: qoriHistogramUniformInit. */
-[[nodiscard]] inline QorResult histogram_uniform_init(int32_t data_type, const float* lower, const float* upper, const
-    int32_t* n_levels, int32_t num_channels, QorHistogramSpec* plan) noexcept {
+[[nodiscard]] inline QorResult histogram_uniform_init(int32_t data_type, const float* lower, const float* upper,
+    const int32_t* n_levels, int32_t num_channels, QorHistogramSpec* plan) noexcept {
     return qoriHistogramUniformInit(data_type, lower, upper, n_levels, num_channels, plan);
 }
 
@@ -6448,10 +6492,10 @@ template <unsigned k> inline auto histogram_0() noexcept {
 #define QORI_WORDS \
     "qori::histogram: no such call. histogram(src, hist, plan, buffer) of 8u, 16u, 16s, 32f: C1 C3 C4"
 /** Counts the pixels between the levels of a prepared histogram. C: qoriHistogram. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult histogram(const A& src, detail::Arg<F0, 3> hist, const QorHistogramSpec* plan, uint8_t*
-    buffer) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult histogram(const A& src, detail::Arg<F0, 3> hist, const QorHistogramSpec* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, plan, buffer);
@@ -6460,15 +6504,16 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult histogram(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult histogram(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
-/** Reports how many bytes the plan of a descriptor takes, at any alignment: 16 blockSize^2 + 72. C: qoriHOGGetSize. */
+/** Reports how many bytes the plan of a descriptor takes, at any alignment: 16 blockSize^2 + 72. C:
+ *  qoriHOGGetSize. */
 [[nodiscard]] inline QorResult hog_get_size(const QorHogConfig* config, int32_t* plan_size) noexcept {
     return qoriHOGGetSize(config, plan_size);
 }
@@ -6485,8 +6530,8 @@ template <bool exists = false> QorResult histogram(detail::Anything = {}, detail
 
 /** Reports how many bytes the buffer takes, at any alignment: 12 for each pixel of the region. C:
  *  qoriHOGGetBufferSize. */
-[[nodiscard]] inline QorResult hog_get_buffer_size(const QorHogPlan* plan, QorImageSize roi_size, int32_t*
-    buffer_size) noexcept {
+[[nodiscard]] inline QorResult hog_get_buffer_size(const QorHogPlan* plan, QorImageSize roi_size,
+    int32_t* buffer_size) noexcept {
     return qoriHOGGetBufferSize(plan, roi_size, buffer_size);
 }
 
@@ -6509,8 +6554,8 @@ template <unsigned k> inline auto hog_0() noexcept {
 /** Descriptors of windows by the orientations of their gradients (Dalal and Triggs 2005). C: qoriHOG. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::hog_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult hog(const A& src, const QorPoint2D* locations, int32_t n_locations, float* dst, const
-    QorHogPlan* plan, const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t* buffer) noexcept {
+[[nodiscard]] QorResult hog(const A& src, const QorPoint2D* locations, int32_t n_locations, float* dst,
+    const QorHogPlan* plan, const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::hog_0<k>()(srcV.data(), srcV.step(), srcV.size(), locations, n_locations, dst, plan,
@@ -6544,12 +6589,13 @@ template <unsigned k> inline auto lbp_3x3_1() noexcept {
     "qori::lbp_3x3: no such call. lbp_3x3(src, dst, [border]) or lbp_3x3(src, dst, [border], [mode]) of 8u, " \
     "32f->8u: C1"
 /** Local binary patterns of the eight neighbours: a bit is set where the neighbour is at least the pixel. Local
- *  binary patterns of the eight neighbours, whose order the caller chooses. C: qoriLBPImage3x3, qoriLBPImageMode3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Either<detail::Arg<F0, 6>,
-    detail::Arg<F1, 7>>, k>& border) noexcept {
+ *  binary patterns of the eight neighbours, whose order the caller chooses. C: qoriLBPImage3x3,
+ *  qoriLBPImageMode3x3. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst,
+    const detail::Edge<detail::Either<detail::Arg<F0, 6>, detail::Arg<F1, 7>>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6567,9 +6613,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6590,10 +6636,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border, uint8_t
-    mode) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border,
+    uint8_t mode) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6632,14 +6679,14 @@ template <unsigned k> inline auto lbp_5x5_1() noexcept {
 #define QORI_WORDS \
     "qori::lbp_5x5: no such call. lbp_5x5(src, dst, [border]) or lbp_5x5(src, dst, [border], [mode]) of 8u, " \
     "8u->16u, 32f->8u, 32f->16u: C1"
-/** Local binary patterns of neighbours two pixels away: a bit is set where the neighbour is at least the pixel. Local
- *  binary patterns of neighbours two pixels away, whose order the caller chooses. C: qoriLBPImage5x5,
+/** Local binary patterns of neighbours two pixels away: a bit is set where the neighbour is at least the pixel.
+ *  Local binary patterns of neighbours two pixels away, whose order the caller chooses. C: qoriLBPImage5x5,
  *  qoriLBPImageMode5x5. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Either<detail::Arg<F0, 6>,
-    detail::Arg<F1, 7>>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst,
+    const detail::Edge<detail::Either<detail::Arg<F0, 6>, detail::Arg<F1, 7>>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6657,9 +6704,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6680,10 +6727,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border, uint8_t
-    mode) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border,
+    uint8_t mode) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6712,13 +6760,13 @@ template <unsigned k> inline auto lbp_horizontal_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::lbp_horizontal: no such call. lbp_horizontal(src, dst, [border]) of 8u, 16u->8u: C1"
-/** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three rows. C:
- *  qoriLBPImageHorizCorr. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border)
-    noexcept {
+/** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three rows.
+ *  C: qoriLBPImageHorizCorr. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst,
+    const detail::Edge<detail::Arg<F0, 6>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6730,9 +6778,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6746,9 +6794,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6798,10 +6846,11 @@ template <unsigned k> inline auto lut_1() noexcept {
     "qori::lut: no such call. lut(src, dst, values, levels, n_levels) or lut(in_place(src), values, levels, " \
     "n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to constants: dst = pValues[k] where pLevels[k] <= src < pLevels[k + 1], else src. C: qoriLUT. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lut(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
-    detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels,
+    const detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6813,10 +6862,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_1<k>()), bool exists = false>
-[[nodiscard]] QorResult lut(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels, const
-    detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_1<k>()), bool exists = false>
+[[nodiscard]] QorResult lut(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
+    const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::lut_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels, detail::pass(n_levels));
@@ -6878,11 +6927,11 @@ template <unsigned k> inline auto lut_linear_1() noexcept {
     "lut_linear(in_place(src), values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to straight lines from pValues[k] at pLevels[k] to pValues[k + 1] at pLevels[k + 1]; else dst =
  *  src. C: qoriLUT_Linear. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lut_linear(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
-    detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_linear(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels,
+    const detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6894,8 +6943,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_linear_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_linear_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut_linear(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
     const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6907,9 +6956,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -6959,10 +7008,11 @@ template <unsigned k> inline auto lut_cubic_1() noexcept {
     "qori::lut_cubic: no such call. lut_cubic(src, dst, values, levels, n_levels) or lut_cubic(in_place(src), " \
     "values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to cubics through the nodes (pLevels, pValues) around them; else dst = src. C: qoriLUT_Cubic. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lut_cubic(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
-    detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_cubic(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels,
+    const detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6974,8 +7024,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_cubic_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_cubic_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut_cubic(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
     const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6987,9 +7037,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -7020,9 +7070,9 @@ template <unsigned k> inline auto filter_median_0() noexcept {
     "qori::filter_median: no such call. filter_median(src, dst, size) of 8u, 16u, 16s: C1 C3 C4 AC4; 32f: C1 C3" \
     " C4; 64f: C1"
 /** The median of a rectangle around an anchor, channel by channel. C: qoriFilterMedian. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7035,9 +7085,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_median(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_median(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -7045,15 +7095,15 @@ template <bool exists = false> QorResult filter_median(detail::Anything = {}, de
 
 /** Reports maskSize.width * maskSize.height * 4 bytes, which no function takes: qoriFilterMedian_32f allocates. C:
  *  qoriFilterMedianGetBufferSize_32f. */
-[[nodiscard]] inline QorResult filter_median_get_buffer_size_32f(QorImageSize roi_size, QorImageSize size, int32_t
-    num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_median_get_buffer_size_32f(QorImageSize roi_size, QorImageSize size,
+    int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterMedianGetBufferSize_32f(roi_size, size, num_channels, buffer_size);
 }
 
 /** Reports maskSize.width * maskSize.height * 8 bytes, which no function takes: qoriFilterMedian_64f allocates. C:
  *  qoriFilterMedianGetBufferSize_64f. */
-[[nodiscard]] inline QorResult filter_median_get_buffer_size_64f(QorImageSize roi_size, QorImageSize size, int32_t
-    num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_median_get_buffer_size_64f(QorImageSize roi_size, QorImageSize size,
+    int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterMedianGetBufferSize_64f(roi_size, size, num_channels, buffer_size);
 }
 
@@ -7077,9 +7127,9 @@ template <unsigned k> inline auto filter_median_horiz_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_median_horiz: no such call. filter_median_horiz(src, dst, mask) of 8u, 16s, 16u: C1 C3 C4 AC4"
 /** The median of 3 or 5 pixels of a row (mask3x1, mask5x1), channel by channel. C: qoriFilterMedianHoriz. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_horiz_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_horiz_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_horiz(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7120,9 +7170,9 @@ template <unsigned k> inline auto filter_median_vert_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_median_vert: no such call. filter_median_vert(src, dst, mask) of 8u, 16s, 16u: C1 C3 C4 AC4"
 /** The median of 3 or 5 pixels of a column (mask1x3, mask1x5), channel by channel. C: qoriFilterMedianVert. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_vert_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_vert_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_vert(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7159,11 +7209,11 @@ template <unsigned k> inline auto filter_median_cross_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::filter_median_cross: no such call. filter_median_cross(src, dst, mask) of 8u, 16s, 16u: C1 C3 AC4"
-/** The median of a pixel and those up to one or two away in its row and its column (mask3x3: 5 pixels, mask5x5: 9).
- *  C: qoriFilterMedianCross. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_cross_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+/** The median of a pixel and those up to one or two away in its row and its column (mask3x3: 5 pixels, mask5x5:
+ *  9). C: qoriFilterMedianCross. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_cross_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_cross(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7197,11 +7247,11 @@ template <unsigned k> inline auto filter_median_color_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::filter_median_color: no such call. filter_median_color(src, dst, mask) of 8u, 16s, 32f: C3 AC4"
-/** The colour median of a square: of its 9 or 25 pixels, the one with the smallest sum of distances to the others. C:
- *  qoriFilterMedianColor. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_color_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+/** The colour median of a square: of its 9 or 25 pixels, the one with the smallest sum of distances to the others.
+ *  C: qoriFilterMedianColor. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_color_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_color(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7231,9 +7281,9 @@ template <unsigned k> inline auto filter_median_weighted_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_median_weighted: no such call. filter_median_weighted(src, dst, weight) of 8u: C1"
 /** The median of 3 x 3 pixels of which the middle one counts `weight` times. C: qoriFilterMedianWeightedCenter3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_weighted_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_weighted_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_median_weighted(const A& src, B&& dst, int32_t weight) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7255,8 +7305,8 @@ template <bool exists = false> QorResult filter_median_weighted(detail::Anything
 #undef QORI_WORDS
 
 /** Reports how many bytes of work buffer a median with a border takes. C: qoriFilterMedianBorderGetBufferSize. */
-[[nodiscard]] inline QorResult filter_median_border_get_buffer_size(QorImageSize roi_size, QorImageSize size, int32_t
-    data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_median_border_get_buffer_size(QorImageSize roi_size, QorImageSize size,
+    int32_t data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterMedianBorderGetBufferSize(roi_size, size, data_type, num_channels, buffer_size);
 }
 
@@ -7273,11 +7323,11 @@ template <unsigned k> inline auto filter_median_border_0() noexcept {
     "qori::filter_median_border: no such call. filter_median_border(src, dst, size, [border], [buffer]) of 8u, " \
     "16u, 16s, 32f: C1"
 /** The median of a rectangle centred on each pixel, of odd sides, with a border. C: qoriFilterMedianBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size, const
-    detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_border_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -7293,11 +7343,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size, const
-    detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_border_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -7314,9 +7364,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_border_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7396,8 +7446,9 @@ template <unsigned k> inline auto mirror_1() noexcept {
     "32f: C1 C3 C4 AC4"
 /** Reflects an image about its horizontal or vertical axis, both, or a diagonal. Reflects an image about its
  *  horizontal or vertical axis, or both, in place. C: qoriMirror. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::mirror_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::mirror_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult mirror(const A& src, B&& dst, QorFlipAxis axis) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7410,8 +7461,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::mirror_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::mirror_1<k>()), bool exists = false>
 [[nodiscard]] QorResult mirror(const InPlace<TA, LA>& src, QorFlipAxis axis) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7465,10 +7516,11 @@ template <unsigned k> inline auto erode_3x3_1() noexcept {
 #define QORI_WORDS \
     "qori::erode_3x3: no such call. erode_3x3(src, dst) of 8u, 16u, 32f: C1 C3 C4 AC4; 64f: C1. " \
     "erode_3x3(in_place(src)) of 8u, 16u, 32f: C1 C3 C4 AC4"
-/** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel. Erosion by
- *  the 3 x 3 square in place. C: qoriErode3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::erode_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel. Erosion
+ *  by the 3 x 3 square in place. C: qoriErode3x3. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::erode_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult erode_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7480,8 +7532,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::erode_3x3_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::erode_3x3_1<k>()), bool exists = false>
 [[nodiscard]] QorResult erode_3x3(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7491,9 +7543,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -7535,11 +7587,11 @@ template <unsigned k> inline auto dilate_3x3_1() noexcept {
 #define QORI_WORDS \
     "qori::dilate_3x3: no such call. dilate_3x3(src, dst) of 8u, 16u, 32f: C1 C3 C4 AC4; 64f: C1. " \
     "dilate_3x3(in_place(src)) of 8u, 16u, 32f: C1 C3 C4 AC4"
-/** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel. Dilation by
- *  the 3 x 3 square in place. C: qoriDilate3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dilate_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+/** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel. Dilation
+ *  by the 3 x 3 square in place. C: qoriDilate3x3. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dilate_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dilate_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7551,8 +7603,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dilate_3x3_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dilate_3x3_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dilate_3x3(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7562,9 +7614,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -7602,10 +7654,11 @@ template <unsigned k> inline auto erode_1() noexcept {
 #define QORI_WORDS \
     "qori::erode: no such call. erode(src, dst, structure) of 8u, 16u, 32f: C1 C3 C4 AC4. erode(in_place(src), " \
     "structure) of 8u, 16u, 32f: C1 C3 AC4"
-/** Erosion by a mask of bytes: the smallest of the pixels under its non-zero bytes, channel by channel. Erosion by a
- *  mask of bytes in place. C: qoriErode. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::erode_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Erosion by a mask of bytes: the smallest of the pixels under its non-zero bytes, channel by channel. Erosion by
+ *  a mask of bytes in place. C: qoriErode. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::erode_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult erode(const A& src, B&& dst, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7618,8 +7671,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::erode_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::erode_1<k>()), bool exists = false>
 [[nodiscard]] QorResult erode(const InPlace<TA, LA>& src, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7670,10 +7723,11 @@ template <unsigned k> inline auto dilate_1() noexcept {
 #define QORI_WORDS \
     "qori::dilate: no such call. dilate(src, dst, structure) of 8u, 16u, 32f: C1 C3 C4 AC4. " \
     "dilate(in_place(src), structure) of 8u, 16u, 32f: C1 C3 AC4"
-/** Dilation by a mask of bytes: the largest of the pixels under its non-zero bytes, channel by channel. Dilation by a
- *  mask of bytes in place. C: qoriDilate. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dilate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Dilation by a mask of bytes: the largest of the pixels under its non-zero bytes, channel by channel. Dilation
+ *  by a mask of bytes in place. C: qoriDilate. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dilate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dilate(const A& src, B&& dst, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7686,10 +7740,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dilate_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dilate(const InPlace<TA, LA>& src, const detail::Weights<const uint8_t*>& structure) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dilate_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dilate(const InPlace<TA, LA>& src,
+    const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dilate_1<k>()(srcV.data(), srcV.step(), srcV.size(), structure.data(), structure.size(),
@@ -7737,8 +7791,8 @@ template <unsigned k> inline auto sum_1() noexcept {
 /** Adds the elements of each channel. C: qoriSum. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::sum_0<k>()),
     class F1 = decltype(detail::sum_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult sum(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k>
-    sum) noexcept {
+[[nodiscard]] QorResult sum(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> sum) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::sum_0<k>()(srcV.data(), srcV.step(), srcV.size(), sum.data);
@@ -7799,8 +7853,8 @@ template <unsigned k> inline auto mean_1() noexcept {
 /** Averages the elements of each channel: their sum over width * height. C: qoriMean. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::mean_0<k>()),
     class F1 = decltype(detail::mean_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k>
-    mean) noexcept {
+[[nodiscard]] QorResult mean(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> mean) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::mean_0<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data);
@@ -7814,8 +7868,8 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
 }
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::mean_1<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Arg<F0, 3>, k> mean, QorAccuracyHint hint) noexcept
-    {
+[[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Arg<F0, 3>, k> mean,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::mean_1<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data, hint);
@@ -7857,8 +7911,8 @@ template <unsigned k> inline auto norm_inf_0() noexcept {
 #define QORI_WORDS \
     "qori::norm_inf: no such call. norm_inf(src, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4; 32s: C1"
 /** Largest magnitude of each channel: max |src|. C: qoriNorm_Inf. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_inf_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_inf_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_inf(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7904,11 +7958,11 @@ template <unsigned k> inline auto norm_l1_1() noexcept {
     "qori::norm_l1: no such call. norm_l1(src, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_l1(src, norm, [hint]) " \
     "of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of each channel: sum |src|. C: qoriNorm_L1. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l1_0<k>()), class F1 = decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0,
-    bool exists = false>
-[[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>,
-    k> norm) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l1_0<k>()), class F1 = decltype(detail::norm_l1_1<k>()),
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l1(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l1_0<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data);
@@ -7920,10 +7974,10 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm, QorAccuracyHint hint)
-    noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l1_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
@@ -7968,11 +8022,11 @@ template <unsigned k> inline auto norm_l2_1() noexcept {
     "qori::norm_l2: no such call. norm_l2(src, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_l2(src, norm, [hint]) " \
     "of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of each channel: the square root of sum src^2. C: qoriNorm_L2. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l2_0<k>()), class F1 = decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0,
-    bool exists = false>
-[[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>,
-    k> norm) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l2_0<k>()), class F1 = decltype(detail::norm_l2_1<k>()),
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l2(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l2_0<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data);
@@ -7984,10 +8038,10 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm, QorAccuracyHint hint)
-    noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l2_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
@@ -8028,9 +8082,9 @@ template <unsigned k> inline auto norm_diff_inf_0() noexcept {
 #define QORI_WORDS \
     "qori::norm_diff_inf: no such call. norm_diff_inf(a, b, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest magnitude of the difference in each channel: max |src1 - src2|. C: qoriNormDiff_Inf. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_diff_inf(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -8042,9 +8096,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8078,11 +8132,11 @@ template <unsigned k> inline auto norm_diff_l1_1() noexcept {
     "qori::norm_diff_l1: no such call. norm_diff_l1(a, b, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_diff_l1(a, " \
     "b, norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|. C: qoriNormDiff_L1. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l1_0<k>()), class F1 = decltype(detail::norm_diff_l1_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l1_0<k>()), class F1 = decltype(detail::norm_diff_l1_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8099,9 +8153,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8114,9 +8168,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8150,11 +8204,11 @@ template <unsigned k> inline auto norm_diff_l2_1() noexcept {
     "qori::norm_diff_l2: no such call. norm_diff_l2(a, b, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_diff_l2(a, " \
     "b, norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2. C: qoriNormDiff_L2. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l2_0<k>()), class F1 = decltype(detail::norm_diff_l2_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l2_0<k>()), class F1 = decltype(detail::norm_diff_l2_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8171,9 +8225,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8186,9 +8240,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8218,9 +8272,9 @@ template <unsigned k> inline auto norm_rel_inf_0() noexcept {
 #define QORI_WORDS \
     "qori::norm_rel_inf: no such call. norm_rel_inf(a, b, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest magnitude of the difference over that of src2, per channel. C: qoriNormRel_Inf. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_rel_inf(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -8232,9 +8286,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8268,11 +8322,11 @@ template <unsigned k> inline auto norm_rel_l1_1() noexcept {
     "qori::norm_rel_l1: no such call. norm_rel_l1(a, b, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_rel_l1(a, b, " \
     "norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of the difference over that of src2, per channel. C: qoriNormRel_L1. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l1_0<k>()), class F1 = decltype(detail::norm_rel_l1_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l1_0<k>()), class F1 = decltype(detail::norm_rel_l1_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8288,9 +8342,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8303,9 +8357,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8340,11 +8394,11 @@ template <unsigned k> inline auto norm_rel_l2_1() noexcept {
     "norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares. C:
  *  qoriNormRel_L2. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l2_0<k>()), class F1 = decltype(detail::norm_rel_l2_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l2_0<k>()), class F1 = decltype(detail::norm_rel_l2_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8360,9 +8414,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8375,9 +8429,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8423,11 +8477,11 @@ template <unsigned k> inline auto dot_1() noexcept {
     "qori::dot: no such call. dot(a, b, dot) of 8u, 8s, 16u, 16s, 32u, 32s: C1 C3 C4 AC4. dot(a, b, dot, " \
     "[hint]) of 32f: C1 C3 C4 AC4"
 /** Dot product of two images, per channel: sum src1 * src2. C: qoriDotProd. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::dot_0<k>()), class F1 = decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1,
-    5>>, k> dot) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::dot_0<k>()), class F1 = decltype(detail::dot_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult dot(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> dot) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8443,10 +8497,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> dot, QorAccuracyHint hint)
-    noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> dot,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8467,8 +8522,8 @@ template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anyt
 
 /** Weighted sum of vectors: pDst[j] = sum over i of pWeights[i] * ppSrcRows[i][j]. C: qoriDotProdCol_32f_L2,
  *  qoriDotProdCol_64f_L2. */
-[[nodiscard]] inline QorResult sum_weighted_rows(const float* const* src, const float* weights, int32_t n_rows, float*
-    dst, int32_t len) noexcept {
+[[nodiscard]] inline QorResult sum_weighted_rows(const float* const* src, const float* weights, int32_t n_rows,
+    float* dst, int32_t len) noexcept {
     return qoriDotProdCol_32f_L2(src, weights, n_rows, dst, len);
 }
 [[nodiscard]] inline QorResult sum_weighted_rows(const double* const* src, const double* weights, int32_t n_rows,
@@ -8486,8 +8541,8 @@ template <unsigned k> inline auto otsu_threshold_0() noexcept {
     "qori::otsu_threshold: no such call. otsu_threshold(src, threshold) of 8u: C1"
 /** The threshold by Otsu's method: the level that sets the elements up to it and those above it furthest apart. C:
  *  qoriComputeThreshold_Otsu. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::otsu_threshold_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::otsu_threshold_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult otsu_threshold(const A& src, detail::Result<detail::Arg<F0, 3>, k> threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -8497,9 +8552,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8534,9 +8589,9 @@ template <unsigned k> inline auto lut_palette_1() noexcept {
     "of 8u, 16u: C3->C4"
 /** Looks elements up in a palette: dst = pTable[src AND (2^nBitSize - 1)]. Looks three channels up in palettes of
  *  their own and puts alpha before them. C: qoriLUTPalette. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_palette_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult lut_palette(const A& src, B&& dst, detail::Arg<F0, 5> table, int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -8549,11 +8604,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lut_palette(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table, int32_t
-    n_bit_size) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_palette_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_palette(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table,
+    int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8565,9 +8620,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lut_palette(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lut_palette(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8584,11 +8639,11 @@ template <unsigned k> inline auto lut_palette_swap_0() noexcept {
     "qori::lut_palette_swap: no such call. lut_palette_swap(src, dst, alpha, table, n_bit_size) of 8u, 16u: " \
     "C3->C4"
 /** Looks three channels up in palettes of their own, reverses them and puts alpha behind. C: qoriLUTPaletteSwap. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_swap_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lut_palette_swap(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table, int32_t
-    n_bit_size) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_palette_swap_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_palette_swap(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table,
+    int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8622,10 +8677,10 @@ template <unsigned k> inline auto resize_get_size_0() noexcept {
     "qori::resize_get_size: no such call. resize_get_size(src_size, dst_size, interpolation, antialias, " \
     "plan_size, init_buf_size) of 8u, 16u, 16s, 32f, 64f: C1"
 /** Reports how many bytes a plan and the buffer for its initialisation take. C: qoriResizeGetSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_size_0<k>()), bool exists =
-    false>
-[[nodiscard]] QorResult resize_get_size(QorImageSize src_size, QorImageSize dst_size, QorInterpolationKind
-    interpolation, int32_t antialias, int32_t* plan_size, int32_t* init_buf_size) noexcept {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_size_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_get_size(QorImageSize src_size, QorImageSize dst_size,
+    QorInterpolationKind interpolation, int32_t antialias, int32_t* plan_size, int32_t* init_buf_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_size_0<k>()(src_size, dst_size, interpolation, antialias, plan_size, init_buf_size);
     } else {
@@ -8650,8 +8705,8 @@ template <unsigned k> inline auto resize_get_buffer_size_0() noexcept {
     " of 8u, 16u, 16s, 32f, 64f: C1"
 /** Reports how many bytes of work buffer a tile takes; each thread needs a buffer of its own. C:
  *  qoriResizeGetBufferSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_buffer_size_0<k>()), bool
-    exists = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_buffer_size_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_get_buffer_size(const QorResizePlan* plan, QorImageSize dst_size, int32_t num_channels,
     int32_t* buf_size) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8678,8 +8733,8 @@ template <unsigned k> inline auto resize_get_border_size_0() noexcept {
     "64f: C1"
 /** Reports how many pixels around the source the filter of a plan may reach; zeros for nearest and super. C:
  *  qoriResizeGetBorderSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_border_size_0<k>()), bool
-    exists = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_border_size_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_get_border_size(const QorResizePlan* plan, QorBorderExtent* border) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_border_size_0<k>()(plan, border);
@@ -8705,10 +8760,10 @@ template <unsigned k> inline auto resize_get_src_offset_0() noexcept {
     " 16s, 32f, 64f: C1"
 /** Reports the source pixel at which pSrc must point for a tile: floor(dstOffset * source length / destination
  *  length). C: qoriResizeGetSrcOffset. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_offset_0<k>()), bool
-    exists = false>
-[[nodiscard]] QorResult resize_get_src_offset(const QorResizePlan* plan, QorPoint2D dst_offset, QorPoint2D*
-    src_offset) noexcept {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_offset_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_get_src_offset(const QorResizePlan* plan, QorPoint2D dst_offset,
+    QorPoint2D* src_offset) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_src_offset_0<k>()(plan, dst_offset, src_offset);
     } else {
@@ -8733,8 +8788,8 @@ template <unsigned k> inline auto resize_get_src_roi_0() noexcept {
     "16s, 32f, 64f: C1"
 /** Reports the smallest source rectangle that holds every pixel that a destination rectangle is made of. C:
  *  qoriResizeGetSrcRoi. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_roi_0<k>()), bool exists
-    = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_roi_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_get_src_roi(const QorResizePlan* plan, QorImageRect rect, QorImageRect* src_rect,
     QorImageRect* dst_rect) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8758,12 +8813,12 @@ template <unsigned k> inline auto resize_nearest_init_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_nearest_init: no such call. resize_nearest_init(src_size, dst_size, plan) of 8u, 16u, 16s, " \
     "32f: C1"
-/** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination - 1e-10).
- *  C: qoriResizeNearestInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_nearest_init_0<k>()), bool exists
-    = false>
-[[nodiscard]] QorResult resize_nearest_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan)
-    noexcept {
+/** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination -
+ *  1e-10). C: qoriResizeNearestInit. */
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_nearest_init_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_nearest_init(QorImageSize src_size, QorImageSize dst_size,
+    QorResizePlan* plan) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_nearest_init_0<k>()(src_size, dst_size, plan);
     } else {
@@ -8788,10 +8843,10 @@ template <unsigned k> inline auto resize_linear_init_0() noexcept {
     " 64f: C1"
 /** Fills the plan of a linear resize. The 8u plan holds 14-bit weights and serves 8u only; the others are one. C:
  *  qoriResizeLinearInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_linear_init_0<k>()), bool exists
-    = false>
-[[nodiscard]] QorResult resize_linear_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan) noexcept
-    {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_linear_init_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_linear_init(QorImageSize src_size, QorImageSize dst_size,
+    QorResizePlan* plan) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_linear_init_0<k>()(src_size, dst_size, plan);
     } else {
@@ -8813,10 +8868,10 @@ template <unsigned k> inline auto resize_cubic_init_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_cubic_init: no such call. resize_cubic_init(src_size, dst_size, b, c, plan, init_buf) of 8u, " \
     "16u, 16s, 32f: C1"
-/** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline. C:
- *  qoriResizeCubicInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_cubic_init_0<k>()), bool exists =
-    false>
+/** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline.
+ *  C: qoriResizeCubicInit. */
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_cubic_init_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_cubic_init(QorImageSize src_size, QorImageSize dst_size, float b, float c,
     QorResizePlan* plan, uint8_t* init_buf) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8842,8 +8897,8 @@ template <unsigned k> inline auto resize_lanczos_init_0() noexcept {
     " 8u, 16u, 16s, 32f: C1"
 /** Fills the plan of a Lanczos resize with 2 or 3 lobes; the weights of each position sum to 1. C:
  *  qoriResizeLanczosInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_lanczos_init_0<k>()), bool exists
-    = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_lanczos_init_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_lanczos_init(QorImageSize src_size, QorImageSize dst_size, uint32_t lobes,
     QorResizePlan* plan, uint8_t* init_buf) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8869,10 +8924,10 @@ template <unsigned k> inline auto resize_super_init_0() noexcept {
     "C1"
 /** Fills the plan of a super-sampling reduction: each pixel is the mean of the source area that it covers. C:
  *  qoriResizeSuperInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_super_init_0<k>()), bool exists =
-    false>
-[[nodiscard]] QorResult resize_super_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan) noexcept
-    {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_super_init_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_super_init(QorImageSize src_size, QorImageSize dst_size,
+    QorResizePlan* plan) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_super_init_0<k>()(src_size, dst_size, plan);
     } else {
@@ -8898,8 +8953,8 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 
 /** Fills the plan of a Lanczos resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f. C:
  *  qoriResizeAntialiasingLanczosInit. */
-[[nodiscard]] inline QorResult resize_antialiasing_lanczos_init(QorImageSize src_size, QorImageSize dst_size, uint32_t
-    lobes, QorResizePlan* plan, uint8_t* init_buf) noexcept {
+[[nodiscard]] inline QorResult resize_antialiasing_lanczos_init(QorImageSize src_size, QorImageSize dst_size,
+    uint32_t lobes, QorResizePlan* plan, uint8_t* init_buf) noexcept {
     return qoriResizeAntialiasingLanczosInit(src_size, dst_size, lobes, plan, init_buf);
 }
 
@@ -8924,11 +8979,11 @@ template <unsigned k> inline auto resize_nearest_0() noexcept {
     "qori::resize_nearest: no such call. resize_nearest(src, dst, offset, plan, buffer) of 8u, 16u, 16s, 32f: " \
     "C1 C3 C4"
 /** Resizes a tile by the nearest source pixel, moved bit for bit. C: qoriResizeNearest. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_nearest(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_nearest(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8939,9 +8994,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -8968,11 +9023,11 @@ template <unsigned k> inline auto resize_super_0() noexcept {
     "qori::resize_super: no such call. resize_super(src, dst, offset, plan, buffer) of 8u, 16u, 16s, 32f: C1 C3" \
     " C4"
 /** Reduces a tile to means of areas; integers round to nearest, ties to even. C: qoriResizeSuper. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_super_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_super(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_super_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_super(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8983,9 +9038,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_super(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_super(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9014,13 +9069,13 @@ template <unsigned k> inline auto resize_linear_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_linear: no such call. resize_linear(src, dst, offset, border, plan, buffer) of 8u, 16u, 16s, " \
     "32f, 64f: C1 C3 C4"
-/** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single precision.
- *  C: qoriResizeLinear. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_linear(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0, 7>,
-    k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single
+ *  precision. C: qoriResizeLinear. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_linear(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9031,9 +9086,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9059,13 +9114,13 @@ template <unsigned k> inline auto resize_cubic_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_cubic: no such call. resize_cubic(src, dst, offset, border, plan, buffer) of 8u, 16u, 16s, " \
     "32f: C1 C3 C4"
-/** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and saturate. C:
- *  qoriResizeCubic. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_cubic(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0, 7>,
-    k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and saturate.
+ *  C: qoriResizeCubic. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_cubic(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9076,9 +9131,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9104,12 +9159,13 @@ template <unsigned k> inline auto resize_lanczos_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_lanczos: no such call. resize_lanczos(src, dst, offset, border, plan, buffer) of 8u, 16u, " \
     "16s, 32f: C1 C3 C4"
-/** Resizes a tile by Lanczos filtering; integers round to nearest, ties to even, and saturate. C: qoriResizeLanczos. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_lanczos_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_lanczos(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0,
-    7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile by Lanczos filtering; integers round to nearest, ties to even, and saturate. C:
+ *  qoriResizeLanczos. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_lanczos_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_lanczos(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9120,9 +9176,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9148,13 +9204,13 @@ template <unsigned k> inline auto resize_antialiasing_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_antialiasing: no such call. resize_antialiasing(src, dst, offset, border, plan, buffer) of " \
     "8u, 16u, 16s, 32f: C1 C3 C4"
-/** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and saturate. C:
- *  qoriResizeAntialiasing. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_antialiasing_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult resize_antialiasing(const A& src, B&& dst, QorPoint2D offset, const
-    detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and saturate.
+ *  C: qoriResizeAntialiasing. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_antialiasing_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_antialiasing(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9223,9 +9279,9 @@ template <unsigned k> inline auto rescale_2() noexcept {
 /** Maps 0..255 linearly onto the whole range of the destination type. Maps 0..255 linearly onto vMin..vMax: dst =
  *  vMin + x * k, k = (vMax - vMin) / 255, in 32-bit float. Maps the whole range of the source type linearly onto
  *  0..255. C: qoriScale. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_0<k>()), class F1 = decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::rescale_0<k>()), class F1 = decltype(detail::rescale_2<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9242,8 +9298,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::rescale_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst, float low, float high) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9255,8 +9312,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst, QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9353,8 +9411,8 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
 }
 template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class F0 = decltype(detail::fill_1<k>()),
     detail::If<detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult fill(const detail::Value<detail::Arg<F0, 0>, k>& value, B&& dst, const View<const uint8_t,
-    C1>& mask) noexcept {
+[[nodiscard]] QorResult fill(const detail::Value<detail::Arg<F0, 0>, k>& value, B&& dst,
+    const View<const uint8_t, C1>& mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
         const auto& maskV = detail::view(mask);
@@ -9417,8 +9475,8 @@ template <unsigned k> inline auto multiply_packed_3() noexcept {
     " C1 C3 C4 AC4. multiply_packed(a, b, dst, [scale]) or multiply_packed(in_place(b), a, [scale]) of 16s, " \
     "32s: C1 C3 C4 AC4"
 /** Multiplies two packed spectra, each channel by itself: a convolution of their images. C: qoriMulPack. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_packed_0<k>()), class F1 = decltype(detail::multiply_packed_2<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_packed_0<k>()), class F1 = decltype(detail::multiply_packed_2<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9440,8 +9498,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_packed_1<k>()), class F1 = decltype(detail::multiply_packed_3<k>()),
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_packed_1<k>()), class F1 = decltype(detail::multiply_packed_3<k>()),
     detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9459,9 +9517,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_packed_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_packed_2<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9475,8 +9533,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_packed_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_packed_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -9515,10 +9573,11 @@ template <unsigned k> inline auto multiply_packed_conj_1() noexcept {
 #define QORI_WORDS \
     "qori::multiply_packed_conj: no such call. multiply_packed_conj(a, b, dst) or multiply_packed_conj(a, " \
     "in_place(b)) of 32f: C1 C3 C4 AC4"
-/** Multiplies a packed spectrum by the conjugate of a second one: a correlation of their images. C: qoriMulPackConj. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_packed_conj_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+/** Multiplies a packed spectrum by the conjugate of a second one: a correlation of their images. C:
+ *  qoriMulPackConj. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_packed_conj_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed_conj(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9532,8 +9591,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, detail::Out<InPlace<TB, LB>>>, class F0
-    = decltype(detail::multiply_packed_conj_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, detail::Out<InPlace<TB, LB>>>,
+    class F0 = decltype(detail::multiply_packed_conj_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed_conj(const A& a, const InPlace<TB, LB>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9571,8 +9630,8 @@ template <unsigned k> inline auto magnitude_packed_1() noexcept {
     "qori::magnitude_packed: no such call. magnitude_packed(src, dst) of 32f: C1 C3. magnitude_packed(src, dst," \
     " [scale]) of 16s, 32s: C1 C3"
 /** The magnitude of every frequency of a packed spectrum, as a full image. C: qoriMagnitudePack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::magnitude_packed_0<k>()), class F1 = decltype(detail::magnitude_packed_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::magnitude_packed_0<k>()), class F1 = decltype(detail::magnitude_packed_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult magnitude_packed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9590,9 +9649,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::magnitude_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::magnitude_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult magnitude_packed(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9631,8 +9690,8 @@ template <unsigned k> inline auto phase_packed_1() noexcept {
     "qori::phase_packed: no such call. phase_packed(src, dst) of 32f: C1 C3. phase_packed(src, dst, [scale]) of" \
     " 16s, 32s: C1 C3"
 /** The phase of every frequency of a packed spectrum, as a full image. C: qoriPhasePack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::phase_packed_0<k>()), class F1 = decltype(detail::phase_packed_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::phase_packed_0<k>()), class F1 = decltype(detail::phase_packed_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult phase_packed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9650,9 +9709,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::phase_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::phase_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult phase_packed(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9664,9 +9723,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult phase_packed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult phase_packed(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9682,9 +9741,9 @@ template <unsigned k> inline auto unpack_spectrum_0() noexcept {
 #define QORI_WORDS \
     "qori::unpack_spectrum: no such call. unpack_spectrum(src, dst) of 32f->32fc, 32s->32sc: C1"
 /** Every frequency of a packed spectrum, as a full complex image. C: qoriPackToCplxExtend. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::unpack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult unpack_spectrum(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9718,9 +9777,9 @@ template <unsigned k> inline auto pack_spectrum_0() noexcept {
 #define QORI_WORDS \
     "qori::pack_spectrum: no such call. pack_spectrum(src, dst) of 32fc->32f, 32sc->32s, 16sc->16s: C1 C3"
 /** Packs the spectrum of a real image that is given as a full complex one. C: qoriCplxExtendToPack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::pack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult pack_spectrum(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9732,9 +9791,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9806,10 +9865,12 @@ template <unsigned k> inline auto threshold_3() noexcept {
     "qori::threshold: no such call. threshold(src, dst, threshold, op) or threshold(in_place(src), threshold, " \
     "op) or threshold(src, dst, threshold, value, op) or threshold(in_place(src), threshold, value, op) of 8u, " \
     "16s, 16u, 32f: C1 C3 AC4"
-/** Clips to a threshold: dst = max(src, threshold) with cmpLess, min(src, threshold) with cmpGreater. Replaces what
- *  is less (cmpLess) or greater (cmpGreater) than a threshold by a value. C: qoriThreshold, qoriThreshold_Val. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Clips to a threshold: dst = max(src, threshold) with cmpLess, min(src, threshold) with cmpGreater. Replaces
+ *  what is less (cmpLess) or greater (cmpGreater) than a threshold by a value. C: qoriThreshold,
+ *  qoriThreshold_Val. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9823,8 +9884,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>& threshold,
     QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9835,10 +9896,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold, const
-    detail::Value<detail::Arg<F0, 6>, k>& value, QorCompareOp op) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
+    const detail::Value<detail::Arg<F0, 6>, k>& value, QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9850,8 +9912,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_3<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>& threshold,
     const detail::Value<detail::Arg<F0, 4>, k>& value, QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9863,9 +9925,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult threshold(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -9945,13 +10007,13 @@ template <unsigned k> inline auto threshold_gt_3() noexcept {
     "qori::threshold_gt: no such call. threshold_gt(src, dst, threshold) or threshold_gt(in_place(src), " \
     "threshold) of 8u, 16s, 16u, 32f: C1 C3 AC4. threshold_gt(src, dst, threshold, value) or " \
     "threshold_gt(in_place(src), threshold, value) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
-/** Clips above a threshold: dst = src > threshold ? threshold : src. Replaces what exceeds a threshold: dst = src >
- *  threshold ? value : src. C: qoriThreshold_GT, qoriThreshold_GTVal. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_gt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult threshold_gt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold)
-    noexcept {
+/** Clips above a threshold: dst = src > threshold ? threshold : src. Replaces what exceeds a threshold: dst = src
+ *  > threshold ? value : src. C: qoriThreshold_GT, qoriThreshold_GTVal. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_gt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult threshold_gt(const A& src, B&& dst,
+    const detail::Value<detail::Arg<F0, 5>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9963,10 +10025,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_gt_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_gt_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_gt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
@@ -9975,9 +10037,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_gt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_gt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold_gt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     const detail::Value<detail::Arg<F0, 6>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9991,10 +10053,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_gt_3<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold, const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_gt_3<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold,
+    const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_gt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
@@ -10004,9 +10067,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -10086,13 +10149,13 @@ template <unsigned k> inline auto threshold_lt_3() noexcept {
     "qori::threshold_lt: no such call. threshold_lt(src, dst, threshold) or threshold_lt(in_place(src), " \
     "threshold) of 8u, 16s, 16u, 32f: C1 C3 AC4. threshold_lt(src, dst, threshold, value) or " \
     "threshold_lt(in_place(src), threshold, value) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
-/** Clips below a threshold: dst = src < threshold ? threshold : src. Replaces what falls below a threshold: dst = src
- *  < threshold ? value : src. C: qoriThreshold_LT, qoriThreshold_LTVal. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_lt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult threshold_lt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold)
-    noexcept {
+/** Clips below a threshold: dst = src < threshold ? threshold : src. Replaces what falls below a threshold: dst =
+ *  src < threshold ? value : src. C: qoriThreshold_LT, qoriThreshold_LTVal. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_lt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult threshold_lt(const A& src, B&& dst,
+    const detail::Value<detail::Arg<F0, 5>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10104,10 +10167,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_lt_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_lt_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_lt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
@@ -10116,9 +10179,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_lt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_lt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold_lt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     const detail::Value<detail::Arg<F0, 6>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10132,10 +10195,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_lt_3<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold, const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_lt_3<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold,
+    const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_lt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
@@ -10145,9 +10209,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -10191,12 +10255,12 @@ template <unsigned k> inline auto threshold_outside_1() noexcept {
     "AC4"
 /** Replaces on both sides: dst = src < thresholdLT ? valueLT : src > thresholdGT ? valueGT : src. C:
  *  qoriThreshold_LTValGTVal. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_outside_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_outside_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold_outside(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& below,
-    const detail::Value<detail::Arg<F0, 6>, k>& value_below, const detail::Value<detail::Arg<F0, 7>, k>& above, const
-    detail::Value<detail::Arg<F0, 8>, k>& value_above) noexcept {
+    const detail::Value<detail::Arg<F0, 6>, k>& value_below, const detail::Value<detail::Arg<F0, 7>, k>& above,
+    const detail::Value<detail::Arg<F0, 8>, k>& value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10208,10 +10272,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_outside_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_outside(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    below, const detail::Value<detail::Arg<F0, 4>, k>& value_below, const detail::Value<detail::Arg<F0, 5>, k>& above,
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_outside_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_outside(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& below, const detail::Value<detail::Arg<F0, 4>, k>& value_below,
+    const detail::Value<detail::Arg<F0, 5>, k>& above,
     const detail::Value<detail::Arg<F0, 6>, k>& value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10251,14 +10316,15 @@ template <unsigned k> inline auto threshold_adaptive_box_1() noexcept {
     "qori::threshold_adaptive_box: no such call. threshold_adaptive_box(src, dst, size, delta, [border], " \
     "[value_above], [value_below], [buffer]) or threshold_adaptive_box(in_place(src), size, delta, [border], " \
     "[value_above], [value_below], [buffer]) of 8u: C1"
-/** valGT where the source is greater than the mean of the square around it minus delta, else valLE. In place, valGT
- *  where a pixel is greater than the mean of the square around it minus delta, else valLE. C:
+/** valGT where the source is greater than the mean of the square around it minus delta, else valLE. In place,
+ *  valGT where a pixel is greater than the mean of the square around it minus delta, else valLE. C:
  *  qoriThresholdAdaptiveBox. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below, Buffer& buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below,
+    Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10275,11 +10341,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10297,11 +10363,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10318,11 +10384,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10339,9 +10405,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10360,10 +10426,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below, Buffer& buffer) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below,
+    Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         int32_t bytes = 0;
@@ -10377,10 +10444,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         Buffer buffer;
@@ -10395,10 +10462,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         Buffer buffer;
@@ -10413,10 +10480,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         Buffer buffer;
@@ -10431,8 +10498,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10465,8 +10532,8 @@ template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything
 }
 
 /** Makes the weights of an adaptive threshold. C: qoriThresholdAdaptiveGaussInit. */
-[[nodiscard]] inline QorResult threshold_adaptive_gauss_init(QorImageSize roi_size, QorImageSize size, int32_t
-    data_type, int32_t num_channels, float sigma, QorAdaptiveGaussSpec* plan) noexcept {
+[[nodiscard]] inline QorResult threshold_adaptive_gauss_init(QorImageSize roi_size, QorImageSize size,
+    int32_t data_type, int32_t num_channels, float sigma, QorAdaptiveGaussSpec* plan) noexcept {
     return qoriThresholdAdaptiveGaussInit(roi_size, size, data_type, num_channels, sigma, plan);
 }
 
@@ -10485,14 +10552,14 @@ template <unsigned k> inline auto threshold_adaptive_gauss_1() noexcept {
     "value_below, border, plan, buffer) or threshold_adaptive_gauss(in_place(src), delta, value_above, " \
     "value_below, border, plan, buffer) of 8u: C1"
 /** valGT where the source is greater than the weighted mean of the square around it minus delta, else valLE. In
- *  place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else valLE. C:
- *  qoriThresholdAdaptiveGauss. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_gauss(const A& src, B&& dst, float delta, uint8_t value_above, uint8_t
-    value_below, const detail::Edge<detail::Arg<F0, 9>, k>& border, const QorAdaptiveGaussSpec* plan, uint8_t* buffer)
-    noexcept {
+ *  place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else valLE.
+ *  C: qoriThresholdAdaptiveGauss. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_gauss_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_gauss(const A& src, B&& dst, float delta, uint8_t value_above,
+    uint8_t value_below, const detail::Edge<detail::Arg<F0, 9>, k>& border, const QorAdaptiveGaussSpec* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10505,11 +10572,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_gauss_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_gauss(const InPlace<TA, LA>& src, float delta, uint8_t value_above, uint8_t
-    value_below, const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorAdaptiveGaussSpec* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_gauss_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_gauss(const InPlace<TA, LA>& src, float delta, uint8_t value_above,
+    uint8_t value_below, const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorAdaptiveGaussSpec* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_adaptive_gauss_1<k>()(srcV.data(), srcV.step(), srcV.size(), delta, value_above,
@@ -10537,36 +10604,40 @@ template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anythi
 [[nodiscard]] inline QorResult warp_affine_get_size(QorImageSize src_size, QorImageSize dst_size, int32_t data_type,
     const double* matrix, QorInterpolationKind interpolation, int32_t inverse, int32_t border, int32_t* plan_size,
     int32_t* init_buf_size) noexcept {
-    return qoriWarpAffineGetSize(src_size, dst_size, data_type, matrix, interpolation, inverse, border, plan_size, init_buf_size);
+    return qoriWarpAffineGetSize(src_size, dst_size, data_type, matrix, interpolation, inverse, border, plan_size,
+        init_buf_size);
 }
 
 /** Fills the plan of a warp by the nearest pixel. Arguments and statuses as for qoriWarpAffineLinearInit. C:
  *  qoriWarpAffineNearestInit. */
-[[nodiscard]] inline QorResult warp_affine_nearest_init(QorImageSize src_size, QorImageSize dst_size, int32_t
-    data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border, const double*
-    border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
-    return qoriWarpAffineNearestInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border, border_value, smooth_edge, plan);
+[[nodiscard]] inline QorResult warp_affine_nearest_init(QorImageSize src_size, QorImageSize dst_size,
+    int32_t data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border,
+    const double* border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
+    return qoriWarpAffineNearestInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border,
+        border_value, smooth_edge, plan);
 }
 
 /** Fills the plan of a linear warp, for one element type and channel count. C: qoriWarpAffineLinearInit. */
-[[nodiscard]] inline QorResult warp_affine_linear_init(QorImageSize src_size, QorImageSize dst_size, int32_t
-    data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border, const double*
-    border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
-    return qoriWarpAffineLinearInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border, border_value, smooth_edge, plan);
+[[nodiscard]] inline QorResult warp_affine_linear_init(QorImageSize src_size, QorImageSize dst_size,
+    int32_t data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border,
+    const double* border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
+    return qoriWarpAffineLinearInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border,
+        border_value, smooth_edge, plan);
 }
 
 /** Fills the plan of a cubic warp from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline. C:
  *  qoriWarpAffineCubicInit. */
 [[nodiscard]] inline QorResult warp_affine_cubic_init(QorImageSize src_size, QorImageSize dst_size, int32_t data_type,
-    const double* matrix, int32_t inverse, int32_t num_channels, double b, double c, int32_t border, const double*
-    border_value, int32_t smooth_edge, QorWarpPlan* plan, uint8_t* init_buf) noexcept {
-    return qoriWarpAffineCubicInit(src_size, dst_size, data_type, matrix, inverse, num_channels, b, c, border, border_value, smooth_edge, plan, init_buf);
+    const double* matrix, int32_t inverse, int32_t num_channels, double b, double c, int32_t border,
+    const double* border_value, int32_t smooth_edge, QorWarpPlan* plan, uint8_t* init_buf) noexcept {
+    return qoriWarpAffineCubicInit(src_size, dst_size, data_type, matrix, inverse, num_channels, b, c, border,
+        border_value, smooth_edge, plan, init_buf);
 }
 
 /** Reports how many bytes of work buffer a tile takes, at least 64; each thread needs a buffer of its own. C:
  *  qoriWarpGetBufferSize. */
-[[nodiscard]] inline QorResult warp_get_buffer_size(const QorWarpPlan* plan, QorImageSize dst_size, int32_t* buf_size)
-    noexcept {
+[[nodiscard]] inline QorResult warp_get_buffer_size(const QorWarpPlan* plan, QorImageSize dst_size,
+    int32_t* buf_size) noexcept {
     return qoriWarpGetBufferSize(plan, dst_size, buf_size);
 }
 
@@ -10601,9 +10672,9 @@ template <unsigned k> inline auto warp_affine_nearest_0() noexcept {
     "16s, 32f, 64f: C1 C3 C4"
 /** Warps a tile: each destination pixel is the source pixel nearest to its position, moved bit for bit. C:
  *  qoriWarpAffineNearest. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::warp_affine_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult warp_affine_nearest(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
     uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10649,11 +10720,11 @@ template <unsigned k> inline auto warp_affine_linear_0() noexcept {
     "16s, 32f, 64f: C1 C3 C4"
 /** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single. C:
  *  qoriWarpAffineLinear. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult warp_affine_linear(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::warp_affine_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult warp_affine_linear(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10697,11 +10768,11 @@ template <unsigned k> inline auto warp_affine_cubic_0() noexcept {
     "32f, 64f: C1 C3 C4"
 /** Warps a tile by cubic filtering of 4 x 4 pixels: 64f and 32f in double precision, integers in single. C:
  *  qoriWarpAffineCubic. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult warp_affine_cubic(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::warp_affine_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult warp_affine_cubic(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10739,9 +10810,9 @@ template <unsigned k> inline auto sum_window_row_0() noexcept {
     " C1 C3 C4"
 /** dst(x, y) = the sum of src(x - anchor, y) to src(x - anchor + maskSize - 1, y), channel by channel. C:
  *  qoriSumWindowRow. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sum_window_row_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sum_window_row_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult sum_window_row(const A& src, B&& dst, int32_t size, int32_t anchor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10754,9 +10825,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -10781,9 +10852,9 @@ template <unsigned k> inline auto sum_window_column_0() noexcept {
     "16s->32f: C1 C3 C4"
 /** dst(x, y) = the sum of src(x, y - anchor) to src(x, y - anchor + maskSize - 1), channel by channel. C:
  *  qoriSumWindowColumn. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sum_window_column_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sum_window_column_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult sum_window_column(const A& src, B&& dst, int32_t size, int32_t anchor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A picture, its lower edge painted, made a quarter as wide and high; then how bright it is.
 #include <cstdio>
 #include "qori.hpp"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Pixels of a cv::Mat without a copy, and without this header knowing of it: a part of a picture, smoothed in grey.
 #include <cstdio>
 #include <opencv2/core.hpp>
@@ -11,5 +12,5 @@ int main() {
     check(copy(pixels.channel(1), View<uint8_t>(green)));
     check(filter_box_border(View<uint8_t>(green), View<uint8_t>(smooth), {21, 21}));
     std::printf("%d %d %d\n", smooth.at<uint8_t>(125, 125), smooth.at<uint8_t>(125, 100), smooth.at<uint8_t>(10, 10));
-    return View<float>(picture) ? 1 : 0;   // of other elements: no view
+    return View<float>(picture) ? 1 : 0;  // of other elements: no view
 }

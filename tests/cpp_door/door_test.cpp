@@ -5,6 +5,8 @@
 #include <gtest/gtest.h>
 
 #include <array>
+#include <span>
+#include <utility>
 #include <vector>
 
 #include "harness/companion/qorcore_instrumented.h"
@@ -90,6 +92,8 @@ TEST(Views, SpansHoldTheirPixels) {
     EXPECT_FALSE((View<uint8_t, C3>(pixels, {4, 4})));
     EXPECT_FALSE((View<uint8_t, C3>(pixels, {INT32_MAX, INT32_MAX})));
     EXPECT_FALSE((View<uint8_t, C3>(pixels, {-4, 3})));
+    EXPECT_TRUE((View<uint8_t, C3>(std::span(pixels).subspan(3), {3, 3})));
+    EXPECT_FALSE((View<uint8_t, C3>(std::span(pixels).subspan(1), {4, 3})));
     const std::array<float, 6> fixed{};
     EXPECT_TRUE((View<const float>(fixed, {2, 3})));
     static_assert(!std::is_constructible_v<View<float>, const std::array<float, 6>&, QorImageSize>);
@@ -273,7 +277,7 @@ TEST(Memory, OwnersMove) {
     Image<float, C3> a({5, 4});
     float* const pixels = a.at(0, 0);
     Image<float, C3> b(std::move(a));
-    EXPECT_FALSE(a);
+    EXPECT_FALSE(a);  // NOLINT(bugprone-use-after-move): what is left behind
     EXPECT_EQ(pixels, b.at(0, 0));
     a = std::move(b);
     EXPECT_EQ(pixels, a.at(0, 0));
