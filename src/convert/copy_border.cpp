@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // An image inside a larger one, with a frame around it.
+#include <algorithm>
+
 #include "frame/checks.h"
-#include "frame/streaming.h"
-#include "kernels/copy/select_rows.h"
+#include "move_rows.h"
 
 namespace qori::convert {
 namespace {
@@ -28,11 +29,16 @@ template <int bytes, bool keepAlpha>
 struct Rows {
     static constexpr int pixelBytes = bytes, colourBytes = bytes / 4 * 3;
 
-    static void copy(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
+    static void copy(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, RowWay way) {
         if constexpr (keepAlpha)
             kernels::selectRow<bytes, colourBytes>(dst, src, pixels);
         else
-            (streaming ? kernels::copyRowStreaming : kernels::copyRow)(dst, src, pixels * bytes);
+            (way == RowWay::strings ? kernels::copyRowString : kernels::copyRow)(dst, src, pixels * bytes);
+    }
+    static void move(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, QorImageSize size,
+                     RowWay way) {
+        if (size.height == 1) return copy(dst, src, size.width, way);
+        moveRows<bytes, keepAlpha>(dst, dstStep, src, srcStep, size, way);
     }
     static void fill(uint8_t* dst, const kernels::Pattern& pattern, ptrdiff_t pixels, bool streaming) {
         if (pixels == 0) return;
@@ -41,30 +47,49 @@ struct Rows {
         else
             (streaming ? kernels::fillRowStreaming : kernels::fillRow)(dst, pattern, pixels * bytes);
     }
-    static bool streams(const Frame& frame) {
-        return !keepAlpha && qori::streams(streamRules::copy, traffic(frame.dst, 2 * bytes));
+    static RowWay wayOf(const Frame& frame) {
+        const bool streaming = !keepAlpha && streams(streamRules::copy, traffic(frame.dst, 2 * bytes));
+        return rowWay(frame.dst, bytes, streaming);
     }
 };
 
 template <class T, Layout layout>
 using RowsOf = Rows<pixelSize<T, layout>, layout == Layout::AC4>;
 
+/// Calls body(first row, rows) for the rows of the source, one by one or as many at a time as stream together: what
+/// lies beside them is written while the ends of the rows are in the cache.
+template <class Body>
+QORI_INLINE void forGroups(const Frame& frame, RowWay way, Body body) {
+    if (way != RowWay::streams) {
+        for (int32_t y = 0; y < frame.src.height; ++y) body(y, 1);
+        return;
+    }
+    constexpr int32_t most = kernels::kStreamedTogether;
+    for (int64_t y = 0; y < frame.src.height; y += most)
+        body(static_cast<int32_t>(y), static_cast<int32_t>(std::min(int64_t{most}, frame.src.height - y)));
+}
+
 template <class R>
 void frameByConstant(const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t dstStep, const Frame& frame,
                      const kernels::Pattern& pattern) {
-    const bool streaming = R::streams(frame);
+    const RowWay way = R::wayOf(frame);
+    const bool streaming = way == RowWay::streams;
     const ptrdiff_t leftBytes = ptrdiff_t{frame.left} * R::pixelBytes,
                     srcBytes = ptrdiff_t{frame.src.width} * R::pixelBytes;
-    for (int32_t y = 0; y < frame.dst.height; ++y) {
-        uint8_t* const row = dst + ptrdiff_t{y} * dstStep;
-        if (y < frame.top || y >= frame.top + frame.src.height) {
-            R::fill(row, pattern, frame.dst.width, streaming);
-            continue;
-        }
-        R::fill(row, pattern, frame.left, streaming);
-        R::copy(row + leftBytes, src + ptrdiff_t{y - frame.top} * srcStep, frame.src.width, streaming);
-        R::fill(row + leftBytes + srcBytes, pattern, frame.right(), streaming);
-    }
+    const auto fillRows = [&](int32_t from, int32_t to) {
+        for (int32_t y = from; y < to; ++y) R::fill(dst + ptrdiff_t{y} * dstStep, pattern, frame.dst.width, streaming);
+    };
+    fillRows(0, frame.top);
+    forGroups(
+        frame, way, [&](int32_t y, int32_t rows) __attribute__((always_inline)) {
+            uint8_t* const inside = dst + ptrdiff_t{frame.top + y} * dstStep + leftBytes;
+            R::move(inside, dstStep, src + ptrdiff_t{y} * srcStep, srcStep, {frame.src.width, rows}, way);
+            for (int32_t k = 0; k < rows; ++k) {
+                R::fill(inside + k * ptrdiff_t{dstStep} - leftBytes, pattern, frame.left, streaming);
+                R::fill(inside + k * ptrdiff_t{dstStep} + srcBytes, pattern, frame.right(), streaming);
+            }
+        });
+    fillRows(frame.top + frame.src.height, frame.dst.height);
     if (streaming) streamFence();
 }
 
@@ -81,25 +106,26 @@ void replicateSides(uint8_t* inside, const uint8_t* src, const Frame& frame) {
 
 /// The frame above and below, once the rows of the source have their sides; `first` is the first of them.
 template <class R>
-void replicateEnds(uint8_t* first, int32_t step, const Frame& frame, bool streaming) {
-    const uint8_t* const last = first + ptrdiff_t{frame.src.height - 1} * step;
-    for (int32_t y = 1; y <= frame.top; ++y) R::copy(first - ptrdiff_t{y} * step, first, frame.dst.width, streaming);
-    for (int32_t y = 1; y <= frame.bottom(); ++y)
-        R::copy(first + ptrdiff_t{frame.src.height - 1 + y} * step, last, frame.dst.width, streaming);
+void replicateEnds(uint8_t* first, ptrdiff_t step, const Frame& frame, RowWay way) {
+    uint8_t* const last = first + (frame.src.height - 1) * step;
+    R::move(first - step, -step, first, 0, {frame.dst.width, frame.top}, way);
+    R::move(last + step, step, last, 0, {frame.dst.width, frame.bottom()}, way);
 }
 
 template <class R>
 void frameByNearest(const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t dstStep, const Frame& frame) {
-    const bool streaming = R::streams(frame);
+    const RowWay way = R::wayOf(frame);
     uint8_t* const first = dst + ptrdiff_t{frame.top} * dstStep;
-    for (int32_t y = 0; y < frame.src.height; ++y) {
-        uint8_t* const inside = first + ptrdiff_t{y} * dstStep + ptrdiff_t{frame.left} * R::pixelBytes;
-        const uint8_t* const from = src + ptrdiff_t{y} * srcStep;
-        R::copy(inside, from, frame.src.width, streaming);
-        replicateSides<R>(inside, from, frame);
-    }
-    replicateEnds<R>(first, dstStep, frame, streaming);
-    if (streaming) streamFence();
+    forGroups(
+        frame, way, [&](int32_t y, int32_t rows) __attribute__((always_inline)) {
+            uint8_t* const inside = first + ptrdiff_t{y} * dstStep + ptrdiff_t{frame.left} * R::pixelBytes;
+            const uint8_t* const from = src + ptrdiff_t{y} * srcStep;
+            R::move(inside, dstStep, from, srcStep, {frame.src.width, rows}, way);
+            for (int32_t k = 0; k < rows; ++k)
+                replicateSides<R>(inside + k * ptrdiff_t{dstStep}, from + k * ptrdiff_t{srcStep}, frame);
+        });
+    replicateEnds<R>(first, dstStep, frame, way);
+    if (way == RowWay::streams) streamFence();
 }
 
 template <class R>
@@ -108,7 +134,7 @@ void frameInPlace(uint8_t* image, int32_t step, const Frame& frame) {
         uint8_t* const row = image + ptrdiff_t{y} * step;
         replicateSides<R>(row, row, frame);
     }
-    replicateEnds<R>(image - ptrdiff_t{frame.left} * R::pixelBytes, step, frame, false);
+    replicateEnds<R>(image - ptrdiff_t{frame.left} * R::pixelBytes, step, frame, RowWay::vectors);
 }
 
 template <class T, Layout layout>

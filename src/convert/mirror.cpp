@@ -1,11 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 // Reflections. Whole pixels move, so that all types of one size share their kernels.
 #include "frame/checks.h"
-#include "frame/streaming.h"
 #include "image/driver.h"
-#include "kernels/copy/select_rows.h"
 #include "kernels/mirror/reverse_rows.h"
 #include "kernels/mirror/transpose.h"
+#include "move_rows.h"
 
 namespace qori::convert {
 namespace {
@@ -28,12 +27,6 @@ struct Moved {
     static constexpr bool keepAlpha = alphaKept;
 
     static uint8_t* pixel(uint8_t* row, int64_t x) { return row + static_cast<ptrdiff_t>(x * bytes); }
-    static void copy(uint8_t* dst, const uint8_t* src, ptrdiff_t pixels, bool streaming) {
-        if constexpr (alphaKept)
-            kernels::selectRow<bytes, bytes / 4 * 3>(dst, src, pixels);
-        else
-            (streaming ? kernels::copyRowStreaming : kernels::copyRow)(dst, src, pixels * bytes);
-    }
     static void swap(uint8_t* a, uint8_t* b, ptrdiff_t pixels) { kernels::swapRows<bytes, alphaKept>(a, b, pixels); }
     /// Pixels from `left` on with those before `rightEnd`.
     static void swapReversed(uint8_t* left, uint8_t* rightEnd, ptrdiff_t pixels) {
@@ -52,16 +45,20 @@ bool streamsOut(QorImageSize roi, int channels) {
     return streams(channels == 4 ? streamRules::widening : streamRules::copy, traffic(roi, 2 * M::pixelBytes));
 }
 
+constexpr int32_t kPage = 4096;
+
 template <class M>
 void reflect(Image<const uint8_t> src, Image<uint8_t> dst, QorImageSize roi, int32_t axis, bool streaming) {
-    if (axis == flipBothAxes && isOneRun(roi, walk(src, M::pixelBytes), walk(dst, M::pixelBytes)))
+    // What streams goes by several rows at a time, if they are of pages.
+    const bool keepsRows = streaming && roi.width >= kPage / M::pixelBytes;
+    if (axis == flipBothAxes && !keepsRows && isOneRun(roi, walk(src, M::pixelBytes), walk(dst, M::pixelBytes)))
         return reflect<M>(src, dst, {roi.width * roi.height, 1}, flipVerticalAxis, streaming);
     const uint8_t* const first = reversesRows(axis) ? src.row(roi.height - 1) : src.data;
     const ptrdiff_t step = reversesRows(axis) ? -ptrdiff_t{src.step} : src.step;
     if (reversesColumns(axis))
         return kernels::reverseRows<M::pixelBytes, M::keepAlpha>(dst.data, dst.step, first, step, roi.width, roi.height,
                                                                  streaming);
-    for (int32_t y = 0; y < roi.height; ++y) M::copy(dst.row(y), first + y * step, roi.width, streaming);
+    moveRows<M::pixelBytes, M::keepAlpha>(dst.data, dst.step, first, step, roi, rowWay(roi, M::pixelBytes, streaming));
 }
 
 /// Exchanges what belongs together from both ends towards the middle.

@@ -7,20 +7,29 @@
 
 namespace qori::filter {
 
+/// How many times as long as tiles histograms take for as many pixels, measured at 16 x 16 to 64 x 64: for squares with
+/// code of their own and for other masks, up to 9 x 9 and above.
+template <class T>
+constexpr int histogramsTake(bool hasCode, bool isSmall) {
+    if (!hasCode) return isSmall ? 4 : 2;
+    return isSmall ? 6 : sizeof(T) == 2 ? 3 : 2;
+}
+
 /// Whether tiles beat histograms. They cost what whole vectors of tiles cost, and at first as much as some 2,000 pixels
-/// for the lists of comparators. Against that they are as fast as histograms or up to twice as fast at 15 x 15, and two
-/// to nine times at 7 x 7 and 9 x 9. Larger masks and 64-bit elements gain nothing.
+/// for the lists of comparators, 500 where there is code instead. Larger masks and 64-bit elements gain nothing.
 template <class T>
 bool tilesPay(QorImageSize size, QorImageSize mask) {
     if constexpr (sizeof(T) == 8) return false;
     namespace tiles = kernels::tiles;
     if (std::max(mask.width, mask.height) > tiles::kMostMask) return false;
     const int32_t area = mask.width * mask.height;
-    const bool hasCode = mask.width == mask.height && mask.width <= tiles::kMostFixed;
+    const bool hasCode =
+        mask.width == mask.height && mask.width >= tiles::kLeastFixed && mask.width <= tiles::kMostFixed;
     if (area > (sizeof(T) == 2 || hasCode ? 15 * 15 : 11 * 11)) return false;
     const int64_t width = int64_t{tiles::sideOf(mask.width)} * Vec<T>::lanes, height = tiles::sideOf(mask.height);
     const int64_t made = roundUp(size.width, width) * roundUp(size.height, height);
-    return (area <= 81 ? 4 : 2) * int64_t{size.width} * size.height >= made + 2000;
+    const int64_t others = int64_t{size.width} * size.height * histogramsTake<T>(hasCode, area <= 81);
+    return others >= made + (hasCode ? 500 : 2000);
 }
 
 template <class T>

@@ -40,6 +40,16 @@ void sweepRectangles(Function function, QorImageSize mask, const std::vector<Sha
     forShapes(shapes, [=](const Shape& shape) { checkRectangle<T, L>(function, shape, mask, drawAnchor(mask)); });
 }
 
+/// Of tiles, squares with code of their own and others, and the first ones beyond.
+constexpr QorImageSize kTiledMasks[] = {{7, 7},   {15, 15}, {7, 13},  {9, 9},   {17, 17}, {21, 3},  {11, 11},
+                                        {19, 19}, {3, 31},  {13, 13}, {21, 21}, {1, 9},   {23, 23}, {25, 11}};
+
+/// Counts the members.
+int nextTurn() {
+    static int turn = 0;
+    return turn++;
+}
+
 template <class T, Layout L, class Function>
 void median(const char* name, Function function) {
     const std::vector<Shape> shapes = windowShapes(9);
@@ -55,9 +65,11 @@ void median(const char* name, Function function) {
     // Several pieces, strips and bins of columns, both ways; the longer rows of 5 x 5.
     sweepRectangles<T, L>(function, {7, 3}, {{.width = 420, .height = 230}, {.width = 900, .height = 3, .padding = 3}});
     sweepRectangles<T, L>(function, {5, 5}, {{.width = 600, .height = 70}});
-    // Several vectors of tiles, the last ones in part, in both directions.
-    for (QorImageSize mask : {QorImageSize{7, 7}, {15, 15}, {7, 13}, {21, 3}, {3, 31}, {1, 9}, {17, 17}, {25, 11}})
-        if (random().oneIn(3))
+    // Several vectors of tiles, the last ones in part, in both directions: every third mask, so that each is met by
+    // members of every size of elements.
+    int index = nextTurn();
+    for (QorImageSize mask : kTiledMasks)
+        if (index++ % 3 == 0)
             sweepRectangles<T, L>(function, mask,
                                   {{.width = (mask.width < 7 ? 70 : 270) + random().below(30),
                                     .height = 33 + random().below(8),

@@ -56,11 +56,11 @@ QORI_INLINE void join(Vec<T>& even, Vec<T>& odd) {
 
 inline constexpr int kMost = 16;
 
-/// n vectors of a row (a power of two up to kMost) become n planes of a vector each: plane p has elements p, p + n, ...
-template <class T>
-QORI_INLINE void fromRow(Vec<T>* v, int n) {
-    Vec<T> t[kMost];
-    // A step takes the lowest bit of an element's number to the top; after log2(n) of them the plane's number is there.
+/// n vectors of a row become n planes of a vector each: plane p has elements p, p + n, ... A step takes the lowest bit
+/// of an element's number to the top; after log2(n) of them the plane's number is there.
+template <int n, class T>
+QORI_INLINE void splitAll(Vec<T>* v) {
+    Vec<T> t[n];
     for (int step = 1; step < n; step *= 2) {
         for (int i = 0; i < n / 2; ++i) {
             Vec<T> even = v[2 * i], odd = v[2 * i + 1];
@@ -70,11 +70,9 @@ QORI_INLINE void fromRow(Vec<T>* v, int n) {
         for (int i = 0; i < n; ++i) v[i] = t[i];
     }
 }
-
-/// Undoes it.
-template <class T>
-QORI_INLINE void toRow(Vec<T>* v, int n) {
-    Vec<T> t[kMost];
+template <int n, class T>
+QORI_INLINE void joinAll(Vec<T>* v) {
+    Vec<T> t[n];
     for (int step = 1; step < n; step *= 2) {
         for (int i = 0; i < n / 2; ++i) {
             Vec<T> even = v[i], odd = v[i + n / 2];
@@ -82,6 +80,30 @@ QORI_INLINE void toRow(Vec<T>* v, int n) {
             t[2 * i] = even, t[2 * i + 1] = odd;
         }
         for (int i = 0; i < n; ++i) v[i] = t[i];
+    }
+}
+
+/// Of n vectors, a power of two up to kMost.
+template <class T>
+QORI_INLINE void fromRow(Vec<T>* v, int n) {
+    switch (n) {
+        case 2: return splitAll<2>(v);
+        case 4: return splitAll<4>(v);
+        case 8: return splitAll<8>(v);
+        case 16: return splitAll<16>(v);
+        default: return;
+    }
+}
+
+/// Undoes it.
+template <class T>
+QORI_INLINE void toRow(Vec<T>* v, int n) {
+    switch (n) {
+        case 2: return joinAll<2>(v);
+        case 4: return joinAll<4>(v);
+        case 8: return joinAll<8>(v);
+        case 16: return joinAll<16>(v);
+        default: return;
     }
 }
 

@@ -73,21 +73,24 @@ struct MergeShape {
     constexpr bool operator==(const MergeShape&) const = default;
 };
 
-inline constexpr int32_t kLongestFixed = 100, kMostFixed = 15;
+inline constexpr int32_t kLongestFixed = 144, kLeastFixed = 7, kMostFixed = 15;
 
-/// Merges with code of their own: those up to kLongestFixed elements of square masks up to kMostFixed.
+/// How the tiles of square masks are halved.
+template <int side>
+inline constexpr Halvings kHalvings{QorImageSize{side, side}};
+
+/// The merges of square masks of kLeastFixed to kMostFixed, all of which have code of their own.
 struct FixedShapes {
     std::array<MergeShape, 80> shape{};
     int count = 0;
 
     constexpr void add(MergeShape s) {
-        if (s.first + s.second > kLongestFixed) return;
         for (int i = 0; i < count; ++i)
             if (shape[static_cast<size_t>(i)] == s) return;
         shape[static_cast<size_t>(count++)] = s;
     }
     constexpr FixedShapes() {
-        for (int32_t side = 7; side <= kMostFixed; side += 2) {
+        for (int32_t side = kLeastFixed; side <= kMostFixed; side += 2) {
             const Halvings halvings(QorImageSize{side, side});
             for (int i = 0; i < halvings.levels; ++i) {
                 const Halving& h = halvings.level[static_cast<size_t>(i)];
@@ -102,7 +105,7 @@ struct FixedShapes {
 inline constexpr FixedShapes kFixedShapes;
 
 /// Its number among them, or -1.
-inline int numberOfFixed(const MergeShape& shape) {
+constexpr int numberOfFixed(const MergeShape& shape) {
     for (int i = 0; i < kFixedShapes.count; ++i)
         if (kFixedShapes.shape[static_cast<size_t>(i)] == shape) return i;
     return -1;

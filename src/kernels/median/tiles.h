@@ -44,10 +44,11 @@ template <class Memory>
 Merge mergeOf(Memory& memory, int32_t first, int32_t second, int32_t begin, int32_t end) {
     Merge merge;
     merge.first = first, merge.second = second, merge.begin = begin, merge.end = end;
+    merge.fixed = numberOfFixed({first, second, begin, end});
+    if (merge.fixed >= 0) return merge;
     merge.rest.list = memory.template take<Comparator>(comparators::mostToMerge(first, second));
     comparators::pairRuns(merge);
     if (merge.rest.list != nullptr) comparators::listSteps(merge);
-    merge.fixed = numberOfFixed({first, second, begin, end});
     return merge;
 }
 
@@ -76,6 +77,9 @@ public:
 
     /// Two trees of a kind have buffers of their own each.
     const V* run(const V* runs) const;
+    /// The same of a square mask: so many runs of one length, a power of two of them.
+    template <int runs, int length, int round = 0>
+    const V* runFixed(const V* from) const;
 
 private:
     struct Round {
@@ -158,6 +162,10 @@ private:
 
     /// The medians of a tile at that pixel, given its core and the extra runs of columns and of rows.
     void halve(const Level* level, const V* core, Extras columns, Extras rows, QorPoint2D at);
+    template <int side, int index>
+    QORI_NOINLINE void halveSquare(const V* core, Extras columns, Extras rows, QorPoint2D at);
+    template <int side, int index>
+    QORI_NOINLINE void lengthenSquare(const Extras& other, QorPoint2D at);
     /// The extra runs of the other side reach as far as the halves' cores, and so beyond the tile's by corners.
     void lengthen(const Level* level, const Extras& other, QorPoint2D at);
 

@@ -67,13 +67,22 @@ QORI_NOINLINE void mergeTwo(const Merge& merge, const Operands<V>& a, const Oper
     compare<2>(merge.rest, a.to, b.to);
 }
 
+/// A run of so many elements, of which the list is.
 template <class V>
-QORI_NOINLINE void sortOne(const Comparators& sort, V* a) {
-    compare<1>(sort, a, a);
+QORI_NOINLINE void sortOne(const Comparators& sort, int32_t length, V* a) {
+    switch (length) {
+        case 2: return sortStraight<2>(a);
+        case 4: return sortStraight<4>(a);
+        case 6: return sortStraight<6>(a);
+        case 8: return sortStraight<8>(a);
+        default: return compare<1>(sort, a, a);
+    }
 }
 template <class V>
-QORI_NOINLINE void sortTwo(const Comparators& sort, V* a, V* b) {
-    compare<2>(sort, a, b);
+QORI_NOINLINE void sortTwo(const Comparators& sort, int32_t length, V* a, V* b) {
+    if (length > 8 || length % 2 != 0) return compare<2>(sort, a, b);
+    sortOne(sort, length, a);
+    sortOne(sort, length, b);
 }
 
 /// The element of that rank of two ascending runs: wherever the first so many of one and the rest of the other are
@@ -108,6 +117,19 @@ const V* MergeTree<V>::run(const V* runs) const {
     return runs;
 }
 
+template <class V>
+template <int runs, int length, int round>
+QORI_INLINE const V* MergeTree<V>::runFixed(const V* from) const {
+    if constexpr (runs == 1) {
+        return from;
+    } else {
+        V* const to = buffers_[round % 2];
+        for (int i = 0; i < runs; i += 2)
+            mergeFixed<kWholeMerge<length, length>>(from + i * length, from + (i + 1) * length, to + i * length);
+        return runFixed<runs / 2, 2 * length, round + 1>(to);
+    }
+}
+
 }  // namespace tiles
 
 template <class K>
@@ -119,19 +141,27 @@ void MedianTiles<K>::run(const K* const* rows, const ptrdiff_t* columns, V* medi
         for (int32_t i = 0; i < columnLength_; ++i) columns_[x * columnLength_ + i] = element(x, top + i);
     int32_t x = 0;
     for (; x + 2 <= seen; x += 2)
-        tiles::sortTwo(columnSort_, columns_ + x * columnLength_, columns_ + (x + 1) * columnLength_);
-    if (x < seen) tiles::sortOne(columnSort_, columns_ + x * columnLength_);
+        tiles::sortTwo(columnSort_, columnLength_, columns_ + x * columnLength_, columns_ + (x + 1) * columnLength_);
+    if (x < seen) tiles::sortOne(columnSort_, columnLength_, columns_ + x * columnLength_);
     for (int32_t y = 0; y < top; ++y) {
         V *const above = rows_ + y * rowLength_, *const beneath = rows_ + (top + y) * rowLength_;
         for (int32_t i = 0; i < rowLength_; ++i) {
             above[i] = element(left + i, y);
             beneath[i] = element(left + i, mask_.height + y);
         }
-        tiles::sortTwo(rowSort_, above, beneath);
+        tiles::sortTwo(rowSort_, rowLength_, above, beneath);
     }
-    halve(levels_, core_.run(columns_ + left * columnLength_) + coreBegin_,
-          {columns_, columns_ + mask_.width * columnLength_, columnLength_},
-          {rows_, rows_ + top * rowLength_, rowLength_}, {0, 0});
+    const V* const core = core_.run(columns_ + left * columnLength_) + coreBegin_;
+    const Extras columnsBeside{columns_, columns_ + mask_.width * columnLength_, columnLength_};
+    const Extras rowsBeside{rows_, rows_ + top * rowLength_, rowLength_};
+    switch (mask_.width == mask_.height ? mask_.width : 0) {
+        case 7: return halveSquare<7, 0>(core, columnsBeside, rowsBeside, {0, 0});
+        case 9: return halveSquare<9, 0>(core, columnsBeside, rowsBeside, {0, 0});
+        case 11: return halveSquare<11, 0>(core, columnsBeside, rowsBeside, {0, 0});
+        case 13: return halveSquare<13, 0>(core, columnsBeside, rowsBeside, {0, 0});
+        case 15: return halveSquare<15, 0>(core, columnsBeside, rowsBeside, {0, 0});
+        default: return halve(levels_, core, columnsBeside, rowsBeside, {0, 0});
+    }
 }
 
 template <class K>
@@ -170,12 +200,67 @@ void MedianTiles<K>::lengthen(const Level* level, const Extras& other, QorPoint2
             for (int k = 0; k < 2; ++k)
                 for (int32_t j = 0; j < level->half; ++j)
                     level->corner[k][j] = across ? element(begin[k] + j, line) : element(line, begin[k] + j);
-            if (level->half > 1) tiles::sortTwo(level->cornerSort, level->corner[0], level->corner[1]);
+            if (level->half > 1) tiles::sortTwo(level->cornerSort, level->half, level->corner[0], level->corner[1]);
             const V* const run = (side == 0 ? other.before : other.behind) + i * other.length;
             const ptrdiff_t to = (side * level->others + i) * ptrdiff_t{level->corners.length()};
             tiles::mergeTwo<V>(level->corners, {run, level->corner[0], level->longer[0] + to},
                                {run, level->corner[1], level->longer[1] + to});
         }
+}
+
+// --- square masks: the same, of constants ---------------------------------------------------------------------------
+
+template <class K>
+template <int side, int index>
+void MedianTiles<K>::halveSquare(const V* core, Extras columns, Extras rows, QorPoint2D at) {
+    constexpr tiles::Halving h = tiles::kHalvings<side>.level[index];
+    const Level& level = levels_[index];
+    const Extras &along = h.isAcross ? columns : rows, &other = h.isAcross ? rows : columns;
+    const V* const added[2] = {
+        level.added[0].template runFixed<h.half, h.length>(along.before + (h.half - 1) * h.length),
+        level.added[1].template runFixed<h.half, h.length>(along.behind)};
+    const QorPoint2D half[2] = {at, h.isAcross ? QorPoint2D{at.x + h.half, at.y} : QorPoint2D{at.x, at.y + h.half}};
+    if constexpr (h.isLast) {
+        for (int k = 0; k < 2; ++k)
+            to_[half[k].y * tiles::kHalvings<side>.tile.width + half[k].x] =
+                tiles::selectStraight<h.coreCount, h.addedCount(), h.rank>(core, added[k]);
+    } else {
+        constexpr int number = tiles::numberOfFixed({h.coreCount, h.addedCount(), h.begin, h.end});
+        for (int k = 0; k < 2; ++k) tiles::mergeFixed<number>(core, added[k], level.cores[k]);
+        lengthenSquare<side, index>(other, at);
+        constexpr ptrdiff_t longLength = h.otherLength + h.half;
+        for (int k = 0; k < 2; ++k) {
+            const ptrdiff_t skipped = k == 0 ? 0 : h.half * h.length;
+            const Extras same{along.before + skipped, along.behind + skipped, h.length};
+            const Extras longer{level.longer[k], level.longer[k] + h.others * longLength, longLength};
+            halveSquare<side, index + 1>(level.cores[k] + h.begin, h.isAcross ? same : longer,
+                                         h.isAcross ? longer : same, half[k]);
+        }
+    }
+}
+
+template <class K>
+template <int side, int index>
+void MedianTiles<K>::lengthenSquare(const Extras& other, QorPoint2D at) {
+    constexpr tiles::Halving h = tiles::kHalvings<side>.level[index];
+    constexpr ptrdiff_t longLength = h.otherLength + h.half;
+    const Level& level = levels_[index];
+    const int32_t first = h.isAcross ? at.x : at.y, firstLine = h.isAcross ? at.y : at.x;
+    V* to[2] = {level.longer[0], level.longer[1]};
+    for (int beyond = 0; beyond < 2; ++beyond) {
+        const V* run = beyond == 0 ? other.before : other.behind;
+        for (int32_t i = 0; i < h.others; ++i, run += h.otherLength) {
+            const int32_t line = firstLine + i + (beyond == 0 ? 0 : side);
+            for (int k = 0; k < 2; ++k, to[k - 1] += longLength) {
+                const int32_t from = first + (k == 0 ? h.half - 1 : side);
+                V corner[h.half];
+                for (int32_t j = 0; j < h.half; ++j)
+                    corner[j] = h.isAcross ? element(from + j, line) : element(line, from + j);
+                if constexpr (h.half > 1) tiles::sortStraight<h.half>(corner);
+                tiles::mergeFixed<tiles::kWholeMerge<h.otherLength, h.half>>(run, corner, to[k]);
+            }
+        }
+    }
 }
 
 }  // namespace qori::kernels

@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "reverse_rows.h"
 
+#include <algorithm>
 #include <array>
 
 #include "kernels/byte_tables.h"
+#include "kernels/copy/stream_rows.h"
 #include "pixels.h"
 
 namespace qori::kernels {
@@ -144,26 +146,75 @@ QORI_INLINE ptrdiff_t bytesToAlignment(const uint8_t* p) {
     }
 }
 
-/// The groups of a row, the destination's ascending; the first and the last may overlap their neighbours.
-template <int pixelBytes, bool keepAlpha, bool streaming>
-QORI_INLINE void reverseGroups(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, ptrdiff_t head) {
+/// A row, its groups in the destination's order; the first and the last may overlap their neighbours.
+template <int pixelBytes, bool keepAlpha>
+struct Reversal {
     using G = Group<pixelBytes>;
-    constexpr int unroll = G::even ? 4 : 1;
-    const uint8_t* const end = src + bytes - G::bytes;
-    const auto group = [=](ptrdiff_t at) __attribute__((always_inline)) {
-        G fresh = G::reversed(end - at);
+    /// In pieces of whole cache lines of the destination.
+    static constexpr ptrdiff_t piece = G::even ? kStreamedPiece : 6 * G::bytes;
+    static_assert(piece % 64 == 0);
+
+    uint8_t* dst;
+    const uint8_t* src;
+    ptrdiff_t bytes, done;
+
+    QORI_INLINE G groupAt(ptrdiff_t at) const {
+        G fresh = G::reversed(src + bytes - G::bytes - at);
         if constexpr (keepAlpha) fresh.at[0] = merged<pixelBytes, true>(fresh.at[0], load(dst + at));
         return fresh;
-    };
-    ptrdiff_t done = 0;
-    if (head > 0) {
-        group(0).template put<false>(dst);
-        done = head;
     }
-    for (; done <= bytes - unroll * G::bytes; done += unroll * G::bytes)
-        for (int k = 0; k < unroll; ++k) group(done + k * G::bytes).template put<streaming>(dst + done + k * G::bytes);
-    for (; done <= bytes - G::bytes; done += G::bytes) group(done).template put<false>(dst + done);
-    if (done < bytes) group(bytes - G::bytes).template put<false>(dst + bytes - G::bytes);
+    template <bool streaming>
+    QORI_INLINE void put(ptrdiff_t at) const {
+        groupAt(at).template put<streaming>(dst + at);
+    }
+
+    QORI_INLINE void begin(ptrdiff_t head) {
+        if (head > 0) put<false>(0);
+        done = head > 0 ? head : 0;
+    }
+    QORI_INLINE void finish() {
+        constexpr int unroll = G::even ? 4 : 1;
+        for (; done <= bytes - unroll * G::bytes; done += unroll * G::bytes)
+            for (int k = 0; k < unroll; ++k) put<false>(done + k * G::bytes);
+        for (; done <= bytes - G::bytes; done += G::bytes) put<false>(done);
+        if (done < bytes) put<false>(bytes - G::bytes);
+    }
+
+    /// From a row whose pixels meet a 32-byte boundary to one whose pieces are of whole lines.
+    QORI_INLINE void beginStreaming(ptrdiff_t head) {
+        begin(head);
+        if ((reinterpret_cast<uintptr_t>(dst + done) & 32u) == 0 || done > bytes - G::bytes) return;
+        put<false>(done);
+        done += G::bytes;
+    }
+    /// The next piece, if the row has one. The source is read backwards, which is fetched ahead no further than a page.
+    QORI_INLINE bool streamPiece() {
+        if (bytes - done < piece) return false;
+        const uint8_t* const ahead = src + bytes - done - 2 * piece;
+        for (ptrdiff_t at = 0; at < piece; at += 64) __builtin_prefetch(ahead + at);
+        for (ptrdiff_t at = 0; at < piece; at += G::bytes) put<true>(done + at);
+        done += piece;
+        return true;
+    }
+};
+
+/// Rows all of whose pixels meet a 32-byte boundary somewhere, a few together.
+template <int pixelBytes>
+QORI_NOINLINE void streamReversed(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep,
+                                  ptrdiff_t bytes, int32_t rows) {
+    Reversal<pixelBytes, false> row[kStreamedTogether];
+    for (; rows > 0; rows -= kStreamedTogether) {
+        const int32_t together = std::min(rows, kStreamedTogether);
+        for (int32_t k = 0; k < together; ++k, dst += dstStep, src += srcStep) {
+            row[k] = {dst, src, bytes, 0};
+            row[k].beginStreaming(bytesToAlignment<pixelBytes>(dst));
+        }
+        for (bool isMore = true; isMore;) {
+            isMore = false;
+            for (int32_t k = 0; k < together; ++k) isMore |= row[k].streamPiece();
+        }
+        for (int32_t k = 0; k < together; ++k) row[k].finish();
+    }
 }
 
 }  // namespace
@@ -176,12 +227,13 @@ void reverseRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t 
         for (; rows > 0; --rows, dst += dstStep, src += srcStep) reverseShort<pixelBytes, keepAlpha>(dst, src, bytes);
         return;
     }
+    if (!keepAlpha && streaming && bytesToAlignment<pixelBytes>(dst) >= 0 &&
+        bytesToAlignment<pixelBytes>(dst + dstStep) >= 0)
+        return streamReversed<pixelBytes>(dst, dstStep, src, srcStep, bytes, rows);
     for (; rows > 0; --rows, dst += dstStep, src += srcStep) {
-        const ptrdiff_t head = bytesToAlignment<pixelBytes>(dst);
-        if (!keepAlpha && streaming && head >= 0)
-            reverseGroups<pixelBytes, keepAlpha, true>(dst, src, bytes, head);
-        else
-            reverseGroups<pixelBytes, keepAlpha, false>(dst, src, bytes, head);
+        Reversal<pixelBytes, keepAlpha> row{dst, src, bytes, 0};
+        row.begin(bytesToAlignment<pixelBytes>(dst));
+        row.finish();
     }
 }
 
