@@ -23,12 +23,18 @@ target_compile_options(qori_warnings INTERFACE
     $<$<COMPILE_LANGUAGE:C,CXX>:-Wall -Wextra -Wshadow -Wconversion>
     $<$<AND:$<BOOL:${QORI_WERROR}>,$<COMPILE_LANGUAGE:C,CXX>>:-Werror>)
 
-# The processor the library is built for, and floating-point arithmetic that means what it says. Callers on 32-bit
-# Windows align the stack to 4 bytes only.
+# The processor the library is built for, and floating-point arithmetic that means what it says.
 add_library(qori_target INTERFACE)
 target_compile_options(qori_target INTERFACE
-    $<$<COMPILE_LANGUAGE:C,CXX>:-mavx2 -mfma -ffp-contract=off -fno-math-errno>
-    $<$<AND:$<PLATFORM_ID:Windows>,$<COMPILE_LANGUAGE:C,CXX>>:-mfpmath=sse -mstackrealign>)
+    $<$<COMPILE_LANGUAGE:C,CXX>:-mavx2 -mfma -ffp-contract=off -fno-math-errno>)
+if(WIN32 AND CMAKE_SIZEOF_VOID_P EQUAL 4)
+    # Callers align the stack to 4 bytes only.
+    target_compile_options(qori_target INTERFACE $<$<COMPILE_LANGUAGE:C,CXX>:-mfpmath=sse -mstackrealign>)
+elseif(WIN32)
+    # Callers align the stack to 16 bytes, and the compiler cannot align it further where there are unwind tables. Debian's
+    # knows and moves vectors of 32 bytes as unaligned ones; others do not, so the assembler encodes all moves like that.
+    target_compile_options(qori_target INTERFACE $<$<COMPILE_LANGUAGE:C,CXX>:-Wa,-muse-unaligned-vector-move>)
+endif()
 if(QORI_SANITIZE STREQUAL "thread")
     add_compile_options("$<$<COMPILE_LANGUAGE:C,CXX>:-fsanitize=thread>")
     add_link_options(-fsanitize=thread)
@@ -41,9 +47,14 @@ elseif(QORI_SANITIZE)
     add_link_options(-fsanitize=address,undefined)
 endif()
 
-# No C++ runtime: neither exceptions nor type information nor guarded statics nor heap.
+# No C++ runtime: neither exceptions nor type information nor guarded statics nor heap. Unwind tables only where the
+# system requires them of every function that is not a leaf.
+set(unwind_tables -fno-asynchronous-unwind-tables)
+if(WIN32 AND CMAKE_SIZEOF_VOID_P EQUAL 8)
+    set(unwind_tables -fasynchronous-unwind-tables)
+endif()
 add_library(qori_freestanding INTERFACE)
 target_compile_options(qori_freestanding INTERFACE
-    $<$<COMPILE_LANGUAGE:CXX>:-fno-exceptions -fno-rtti -fno-threadsafe-statics -fno-asynchronous-unwind-tables>
+    $<$<COMPILE_LANGUAGE:CXX>:-fno-exceptions -fno-rtti -fno-threadsafe-statics ${unwind_tables}>
     # Kernels are vector code already; packing their pointers into vectors only slows short rows down.
     $<$<COMPILE_LANGUAGE:CXX>:-fno-tree-slp-vectorize>)

@@ -15,15 +15,23 @@ configure_and_build() {
     exit 1
 }
 
-# Makes Wine's prefix once, so that programs, and tests that run side by side, find it ready. A prefix that was not finished
-# has no registry file.
+# Makes Wine's prefix once, so that programs, and tests that run side by side, find it ready: one for programs of both
+# widths. A prefix that was not finished has no registry file; one of 32-bit Wine alone runs no 64-bit programs.
 start_wine() {
-    export WINEPREFIX="${WINEPREFIX:-$PWD/build/wine}" WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml="
+    local -r own=$PWD/build/wine
+    export WINEPREFIX="${WINEPREFIX:-$own}" WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml="
+    if grep -qs '^#arch=win32' "$WINEPREFIX/system.reg"; then
+        if [[ $WINEPREFIX != "$own" ]]; then
+            echo "${0##*/}: WINEPREFIX=$WINEPREFIX runs 32-bit programs only; name another folder, or none" >&2
+            exit 1
+        fi
+        rm -rf "$own"
+    fi
     if [[ ! -f $WINEPREFIX/system.reg ]]; then
         mkdir -p "$(dirname "$WINEPREFIX")"
         echo "${0##*/}: first start of Wine"
         if ! { wineboot -i && wineserver -w; } >/dev/null 2>&1; then
-            echo "${0##*/}: Wine does not start (Debian packages wine, wine32:i386)" >&2
+            echo "${0##*/}: Wine does not start (Debian packages wine, wine64, wine32:i386)" >&2
             exit 1
         fi
     fi

@@ -2,6 +2,7 @@
 execute_process(COMMAND ${CMAKE_CXX_COMPILER} -print-file-name=libasan.so OUTPUT_VARIABLE sanitizer
     OUTPUT_STRIP_TRAILING_WHITESPACE)
 file(GLOB sources CONFIGURE_DEPENDS RELATIVE ${CMAKE_CURRENT_SOURCE_DIR} */*_test.cpp)
+list(REMOVE_ITEM sources frame/unwind_test.cpp)
 # Cases of many values, which touch the memory that their neighbours touch: half of all the time over slow libraries.
 set(slow ResizeNumbers.ConstantsStay ResizeNumbers.NothingIsComputedOnTheBuffersGarbage
     ResizeNumbers.WorkMemoryFollowsTheDestination Median.EveryPatternOf5x5 Median.MajoritiesInTiles

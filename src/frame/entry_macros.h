@@ -6,7 +6,21 @@
 #define QORI_ENTRY_MACROS_H
 
 /* clang-format off */
-#if defined(_WIN32)
+#if defined(_WIN64)
+
+/* The caller's convention is the wrapper's, whatever the arguments: a stub, being a leaf, needs no unwind data. */
+.macro QORI_SLOT name, bytes
+    .quad \name\()_impl
+.endm
+.macro QORI_STUB name, index
+    .globl \name
+    .def \name; .scl 2; .type 32; .endef
+\name:
+    jmp *(qoriEntryTable + 8 * \index)(%rip)
+    .balign 16, 0x90
+.endm
+
+#elif defined(_WIN32)
 
 /* stdcall: the wrapper's symbol carries the bytes of its arguments, so a wrong count in the registry fails to link. */
 .macro QORI_SLOT name, bytes

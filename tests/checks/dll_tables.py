@@ -29,15 +29,17 @@ if imports.keys() - SYSTEM != {"qorcore-8.2.dll"}:
 if imports["qorcore-8.2.dll"] != COMPANION:
     sys.exit(f"imports {sorted(imports['qorcore-8.2.dll'])} from the companion")
 
+# In 32 bits names have an underscore and the jump its slot's address; in 64 bits the slot's distance behind itself.
+image = Path(dll).read_bytes()
+wide = struct.unpack_from("<H", image, struct.unpack_from("<I", image, 0x3C)[0] + 4)[0] == 0x8664
 code = subprocess.run([objdump, "-d", "-j", ".text", dll], check=True, capture_output=True, text=True).stdout
-jumps = dict(re.findall(r"<_(qori\w+)>:\n\s*([0-9a-f]+:\s+ff 25 [0-9a-f ]{11})", code))
-stubs = [(int(jumps[n].split(":")[0], 16), int.from_bytes(bytes.fromhex(jumps[n].split("ff 25")[1].replace(" ", "")), "little"))
-         for n in expected]
+jumps = {name: (int(address, 16), int.from_bytes(bytes.fromhex(slot), "little", signed=wide)) for name, address, slot in
+         re.findall(r"<_?(qori\w+)>:\n\s*([0-9a-f]+):\s+ff 25 ([0-9a-f ]{11})", code)}
+stubs = [(jumps[n][0], jumps[n][1] + (jumps[n][0] + 6 if wide else 0)) for n in expected]
 for i, (address, slot) in enumerate(stubs):
-    if address != stubs[0][0] + 16 * i or slot != stubs[0][1] + 4 * i:
+    if address != stubs[0][0] + 16 * i or slot != stubs[0][1] + (8 if wide else 4) * i:
         sys.exit(f"stub {i} ({expected[i]}) at {address:#x} jumps through {slot:#x}")
 # VS_FIXEDFILEINFO: signature, structure version, then file and product version as two words of major.minor, patch.build.
-image = Path(dll).read_bytes()
 fixed = image[image.index(struct.pack("<I", 0xFEEF04BD)):][:24]
 if struct.unpack("<4I", fixed[8:]) != (8 << 16 | 2, 1 << 16 | 1083) * 2:
     sys.exit("the version resource is not 8.2.1.1083")

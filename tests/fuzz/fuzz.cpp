@@ -3,7 +3,8 @@
 // negative and odd steps, misaligned and overlapping images, any scalar, plans of any kind and of other types. Nothing
 // may crash, overflow or return a status that does not exist.
 //
-// Built with -DQORI_FUZZ=ON (clang) it is a libFuzzer target; else it runs a fixed number of random inputs.
+// Built with -DQORI_FUZZ=ON (clang) it is a libFuzzer target; else it runs a fixed number of random inputs, or writes
+// to a file what calls of each export leave behind, for comparison with another build of the library.
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -21,7 +22,23 @@ namespace {
 constexpr int kArenas = 8;
 /// Room for images, buffers and plans on either side of the middle, with all that windows may reach around them.
 constexpr size_t kArenaBytes = 4 << 20;
+/// What digests look at of an arena, around its middle.
+constexpr size_t kSeenBefore = 32 << 10, kSeen = 128 << 10;
 constexpr int kMostWidth = 70, kMostHeight = 6, kMostStep = 2000, kMostLevels = 300;
+
+GuardedPages arenas[kArenas];
+
+GuardedPages filledArena() {
+    const GuardedPages arena = mapGuarded(kArenaBytes);
+    for (size_t i = 0; i < arena.size; ++i) arena.begin[i] = static_cast<uint8_t>(i * 167 >> 3);
+    return arena;
+}
+
+/// An arena as all of them begin.
+const GuardedPages& pristine() {
+    static const GuardedPages arena = filledArena();
+    return arena;
+}
 
 /// Takes values off the input; zeros when it has run out.
 class Input {
@@ -40,14 +57,12 @@ public:
 
     /// Memory for the next pointer argument, sometimes none, sometimes shared with another.
     uint8_t* memory() {
-        static GuardedPages arenas[kArenas];
         const auto choice = take<uint8_t>();
         if (choice >= 250) return nullptr;
-        GuardedPages& arena = arenas[choice < 8 ? choice : static_cast<unsigned>(next_++) % kArenas];
-        if (arena.begin == nullptr) {
-            arena = mapGuarded(kArenaBytes);
-            for (size_t i = 0; i < arena.size; ++i) arena.begin[i] = static_cast<uint8_t>(i * 167 >> 3);
-        }
+        last = choice < 8 && !apart ? choice : static_cast<unsigned>(next_++) % kArenas;
+        GuardedPages& arena = arenas[last];
+        used |= 1u << last;
+        if (arena.begin == nullptr) arena = filledArena();
         return arena.begin + kArenaBytes / 2 + choice % 67;
     }
 
@@ -68,8 +83,11 @@ public:
     bool isOrder = false;      ///< Integers are exponents of sizes.
     bool releases = false;     ///< The export frees a plan.
     bool isAlgorithm = false;  ///< An integer is a QorCorrelation.
-    int channels = 1;          ///< Of the export that is called.
-    int32_t dataType = 0;      ///< QorDataType of its first element type.
+    bool apart = false;        ///< No two arguments share memory.
+    unsigned used = 0;         ///< Arenas that arguments point into, as bits, and the last of them.
+    unsigned last = 0;
+    int channels = 1;      ///< Of the export that is called.
+    int32_t dataType = 0;  ///< QorDataType of its first element type.
 
 private:
     const uint8_t* data_;
@@ -398,13 +416,7 @@ constexpr Target kTargets[] = {
 
 bool succeeded[std::size(kTargets)];
 
-}  // namespace
-}  // namespace qori::test
-
-extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    using namespace qori::test;
-    Input in(data, size);
-    const Target& target = kTargets[in.take<uint16_t>() % std::size(kTargets)];
+QorResult runTarget(const Target& target, Input& in) {
     in.channels = target.channels;
     in.dataType = target.dataType;
     in.countsBits = std::strstr(target.name, "_1u") != nullptr;
@@ -420,24 +432,111 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         std::fprintf(stderr, "%s returned a status that it does not have\n", target.name);
         std::abort();
     }
+    return result;
+}
+
+}  // namespace
+}  // namespace qori::test
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+    using namespace qori::test;
+    Input in(data, size);
+    const Target& target = kTargets[in.take<uint16_t>() % std::size(kTargets)];
+    runTarget(target, in);
     return 0;
 }
 
 #ifndef QORI_LIBFUZZER
-int main(int argc, char** argv) {
-    const long runs = argc > 1 ? std::atol(argv[1]) : 200'000;
-    uint64_t state = argc > 2 ? std::strtoull(argv[2], nullptr, 10) : 1;
-    for (long i = 0; i < runs; ++i) {
-        uint8_t data[192];
+namespace qori::test {
+namespace {
+
+struct Bytes {
+    uint8_t data[192];
+    explicit Bytes(uint64_t& state) {
         for (uint8_t& byte : data)
             byte = static_cast<uint8_t>((state = state * 6364136223846793005u + 1442695040888963407u) >> 56);
-        LLVMFuzzerTestOneInput(data, sizeof data);
     }
-    using namespace qori::test;
+};
+
+uint64_t join(uint64_t digest, uint64_t word) {
+    digest = (digest ^ word) * 0x9E3779B97F4A7C15u;
+    return digest ^ digest >> 29;
+}
+
+/// Whether the last argument is a work buffer, which may be left with addresses in it.
+bool takesBuffer(const char* name) {
+    struct Parameters {
+        const char *name, *list;
+    };
+    static constexpr Parameters kParameters[] = {
+#define QORI_CONTRACT(name, parameters, checks) {#name, parameters},
+#include "contracts/all.inc"
+#undef QORI_CONTRACT
+    };
+    for (const auto& [member, list] : kParameters) {
+        if (std::strcmp(member, name) != 0) continue;
+        const char* buffer = std::strstr(list, " pBuffer");
+        return buffer != nullptr && buffer[std::strlen(" pBuffer")] == '\0';
+    }
+    return false;
+}
+
+/// Of the status of a call and of what its arguments point at, which begins and ends as it was filled.
+uint64_t digestOfCall(const Target& target, bool hasBuffer, uint64_t& state) {
+    const Bytes bytes(state);
+    Input in(bytes.data, sizeof bytes.data);
+    in.apart = true;
+    auto digest = static_cast<uint64_t>(runTarget(target, in));
+    constexpr size_t begin = kArenaBytes / 2 - kSeenBefore;
+    for (unsigned i = 0; i < kArenas; ++i) {
+        if ((in.used >> i & 1) == 0) continue;
+        for (size_t at = begin; at < begin + kSeen && !(hasBuffer && i == in.last); at += sizeof(uint64_t)) {
+            uint64_t word;
+            std::memcpy(&word, arenas[i].begin + at, sizeof word);
+            digest = join(digest, word);
+        }
+        std::memcpy(arenas[i].begin + begin, pristine().begin + begin, kSeen);
+    }
+    return digest;
+}
+
+/// Says how many exports did something, and fails where these are not more than the given percentage.
+int reportSuccess(long runs, size_t percentage) {
     size_t exports = 0;
     for (const bool once : succeeded) exports += once;
     std::printf("%ld random calls over %zu exports, %zu of which succeeded at least once\n", runs, std::size(kTargets),
                 exports);
-    return runs < 1'000'000 || exports > std::size(kTargets) * 9 / 10 ? 0 : 1;
+    return exports >= std::size(kTargets) * percentage / 100 ? 0 : 1;
+}
+
+/// A line for each export: its name and the digest of `calls` calls, the same for every build that computes the same.
+int writeDigests(const char* path, int calls) {
+    std::FILE* file = std::fopen(path, "wb");
+    if (file == nullptr) return 1;
+    for (const Target& target : kTargets) {
+        uint64_t state = static_cast<uint64_t>(&target - kTargets), digest = 0;
+        const bool hasBuffer = takesBuffer(target.name);
+        for (int i = 0; i < calls; ++i) digest = join(digest, digestOfCall(target, hasBuffer, state));
+        std::fprintf(file, "%s %08x%08x\n", target.name, static_cast<unsigned>(digest >> 32),
+                     static_cast<unsigned>(digest));
+    }
+    return std::fclose(file) == 0 ? reportSuccess(calls * static_cast<long>(std::size(kTargets)), 80) : 1;
+}
+
+}  // namespace
+}  // namespace qori::test
+
+/// fuzz [RUNS [SEED]], or fuzz --digests FILE [CALLS]
+int main(int argc, char** argv) {
+    using namespace qori::test;
+    if (argc > 2 && std::strcmp(argv[1], "--digests") == 0)
+        return writeDigests(argv[2], argc > 3 ? std::atoi(argv[3]) : 40);
+    const long runs = argc > 1 ? std::atol(argv[1]) : 200'000;
+    uint64_t state = argc > 2 ? std::strtoull(argv[2], nullptr, 10) : 1;
+    for (long i = 0; i < runs; ++i) {
+        const Bytes bytes(state);
+        LLVMFuzzerTestOneInput(bytes.data, sizeof bytes.data);
+    }
+    return reportSuccess(runs, runs < 1'000'000 ? 0 : 90);
 }
 #endif

@@ -78,5 +78,12 @@ void qorTestSetCacheSize(int32_t bytes) { cacheSize = bytes == 0 ? kDefaultCache
 int qorTestCacheQueries(void) { return cacheQueries; }
 int qorTestFeatureQueries(void) { return featureQueries; }
 int qorTestLiveBlocks(void) { return liveBlocks; }
+void qorTestForgetBlocks(void) {
+    for (Block& block : blocks) {
+        unmapGuarded(block.pages);
+        block = {};
+    }
+    liveBlocks = 0;
+}
 int qorTestDamagedBlocks(void) { return damagedBlocks; }
 }

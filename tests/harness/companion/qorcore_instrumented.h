@@ -14,6 +14,8 @@ QORCORE_API int qorTestCacheQueries(void);
 QORCORE_API int qorTestFeatureQueries(void);
 /// Blocks not yet freed.
 QORCORE_API int qorTestLiveBlocks(void);
+/// Unmaps the blocks of calls that were abandoned.
+QORCORE_API void qorTestForgetBlocks(void);
 /// Blocks that were written beyond their length, found when they were freed.
 QORCORE_API int qorTestDamagedBlocks(void);
 }

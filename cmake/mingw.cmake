@@ -1,0 +1,12 @@
+# Windows by Debian's mingw-w64 of the processor QORI_MINGW, run through Wine. The tool chain files beside it set that.
+set(CMAKE_SYSTEM_NAME Windows)
+set(CMAKE_SYSTEM_PROCESSOR ${QORI_MINGW})
+set(CMAKE_C_COMPILER ${QORI_MINGW}-w64-mingw32-gcc-posix)
+set(CMAKE_CXX_COMPILER ${QORI_MINGW}-w64-mingw32-g++-posix)
+set(CMAKE_RC_COMPILER ${QORI_MINGW}-w64-mingw32-windres)
+set(CMAKE_DLLTOOL ${QORI_MINGW}-w64-mingw32-dlltool)
+set(CMAKE_FIND_ROOT_PATH /usr/${QORI_MINGW}-w64-mingw32)
+set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)
+set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)
+set(CMAKE_FIND_ROOT_PATH_MODE_INCLUDE ONLY)
+set(CMAKE_CROSSCOMPILING_EMULATOR wine)
