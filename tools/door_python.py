@@ -91,6 +91,8 @@ def layouts(member, inserts):
         source &= ~ALPHA
     if "24u" in member.types:
         target = 3
+    elif member.operation.extent == "windows":
+        target = 1
     return source, target
 
 
@@ -364,7 +366,8 @@ def form_row(form, function, tables, members):
     if main.operation.plan and variant == "NONE":
         raise RegistryError(f"{main.name}: the Python door knows no plans of {main.c_operation}")
     operation = main.operation
-    return (f'    {{"{main.name}", {cells[0]}, {cells[1]}, {source}, {target}, {form.layouts[0]}, '
+    twin = f'"{form.twin.name}"' if form.twin else "NULL"
+    return (f'    {{"{main.name}", {cells[0]}, {twin}, {cells[1]}, {source}, {target}, {form.layouts[0]}, '
             f'{form.layouts[1]}, {bits(form.accepts, function) | choice_bits(function)}u, {bits(form.requires, function)}u, '
             f'PLAN_{variant}, QUERY_{kind}, {asked}, {kernel_type(main)}, {tables.number(tables.results, tuple(results))}, '
             f'REACH_{operation.reach.upper() or "NONE"}, EXTENT_{operation.extent.upper() or "SAME"}, '
@@ -572,7 +575,9 @@ class Image:
 
 def empty(shape: tuple[int, int] | tuple[int, int, int], dtype: DType = "uint8") -> Image: ...
 def version() -> str: ...
-def _members() -> list[tuple[str, str, str, int, int, int, bool, bool]]: ...
+def _members() -> list[tuple[str, str | None, str | None]]: ...
+def _member(function: str, /, *arguments: Any, **keywords: Any) -> str: ...
+def _address(plan: Any, /) -> int: ...
 
 class _ImagePlan:
     @property

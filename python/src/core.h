@@ -138,6 +138,7 @@ enum {
     EXTENT_FRAME,
     EXTENT_BLOCKS,
     EXTENT_BITS,
+    EXTENT_ROW,
     EXTENT_2X2,
     EXTENT_4X4,
     EXTENT_8X8,
@@ -171,6 +172,7 @@ typedef struct Form {
     const char* name;
     Function function;
     uint16_t signature, program;
+    const char* in_place_name;
     Function in_place;
     uint16_t in_place_signature, in_place_program;
     uint8_t in_place_image; /* the source that the twin overwrites */
@@ -311,6 +313,8 @@ int read_points(Call* call, const char* name, PyObject* object, void** data, int
 void* allocate(Call* call, size_t bytes);
 
 /* --- dispatch.c --- */
+/* The member that a call would take, as its C name. */
+PyObject* member_for(const Operation* operation, PyObject* const* arguments, Py_ssize_t count, PyObject* names);
 PyObject* run(const Operation* operation, PyObject* const* arguments, Py_ssize_t count, PyObject* names);
 void free_call(Call* call);
 Call* start_call(Call* call, const Operation* operation);

@@ -277,6 +277,8 @@ static int meets(const Call* call, int which, const char* name) {
         !(call->operation->forms->extent == EXTENT_LEVELS))
         return 1;
     if (call->form->contiguous_out && call->form->contiguous && in->data == out->data) return 1;
+    if (call->form->extent == EXTENT_ROW && in->step && !((out->data - in->data) % in->step))
+        return 0; /* one of the rows */
     return refuse(PyExc_ValueError, call, "out",
                   exact ? "the array of %s came; accepted is another array: this operation does not run in place"
                         : "an array that shares memory with %s came; accepted are that array itself or one apart from "
@@ -569,6 +571,7 @@ static int lists_step(Call* call, const Step* step, Slot* slot) {
                           call->counts[i]);
         call->counts[i] = counts[i];
     }
+    for (int i = n; i < 4; ++i) call->counts[i] = 0;
     for (int i = 0; i < n; ++i) { /* what is read must not be what is written */
         const uint8_t *low = lists[i],
                       *high = low + (size_t)counts[i] * element_bytes[step->b] * (step->c == 9 ? 3 : 1);
@@ -653,18 +656,18 @@ static int planes_step(Call* call, const Image* image, Slot* slot) {
     return 0;
 }
 
+/* Levels are read before the bins between them are made. */
+static int levels_first(Call* call, const Step* step) {
+    Slot* slot = call->slots;
+    const int counts = parameter_index(call->operation, KIND_COUNTS, NULL) >= 0;
+    while (step->code != (counts ? STEP_COUNTS : STEP_LISTS)) ++step, ++slot;
+    return counts ? counts_step(call, step, slot) : lists_step(call, step, slot);
+}
+
 static int execute(Call* call, const Step* step) {
     const Image* images = call->images;
     call->list_elements = 0;
-    if (call->form->extent == EXTENT_LEVELS && !call->plan) {
-        const int i = parameter_index(call->operation, KIND_COUNTS, NULL);
-        const Step* s = step;
-        while (s->code != STEP_COUNTS) ++s;
-        Slot unused;
-        if (i >= 0) {
-            if (counts_step(call, s, &unused)) return -1;
-        }
-    }
+    if (call->form->extent == EXTENT_LEVELS && !call->plan && levels_first(call, step)) return -1;
     for (Slot* slot = call->slots; step->code != STEP_END; ++step, ++slot) {
         int32_t a, b;
         int failed = 0;
@@ -695,7 +698,9 @@ static int execute(Call* call, const Step* step) {
             case STEP_WIDTH: slot->i = images[step->a].width; break;
             case STEP_ROWS: failed = rows_step(call, slot); break;
             case STEP_VECTOR: failed = vector_step(call, step, slot); break;
-            case STEP_LISTS: failed = lists_step(call, step, slot); break;
+            case STEP_LISTS:
+                if (call->form->extent != EXTENT_LEVELS) failed = lists_step(call, step, slot);
+                break;
             case STEP_LISTS_OUT: failed = lists_out(call, step->a, step->c, slot); break;
             case STEP_COUNTS: failed = counts_step(call, step, slot); break;
             case STEP_BITS: failed = bits_step(call, step, slot); break;
@@ -810,6 +815,16 @@ static int prepare(Call* call) {
                           "an array that shares memory with the kernel came; pass a copy");
     }
     return 0;
+}
+
+PyObject* member_for(const Operation* operation, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
+    Call call;
+    PyObject* result = NULL;
+    start_call(&call, operation);
+    if (!bind(&call, arguments, count, names) && !prepare(&call))
+        result = PyUnicode_FromString(call.in_place ? call.form->in_place_name : call.form->name);
+    free_call(&call);
+    return result;
 }
 
 PyObject* run(const Operation* operation, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {

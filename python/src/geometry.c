@@ -302,6 +302,7 @@ int measure(Call* call, int32_t* height, int32_t* width) {
         case EXTENT_FRAME: return frame_extent(call, height, width);
         case EXTENT_BLOCKS: return blocks_extent(call, height, width);
         case EXTENT_BITS: return bits_extent(call, height, width);
+        case EXTENT_ROW: *height = 1; return 0;
         case EXTENT_2X2: return block_extent(call, 2, height, width);
         case EXTENT_4X4: return block_extent(call, 4, height, width);
         case EXTENT_8X8: return block_extent(call, 8, height, width);

@@ -122,7 +122,7 @@ static PyObject* version(PyObject* module, PyObject* unused) {
     return PyUnicode_FromFormat("%d.%d.%d", v->versionMajor, v->versionMinor, v->versionPatch);
 }
 
-/* {C name: (operation, source, target)} of every form, twins too, for listings and tests. */
+/* (function, C member, its in-place twin or None) of every form. */
 static PyObject* members(PyObject* module, PyObject* unused) {
     (void)module;
     (void)unused;
@@ -130,18 +130,30 @@ static PyObject* members(PyObject* module, PyObject* unused) {
     for (int o = 0; list && o < OPERATIONS; ++o)
         for (int i = 0; list && i < operations[o].form_count; ++i) {
             const Form* f = &operations[o].forms[i];
-            PyObject* item =
-                Py_BuildValue("(sssiiiii)", f->name, operations[o].name, element_names[f->source], f->source_layout,
-                              f->target, f->target_layout, f->function != NULL, f->in_place != NULL);
+            PyObject* item = Py_BuildValue("(szz)", operations[o].name, f->function ? f->name : NULL, f->in_place_name);
             if (!item || PyList_Append(list, item)) Py_CLEAR(list);
             Py_XDECREF(item);
         }
     return list;
 }
 
+/* The C name of the member that a function would call with these arguments. */
+static PyObject* member(PyObject* module, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
+    (void)module;
+    const char* name = count ? PyUnicode_AsUTF8AndSize(arguments[0], NULL) : NULL;
+    for (int o = 0; name && o < OPERATIONS; ++o)
+        if (!strcmp(operations[o].name, name)) return member_for(&operations[o], arguments + 1, count - 1, names);
+    if (!PyErr_Occurred())
+        PyErr_SetString(PyExc_ValueError, "_member: accepted are the name of a function and its arguments");
+    return NULL;
+}
+
 static PyMethodDef more_methods[] = {
     {"version", version, METH_NOARGS, "version()\n--\n\nVersion of the library, as '8.2.0'."},
-    {"_members", members, METH_NOARGS, "_members()\n--\n\nThe C members behind the functions."},
+    {"_members", members, METH_NOARGS, "_members()\n--\n\n(function, C member, in-place C member) of every form."},
+    {"_member", (PyCFunction)(void (*)(void))member, METH_FASTCALL | METH_KEYWORDS,
+     "_member(function, /, *arguments, **keywords)\n--\n\nThe C member that the function would call."},
+    {"_address", plan_address, METH_O, "_address(plan, /)\n--\n\nWhere the plan's memory is."},
     {"empty", (PyCFunction)(void (*)(void))empty_image, METH_VARARGS | METH_KEYWORDS, EMPTY_DOC},
     {NULL, NULL, 0, NULL}};
 

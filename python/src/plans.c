@@ -106,6 +106,15 @@ static void deallocate(PyObject* object) {
 
 static PyObject* represent(PyObject* object) { return Py_NewRef(((Plan*)object)->text); }
 
+/* The plan's memory as a number. */
+PyObject* plan_address(PyObject* module, PyObject* object) {
+    (void)module;
+    for (int kind = 0; kind < PLAN_TYPES; ++kind)
+        if (Py_TYPE(object) == shared.plan_types[kind]) return PyLong_FromVoidPtr(((Plan*)object)->memory);
+    PyErr_SetString(PyExc_TypeError, "_address: accepted is a plan");
+    return NULL;
+}
+
 /* The operation with the plan put behind its first argument. */
 static PyObject* with_plan(const char* name, PyObject* self, PyObject* const* arguments, Py_ssize_t count,
                            PyObject* names) {

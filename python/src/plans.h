@@ -36,7 +36,7 @@ typedef struct Plan {
 int make_plan_types(PyObject* module);
 /* The plan of an argument, or null with an exception set. */
 const Plan* plan_of(const Call* call, PyObject* object);
-int plan_kind_of(const char* operation);
+PyObject* plan_address(PyObject* module, PyObject* object);
 /* Bytes of work memory of a call whose images and region are known; -1 with an exception set. */
 int64_t work_bytes(Call* call);
 
