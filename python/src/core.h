@@ -194,6 +194,9 @@ typedef struct Index {
     Span spans[ELEMENTS][10];
 } Index;
 
+/* Parameters that every call asks for; -1 where the operation has none. */
+enum { HAS_OUT, HAS_PATTERN, HAS_BORDER, HAS_OFFSET, HAS_AXIS, HAS_PLAN, HAS };
+
 typedef struct Operation {
     const char* name;
     const Parameter* parameters;
@@ -201,6 +204,7 @@ typedef struct Operation {
     uint8_t count, positional;
     uint16_t form_count;
     const Index* index;
+    int8_t has[HAS];
 } Operation;
 
 typedef struct Word {

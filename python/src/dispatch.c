@@ -271,8 +271,7 @@ static int meets(const Call* call, int which, const char* name) {
     const int exact = in->data == out->data && (in->step == out->step || in->height < 2) && in->height == out->height &&
                       in->width == out->width && element_bytes[in->element] == element_bytes[out->element] &&
                       in->layout == out->layout && (!(in->layout & PLANAR) || in->plane == out->plane);
-    const int diagonal =
-        call->form->extent == EXTENT_AXIS && call->pairs[parameter_index(call->operation, KIND_ENUM, "axis")][0] > 2;
+    const int diagonal = call->form->extent == EXTENT_AXIS && call->pairs[call->operation->has[HAS_AXIS]][0] > 2;
     if (exact && call->form->overlap && !diagonal && which != MASK &&
         !(call->operation->forms->extent == EXTENT_LEVELS))
         return 1;
@@ -333,7 +332,7 @@ static int check_inputs(const Call* call, int height, int width) {
     const Image *second = &call->images[SRC2], *mask = &call->images[MASK];
     char text[96];
     if (second->held) {
-        if (parameter_index(call->operation, KIND_IMAGE, "pattern") >= 0) {
+        if (call->operation->has[HAS_PATTERN] >= 0) {
             if (second->element != call->images[SRC].element || second->layout != call->images[SRC].layout)
                 return refuse(PyExc_ValueError, call, "pattern", "%s came; accepted are elements and channels of src",
                               describe(second, text));
@@ -366,7 +365,7 @@ static int lay_destination(Call* call) {
         if (offset_source(call)) return -1;
     }
     if (check_inputs(call, call->height, call->width)) return -1;
-    const int destination = parameter_index(call->operation, KIND_OUT, NULL);
+    const int destination = call->operation->has[HAS_OUT];
     if (destination < 0 || form->extent >= EXTENT_LEVELS || form->extent == EXTENT_BLOCKS) return 0;
     if (!out->held) {
         if (make_out(call, height, width)) return -1;
@@ -426,7 +425,7 @@ static int list_memory(Call* call, PyObject* given, int element, int count, PyOb
 static int lists_out(Call* call, int which, int channels, Slot* slot) {
     void** pointers = (void**)call->values[call->value_count++].bytes;
     const int n = channels ? channels : 1;
-    const int index = parameter_index(call->operation, KIND_OUT, NULL);
+    const int index = call->operation->has[HAS_OUT];
     PyObject* given = !which && call->given >> index & 1 ? call->arguments[index] : NULL;
     PyObject* made = PyTuple_New(n);
     if (!made) return -1;
@@ -463,7 +462,7 @@ failed:
 /* The two images of smallest and largest elements of blocks. */
 static int special_outputs(Call* call) {
     int32_t height, width;
-    const int index = parameter_index(call->operation, KIND_OUT, NULL);
+    const int index = call->operation->has[HAS_OUT];
     PyObject* given = index >= 0 && call->given >> index & 1 ? call->arguments[index] : NULL;
     if (call->form->extent == EXTENT_BLOCKS) {
         if (measure(call, &height, &width)) return -1;
@@ -784,7 +783,7 @@ static PyObject* result_of(Call* call) {
     if (all_results[call->form->results]->kind != RESULT_END) return results_object(call);
     if (call->lists) return Py_NewRef(call->lists);
     if (call->made) return Py_NewRef(call->made);
-    const int out = parameter_index(call->operation, KIND_OUT, NULL);
+    const int out = call->operation->has[HAS_OUT];
     return Py_NewRef(call->arguments[out]);
 }
 

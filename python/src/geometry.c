@@ -104,7 +104,7 @@ static int along(Call* call, int vertical) {
 
 /* Keeps of the margins those of the sides that the border reads from memory. */
 static int sides_in_memory(Call* call) {
-    const int i = parameter_index(call->operation, KIND_FLAGS, "border");
+    const int i = call->operation->has[HAS_BORDER];
     if (i < 0) return 0;
     int32_t border;
     if (word_of(call, i, &border)) return -1;
@@ -167,7 +167,7 @@ static int plan_extent(Call* call, int32_t* height, int32_t* width) {
                       call->top | call->left | call->bottom | call->right ? " inside what it reads around them" : "");
     *height = plan->height;
     *width = plan->width;
-    const int i = parameter_index(call->operation, KIND_POINT, "offset");
+    const int i = call->operation->has[HAS_OFFSET];
     if (i >= 0 && call->given >> i & 1) {
         int32_t y, x;
         if (!call->images[OUT].held)
@@ -265,7 +265,7 @@ static int blocks_extent(Call* call, int32_t* height, int32_t* width) {
 
 static int axis_extent(Call* call, int32_t* height, int32_t* width) {
     int32_t axis;
-    if (word_of(call, parameter_index(call->operation, KIND_ENUM, "axis"), &axis)) return -1;
+    if (word_of(call, call->operation->has[HAS_AXIS], &axis)) return -1;
     const int diagonal = axis == 3 || axis == 4;
     *height = diagonal ? call->width : call->height;
     *width = diagonal ? call->height : call->width;
@@ -308,7 +308,7 @@ int measure(Call* call, int32_t* height, int32_t* width) {
         case EXTENT_8X8: return block_extent(call, 8, height, width);
         default:
             /* Correlations of one size with their source come without an extent. */
-            return call->images[SRC2].held && parameter_index(call->operation, KIND_IMAGE, "pattern") >= 0
+            return call->images[SRC2].held && call->operation->has[HAS_PATTERN] >= 0
                        ? correlation_extent(call, height, width)
                        : 0;
     }

@@ -33,6 +33,7 @@ static Plan* new_plan(PyTypeObject* type, int kind, int variant, int element) {
     plan->element = (uint8_t)element;
     plan->target = NO_ELEMENT;
     plan->free_memory = free;
+    plan->vectorcall = call_plan_directly;
     return plan;
 }
 
@@ -139,6 +140,9 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
     static QorResult (*const borders[])(const QorResizePlan*, QorBorderExtent*) = {
         qoriResizeGetBorderSize_8u, qoriResizeGetBorderSize_16u, qoriResizeGetBorderSize_16s,
         qoriResizeGetBorderSize_32f, qoriResizeGetBorderSize_64f};
+    static QorResult (*const buffers[])(const QorResizePlan*, QorImageSize, int32_t, int32_t*) = {
+        qoriResizeGetBufferSize_8u, qoriResizeGetBufferSize_16u, qoriResizeGetBufferSize_16s,
+        qoriResizeGetBufferSize_32f, qoriResizeGetBufferSize_64f};
     PyObject *source, *target, *word = NULL, *dtype = NULL;
     ResizeArguments r = {.c = 0.5, .lobes = 3};
     Operation operation;
@@ -178,6 +182,9 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
         status = fill_resize(&r, element, plan->memory, &member);
         QorBorderExtent border = {0, 0, 0, 0};
         if (!status) status = borders[e](plan->memory, &border);
+        for (int channels = 1; !status && channels < 5; ++channels)
+            if (channels != 2 && buffers[e](plan->memory, r.target, channels, &plan->whole_bytes[channels]))
+                plan->whole_bytes[channels] = 0;
         set_border(plan, border);
         set_shapes(plan, r.source, r.target);
         plan->antialias = r.antialias;
