@@ -37,8 +37,10 @@ void free_call(Call* call) {
  */
 
 static int too_many(const Call* call, Py_ssize_t count) {
+    int accepted = call->operation->positional;
+    for (int i = 0; i < call->operation->count; ++i) accepted -= call->operation->parameters[i].twin != 0;
     return refuse(PyExc_TypeError, call, NULL, "%zd positional arguments came; accepted are at most %d", count,
-                  call->operation->positional);
+                  accepted);
 }
 
 static int keyword(Call* call, PyObject* name) {
@@ -125,7 +127,7 @@ static int elements_of_tables(Call* call, PyObject* object) {
 static int take_argument(Call* call, int i) {
     const Parameter* p = &call->operation->parameters[i];
     PyObject* object = call->arguments[i];
-    int truth, element;
+    int element;
     switch (p->kind) {
         case KIND_IMAGE: return acquire(call, object, p->name, &call->images[p->image], p->image);
         case KIND_OUT:
@@ -134,9 +136,10 @@ static int take_argument(Call* call, int i) {
             return acquire(call, object, p->name, &call->images[OUT], OUT);
         case KIND_PLAN: return (call->plan = plan_of(call, object)) ? 0 : -1;
         case KIND_KEEP_ALPHA:
-            truth = PyObject_IsTrue(object);
-            call->keep_alpha = truth > 0;
-            return truth < 0 ? -1 : 0;
+            if (object != Py_True && object != Py_False)
+                return refuse(PyExc_TypeError, call, p->name, "%R came; accepted are True and False", object);
+            call->keep_alpha = object == Py_True;
+            return 0;
         case KIND_CHANNEL: return small_integer(call, i, 0, 3, &call->channel);
         case KIND_CHANNELS: return small_integer(call, i, 1, 4, &call->channels);
         case KIND_DTYPE:
@@ -209,10 +212,16 @@ static int choose(Call* call) {
     const Operation* operation = call->operation;
     const Image* key = call->images[SRC].held ? &call->images[SRC] : &call->images[OUT];
     const Span span = operation->index->spans[key->element][(key->layout & CHANNELS) + (key->layout & PLANAR ? 5 : 0)];
-    const Form *form = operation->forms + span.first, *end = form + span.count, *found = NULL;
+    const Form *form = operation->forms + span.first, *end = form + span.count, *found = NULL, *keeping = NULL;
+    const int makes_out = operation->has[HAS_OUT] >= 0 && !call->images[OUT].held;
     int ambiguous = 0;
     for (; form < end; ++form) {
         if (!suits(call, form, key)) continue;
+        if (makes_out && form->target_layout & PLANAR) continue;
+        if (makes_out && form->target_layout & (ALPHA | CHANNEL)) { /* keeps parts of a destination that is not there */
+            keeping = form;
+            continue;
+        }
         if (!found) {
             found = form;
             if (call->images[OUT].held || call->dtype >= 0) break;
@@ -227,6 +236,7 @@ static int choose(Call* call) {
             }
         }
     }
+    if (!found) found = keeping;
     if (!found) {
         no_form(call);
         return -1;
@@ -362,7 +372,6 @@ static int lay_destination(Call* call) {
         src->data += (Py_ssize_t)call->top * src->step + (Py_ssize_t)call->left * pixel_bytes(src);
         src->height = call->height;
         src->width = form->extent == EXTENT_BITS ? src->width : call->width;
-        if (offset_source(call)) return -1;
     }
     if (check_inputs(call, call->height, call->width)) return -1;
     const int destination = call->operation->has[HAS_OUT];
@@ -372,10 +381,10 @@ static int lay_destination(Call* call) {
         return src->held ? place_source(call, src, form->source_layout) : 0;
     }
     if (check_writable(call, out, call->operation->parameters[destination].name)) return -1;
-    const int block = form->extent >= EXTENT_2X2 && form->extent <= EXTENT_8X8;
-    const int fits = block ? (out->data == src->data || (int64_t)out->height * out->width == (int64_t)height * width) &&
-                                 (out->dimensions == 1 || out->height == height || out->data == src->data)
-                           : out->height == height && out->width == width;
+    /* A small block may be written over the first elements of the source's own. */
+    const int over = form->in_place && form->contiguous && out->data == src->data && out->element == src->element &&
+                     out->height == src->height && out->width == src->width;
+    const int fits = (out->height == height && out->width == width) || over;
     if (!fits) {
         char text[96];
         return refuse(PyExc_ValueError, call, "out", "%s came; accepted is (%d, %d)%s", describe(out, text), height,
@@ -799,7 +808,7 @@ static int64_t traffic(const Call* call) {
 }
 
 static int prepare(Call* call) {
-    if (take_arguments(call) || choose(call) || lay_destination(call)) return -1;
+    if (take_arguments(call) || choose(call) || lay_destination(call) || offset_source(call)) return -1;
     if (call->form->extent == EXTENT_BLOCKS && special_outputs(call)) return -1;
     if (call->form->extent == EXTENT_WINDOWS && descriptors(call)) return -1;
     if (call->kernel && call->form->extent != EXTENT_WINDOWS && call->images[OUT].held) {

@@ -272,11 +272,21 @@ static int axis_extent(Call* call, int32_t* height, int32_t* width) {
     return 0;
 }
 
+/* A flat block lies in rows of its side. */
+static void fold(Image* image, int side) {
+    if (image->dimensions != 1 || image->width != side * side) return;
+    image->height = image->width = side;
+    image->step = (Py_ssize_t)side * element_bytes[image->element];
+}
+
 static int block_extent(Call* call, int side, int32_t* height, int32_t* width) {
-    const Image* src = &call->images[SRC];
-    if ((int64_t)src->height * src->width != 64 || (src->height != 8 && src->dimensions != 1))
+    Image *src = &call->images[SRC], *out = &call->images[OUT];
+    fold(src, 8);
+    if (out->held) fold(out, side);
+    if (src->height != 8 || src->width != 8)
         return refuse(PyExc_ValueError, call, "src", "(%d, %d) elements came; accepted is a block of (8, 8)",
                       src->height, src->width);
+    call->height = call->width = 8;
     *height = *width = side;
     return 0;
 }
