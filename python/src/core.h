@@ -305,6 +305,7 @@ extern const uint8_t element_bytes[ELEMENTS];
 /* --- arguments.c --- */
 int read_integer(const Call* call, const char* name, PyObject* object, int64_t low, int64_t high, int64_t* value);
 int read_number(const Call* call, const char* name, PyObject* object, int element, void* into);
+PyObject* item_of(const Call* call, const char* name, PyObject* object, int index, int count);
 int read_pair(const Call* call, const char* name, PyObject* object, int32_t* rows, int32_t* columns);
 int read_word(const Call* call, const char* name, PyObject* object, const Enumeration* enumeration, int combine,
               int32_t* value);

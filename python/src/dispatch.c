@@ -137,7 +137,7 @@ static int take_argument(Call* call, int i) {
         case KIND_PLAN: return (call->plan = plan_of(call, object)) ? 0 : -1;
         case KIND_KEEP_ALPHA:
             if (object != Py_True && object != Py_False)
-                return refuse(PyExc_TypeError, call, p->name, "%R came; accepted are True and False", object);
+                return refuse(PyExc_TypeError, call, p->name, "%.80R came; accepted are True and False", object);
             call->keep_alpha = object == Py_True;
             return 0;
         case KIND_CHANNEL: return small_integer(call, i, 0, 3, &call->channel);
@@ -146,7 +146,7 @@ static int take_argument(Call* call, int i) {
             if (!shared.empty && find_numpy(0) < 0) return -1;
             element = element_of_type(object);
             if (element < 0)
-                return refuse(PyExc_TypeError, call, "dtype", "%R came; accepted are types of elements, as 'uint8'",
+                return refuse(PyExc_TypeError, call, "dtype", "%.80R came; accepted are types of elements, as 'uint8'",
                               object);
             call->dtype = (int16_t)element;
             return 0;
@@ -442,7 +442,7 @@ static int lists_out(Call* call, int which, int channels, Slot* slot) {
     for (int i = 0; i < n; ++i) {
         PyObject *array = NULL, *one = given;
         if (given && channels) {
-            one = PySequence_GetItem(given, i);
+            one = item_of(call, "out", given, i, n);
             if (!one) goto failed;
         }
         const int failed = list_memory(call, one, I32, counts[i] - !which, &array, &pointers[i]);
@@ -478,7 +478,7 @@ static int special_outputs(Call* call) {
         call->lists = PyTuple_New(2);
         for (int i = 0; call->lists && i < 2; ++i) {
             PyObject* array =
-                given ? PySequence_GetItem(given, i) : make_array(call->form->target, height, width, 1, 2);
+                given ? item_of(call, "out", given, i, 2) : make_array(call->form->target, height, width, 1, 2);
             if (!array) return -1;
             PyTuple_SetItem(call->lists, i, array);
             Image* image = &call->images[i ? OUT2 : OUT];
