@@ -1,0 +1,83 @@
+#!/usr/bin/env python3
+"""Assembles the source of the site: hand-written pages, pages of the registry, pictures of the recipes.
+
+    assemble.py FOLDER [--no-pictures]
+
+Prints how many operations have a picture and an example, and which have none.
+"""
+import shutil
+import sys
+from pathlib import Path
+
+from paths import ROOT
+
+import gallery
+import plots
+import reference
+import registry
+
+
+def write(path, text):
+    path.parent.mkdir(parents=True, exist_ok=True)
+    path.write_text(text.rstrip("\n") + "\n")
+
+
+def toctree(names, **options):
+    lines = ["```{toctree}"] + [f":{key.replace('_', '-')}: {value}".rstrip() for key, value in options.items()]
+    return "\n".join(lines + [""] + names + ["```", ""])
+
+
+def overview(pages, shown):
+    """All operations by task, each with its thumbnail."""
+    lines = ["# Operations", "", f"{len(pages)} operations, by what they are for. Each page shows what the operation does, how it "
+             "is called in Python, C++ and C, for which elements and layouts it exists, and when it refuses.", ""]
+    for title, group in reference.by_task(pages):
+        lines += [f"## {title}", "", '<div class="cards">']
+        for page in group:
+            picture = shown.get(page.name, {}).get("thumbnail")
+            image = f'<img src="../_static/pictures/{picture}" alt="" loading="lazy">' if picture else '<div class="none"></div>'
+            lines.append(f'<a href="{page.name}.html">{image}<span>{page.name}</span></a>')
+        lines += ["</div>", ""]
+    return "\n".join(lines) + "\n" + toctree(sorted(pages), hidden="", maxdepth=1)
+
+
+def plans_index(families, members):
+    lines = ["# Plans, buffers and queries", "", "In Python and C++ plans are objects and buffers look after themselves; see "
+             "[plans and buffers](../tasks/plans.md). These are the C functions behind them, by family.", ""]
+    return "\n".join(lines) + toctree(list(members), maxdepth=1)
+
+
+def main(arguments):
+    if not arguments or arguments[0].startswith("-"):
+        print(__doc__, file=sys.stderr)
+        return 2
+    folder = Path(arguments[0])
+    shutil.rmtree(folder, ignore_errors=True)
+    shutil.copytree(ROOT / "docs", folder, ignore=shutil.ignore_patterns("recipes", "speed.json"))
+    families = registry.load(ROOT / "api")
+    pages, helpers = reference.operations(families), reference.support(families)
+    shown = {} if "--no-pictures" in arguments else gallery.make(pages, folder / "_static" / "pictures")
+    for page in pages.values():
+        write(folder / "operations" / f"{page.name}.md",
+              reference.operation_page(page, pages, helpers, shown.get(page.name, {})))
+    write(folder / "operations" / "index.md", overview(pages, shown))
+    stems = {f.stem: f for f in families}
+    for stem, members in helpers.items():
+        write(folder / "plans" / f"{stem}.md", reference.support_page(stems[stem], members, pages))
+    write(folder / "plans" / "index.md", plans_index(families, helpers))
+    plots.draw(ROOT / "docs" / "speed.json", folder / "_static")
+    if "--no-pictures" not in arguments:
+        gallery.fill_pages(folder)
+        report(pages, shown)
+    return 0
+
+
+def report(pages, shown):
+    for what in ("pictures", "example"):
+        lacking = [name for name in pages if not shown.get(name, {}).get(what)]
+        print(f"docs: {len(pages) - len(lacking)} of {len(pages)} operations have {what}" +
+              (f"; none: {' '.join(lacking)}" if lacking else ""))
+
+
+if __name__ == "__main__":
+    sys.exit(main(sys.argv[1:]))
