@@ -9,9 +9,7 @@ version = release.rpartition(".")[0]
 
 extensions = ["myst_parser"]
 myst_heading_anchors = 3
-exclude_patterns = ["pictures"]
 nitpicky = True
-suppress_warnings = ["myst.xref_missing"] if False else []
 
 html_theme = "furo"
 html_title = f"qori {version}"
@@ -21,7 +19,7 @@ html_show_sourcelink = False
 html_copy_source = False
 html_show_sphinx = False
 html_last_updated_fmt = None
-pygments_style, pygments_dark_style = "xcode", "github-dark"
+pygments_style, pygments_dark_style = "friendly", "github-dark"
 html_theme_options = {
     "light_css_variables": {"color-brand-primary": "#0b6e72", "color-brand-content": "#0b6e72"},
     "dark_css_variables": {"color-brand-primary": "#4fc1c4", "color-brand-content": "#4fc1c4"},

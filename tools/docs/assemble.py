@@ -5,6 +5,7 @@
 
 Prints how many operations have a picture and an example, and which have none.
 """
+import re
 import shutil
 import sys
 from pathlib import Path
@@ -20,6 +21,14 @@ import registry
 def write(path, text):
     path.parent.mkdir(parents=True, exist_ok=True)
     path.write_text(text.rstrip("\n") + "\n")
+
+
+def fill(path, what, made):
+    """Replaces comments of a page; an old one in it that is not there any more is an error."""
+    text, count = re.subn(rf"<!-- {what} -->", lambda m: made(m[1] if m.groups() else None), path.read_text())
+    if not count:
+        raise registry.RegistryError(f"{path.name}: no place for {what}")
+    path.write_text(text)
 
 
 def toctree(names, **options):
@@ -51,12 +60,13 @@ def main(arguments):
     if not arguments or arguments[0].startswith("-"):
         print(__doc__, file=sys.stderr)
         return 2
-    folder = Path(arguments[0])
+    folder = Path(arguments[0]).resolve()
     shutil.rmtree(folder, ignore_errors=True)
     shutil.copytree(ROOT / "docs", folder, ignore=shutil.ignore_patterns("recipes", "speed.json"))
     families = registry.load(ROOT / "api")
     pages, helpers = reference.operations(families), reference.support(families)
-    shown = {} if "--no-pictures" in arguments else gallery.make(pages, folder / "_static" / "pictures")
+    plain = "--no-pictures" in arguments
+    shown, failed = ({}, []) if plain else gallery.make(pages, folder / "_static" / "pictures")
     for page in pages.values():
         write(folder / "operations" / f"{page.name}.md",
               reference.operation_page(page, pages, helpers, shown.get(page.name, {})))
@@ -65,11 +75,14 @@ def main(arguments):
     for stem, members in helpers.items():
         write(folder / "plans" / f"{stem}.md", reference.support_page(stems[stem], members, pages))
     write(folder / "plans" / "index.md", plans_index(families, helpers))
-    plots.draw(ROOT / "docs" / "speed.json", folder / "_static")
-    if "--no-pictures" not in arguments:
-        gallery.fill_pages(folder)
+    fill(folder / "numerics.md", "bounds", lambda _: reference.bounds(pages))
+    fill(folder / "speed.md", "plot: (\\w+)", plots.markdown(ROOT / "docs" / "speed.json", folder / "_static"))
+    if not plain:
+        failed += gallery.fill_pages(folder)
         report(pages, shown)
-    return 0
+    for text in failed:
+        print(f"docs: {text}", file=sys.stderr)
+    return int(bool(failed))
 
 
 def report(pages, shown):

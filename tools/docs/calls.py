@@ -77,7 +77,7 @@ def pixel_class(array, keep_alpha=False, channel=False):
 
 
 def centre(length):
-    return length // 2
+    return (length - 1) // 2
 
 
 def reach_of(member, given):
@@ -185,7 +185,10 @@ class Model:
             wanted = out.dtype if out is not None else given.get("dtype")
             if wanted is not None and np.dtype(wanted) != target:
                 continue
-            if out is not None and out.ndim > 1 and form.layouts[1] & 7 != pixel_class(out) & 7:
+            if out is not None and out.ndim > 1 and (form.layouts[1] ^ pixel_class(out)) & (7 | door_python.PLANAR):
+                continue
+            if ("channel" in given) != bool((form.layouts[0] | form.layouts[1]) & door_python.CHANNEL) or \
+                    (out is None and "dst" not in given and form.layouts[1] & (door_python.CHANNEL | door_python.ALPHA)):
                 continue
             rank = (wanted is None and target != first.dtype, form.layouts[0] != form.layouts[1], len(form.accepts))
             found.append((rank, len(found), member))
@@ -325,6 +328,7 @@ class Model:
     def image(self, a, array, public, member, reach, given):
         if a.name == "max":
             self.last_max = array
+            self.fresh[id(array)] = array
         name, offset = self.name_of(array, public if public not in self.names else self.unique(public))
         element = C_NAME.get(array.dtype)
         parts = []
@@ -432,7 +436,7 @@ class Model:
             return str(counts[0]), counts[0]
         if a.kind == "bits":
             table = given["table"]
-            number = int(np.log2(len(table) if np.ndim(table) < 2 or not a.length else len(table[0])))
+            number = int(np.log2(len(table) if np.ndim(table[0]) == 0 else len(table[0])))
             return str(number), number
         if a.kind == "lists_out":
             return self.lists_out(a, member, given, channels)

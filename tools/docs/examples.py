@@ -1,8 +1,12 @@
 """Examples on small arrays: run by the package, written out in C, and as one C program that the tests compile."""
+import ast
 import contextlib
+import ctypes
 import io
 import os
+import re
 import tempfile
+from dataclasses import dataclass
 
 import numpy as np
 from PIL import Image
@@ -53,47 +57,71 @@ def shown(value):
         return repr(value)
 
 
-def own_names(text, names):
-    """The names that an example makes itself."""
-    return {k: v for k, v in names.items() if isinstance(v, np.ndarray) and k not in inputs.everything()}
+def own_names(names):
+    """The arrays that an example makes itself."""
+    known = inputs.everything()
+    return {k: v for k, v in names.items() if isinstance(v, np.ndarray) and k not in known}
 
 
-def c_text(recipe, model_):
-    """(declarations and calls, names of what is computed, value) of an example in C; the model runs it too."""
-    import ast
-    tree = ast.parse(recipe.example)
+@dataclass
+class CExample:
+    text: str                       # declarations, calls, release
+    computed: dict                  # C name: bytes after the calls, of arrays and results that the calls write
+    value: object                   # of the last expression
+
+
+def in_c(recipe, model_):
+    """An example in C; the model makes its calls as well."""
     names = {"np": np, "qori": model_, **inputs.everything()}
     model_.restart()
-    value = None
-    for node in tree.body:
-        model_.names.update({k: v for k, v in own_names("", names).items()
-                             if not any(v is known for known in model_.names.values())})
-        piece = ast.Module([node], [])
-        if isinstance(node, ast.Expr):
-            value = eval(compile(ast.Expression(node.value), "<example>", "eval"), names)
-        else:
-            exec(compile(piece, "<example>", "exec"), names)
-    return assemble(model_), value
+    begun, value = {}, None
+    for node in ast.parse(recipe.example).body:
+        for name, array in own_names(names).items():
+            if not any(array is known for known in model_.names.values()):
+                model_.names[name], begun[name] = array, array.copy()
+        piece = ast.unparse(node)
+        value = recipes.run(piece, names)
+    return assemble(model_, begun, value)
 
 
-def assemble(model_):
-    declared, computed, text = [], [], "\n".join(model_.lines)
-    for name, array in model_.names.items():
-        if not isinstance(array, np.ndarray) or not used(name, text) or f" {name}[" in text and "int32_t " + name + "[" in text:
+def assemble(model_, begun, value):
+    body, declared, computed = "\n".join(model_.lines), [], {}
+    for name, thing in model_.names.items():
+        if not re.search(rf"\b{name}\b", body):
             continue
-        element = calls.C_NAME[array.dtype]
-        if id(array) in model_.fresh or not array.flags.writeable and False:
-            declared.append(f"{element} {name}[{' * '.join(map(str, array.shape))}];")
-            computed.append(name)
-        elif f"{element} {name}[" not in text:
-            declared.append(f"{element} {name}[] = {calls.block(array, element)};")
-    ends = model_.freed + [f"free({name});" for name, v in model_.names.items() if isinstance(v, bytes) and v == b"allocated"]
-    return "\n".join(declared + model_.lines + ends), computed
+        if isinstance(thing, np.ndarray):
+            element = calls.C_NAME[thing.dtype]
+            inside = re.search(rf"^\w+ {name}\[", body, re.M)
+            if id(thing) in model_.fresh:
+                declared.append(f"{element} {name}[{' * '.join(map(str, thing.shape))}];")
+            elif not inside:
+                declared.append(f"{element} {name}[] = {calls.block(begun.get(name, thing), element)};")
+            if id(thing) in model_.fresh or inside or not np.array_equal(begun.get(name, thing), thing):
+                computed[name] = thing.tobytes()
+        elif isinstance(thing, ctypes.Array):
+            computed[name] = bytes(thing)
+    ends = model_.freed + [f"free({name});" for name, thing in model_.names.items() if isinstance(thing, bytes) and thing == b"allocated"]
+    return CExample("\n".join(declared + model_.lines + ends), computed, value)
 
 
-def used(name, text):
-    import re
-    return re.search(rf"\b{name}\b", text) is not None
+def program(found):
+    """One C program of all examples: a line for each of them with the bytes of what it computed, in the order of names."""
+    parts = ["#include <math.h>", "#include <stdio.h>", "#include <stdlib.h>", '#include "qori.h"', "",
+             "static void show(const void* bytes, size_t count) {",
+             '    for (size_t i = 0; i < count; ++i) printf("%02x", ((const unsigned char*)bytes)[i]);', '    printf(" ");', "}", ""]
+    for name, example in found.items():
+        body = example.text.splitlines()
+        frees = [line for line in body if re.match(r"(free|qori\w+Free\w*)\(", line)]
+        lines = [line for line in body if line not in frees]
+        shows = [f"show({'' if c_is_array(c, example) else '&'}{c}, sizeof {c});" for c in example.computed]
+        parts += [f"static void example_{name}(void) {{", *("    " + line for line in lines + shows + frees), "}", ""]
+    parts += ["int main(void) {", *(f'    printf("{name} "); example_{name}(); printf("\\n");' for name in found), "    return 0;",
+              "}", ""]
+    return "\n".join(parts)
+
+
+def c_is_array(name, example):
+    return re.search(rf"\b{name}\[", example.text) is not None
 
 
 def markdown(recipe, names, model_):
@@ -105,5 +133,4 @@ def markdown(recipe, names, model_):
     lines = ["```python", text, "```", ""]
     if output:
         lines += ["```text", output.rstrip(), "```", ""]
-    (c, _), _ = c_text(recipe, model_)
-    return lines + ["The same in C:", "", "```c", c, "```", ""]
+    return lines + ["The same in C:", "", "```c", in_c(recipe, model_).text, "```", ""]

@@ -6,7 +6,6 @@ from html import escape
 import examples
 import recipes
 import render
-from paths import ROOT
 
 CODE = re.compile(r"```python\n(.*?)```\n", re.S)
 SHOW = re.compile(r"<!-- show: (.*?) -->")
@@ -66,7 +65,7 @@ def errors(recipe, names):
 
 
 def make(pages, folder):
-    """{operation: pictures, example, errors, thumbnail}; what cannot be made is told and left out."""
+    """({operation: pictures, example, errors, thumbnail}, what could not be made and why)."""
     qori = recipes.door()
     names = recipes.namespace(qori)
     found, failed = {}, []
@@ -76,7 +75,7 @@ def make(pages, folder):
         raise recipes.RecipeError(f"recipes of no operation: {sorted(unknown)}")
     model = examples.model()
     for name, recipe in known.items():
-        shown = found[name] = {}
+        shown = found[name] = {"brief": recipe.brief}
         for what, maker in (("pictures", lambda: pictures(recipe, names, folder)),
                             ("example", lambda: examples.markdown(recipe, names, model)),
                             ("errors", lambda: errors(recipe, names))):
@@ -87,11 +86,8 @@ def make(pages, folder):
                 failed.append((name, what, error))
         if shown["pictures"]:
             shown["thumbnail"] = f"{name}_0_{(len(recipe.rows[0].vary) - 1) // 2}.webp"
-    for name, what, error in failed:
-        print(f"docs: {name}: no {what}: {''.join(traceback.format_exception(error)[-3:])}")
-    if failed:
-        raise recipes.RecipeError(f"{len(failed)} recipes failed")
-    return found
+    return found, [f"{name}: no {what}: {''.join(traceback.format_exception_only(error)).strip()}"
+                   for name, what, error in failed]
 
 
 # --- pages written by hand ------------------------------------------------------------------------------------------
@@ -112,7 +108,7 @@ def run_page(path, names, show=lambda name, value: None):
     def each(match):
         if match.group().startswith("<!--"):
             figures = []
-            for part in match[1].split(","):
+            for part in match[1].split(";"):
                 expression, _, view = part.strip().partition(" as ")
                 value = eval(view or expression, vars(render) | names | {"r": names.get(expression)})
                 figures.append(show(expression, value, code(assigned(expression, blocks))))
@@ -126,9 +122,9 @@ def run_page(path, names, show=lambda name, value: None):
 
 
 def fill_pages(folder):
-    import os
-    qori = recipes.door()
-    source = ROOT / "docs"
+    """Runs the pages written by hand, puts in what they print and show, and gives what failed."""
+    failed = []
+    recipes.door()
     for path in sorted([*folder.glob("tasks/*.md"), folder / "index.md"]):
         if not path.exists() or "```python" not in path.read_text():
             continue
@@ -139,6 +135,9 @@ def fill_pages(folder):
             picture = render.save(render.picture_of(value), folder / "_static" / "pictures" / f"{stem}_{name}.webp")
             return figure(picture, caption, alt=name).replace("../_static/pictures", place)
 
-        with examples.scratch():
-            path.write_text(run_page(path, {"__name__": "__page__"}, show))
-    assert source.exists() and os and qori
+        try:
+            with examples.scratch():
+                path.write_text(run_page(path, {"__name__": "__page__"}, show))
+        except Exception as error:
+            failed.append(f"{path.name}: {''.join(traceback.format_exception_only(error)).strip()}")
+    return failed

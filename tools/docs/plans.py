@@ -59,10 +59,10 @@ def data_type(name):
     return name, ENUMS["QorDataType"][name]
 
 
-def resize_plan(model, src_shape, dst_shape, method="linear", dtype="uint8", *, antialias=False, b=0.0, c=0.5):
+def resize_plan(model, src_shape, dst_shape, interpolation="linear", dtype="uint8", *, antialias=False, b=0.0, c=0.5, lobes=3):
     from door_python import ENUMS
-    lobes = int(method[-1]) if method[-1].isdigit() else 3
-    kind = method.rstrip("23")
+    kind = interpolation.rstrip("23")
+    lobes = int(interpolation[-1]) if interpolation[-1].isdigit() else lobes
     code, _ = code_of(dtype)
     maker = Maker(model)
     interpolation = INTERPOLATION[kind]
@@ -83,14 +83,14 @@ def resize_plan(model, src_shape, dst_shape, method="linear", dtype="uint8", *, 
     return Plan(memory, {"ResizeAntialiasing" if antialias else "Resize" + kind.capitalize()}, tuple(dst_shape[:2]), name=plan[0])
 
 
-def warp_affine_plan(model, src_shape, dst_shape, matrix, method="linear", dtype="uint8", *, inverse=False,
-                     border="replicate", border_value=0, smooth_edge=False, b=0.0, c=0.5):
+def warp_affine_plan(model, src_shape, dst_shape, matrix, interpolation="linear", dtype="uint8", channels=1, *, inverse=False,
+                     border="constant", border_value=0, b=0.0, c=0.5):
     from door_python import ENUMS
     maker = Maker(model)
     _, type_name = code_of(dtype)
-    channels = src_shape[2] if len(src_shape) > 2 else 1
-    interpolation = INTERPOLATION[method]
-    coefficients = np.ascontiguousarray(matrix, np.float64).ravel()
+    method, interpolation = interpolation, INTERPOLATION[interpolation]
+    (a, b_, c_), (d, e, f) = matrix                     # rows and columns; C maps x and y
+    coefficients = np.array([e, d, f, b_, a, c_], np.float64)
     values = (ct.c_double * 4)(*(list(border_value) if np.ndim(border_value) else [border_value] * 4))
     model.keep += [coefficients, values]
     matrix_text = (model.named("matrix", coefficients), ct.c_void_p(coefficients.ctypes.data))
@@ -103,7 +103,7 @@ def warp_affine_plan(model, src_shape, dst_shape, matrix, method="linear", dtype
     if method == "cubic":
         pairs += [(literal(b, "double"), float(b)), (literal(c, "double"), float(c))]
     texts = ", ".join(literal(v, "double") for v in list(values)[:max(channels, 1)])
-    pairs += [border_pair, (f"(const double[]){{{texts}}}", values), number(int(smooth_edge)), plan]
+    pairs += [border_pair, (f"(const double[]){{{texts}}}", values), number(0), plan]
     if method == "cubic":
         pairs.append(maker.allocate("uint8_t", "init", "initBytes", " + 1")[0])
     maker.fill(f"qoriWarpAffine{method.capitalize()}Init", *pairs)
@@ -140,21 +140,20 @@ def fourier_plan(family):
     return make
 
 
-def dct_plan(model, shape, inverse=False, *, hint="fast"):
-    way = "Inv" if inverse else "Fwd"
+def dct_plan(model, shape, *, hint="fast"):
+    """One plan for both ways."""
+    way = "Fwd"
     maker = Maker(model)
     choice = model.enumerated("QorAccuracyHint", hint)
     maker.query(f"qoriDCT{way}GetSize_32f", size(shape), choice, receives=["planBytes", "initBytes", "workBytes"])
     plan, memory = maker.allocate("QorDct2DPlan", "plan", "planBytes")
     init, _ = maker.allocate("uint8_t", "init", "initBytes", " + 1")
     maker.fill(f"qoriDCT{way}Init_32f", size(shape), choice, plan, init)
-    return Plan(memory, {"DCT" + way}, tuple(shape[:2]), name=plan[0])
+    return Plan(memory, {"DCTFwd", "DCTInv"}, tuple(shape[:2]), name=plan[0])
 
 
-def adaptive_gauss_plan(model, size_, sigma=0.0):
-    from door_python import ENUMS
+def adaptive_gauss_plan(model, shape, *, sigma=0.0):
     maker = Maker(model)
-    shape = (size_, size_) if isinstance(size_, int) else size_
     region = ("(QorImageSize){1, 1}", Pair(1, 1))
     maker.query("qoriThresholdAdaptiveGaussGetBufferSize", region, size(shape), data_type("qor8u"), number(1),
                 receives=["planBytes", "bufferBytes"])
@@ -180,7 +179,7 @@ def linear_filter_plan(model, kernel, dtype="uint8", channels=1, *, divisor=1, r
     return Plan(memory, {"FilterBorder"}, None, name=plan[0], size=kernel.shape, kernel=C_NAME[kernel.dtype])
 
 
-def histogram_plan(model, levels, lower=None, upper=None, dtype="uint8", channels=1):
+def histogram_plan(model, levels, dtype="uint8", channels=1, *, lower=None, upper=None):
     """Levels as a list, or their number between two bounds."""
     maker = Maker(model)
     _, type_name = code_of(dtype)
@@ -204,11 +203,12 @@ def histogram_plan(model, levels, lower=None, upper=None, dtype="uint8", channel
     return Plan(memory, {"Histogram"}, None, name=plan[0], levels=count, uniform=int(uniform))
 
 
-def hog_plan(model, window, cell=8, stride=None, bins=9, *, sigma=8.0, clip=0.2, order=0):
+def hog_plan(model, window=(128, 64), *, cell=8, stride=None, bins=9, sigma=8.0, limit=0.2, columns_first=False):
     class Config(ct.Structure):
         _fields_ = [("ints", ct.c_int32 * 5), ("floats", ct.c_float * 2), ("window", Pair)]
 
     stride = cell if stride is None else stride
+    order, clip = int(columns_first), limit
     config = Config((ct.c_int32 * 5)(order, cell, 2 * cell, stride, bins), (ct.c_float * 2)(sigma, clip), Pair(window[1], window[0]))
     model.keep.append(config)
     model.lines.append(f"const QorHogConfig config = {{{order}, {cell}, {2 * cell}, {stride}, {bins}, {literal(sigma)}, "

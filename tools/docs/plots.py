@@ -34,11 +34,15 @@ def chart(title, rows, colours):
     return "\n".join(lines + ["</svg>", ""])
 
 
-def draw(source, folder):
-    """One plot for each group of the rows, speed_GROUP_light.svg and speed_GROUP_dark.svg."""
-    if not source.exists():
-        return
+def markdown(source, folder):
+    """Draws the plots of all groups, SVG for light and for dark pages, and gives the function that names a group's."""
     folder.mkdir(parents=True, exist_ok=True)
-    for name, group in json.loads(source.read_text())["groups"].items():
+    groups = json.loads(source.read_text())["groups"]
+    for name, group in groups.items():
         for mode, colours in COLOURS.items():
             (folder / f"speed_{name}_{mode}.svg").write_text(chart(group["title"], group["rows"], colours))
+
+    def images(name):
+        return "\n".join(f'<img class="plot {mode}-only" src="_static/speed_{name}_{mode}.svg" '
+                         f'alt="{escape(groups[name]["title"])}">' for mode in COLOURS)
+    return images

@@ -2,6 +2,7 @@
 
 docs/recipes/*.toml are lists of [[recipe]]:
     of        operations; OP in the texts below stands for each in turn
+    brief     what the operation does, where the registry says it of its forms only
     example   statements on small arrays; the value of the last, an expression, is printed
     wrong     an expression that is refused; its error is printed
     [[recipe.row]]
@@ -51,6 +52,7 @@ class Row:
 @dataclass
 class Recipe:
     operation: str
+    brief: str = ""
     example: str = ""
     wrong: str = ""
     rows: list = field(default_factory=list)

@@ -170,7 +170,7 @@ def details(members):
         lines += [f"**{escape(group.keys['brief'])}** — " + ", ".join(f"`{n}`" for n in names), ""]
         for key, label in DOC_FIELDS:
             if key in group.keys:
-                lines += [f": *{label}.* {escape(group.keys[key])}"] if False else [f"- *{label}.* {escape(group.keys[key])}"]
+                lines.append(f"- *{label}.* {escape(group.keys[key])}")
         if "returns" in group.keys:
             lines += [f"- *Returns.* {escape(group.keys['returns'])}"]
         lines.append("")
@@ -186,7 +186,7 @@ def registry_examples(members):
     lines = []
     for group in {id(m.group): m.group for m in members}.values():
         if "example" in group.keys:
-            lines += ["In C, with plans and buffers written out:", ""] + fenced("c", group.keys["example"])
+            lines += ["From the header:", ""] + fenced("c", group.keys["example"])
     return lines
 
 
@@ -202,7 +202,7 @@ def related(page, pages, support_pages):
 
 def operation_page(page, pages, support_pages, show):
     """`show` gives the Markdown of the operation's pictures, examples and errors, lists of lines by these names."""
-    lines = [f"# {page.name}", "", escape(page.brief), ""]
+    lines = [f"# {page.name}", "", escape(show.get("brief") or page.brief), ""]
     lines += show.get("pictures", [])
     lines += ["## Call", "", "Python", ""] + fenced("python", python_signature(page.members))
     lines += ["C++", ""] + fenced("cpp", cpp_signature(page.members)) + ["C", ""] + fenced("c", c_signatures(page))
@@ -234,4 +234,24 @@ def support_page(family, members, pages):
             if key in group.keys:
                 lines.append(f"- *{label}.* {escape(group.keys[key])}")
         lines += [""] + statuses(own) + registry_examples(own)
+    return "\n".join(lines)
+
+
+# --- numerics ------------------------------------------------------------------------------------------------------
+
+def bounds(pages):
+    """What the registry says of elements, by family: text first said of which operations."""
+    lines = []
+    for _, group in by_task(pages):
+        for family in dict.fromkeys(p.family.stem for p in group):
+            said = {}
+            for page in (p for p in group if p.family.stem == family):
+                for g in page.groups:
+                    if "elements" in g.keys:
+                        said.setdefault(g.keys["elements"], {})[page.name] = None
+            if said:
+                title = next(p.family.title for p in group if p.family.stem == family)
+                lines += [f"### {title}", ""]
+                lines += [f"- {', '.join(f'[{n}](operations/{n}.md)' for n in names)}: {escape(text)}"
+                          for text, names in said.items()] + [""]
     return "\n".join(lines)

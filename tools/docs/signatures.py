@@ -1,4 +1,7 @@
 """Signatures of operations in Python and C++, from the roles of their arguments."""
+import functools
+
+import door_python
 import registry
 
 INPUTS = ("image_in", "image_inout", "planes_in", "array_in", "array_inout", "rows_in")
@@ -36,19 +39,13 @@ def default_text(argument):
     return "(0, 0)" if text == "0 0" else text
 
 
+@functools.cache
+def python_functions():
+    return {f.name: f for f in door_python.functions(registry.load(registry.ROOT / "api"))}
+
+
 def python_signature(members):
-    required, optional = merged(members)
-    parts = [a.name for a in required]
-    writes = any(a.kind in OUTPUTS + ("image_inout", "array_inout") for m in members for a in m.arguments)
-    if writes:
-        parts.append("out=None")
-    keywords = [f"{a.name}={default_text(a)}" for a in optional if a.kind != "mask"]
-    keywords += ["mask=None"] * any(a.kind == "mask" for a in optional)
-    keywords += ["channel=None"] * any(m.layout.endswith("C") for m in members)
-    keywords += ["keep_alpha=False"] * any("AC4" in m.layout for m in members)
-    if keywords:
-        parts += ["*"] + keywords
-    return f"qori.{members[0].operation.snake}({', '.join(parts)})"
+    return "qori." + door_python.signature(python_functions()[members[0].operation.snake])
 
 
 CPP_TYPES = {"image_in": "View<const T, L> {}", "image_inout": "View<const T, L> {}", "planes_in": "Planes<const T, N> {}",
