@@ -76,9 +76,12 @@ def in_c(recipe, model_):
     model_.restart()
     begun, value = {}, None
     for node in ast.parse(recipe.example).body:
+        body = "\n".join(model_.lines)
         for name, array in own_names(names).items():
             if not any(array is known for known in model_.names.values()):
-                model_.names[name], begun[name] = array, array.copy()
+                model_.names[name] = array
+            if model_.names.get(name) is array and not re.search(rf"\b{name}\b", body):
+                begun[name] = array.copy()                      # as it is when the first call sees it
         piece = ast.unparse(node)
         value = recipes.run(piece, names)
     return assemble(model_, begun, value)
