@@ -3,7 +3,7 @@
 
     apigen.py header FILE               the public C header
     apigen.py build DIR [FAMILY...]     entry table and stubs, wrappers, members and contracts, export lists,
-                                        import definitions, reference pages; of some families where they are named
+                                        import definitions, reference pages, the Python door; of some families where they are named
     apigen.py where NAME...             where exports are registered, checked and computed
 
 Files whose content does not change are left alone, so that a build repeats only what the registry changed.
@@ -14,6 +14,7 @@ import textwrap
 import tomllib
 from pathlib import Path
 
+import door_python
 from registry import ROOT, RegistryError, all_members, checks_of, choose, load
 
 DOC_FIELDS = [("shapes", "Shapes"), ("elements", "Elements"), ("units", "Units"), ("aliasing", "Aliasing"),
@@ -156,6 +157,8 @@ def build(families, folder):
     write(folder / "imports.def", import_definition(members))
     write(folder / "exports.map", version_script(members))
     write(folder / "exports.txt", "".join(m.name + "\n" for m in members))
+    for name, text in door_python.products(families).items():
+        write(folder / name, text)
 
 
 # --- finding one's way ----------------------------------------------------------------------------------------------

@@ -8,7 +8,7 @@ IMAGES = ("image_in", "image_out", "image_inout", "planes_in", "planes_out")
 RULES = {"reach": {"", "window", "kernel", "structure", "fixed", "1", "2", "row", "column", "centred", "centred_kernel",
                    "centred_plan", "plan"},
          "extent": {"", "full", "same", "valid", "algorithm", "plan", "axis", "frame", "blocks", "bits", "2x2", "4x4",
-                    "8x8", "levels", "windows"},
+                    "8x8", "levels", "windows", "row"},
          "overlap": {"exact", "never"}}
 
 
