@@ -47,7 +47,7 @@ def plain(value):
         return plain(list(value))
     if value is None:
         return []
-    array = np.asarray(value)
+    array = np.asarray(value).squeeze()                # a list is a list, as a row too
     return [array] if array.ndim else [float(array) if array.dtype.kind in "iuf" else array]
 
 

@@ -6,6 +6,7 @@ import io
 import os
 import re
 import tempfile
+import warnings
 from dataclasses import dataclass
 
 import numpy as np
@@ -43,10 +44,13 @@ def scratch():
 def printed(text, names):
     """What statements print; and the value of a last expression, as at a prompt."""
     output = io.StringIO()
-    with contextlib.redirect_stdout(output):
+    with contextlib.redirect_stdout(output), warnings.catch_warnings(record=True) as remarks:
+        warnings.simplefilter("always")
         value = recipes.run(text, names)
         if value is not None:
             print(shown(value))
+        for remark in remarks:
+            print(f"qori.{remark.category.__name__}: {remark.message}")
     return output.getvalue()
 
 
