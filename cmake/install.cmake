@@ -2,7 +2,7 @@
 # documentation.
 include(CMakePackageConfigHelpers)
 
-install(FILES include/qori.h core/qorcore.h DESTINATION ${CMAKE_INSTALL_INCLUDEDIR})
+install(FILES include/qori.h include/qori.hpp core/qorcore.h DESTINATION ${CMAKE_INSTALL_INCLUDEDIR})
 install(FILES README.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
 install(FILES docs/design.md DESTINATION ${CMAKE_INSTALL_DOCDIR}/docs)
 install(DIRECTORY ${PROJECT_BINARY_DIR}/generated/reference DESTINATION ${CMAKE_INSTALL_DOCDIR})

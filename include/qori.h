@@ -42,9 +42,9 @@
 #if defined(QORI_BUILDING)
 #define QORI_API
 #elif defined(_WIN32)
-#define QORI_API __declspec(dllimport)
+#define QORI_API __declspec(dllimport) __declspec(nothrow)
 #else
-#define QORI_API
+#define QORI_API __attribute__((__nothrow__))
 #endif
 
 #ifdef __cplusplus

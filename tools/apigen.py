@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Derives everything that lists exports from the registry in api/.
 
-    apigen.py header FILE               the public C header
+    apigen.py header FILE               the public C header, and the C++ one beside it (.hpp)
     apigen.py build DIR [FAMILY...]     entry table and stubs, wrappers, members and contracts, export lists,
                                         import definitions, reference pages, the Python door; of some families where they are named
     apigen.py where NAME...             where exports are registered, checked and computed
@@ -14,6 +14,8 @@ import textwrap
 import tomllib
 from pathlib import Path
 
+import door_cpp
+import door_cpp_text
 import door_python
 from registry import ROOT, RegistryError, all_members, checks_of, choose, load
 
@@ -211,13 +213,14 @@ def main(arguments):
         families = load(ROOT / "api")
         if command == "header":
             write(Path(operands[0]), header(families))
+            write(Path(operands[0]).with_suffix(".hpp"), door_cpp_text.header(families))
         elif command == "build":
             folder, *chosen = operands
             build(choose(families, chosen), Path(folder))
         else:
             for name in operands:
                 print("\n".join(where(families, name)))
-    except (RegistryError, KeyError, tomllib.TOMLDecodeError) as error:
+    except (RegistryError, door_cpp.DoorError, KeyError, tomllib.TOMLDecodeError) as error:
         print(f"apigen: {error!r}", file=sys.stderr)
         return 1
     return 0

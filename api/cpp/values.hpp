@@ -1,0 +1,160 @@
+
+/** One element per channel: {1, 2, 3}, or of one channel 1. */
+template <class T, int N>
+class Pixel {
+public:
+    constexpr Pixel() noexcept = default;
+    template <class... U, detail::If<sizeof...(U) == N && (std::is_convertible_v<U, T> && ...)> = 0>
+    constexpr Pixel(U... channels) noexcept : values_{static_cast<T>(channels)...} {}
+    constexpr Pixel(const T (&channels)[N]) noexcept {
+        for (int i = 0; i < N; ++i) values_[i] = channels[i];
+    }
+    constexpr T& operator[](int channel) noexcept { return values_[channel]; }
+    constexpr const T& operator[](int channel) const noexcept { return values_[channel]; }
+    constexpr T* data() noexcept { return values_; }
+    constexpr const T* data() const noexcept { return values_; }
+    static constexpr std::size_t size() noexcept { return N; }
+
+private:
+    T values_[N] = {};
+};
+
+namespace detail {
+
+/** Where an operation puts a result per channel: a variable (of one channel), an array, a Pixel or the like. */
+template <class T, int N>
+class Results {
+public:
+    constexpr Results(T (&results)[N]) noexcept : data(results) {}
+    template <int M = N, If<M == 1> = 0>
+    constexpr Results(T& result) noexcept : data(&result) {}
+    template <class S, If<isSpan<S&, T> && sizeof(S) == N * sizeof(T)> = 0>
+    constexpr Results(S& results) noexcept : data(results.data()) {}
+    T* data;
+};
+
+}  // namespace detail
+
+/** Weights of a filter, or the mask of a morphological operation, with the anchor that lies on the pixel made. */
+template <class T>
+class Kernel {
+public:
+    constexpr Kernel(const T* weights, QorImageSize size, QorPoint2D anchor) noexcept
+        : data_(weights), size_(size), anchor_(anchor) {}
+    /** The anchor is the middle: width / 2, height / 2, rounded down. */
+    constexpr Kernel(const T* weights, QorImageSize size) noexcept
+        : Kernel(weights, size, {size.width / 2, size.height / 2}) {}
+    template <std::size_t H, std::size_t W>
+    constexpr Kernel(const T (&rows)[H][W]) noexcept : Kernel(rows[0], {int32_t(W), int32_t(H)}) {}
+    constexpr const T* data() const noexcept { return data_; }
+    constexpr QorImageSize size() const noexcept { return size_; }
+    constexpr QorPoint2D anchor() const noexcept { return anchor_; }
+
+private:
+    const T* data_;
+    QorImageSize size_;
+    QorPoint2D anchor_;
+};
+
+/** Pixels around the one made: {width, height}, anchored in the middle, or {width, height, x, y}. */
+class Window {
+public:
+    constexpr Window(int32_t width, int32_t height) noexcept : Window(width, height, width / 2, height / 2) {}
+    constexpr Window(int32_t width, int32_t height, int32_t x, int32_t y) noexcept
+        : size_{width, height}, anchor_{x, y} {}
+    constexpr Window(QorImageSize size) noexcept : Window(size.width, size.height) {}
+    constexpr Window(QorImageSize size, QorPoint2D anchor) noexcept : size_(size), anchor_(anchor) {}
+    constexpr QorImageSize size() const noexcept { return size_; }
+    constexpr QorPoint2D anchor() const noexcept { return anchor_; }
+
+private:
+    QorImageSize size_;
+    QorPoint2D anchor_;
+};
+
+/** What lies beyond an image: borderReplicate and so on, or {borderConstant, value per channel}. */
+template <class T, int N>
+class Border {
+public:
+    constexpr Border(int32_t mode) noexcept : mode_(mode) {}
+    constexpr Border(int32_t mode, const Pixel<T, N>& value) noexcept : mode_(mode), value_(value) {}
+    constexpr int32_t mode() const noexcept { return mode_; }
+    constexpr const Pixel<T, N>& value() const noexcept { return value_; }
+
+private:
+    int32_t mode_;
+    Pixel<T, N> value_;
+};
+
+/** Bytes for an operation to work in, aligned to 64. Grows and never shrinks; keep one per thread across calls. */
+class Buffer {
+public:
+    Buffer() noexcept = default;
+    explicit Buffer(int32_t bytes) noexcept { reserve(bytes); }
+    Buffer(Buffer&& other) noexcept : data_(other.data_), bytes_(other.bytes_) {
+        other.data_ = nullptr, other.bytes_ = 0;
+    }
+    Buffer& operator=(Buffer&& other) noexcept {
+        if (this != &other) {
+            qoriFree(data_);
+            data_ = other.data_, bytes_ = other.bytes_;
+            other.data_ = nullptr, other.bytes_ = 0;
+        }
+        return *this;
+    }
+    ~Buffer() { qoriFree(data_); }
+    /** At least as many bytes, whose contents are lost; false where there is no memory: then the old ones stay. */
+    [[nodiscard]] bool fits(int32_t bytes) noexcept {
+        reserve(bytes);
+        return data_ && bytes_ >= bytes;
+    }
+    uint8_t* data() const noexcept { return data_; }
+    int32_t bytes() const noexcept { return bytes_; }
+    explicit operator bool() const noexcept { return data_ != nullptr; }
+
+private:
+    void reserve(int32_t bytes) noexcept {
+        if (data_ && bytes_ >= bytes) return;
+        int32_t step;
+        const int32_t wanted = bytes < 64 ? 64 : bytes;
+        uint8_t* grown = qoriMalloc_8u_C1(wanted, 1, &step);
+        if (!grown) return;
+        qoriFree(data_);
+        data_ = grown, bytes_ = wanted;
+    }
+    uint8_t* data_ = nullptr;
+    int32_t bytes_ = 0;
+};
+
+/** The header's words for a status. */
+inline const char* status_text(QorResult status) noexcept {
+    switch (status) {
+        // @TEXTS@
+        default: return "A status that this header does not know.";
+    }
+}
+
+#if defined(__cpp_exceptions)
+/** An error's status and the header's words for it. */
+class Error : public std::exception {
+public:
+    explicit Error(QorResult status) noexcept : status_(status) {}
+    QorResult status() const noexcept { return status_; }
+    const char* what() const noexcept override { return status_text(status_); }
+
+private:
+    QorResult status_;
+};
+#endif
+
+/** Passes successes and warnings on; an error throws qori::Error or, without exceptions, ends the program. */
+inline QorResult check(QorResult status) {
+    if (status < 0) {
+#if defined(__cpp_exceptions)
+        throw Error(status);
+#else
+        std::abort();
+#endif
+    }
+    return status;
+}
