@@ -204,8 +204,10 @@ def operation_page(page, pages, support_pages, show):
     """`show` gives the Markdown of the operation's pictures, examples and errors, lists of lines by these names."""
     lines = [f"# {page.name}", "", escape(show.get("brief") or page.brief), ""]
     lines += show.get("pictures", [])
-    lines += ["## Call", "", "Python", ""] + fenced("python", python_signature(page.members))
-    lines += ["C++", ""] + fenced("cpp", cpp_signature(page.members)) + ["C", ""] + fenced("c", c_signatures(page))
+    lines += ["## Call", ""]
+    for language, title, text in (("python", "Python", python_signature(page.members)),
+                                  ("cpp", "C++", cpp_signature(page.members)), ("c", "C", c_signatures(page))):
+        lines += [f'<p class="language">{title}</p>', ""] + fenced(language, text)
     if show.get("example") or registry_examples(page.members):
         lines += ["## Example", ""] + show.get("example", []) + registry_examples(page.members)
     lines += ["## What exists", ""] + existing(page)

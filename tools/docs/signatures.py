@@ -1,42 +1,51 @@
-"""Signatures of operations in Python and C++, from the roles of their arguments."""
+"""Signatures of operations in Python and C++, from the two doors."""
 import functools
+import re
 
+import door_cpp
 import door_python
 import registry
 
-INPUTS = ("image_in", "image_inout", "planes_in", "array_in", "array_inout", "rows_in")
-OUTPUTS = ("image_out", "planes_out", "array_out", "lists_out")
-SILENT = ("step", "region", "size_of", "count", "bits", "buffer", "result")
-
-
-def public_arguments(member):
-    """The arguments that a caller gives, in natural order: inputs (a before b), what has no default, then the rest."""
-    given = [a for a in member.arguments if a.kind not in SILENT + OUTPUTS]
-    inputs = sorted((a for a in given if a.kind in INPUTS), key=lambda a: a.name if a.name in "ab" else "")
-    others = [a for a in given if a.kind not in INPUTS]
-    operand = [a for a in others if a.name == "b"]
-    rest = [a for a in others if a.name != "b"]
-    return inputs + operand + [a for a in rest if a.default is None] + [a for a in rest if a.default is not None]
-
-
-def merged(members):
-    """Arguments of all members by name, in order; those that some members lack have the default None."""
-    order, everywhere = {}, None
-    for member in members:
-        names = [a.name for a in public_arguments(member)]
-        everywhere = set(names) if everywhere is None else everywhere & set(names)
-        for argument in public_arguments(member):
-            order.setdefault(argument.name, argument)
-    required = [a for a in order.values() if a.default is None and a.name in everywhere]
-    optional = [a for a in order.values() if a not in required]
-    return required, optional
-
-
-def default_text(argument):
-    text = argument.default
-    if text is None:
-        return "None"
-    return "(0, 0)" if text == "0 0" else text
+CPP_TYPES = {"in": "View<const T, L>", "out": "View<T, L>", "inout": "InPlace<T, L>", "mask": "View<const uint8_t, C1>",
+             "block_in": "const T*", "block_out": "T*", "block_inout": "T*", "kernel": "Kernel<T>", "window": "Window",
+             "border": "Border<T, N>", "value": "Pixel<T, N>", "buffer": "Buffer&"}
+# Operations with plans are calls of theirs: how the plan is made, and how it is called. Work memory is optional.
+PLANS = {
+    "ResizePlan": """
+qori::ResizePlan<T> plan(QorImageSize src, QorImageSize dst, Interpolation how);
+QorResult plan(View<const T, L> src, View<T, L> dst, Border<T, N> border = borderReplicate);
+QorResult plan.tile(View<const T, L> src, View<T, L> dst, QorPoint2D offset, Border<T, N> border, Buffer& buffer);""",
+    "WarpAffinePlan": """
+qori::WarpAffinePlan<T, L> plan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
+    Border<double, N> border = borderReplicate, bool inverse = false);
+QorResult plan(View<const T, L> src, View<T, L> dst);
+QorResult plan.tile(View<const T, L> src, View<T, L> dst, QorPoint2D offset, Buffer& buffer);""",
+    "DftPlan": """
+qori::DftPlan<T> plan(QorImageSize size, QorFftNormFlag norm = fftDivInvByN);
+QorResult plan.WAY(View<const T, L> src, View<D, L> dst, int32_t scale = 0);""",
+    "FftPlan": """
+qori::FftPlan<T> plan(QorImageSize size, QorFftNormFlag norm = fftDivInvByN);
+QorResult plan.WAY(View<const T, L> src, View<D, L> dst, int32_t scale = 0);""",
+    "DctPlan": """
+qori::DctPlan plan(QorImageSize size, QorAccuracyHint hint = hintFast);
+QorResult plan.WAY(View<const float, L> src, View<float, L> dst);""",
+    "LinearFilterPlan": """
+qori::LinearFilterPlan<T, L> plan(Kernel<int16_t> kernel, int32_t divisor = 1,
+    QorRoundingMode rounding = roundNearestEven);
+qori::LinearFilterPlan<T, L> plan(Kernel<float> kernel, QorRoundingMode rounding = roundNearestEven);
+QorResult plan(View<const T, L> src, View<T, L> dst, Border<T, N> border = borderReplicate);""",
+    "HistogramPlan": """
+qori::HistogramPlan<T, L> plan(const float* const (&levels)[N], Pixel<int32_t, N> counts);
+qori::HistogramPlan<T, L> plan(Pixel<float, N> lower, Pixel<float, N> upper, Pixel<int32_t, N> counts);
+QorResult plan(View<const T, L> src, uint32_t* hist);""",
+    "HogPlan": """
+qori::HogPlan<T> plan(QorHogConfig config);
+QorResult plan(View<const T, L> src, const QorPoint2D* locations, int32_t count, float* dst,
+    Border<T, N> border = borderReplicate);""",
+    "AdaptiveGaussPlan": """
+qori::AdaptiveGaussPlan plan(QorImageSize square, float sigma = 0);
+QorResult plan(View<const uint8_t> src, View<uint8_t> dst, float delta,
+    Border<uint8_t, 1> border = borderReplicate, uint8_t above = 255, uint8_t below = 0);"""}
 
 
 @functools.cache
@@ -48,29 +57,56 @@ def python_signature(members):
     return "qori." + door_python.signature(python_functions()[members[0].operation.snake])
 
 
-CPP_TYPES = {"image_in": "View<const T, L> {}", "image_inout": "View<const T, L> {}", "planes_in": "Planes<const T, N> {}",
-             "array_in": "const T* {}", "array_inout": "const T* {}", "rows_in": "const T* const* {}", "value": "Value<T, L> {}",
-             "scalar": "{e} {}", "enum": "{d} {}", "flags": "{d} {}", "size": "QorImageSize {}", "point": "QorPoint2D {}",
-             "kernel": "Kernel<T> {}", "lists_in": "Lists<T, L> {}", "mask": "View<const std::uint8_t, C1> {}",
-             "rows": "std::int32_t {}", "columns": "std::int32_t {}", "plan_in": "const {p}& {}"}
+def cpp_type(argument, c_argument):
+    if argument.kind == "enum":
+        return argument.detail
+    if argument.kind == "result":
+        return f"{c_argument.element}&" if not c_argument.length else f"{c_argument.element} (&)[N]"
+    if argument.kind in CPP_TYPES:
+        return CPP_TYPES[argument.kind]
+    return re.sub(r"\s*\w+(\[\w*\])?$", "", c_argument.declaration) + ("*" if c_argument.length else "")
 
 
-def cpp_parameter(argument, member):
-    form = CPP_TYPES.get(argument.kind, argument.element + " {}")
-    text = form.replace("{e}", argument.element).replace("{d}", argument.detail).replace("{p}", member.operation.plan or "auto")
-    return text.replace("{}", argument.name)
+def cpp_calls(members):
+    """One line for each list of arguments that the operation takes, out of place first; work memory is optional."""
+    lines = {}
+    for form in next(iter(door_cpp.forms_of(members).values())):
+        member, parts = form.anyone(), []
+        for a in door_cpp.in_order(form.arguments, members[0].operation.snake):
+            if a.kind == "buffer":
+                continue
+            text = f"{cpp_type(a, member.arguments[a.places[0]])} {a.name}"
+            if "(&)" in text:
+                text = text.replace("(&)", f"(&{a.name})").rpartition(" ")[0]
+            parts.append(text + (f" = {a.default}" if a.default is not None else ""))
+        lines.setdefault(", ".join(parts), form)
+    for text in [t for t in lines if " = " in t]:       # what a default covers
+        lines.pop(", ".join(p for p in text.split(", ") if " = " not in p), None)
+    ordered = sorted(lines, key=lambda text: ("InPlace" in text or text.count("*") > 1))
+    return ordered
 
 
 def cpp_signature(members):
-    member = members[0]
-    required, optional = merged(members)
-    parts = [cpp_parameter(a, member) for a in required]
-    if any(a.kind in OUTPUTS for a in member.arguments):
-        parts.append("View<D, L> out")
-    parts += [cpp_parameter(a, member) + (f" = {default_text(a)}" if a.default is not None else "") for a in optional
-              if a.default is not None]
-    parts += [f"{a.element}& {a.name}" for a in member.arguments if a.kind == "result"]
-    return f"Status qori::{member.operation.snake}({', '.join(parts)}) noexcept;"
+    if members[0].operation.plan:
+        return PLANS[members[0].operation.plan].strip().replace("WAY", members[0].operation.snake.rpartition("_")[2])
+    name = members[0].operation.snake
+    return "\n".join(broken(f"QorResult qori::{name}(", parts.split(", ")) for parts in cpp_calls(members))
 
 
-__all__ = ["cpp_signature", "python_signature", "public_arguments", "registry"]
+def broken(head, parts, width=96):
+    """A prototype, broken between parameters where it is long."""
+    lines, line, depth = [], head, 0
+    joined, current = [], ""
+    for part in parts:                                  # commas inside of <> do not part
+        current = f"{current}, {part}" if current else part
+        depth = current.count("<") - current.count(">")
+        if not depth:
+            joined.append(current)
+            current = ""
+    for index, part in enumerate(joined or ["void"]):
+        piece = part + (");" if index + 1 >= len(joined) else ", ")
+        if len(line + piece) > width:
+            lines.append(line.rstrip())
+            line = "    "
+        line += piece
+    return "\n".join(lines + [line])
