@@ -3,7 +3,7 @@
 
     assemble.py FOLDER [--no-pictures]
 
-Prints how many operations have a picture and an example, and which have none.
+Fails where an operation has no picture or no example, or one of them cannot be made.
 """
 import re
 import shutil
@@ -78,18 +78,20 @@ def main(arguments):
     fill(folder / "numerics.md", "bounds", lambda _: reference.bounds(pages))
     fill(folder / "speed.md", "plot: (\\w+)", plots.markdown(ROOT / "docs" / "speed.json", folder / "_static"))
     if not plain:
-        failed += gallery.fill_pages(folder)
-        report(pages, shown)
+        failed += gallery.fill_pages(folder) + lacking(pages, shown)
     for text in failed:
         print(f"docs: {text}", file=sys.stderr)
     return int(bool(failed))
 
 
-def report(pages, shown):
+def lacking(pages, shown):
+    """Prints how many operations have a picture and an example, and gives what is missing."""
+    found = []
     for what in ("pictures", "example"):
-        lacking = [name for name in pages if not shown.get(name, {}).get(what)]
-        print(f"docs: {len(pages) - len(lacking)} of {len(pages)} operations have {what}" +
-              (f"; none: {' '.join(lacking)}" if lacking else ""))
+        without = [name for name in pages if not shown.get(name, {}).get(what)]
+        print(f"docs: {len(pages) - len(without)} of {len(pages)} operations have {what}")
+        found += [f"{name} has no {what}" for name in without]
+    return found
 
 
 if __name__ == "__main__":

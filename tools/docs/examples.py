@@ -30,12 +30,12 @@ def scratch():
         os.chdir(folder)
         try:
             named = inputs.everything()
-            Image.fromarray(named["large"]).save("photo.png")
+            Image.fromarray(named["large"]).save("photo.png", compress_level=1)
             for name in ("page", "speckled", "stars"):
                 Image.fromarray(named[name]).save(name + ".png")
             os.mkdir("holiday")
             for i in range(3):
-                Image.fromarray(named["large"][20 * i:, 30 * i:]).save(f"holiday/{i + 1}.png")
+                Image.fromarray(named["large"][20 * i:, 30 * i:]).save(f"holiday/{i + 1}.png", compress_level=1)
             yield
         finally:
             os.chdir(old)

@@ -19,7 +19,8 @@ def figure(name, caption, kind="", alt=""):
 
 
 def code(text):
-    return "<code>" + escape(text) + "</code>"
+    """As code, of which short lists in parentheses stay on one line."""
+    return "<code>" + re.sub(r"\([^()\n]{1,22}\)", r'<span class="whole">\g<0></span>', escape(text)) + "</code>"
 
 
 def value_text(result):

@@ -9,7 +9,8 @@ COLOURS = {"light": ("#1c1c1c", "#6b6b6b", "#dcdcdc", "#0b6e72", "#9cc9ca"),
 def chart(title, rows, colours):
     """Bars of shares; the roofline is the line at 1. Bars beyond twice the roofline end in a point."""
     ink, pale, grid, strong, weak = colours
-    height, top, left, scale, cut = 19, 34, 232, 190, 2.0
+    height, top, scale, cut = 19, 34, 190, 2.0
+    left = max(232, 16 + 6.6 * max(len(row["operation"]) for row in rows))
     end = left + scale * cut
     bottom, width = top + height * len(rows) + 4, end + 110
     lines = [f'<svg xmlns="http://www.w3.org/2000/svg" viewBox="0 0 {width:.0f} {bottom + 6}" font-size="11.5" '

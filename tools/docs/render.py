@@ -118,13 +118,18 @@ def picture_of(array, crop=None):
 
 
 def save(picture, path):
-    """WebP, without loss where that stays small."""
+    """WebP, of few colours and little detail without loss."""
+    if path.exists():                           # an input of many recipes
+        return path.name
     path.parent.mkdir(parents=True, exist_ok=True)
     if max(picture.size) > 520:
         picture.thumbnail((520, 520))
-    picture.save(path, "WEBP", lossless=True, method=3)
     quality = 90
+    if picture.getcolors(256) is None:
+        picture.save(path, "WEBP", quality=quality, method=2)
+    else:
+        picture.save(path, "WEBP", lossless=True, quality=40, method=2)
     while path.stat().st_size > LIMIT and quality > 20:
-        picture.save(path, "WEBP", quality=quality, method=3)
-        quality -= 12
+        quality -= 16
+        picture.save(path, "WEBP", quality=quality, method=2)
     return path.name
