@@ -19,8 +19,9 @@ def figure(name, caption, kind="", alt=""):
 
 
 def code(text):
-    """As code, of which short lists in parentheses stay on one line."""
-    return "<code>" + re.sub(r"\([^()\n]{1,22}\)", r'<span class="whole">\g<0></span>', escape(text)) + "</code>"
+    """As code that breaks behind a function's name rather than in it; short lists in parentheses stay on one line."""
+    text = re.sub(r"\([^()\n]{1,22}\)", r'<span class="whole">\g<0></span>', escape(text))
+    return "<code>" + re.sub(r"(qori\.\w+\()(?!<)", r"\1<wbr>", text) + "</code>"
 
 
 def value_text(result):

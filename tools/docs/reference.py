@@ -39,7 +39,8 @@ class Page:
 
     @property
     def brief(self):
-        return self.groups[0].keys["brief"]
+        """The first group's first words, without the formula of the C parameters."""
+        return re.sub(r": (dst|p[A-Z])\S* = .*", ".", self.groups[0].keys["brief"])
 
 
 def operations(families):
@@ -134,15 +135,18 @@ def existing(page):
 
 def statuses(members):
     """Tables of statuses in the order of the checks, members with the same list under one heading."""
-    lists = {}
+    lists, everywhere = {}, {}
     for member in members:
-        lists.setdefault(tuple(member.checks), {})[pattern(member)] = None
+        types = lists.setdefault(tuple(member.checks), {}).setdefault(pattern(member), {})
+        types[code_parts(member)[0]] = None
+        everywhere.setdefault(pattern(member), set()).add(tuple(member.checks))
     lines = []
     for checks, names in lists.items():
         if not checks:
             continue
         if len(lists) > 1:
-            lines += [", ".join(f"`{n}`" for n in names), ""]
+            lines += [", ".join(f"`{n}`" + (f" of {' '.join(types)}" if len(everywhere[n]) > 1 else "")
+                                for n, types in names.items()), ""]
         lines += ["| | status | when |", "|---|---|---|"]
         for number, text in enumerate(checks, 1):
             match = re.match(r"^(QOR_\w+) \((.*)\)$", text)
@@ -171,7 +175,7 @@ def details(members):
         for key, label in DOC_FIELDS:
             if key in group.keys:
                 lines.append(f"- *{label}.* {escape(group.keys[key])}")
-        if "returns" in group.keys:
+        if not group.keys.get("returns", "QOR_OK; in this order").startswith("QOR_OK; in this order"):
             lines += [f"- *Returns.* {escape(group.keys['returns'])}"]
         lines.append("")
     return lines
@@ -183,11 +187,8 @@ def all_names(members):
 
 
 def registry_examples(members):
-    lines = []
-    for group in {id(m.group): m.group for m in members}.values():
-        if "example" in group.keys:
-            lines += ["From the header:", ""] + fenced("c", group.keys["example"])
-    return lines
+    texts = [g.keys["example"] for g in {id(m.group): m.group for m in members}.values() if "example" in g.keys]
+    return ["From the header:", ""] + [line for text in texts for line in fenced("c", text)] if texts else []
 
 
 def related(page, pages, support_pages):
