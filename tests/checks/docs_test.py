@@ -19,7 +19,8 @@ class Reference(unittest.TestCase):
 
     def test_every_export_stands_on_one_page(self):
         support = reference.support(self.families)
-        listed = [m.name for p in self.pages.values() for m in p.members] + [m.name for f in support.values() for m in f]
+        listed = [m.name for p in self.pages.values() for m in p.members]
+        listed += [m.name for members in support.values() for m in members]
         self.assertEqual(sorted(listed), sorted(m.name for m in registry.all_members(self.families)))
 
     def test_every_operation_is_found_by_one_task(self):
@@ -36,7 +37,7 @@ class Reference(unittest.TestCase):
 
     def test_statuses_stand_in_the_order_of_the_checks(self):
         page = self.pages["filter_median"]
-        lines = [line for line in reference.statuses(page.members) if line.startswith("| 1 ") or line.startswith("| 2 ")]
+        lines = [line for line in reference.statuses(page.members) if line.startswith(("| 1 ", "| 2 "))]
         first, second = page.members[0].checks[:2]
         self.assertIn(first.split(" ")[0], lines[0])
         self.assertIn(second.split(" ")[0], lines[1])

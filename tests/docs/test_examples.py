@@ -52,7 +52,9 @@ def plain(value):
 
 
 def same(a, b):
-    return len(a) == len(b) and all(np.array_equal(x, y, equal_nan=np.asarray(x).dtype.kind == "f") for x, y in zip(a, b))
+    def equal(x, y):
+        return np.array_equal(x, y, equal_nan=np.asarray(x).dtype.kind == "f")
+    return len(a) == len(b) and all(map(equal, a, b))
 
 
 @pytest.mark.parametrize("name", RECIPES)
@@ -91,4 +93,5 @@ def test_the_python_of_a_page_runs_from_top_to_bottom(path, names):
 def test_the_programs_of_a_page_run(path, tmp_path):
     for index, text in enumerate(re.findall(r"```c\n(.*?)```", path.read_text(), re.S)):
         if "int main(void)" in text:
-            subprocess.run([compiled(text, tmp_path, f"program{index}")], check=True, stdout=subprocess.DEVNULL, timeout=60)
+            program = compiled(text, tmp_path, f"program{index}")
+            subprocess.run([program], check=True, stdout=subprocess.DEVNULL, timeout=60)

@@ -38,21 +38,23 @@ def toctree(names, **options):
 
 def overview(pages, shown):
     """All operations by task, each with its thumbnail."""
-    lines = ["# Operations", "", f"{len(pages)} operations, by what they are for. Each page shows what the operation does, how it "
-             "is called in Python, C++ and C, for which elements and layouts it exists, and when it refuses.", ""]
+    lines = ["# Operations", "", f"{len(pages)} operations, by what they are for. Each page shows what it does, how "
+             "it is called in Python, C++ and C, for which elements and layouts it exists, and when it refuses.", ""]
     for title, group in reference.by_task(pages):
         lines += [f"## {title}", "", '<div class="cards">']
         for page in group:
             picture = shown.get(page.name, {}).get("thumbnail")
-            image = f'<img src="../_static/pictures/{picture}" alt="" loading="lazy">' if picture else '<div class="none"></div>'
+            image = '<div class="none"></div>'
+            if picture:
+                image = f'<img src="../_static/pictures/{picture}" alt="" loading="lazy">'
             lines.append(f'<a href="{page.name}.html">{image}<span>{page.name}</span></a>')
         lines += ["</div>", ""]
     return "\n".join(lines) + "\n" + toctree(sorted(pages), hidden="", maxdepth=1)
 
 
 def plans_index(families, members):
-    lines = ["# Plans, buffers and queries", "", "In Python and C++ plans are objects and buffers look after themselves; see "
-             "[plans and buffers](../tasks/plans.md). These are the C functions behind them, by family.", ""]
+    lines = ["# Plans, buffers and queries", "",
+             "In Python and C++ plans are objects and buffers look after themselves; see [plans and buffers](../tasks/plans.md). These are the C functions behind them, by family.", ""]
     return "\n".join(lines) + toctree(list(members), maxdepth=1)
 
 

@@ -12,6 +12,7 @@ from dataclasses import dataclass
 import numpy as np
 from PIL import Image
 
+import c_text
 import calls
 import inputs
 import recipes
@@ -97,33 +98,34 @@ def assemble(model_, begun, value):
         if not re.search(rf"\b{name}\b", body):
             continue
         if isinstance(thing, np.ndarray):
-            element = calls.C_NAME[thing.dtype]
+            element = c_text.C_NAME[thing.dtype]
             inside = re.search(rf"^\w+ {name}\[", body, re.M)
             if id(thing) in model_.fresh:
                 declared.append(f"{element} {name}[{' * '.join(map(str, thing.shape))}];")
             elif not inside:
-                declared.append(f"{element} {name}[] = {calls.block(begun.get(name, thing), element)};")
+                declared.append(f"{element} {name}[] = {c_text.initialiser(begun.get(name, thing), element)};")
             if id(thing) in model_.fresh or inside or not np.array_equal(begun.get(name, thing), thing):
                 computed[name] = thing.tobytes()
         elif isinstance(thing, ctypes.Array):
             computed[name] = bytes(thing)
-    ends = model_.freed + [f"free({name});" for name, thing in model_.names.items() if isinstance(thing, bytes) and thing == b"allocated"]
+    ends = model_.freed + [f"free({name});" for name, thing in model_.names.items() if isinstance(thing, bytes)]
     return CExample("\n".join(declared + model_.lines + ends), computed, value)
 
 
 def program(found):
-    """One C program of all examples: a line for each of them with the bytes of what it computed, in the order of names."""
+    """One C program of all examples: a line for each, with the bytes of what it computed in the order of names."""
     parts = ["#include <math.h>", "#include <stdio.h>", "#include <stdlib.h>", '#include "qori.h"', "",
              "static void show(const void* bytes, size_t count) {",
-             '    for (size_t i = 0; i < count; ++i) printf("%02x", ((const unsigned char*)bytes)[i]);', '    printf(" ");', "}", ""]
+             '    for (size_t i = 0; i < count; ++i) printf("%02x", ((const unsigned char*)bytes)[i]);',
+             '    printf(" ");', "}", ""]
     for name, example in found.items():
         body = example.text.splitlines()
         frees = [line for line in body if re.match(r"(free|qori\w+Free\w*)\(", line)]
         lines = [line for line in body if line not in frees]
         shows = [f"show({'' if c_is_array(c, example) else '&'}{c}, sizeof {c});" for c in example.computed]
         parts += [f"static void example_{name}(void) {{", *("    " + line for line in lines + shows + frees), "}", ""]
-    parts += ["int main(void) {", *(f'    printf("{name} "); example_{name}(); printf("\\n");' for name in found), "    return 0;",
-              "}", ""]
+    calls_ = [f'    printf("{name} "); example_{name}(); printf("\\n");' for name in found]
+    parts += ["int main(void) {", *calls_, "    return 0;", "}", ""]
     return "\n".join(parts)
 
 

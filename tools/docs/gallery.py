@@ -62,8 +62,8 @@ def errors(recipe, names):
     if not recipe.wrong:
         return []
     text = recipe.wrong.strip()
-    return ['<div class="refused">', "", "```python", text, "```", "", "```text", recipes.refusal(text, names), "```", "",
-            "</div>", ""]
+    error = recipes.refusal(text, names)
+    return ['<div class="refused">', "", "```python", text, "```", "", "```text", error, "```", "", "</div>", ""]
 
 
 def make(pages, folder):
@@ -119,8 +119,8 @@ def run_page(path, names, show=lambda name, value: None):
         printed = examples.printed(match[1], names)
         return match.group() + (f"\n```text\n{printed}```\n" if printed else "")
 
-    return re.sub(CODE.pattern + "|" + SHOW.pattern, lambda m: each(CODE.match(m.group()) or SHOW.match(m.group())), text,
-                  flags=re.S)
+    either = re.compile(CODE.pattern + "|" + SHOW.pattern, re.S)
+    return either.sub(lambda m: each(CODE.match(m.group()) or SHOW.match(m.group())), text)
 
 
 def fill_pages(folder):

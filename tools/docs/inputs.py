@@ -99,8 +99,7 @@ def everything():
         "dim": (photo * 0.28).astype(np.uint8), "noisy": gauss_noise(gray, 22), "speckled": speckle(gray, 0.1),
         "speckled_photo": speckle(photo, 0.1), "page": page(), "shapes": shapes(), "zone": zone(), "disc": disc(),
         "ramp": (x * 255 // (WIDTH - 1)).astype(np.uint8), "mirrored": np.ascontiguousarray(photo[:, ::-1]),
-        "rgba": np.dstack([photo, disc()]), "gray16": (gray.astype(np.int16) * 16), "gray_f": gray.astype(np.float32) / 255,
-        "square_f": grey(square).astype(np.float32) / 255, "photo_f": photo.astype(np.float32) / 255,
+        "gray_f": gray.astype(np.float32) / 255, "square_f": grey(square).astype(np.float32) / 255,
         "balanced": gray.astype(np.int16) - 128, "tile": np.ascontiguousarray(gray[60:96, 96:144]),
         "stars": star_field(),
     }
@@ -113,6 +112,6 @@ def star_field():
     random = np.random.default_rng(8)
     field = np.zeros((HEIGHT, WIDTH))
     y, x = np.mgrid[0:HEIGHT, 0:WIDTH]
-    for row, column, light in zip(random.uniform(0, HEIGHT, 40), random.uniform(0, WIDTH, 40), random.uniform(40, 255, 40)):
+    for row, column, light in random.uniform((0, 0, 40), (HEIGHT, WIDTH, 255), (40, 3)):
         field += light * np.exp(-((y - row) ** 2 + (x - column) ** 2) / 3)
     return (field + random.normal(12, 4, field.shape)).clip(0, 255).astype(np.uint8)

@@ -29,8 +29,8 @@ def chart(title, rows, colours):
         lines.append(f'<polygon points="{left},{low} {x:.1f},{low} {point}{x:.1f},{high} {left},{high}" '
                      f'fill="{strong if share >= 0.9 else weak}"/>')
         lines.append(f'<text x="{left - 8}" y="{y + 14}" text-anchor="end">{escape(row["operation"])}</text>')
-        lines.append(f'<text x="{max(x + 8, left + 8):.1f}" y="{y + 14}" fill="{pale}" font-size="10.5">{share:.2f}</text>'
-                     if share < cut - 0.2 else f'<text x="{end + 12}" y="{y + 14}" fill="{pale}" font-size="10.5">{share:.2f}</text>')
+        beside = x + 8 if share < cut - 0.2 else end + 12
+        lines.append(f'<text x="{beside:.1f}" y="{y + 14}" fill="{pale}" font-size="10.5">{share:.2f}</text>')
         lines.append(f'<text x="{width - 6:.0f}" y="{y + 14}" text-anchor="end">{row["rate"]:,.0f}</text>')
     return "\n".join(lines + ["</svg>", ""])
 

@@ -5,12 +5,12 @@ from dataclasses import dataclass, field
 import registry
 from signatures import cpp_signature, python_signature
 
-KIND_LEGEND = ("**R** writes a destination, **I** works in place, **M** writes where a mask is not zero, **Sfs** divides an "
-               "integer result by 2^scaleFactor.")
+KIND_LEGEND = ("**R** writes a destination, **I** works in place, **M** writes where a mask is not zero, **Sfs** "
+               "divides an integer result by 2^scaleFactor.")
 DOC_FIELDS = (("shapes", "Shapes"), ("elements", "Elements"), ("units", "Units"), ("aliasing", "Aliasing"),
               ("notes", "Notes"))
-NAME = re.compile(r"_(?P<types>(?:\d+(?:u|sc|s|fc|f))+)_(?P<layout>(?:AC4|AC1|A0C4|AP4|[CP]\d)(?:A0C4|AC4|C\d(?:C)?|[CP]\d|C)?)"
-                  r"(?P<flags>I?M?R?(?:Sfs)?)$")
+NAME = re.compile(r"_(?P<types>(?:\d+(?:u|sc|s|fc|f))+)"
+                  r"_(?P<layout>(?:AC4|AC1|A0C4|AP4|[CP]\d)(?:A0C4|AC4|C\d(?:C)?|[CP]\d|C)?)(?P<flags>I?M?R?(?:Sfs)?)$")
 
 # What people look for, and the families in which they find it.
 TASKS = (("Copy, fill, pad, reflect", ("copy", "set", "border", "mirror", "convert_bits")),
@@ -104,7 +104,8 @@ def forms(page):
     """Members by registry group and flags: one prototype stands for each."""
     found = {}
     for member in page.members:
-        found.setdefault((id(member.group), code_parts(member)[2], member.c_operation, len(member.parameters)), []).append(member)
+        form = id(member.group), code_parts(member)[2], member.c_operation, len(member.parameters)
+        found.setdefault(form, []).append(member)
     return list(found.values())
 
 
@@ -123,7 +124,8 @@ def existing(page):
         types, layout, flags = code_parts(member)
         layouts[layout] = None
         kinds = cells.setdefault(types, {}).setdefault(layout, {})
-        kinds[(flags or "·").replace("IR", "I").replace("MR", "M").replace("RSfs", "Sfs").replace("ISfs", "I Sfs")] = None
+        short = (flags or "·").replace("IR", "I").replace("MR", "M")
+        kinds[short.replace("RSfs", "Sfs").replace("ISfs", "I Sfs")] = None
     if not any(cells):
         return [f"`{m.name}`" for m in page.members] + [""]
     order = sorted(layouts, key=lambda name: (len(name), name))
@@ -220,7 +222,8 @@ def operation_page(page, pages, support_pages, show):
 
 
 def support_page(family, members, pages):
-    lines = [f"# {family.title}: plans and queries" if family.stem not in ("memory", "version") else f"# {family.title}", ""]
+    title = family.title if family.stem in ("memory", "version") else f"{family.title}: plans and queries"
+    lines = [f"# {title}", ""]
     users = [p.name for p in pages.values() if p.family.stem == family.stem]
     if users:
         lines += ["Used by " + ", ".join(f"[{n}](../operations/{n}.md)" for n in users) + ".", ""]

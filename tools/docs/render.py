@@ -58,7 +58,8 @@ def bars(lists, levels=None):
 def frame(array, row, column, height, width):
     """The picture with a rectangle."""
     picture = Image.fromarray(np.asarray(array)).convert("RGB")
-    ImageDraw.Draw(picture).rectangle((column, row, column + width - 1, row + height - 1), outline=(255, 190, 40), width=2)
+    corners = column, row, column + width - 1, row + height - 1
+    ImageDraw.Draw(picture).rectangle(corners, outline=(255, 190, 40), width=2)
     return np.array(picture)
 
 
@@ -93,7 +94,8 @@ def graph(values, low=None, high=None):
     low, high = values.min() if low is None else low, values.max() if high is None else high
     picture = Image.new("RGB", (252, 168), (250, 250, 250))
     draw = ImageDraw.Draw(picture)
-    points = [(4 + 244 * i / max(len(values) - 1, 1), 162 - 156 * (v - low) / (high - low or 1)) for i, v in enumerate(values)]
+    x, y = 244 / max(len(values) - 1, 1), 156 / (high - low or 1)
+    points = [(4 + i * x, 162 - (v - low) * y) for i, v in enumerate(values)]
     draw.line(points, ACCENT, 2)
     return np.array(picture)
 

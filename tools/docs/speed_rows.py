@@ -9,13 +9,15 @@ import sys
 
 GROUPS = {
     "values": ("Pixels and values, 512 x 512", "512x512", [
-        "copy 8u C1", "copy 8u C3", "copy masked 8u C1", "split 8u C3P3", "merge 8u P3C3", "set 8u C3", "mirror columns 8u C3",
-        "border replicate 8u C3", "convert 8u32f C1", "convert 32f8u C1", "add 8u C1 sfs 0", "add 32f C1", "addC 8u C3 sfs 0",
-        "mul 8u C1 sfs 8", "div 32f C1", "LUT palette 8u C1", "LUT palette 8u C3", "LUT linear 32f C1, 16 levels"]),
+        "copy 8u C1", "copy 8u C3", "copy masked 8u C1", "split 8u C3P3", "merge 8u P3C3", "set 8u C3",
+        "mirror columns 8u C3", "border replicate 8u C3", "convert 8u32f C1", "convert 32f8u C1", "add 8u C1 sfs 0",
+        "add 32f C1", "addC 8u C3 sfs 0", "mul 8u C1 sfs 8", "div 32f C1", "LUT palette 8u C1", "LUT palette 8u C3",
+        "LUT linear 32f C1, 16 levels"]),
     "filters": ("Filters, 512 x 512", "512x512", [
-        "box 3x3 8u C1", "box 31x31 8u C1", "gauss 3x3 8u C1", "gauss 5x5 8u C1", "filter 3x3 8u C1", "filter 7x7 8u C1",
-        "filter 7x7 32f C1", "erode 3x3 8u C1", "erode 7x7 8u C1 (rectangle)", "erode 7x7 8u C1 (disc)", "median 3x3 8u C1",
-        "median 5x5 8u C1", "median 15x15 8u C1", "adaptive threshold box 15x15 8u C1", "LBP 3x3 8u C1"]),
+        "box 3x3 8u C1", "box 31x31 8u C1", "gauss 3x3 8u C1", "gauss 5x5 8u C1", "filter 3x3 8u C1",
+        "filter 7x7 8u C1", "filter 7x7 32f C1", "erode 3x3 8u C1", "erode 7x7 8u C1 (rectangle)",
+        "erode 7x7 8u C1 (disc)", "median 3x3 8u C1", "median 5x5 8u C1", "median 15x15 8u C1",
+        "adaptive threshold box 15x15 8u C1", "LBP 3x3 8u C1"]),
     "geometry": ("Resize and warp, full HD and more", None, [
         "resize nearest 8u C3 from 1920x1080/1280x720", "resize linear 8u C1 from 1920x1080/1280x720",
         "resize linear 8u C3 from 1920x1080/1280x720", "resize linear 8u C3 from 3840x2160/1920x1080",
