@@ -11,9 +11,11 @@ import pytest
 ROOT = Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(ROOT / "tools" / "docs"))
 import paths  # noqa: E402
+import door_python  # noqa: E402
 import examples  # noqa: E402
 import gallery  # noqa: E402
 import recipes  # noqa: E402
+import registry  # noqa: E402
 
 RECIPES = recipes.load()
 PAGES = sorted(p for p in [*(ROOT / "docs").glob("*.md"), *(ROOT / "docs" / "tasks").glob("*.md")])
@@ -95,3 +97,9 @@ def test_the_programs_of_a_page_run(path, tmp_path):
         if "int main(void)" in text:
             program = compiled(text, tmp_path, f"program{index}")
             subprocess.run([program], check=True, stdout=subprocess.DEVNULL, timeout=60)
+
+
+def test_every_operation_has_pictures_an_example_and_a_wrong_use():
+    operations = {f.name for f in door_python.functions(registry.load(ROOT / "api"))}
+    assert set(RECIPES) == operations
+    assert not [n for n, r in RECIPES.items() if not (r.example and r.wrong and r.rows)]

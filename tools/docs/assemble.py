@@ -54,7 +54,8 @@ def overview(pages, shown):
 
 def plans_index(families, members):
     lines = ["# Plans, buffers and queries", "",
-             "In Python and C++ plans are objects and buffers look after themselves; see [plans and buffers](../tasks/plans.md). These are the C functions behind them, by family.", ""]
+             "In Python and C++ plans are objects and buffers look after themselves; see [plans and buffers]"
+             "(../tasks/plans.md). These are the C functions behind them, by family.", ""]
     return "\n".join(lines) + toctree(list(members), maxdepth=1)
 
 
