@@ -39,7 +39,8 @@ def toctree(names, **options):
 def overview(pages, shown):
     """All operations by task, each with its thumbnail."""
     lines = ["# Operations", "", f"{len(pages)} operations, by what they are for. Each page shows what it does, how "
-             "it is called in Python, C++ and C, for which elements and layouts it exists, and when it refuses.", ""]
+             "it is called in Python, C++ and C, for which elements and layouts it exists, and when it refuses. `photo`, `gray` and so on "
+             "are [the pictures of these pages](../pictures.md).", ""]
     for title, group in reference.by_task(pages):
         lines += [f"## {title}", "", '<div class="cards">']
         for page in group:
@@ -82,6 +83,7 @@ def main(arguments):
     fill(folder / "speed.md", "plot: (\\w+)", plots.markdown(ROOT / "docs" / "speed.json", folder / "_static"))
     if not plain:
         failed += gallery.fill_pages(folder) + lacking(pages, shown)
+        fill(folder / "pictures.md", "pictures", lambda _: gallery.inputs_shown(folder / "_static" / "pictures"))
     for text in failed:
         print(f"docs: {text}", file=sys.stderr)
     return int(bool(failed))

@@ -139,7 +139,7 @@ def markdown(recipe, names, model_):
     own = dict(names)
     text = recipe.example.strip()
     output = printed(text, own)
-    lines = ["```python", text, "```", ""]
+    lines = ["```python", "import numpy as np", "import qori", "", text, "```", ""]
     if output:
         lines += ["```text", output.rstrip(), "```", ""]
-    return lines + ["The same in C:", "", "```c", in_c(recipe, model_).text, "```", ""]
+    return lines + ["The same in C, statuses left out:", "", "```c", in_c(recipe, model_).text, "```", ""]

@@ -3,7 +3,10 @@ import re
 import traceback
 from html import escape
 
+import numpy as np
+
 import examples
+import inputs
 import recipes
 import render
 
@@ -24,6 +27,18 @@ def code(text):
     return "<code>" + re.sub(r"(qori\.\w+\()(?!<)", r"\1<wbr>", text) + "</code>"
 
 
+def inputs_shown(folder):
+    """All pictures that recipes begin with: name, elements, shape."""
+    figures = []
+    for name, array in inputs.everything().items():
+        if array.dtype != np.uint8:
+            continue
+        picture = render.save(render.picture_of(array), folder / f"input_{name}.webp")
+        shape = " x ".join(map(str, array.shape))
+        figures.append(figure(picture, f"{code(name)} {shape}", alt=name).replace("../_static", "_static"))
+    return '<div class="shots">\n' + "\n".join(figures) + "\n</div>"
+
+
 def value_text(result):
     """What stands beside the call of a result that is not a picture."""
     if isinstance(result, (int, float)):
@@ -38,7 +53,8 @@ def row_figures(recipe, number, row, names, folder):
     figures = []
     for name in row.input:
         picture = render.save(render.picture_of(names[name], None), folder / f"input_{name}.webp")
-        figures.append(figure(picture, escape(name), "input", name))
+        link = f'<a href="../pictures.html">{escape(name)}</a>'
+        figures.append(figure(picture, link, "input", name))
     for index, (text, drawn, result) in enumerate(recipes.run_row(row, names)):
         picture = render.save(render.picture_of(drawn, row.crop), folder / f"{recipe.operation}_{number}_{index}.webp")
         value = value_text(result)
