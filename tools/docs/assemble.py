@@ -13,6 +13,7 @@ from pathlib import Path
 from paths import ROOT
 
 import gallery
+import panels
 import plots
 import reference
 import registry
@@ -83,6 +84,7 @@ def main(arguments):
     fill(folder / "speed.md", "plot: (\\w+)", plots.markdown(ROOT / "docs" / "speed.json", folder / "_static"))
     if not plain:
         failed += gallery.fill_pages(folder) + lacking(pages, shown)
+        fill(folder / "demo.md", "panels", lambda _: panels.markdown(folder / "_static" / "pictures"))
         fill(folder / "pictures.md", "pictures", lambda _: gallery.inputs_shown(folder / "_static" / "pictures"))
     for text in failed:
         print(f"docs: {text}", file=sys.stderr)
