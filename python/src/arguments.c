@@ -23,7 +23,10 @@ void* allocate(Call* call, size_t bytes) {
 static int wrong_type(const Call* call, const char* name, PyObject* object, const char* accepted) {
     PyObject* type = PyType_GetName(Py_TYPE(object));
     if (!type) return -1;
-    refuse(PyExc_TypeError, call, name, "%R of type %U came; accepted is %s", object, type, accepted);
+    if (PyObject_CheckBuffer(object)) /* whose text may be long */
+        refuse(PyExc_TypeError, call, name, "an object of type %U came; accepted is %s", type, accepted);
+    else
+        refuse(PyExc_TypeError, call, name, "%.80R of type %U came; accepted is %s", object, type, accepted);
     Py_DECREF(type);
     return -1;
 }
@@ -40,7 +43,7 @@ int read_integer(const Call* call, const char* name, PyObject* object, int64_t l
     Py_DECREF(integer);
     if (*value == -1 && PyErr_Occurred()) return -1;
     if (overflow || *value < low || *value > high)
-        return refuse(PyExc_ValueError, call, name, "%R came; accepted are integers from %lld to %lld", object,
+        return refuse(PyExc_ValueError, call, name, "%.80R came; accepted are integers from %lld to %lld", object,
                       (long long)low, (long long)high);
     return 0;
 }
@@ -50,7 +53,7 @@ static int read_real(const Call* call, const char* name, PyObject* object, doubl
     if (*value == -1.0 && PyErr_Occurred()) {
         if (PyErr_ExceptionMatches(PyExc_OverflowError)) {
             PyErr_Clear();
-            return refuse(PyExc_ValueError, call, name, "%R came; accepted are numbers in the range of float64",
+            return refuse(PyExc_ValueError, call, name, "%.80R came; accepted are numbers in the range of float64",
                           object);
         }
         if (!PyErr_ExceptionMatches(PyExc_TypeError)) return -1;
@@ -63,7 +66,7 @@ static int read_real(const Call* call, const char* name, PyObject* object, doubl
 static int as_float(const Call* call, const char* name, PyObject* object, double value, float* into) {
     *into = (float)value;
     if (isinf(*into) && isfinite(value))
-        return refuse(PyExc_ValueError, call, name, "%R came; accepted are numbers in the range of float32", object);
+        return refuse(PyExc_ValueError, call, name, "%.80R came; accepted are numbers in the range of float32", object);
     return 0;
 }
 
@@ -84,8 +87,9 @@ static int read_complex(const Call* call, const char* name, PyObject* object, in
         }
         const double limit = element == C16 ? 32768.0 : 2147483648.0;
         if (!(parts[i] >= -limit && parts[i] < limit && parts[i] == floor(parts[i])))
-            return refuse(PyExc_ValueError, call, name, "%R came; accepted are complex numbers of integers of %d bits",
-                          object, element == C16 ? 16 : 32);
+            return refuse(PyExc_ValueError, call, name,
+                          "%.80R came; accepted are complex numbers of integers of %d bits", object,
+                          element == C16 ? 16 : 32);
         if (element == C16)
             ((int16_t*)into)[i] = (int16_t)parts[i];
         else
@@ -141,6 +145,15 @@ int read_values(const Call* call, const char* name, PyObject* object, int elemen
     return 0;
 }
 
+/* One of several objects of a sequence: a new reference. */
+PyObject* item_of(const Call* call, const char* name, PyObject* object, int index, int count) {
+    const Py_ssize_t n = PySequence_Check(object) && !PyUnicode_Check(object) ? PySequence_Size(object) : -1;
+    if (n == count) return PySequence_GetItem(object, index);
+    PyErr_Clear();
+    refuse(PyExc_TypeError, call, name, "%.80R came; accepted is a sequence of %d arrays", object, count);
+    return NULL;
+}
+
 /* (rows, columns), or one number for both. */
 int read_pair(const Call* call, const char* name, PyObject* object, int32_t* rows, int32_t* columns) {
     int64_t values[2];
@@ -172,7 +185,7 @@ static int refuse_word(const Call* call, const char* name, PyObject* object, con
     for (const Word* w = enumeration->words; w->text && used + 40 < sizeof words; ++w)
         used +=
             (size_t)snprintf(words + used, sizeof words - used, "%s'%s'", w == enumeration->words ? "" : ", ", w->text);
-    return refuse(PyExc_ValueError, call, name, "%R came; accepted are %s%s", object, words,
+    return refuse(PyExc_ValueError, call, name, "%.80R came; accepted are %s%s", object, words,
                   combine ? ", combined by '|'" : "");
 }
 
@@ -335,8 +348,11 @@ int read_lists(Call* call, const char* name, PyObject* object, int element, int 
 
 /* (row, column) pairs as points of x and y. */
 int read_points(Call* call, const char* name, PyObject* object, void** data, int32_t* count) {
-    const Py_ssize_t n = PySequence_Size(object);
-    if (n < 0) return -1;
+    const Py_ssize_t n = PySequence_Check(object) && !PyUnicode_Check(object) ? PySequence_Size(object) : -1;
+    if (n < 0) {
+        PyErr_Clear();
+        return wrong_type(call, name, object, "a list of pairs (row, column)");
+    }
     if (n > 1 << 26) return refuse(PyExc_ValueError, call, name, "%zd points came; accepted are 67108864", n);
     QorPoint2D* points = allocate(call, (size_t)n * sizeof *points);
     if (!points) return -1;

@@ -194,6 +194,9 @@ typedef struct Index {
     Span spans[ELEMENTS][10];
 } Index;
 
+/* Parameters that every call asks for; -1 where the operation has none. */
+enum { HAS_OUT, HAS_PATTERN, HAS_BORDER, HAS_OFFSET, HAS_AXIS, HAS_PLAN, HAS };
+
 typedef struct Operation {
     const char* name;
     const Parameter* parameters;
@@ -201,6 +204,7 @@ typedef struct Operation {
     uint8_t count, positional;
     uint16_t form_count;
     const Index* index;
+    int8_t has[HAS];
 } Operation;
 
 typedef struct Word {
@@ -301,6 +305,7 @@ extern const uint8_t element_bytes[ELEMENTS];
 /* --- arguments.c --- */
 int read_integer(const Call* call, const char* name, PyObject* object, int64_t low, int64_t high, int64_t* value);
 int read_number(const Call* call, const char* name, PyObject* object, int element, void* into);
+PyObject* item_of(const Call* call, const char* name, PyObject* object, int index, int count);
 int read_pair(const Call* call, const char* name, PyObject* object, int32_t* rows, int32_t* columns);
 int read_word(const Call* call, const char* name, PyObject* object, const Enumeration* enumeration, int combine,
               int32_t* value);

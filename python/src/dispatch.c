@@ -37,8 +37,10 @@ void free_call(Call* call) {
  */
 
 static int too_many(const Call* call, Py_ssize_t count) {
+    int accepted = call->operation->positional;
+    for (int i = 0; i < call->operation->count; ++i) accepted -= call->operation->parameters[i].twin != 0;
     return refuse(PyExc_TypeError, call, NULL, "%zd positional arguments came; accepted are at most %d", count,
-                  call->operation->positional);
+                  accepted);
 }
 
 static int keyword(Call* call, PyObject* name) {
@@ -125,7 +127,7 @@ static int elements_of_tables(Call* call, PyObject* object) {
 static int take_argument(Call* call, int i) {
     const Parameter* p = &call->operation->parameters[i];
     PyObject* object = call->arguments[i];
-    int truth, element;
+    int element;
     switch (p->kind) {
         case KIND_IMAGE: return acquire(call, object, p->name, &call->images[p->image], p->image);
         case KIND_OUT:
@@ -134,16 +136,17 @@ static int take_argument(Call* call, int i) {
             return acquire(call, object, p->name, &call->images[OUT], OUT);
         case KIND_PLAN: return (call->plan = plan_of(call, object)) ? 0 : -1;
         case KIND_KEEP_ALPHA:
-            truth = PyObject_IsTrue(object);
-            call->keep_alpha = truth > 0;
-            return truth < 0 ? -1 : 0;
+            if (object != Py_True && object != Py_False)
+                return refuse(PyExc_TypeError, call, p->name, "%.80R came; accepted are True and False", object);
+            call->keep_alpha = object == Py_True;
+            return 0;
         case KIND_CHANNEL: return small_integer(call, i, 0, 3, &call->channel);
         case KIND_CHANNELS: return small_integer(call, i, 1, 4, &call->channels);
         case KIND_DTYPE:
             if (!shared.empty && find_numpy(0) < 0) return -1;
             element = element_of_type(object);
             if (element < 0)
-                return refuse(PyExc_TypeError, call, "dtype", "%R came; accepted are types of elements, as 'uint8'",
+                return refuse(PyExc_TypeError, call, "dtype", "%.80R came; accepted are types of elements, as 'uint8'",
                               object);
             call->dtype = (int16_t)element;
             return 0;
@@ -209,10 +212,16 @@ static int choose(Call* call) {
     const Operation* operation = call->operation;
     const Image* key = call->images[SRC].held ? &call->images[SRC] : &call->images[OUT];
     const Span span = operation->index->spans[key->element][(key->layout & CHANNELS) + (key->layout & PLANAR ? 5 : 0)];
-    const Form *form = operation->forms + span.first, *end = form + span.count, *found = NULL;
+    const Form *form = operation->forms + span.first, *end = form + span.count, *found = NULL, *keeping = NULL;
+    const int makes_out = operation->has[HAS_OUT] >= 0 && !call->images[OUT].held;
     int ambiguous = 0;
     for (; form < end; ++form) {
         if (!suits(call, form, key)) continue;
+        if (makes_out && form->target_layout & PLANAR) continue;
+        if (makes_out && form->target_layout & (ALPHA | CHANNEL)) { /* keeps parts of a destination that is not there */
+            keeping = form;
+            continue;
+        }
         if (!found) {
             found = form;
             if (call->images[OUT].held || call->dtype >= 0) break;
@@ -227,6 +236,7 @@ static int choose(Call* call) {
             }
         }
     }
+    if (!found) found = keeping;
     if (!found) {
         no_form(call);
         return -1;
@@ -271,8 +281,7 @@ static int meets(const Call* call, int which, const char* name) {
     const int exact = in->data == out->data && (in->step == out->step || in->height < 2) && in->height == out->height &&
                       in->width == out->width && element_bytes[in->element] == element_bytes[out->element] &&
                       in->layout == out->layout && (!(in->layout & PLANAR) || in->plane == out->plane);
-    const int diagonal =
-        call->form->extent == EXTENT_AXIS && call->pairs[parameter_index(call->operation, KIND_ENUM, "axis")][0] > 2;
+    const int diagonal = call->form->extent == EXTENT_AXIS && call->pairs[call->operation->has[HAS_AXIS]][0] > 2;
     if (exact && call->form->overlap && !diagonal && which != MASK &&
         !(call->operation->forms->extent == EXTENT_LEVELS))
         return 1;
@@ -333,7 +342,7 @@ static int check_inputs(const Call* call, int height, int width) {
     const Image *second = &call->images[SRC2], *mask = &call->images[MASK];
     char text[96];
     if (second->held) {
-        if (parameter_index(call->operation, KIND_IMAGE, "pattern") >= 0) {
+        if (call->operation->has[HAS_PATTERN] >= 0) {
             if (second->element != call->images[SRC].element || second->layout != call->images[SRC].layout)
                 return refuse(PyExc_ValueError, call, "pattern", "%s came; accepted are elements and channels of src",
                               describe(second, text));
@@ -363,20 +372,19 @@ static int lay_destination(Call* call) {
         src->data += (Py_ssize_t)call->top * src->step + (Py_ssize_t)call->left * pixel_bytes(src);
         src->height = call->height;
         src->width = form->extent == EXTENT_BITS ? src->width : call->width;
-        if (offset_source(call)) return -1;
     }
     if (check_inputs(call, call->height, call->width)) return -1;
-    const int destination = parameter_index(call->operation, KIND_OUT, NULL);
+    const int destination = call->operation->has[HAS_OUT];
     if (destination < 0 || form->extent >= EXTENT_LEVELS || form->extent == EXTENT_BLOCKS) return 0;
     if (!out->held) {
         if (make_out(call, height, width)) return -1;
         return src->held ? place_source(call, src, form->source_layout) : 0;
     }
     if (check_writable(call, out, call->operation->parameters[destination].name)) return -1;
-    const int block = form->extent >= EXTENT_2X2 && form->extent <= EXTENT_8X8;
-    const int fits = block ? (out->data == src->data || (int64_t)out->height * out->width == (int64_t)height * width) &&
-                                 (out->dimensions == 1 || out->height == height || out->data == src->data)
-                           : out->height == height && out->width == width;
+    /* A small block may be written over the first elements of the source's own. */
+    const int over = form->in_place && form->contiguous && out->data == src->data && out->element == src->element &&
+                     out->height == src->height && out->width == src->width;
+    const int fits = (out->height == height && out->width == width) || over;
     if (!fits) {
         char text[96];
         return refuse(PyExc_ValueError, call, "out", "%s came; accepted is (%d, %d)%s", describe(out, text), height,
@@ -426,7 +434,7 @@ static int list_memory(Call* call, PyObject* given, int element, int count, PyOb
 static int lists_out(Call* call, int which, int channels, Slot* slot) {
     void** pointers = (void**)call->values[call->value_count++].bytes;
     const int n = channels ? channels : 1;
-    const int index = parameter_index(call->operation, KIND_OUT, NULL);
+    const int index = call->operation->has[HAS_OUT];
     PyObject* given = !which && call->given >> index & 1 ? call->arguments[index] : NULL;
     PyObject* made = PyTuple_New(n);
     if (!made) return -1;
@@ -434,7 +442,7 @@ static int lists_out(Call* call, int which, int channels, Slot* slot) {
     for (int i = 0; i < n; ++i) {
         PyObject *array = NULL, *one = given;
         if (given && channels) {
-            one = PySequence_GetItem(given, i);
+            one = item_of(call, "out", given, i, n);
             if (!one) goto failed;
         }
         const int failed = list_memory(call, one, I32, counts[i] - !which, &array, &pointers[i]);
@@ -463,14 +471,14 @@ failed:
 /* The two images of smallest and largest elements of blocks. */
 static int special_outputs(Call* call) {
     int32_t height, width;
-    const int index = parameter_index(call->operation, KIND_OUT, NULL);
+    const int index = call->operation->has[HAS_OUT];
     PyObject* given = index >= 0 && call->given >> index & 1 ? call->arguments[index] : NULL;
     if (call->form->extent == EXTENT_BLOCKS) {
         if (measure(call, &height, &width)) return -1;
         call->lists = PyTuple_New(2);
         for (int i = 0; call->lists && i < 2; ++i) {
             PyObject* array =
-                given ? PySequence_GetItem(given, i) : make_array(call->form->target, height, width, 1, 2);
+                given ? item_of(call, "out", given, i, 2) : make_array(call->form->target, height, width, 1, 2);
             if (!array) return -1;
             PyTuple_SetItem(call->lists, i, array);
             Image* image = &call->images[i ? OUT2 : OUT];
@@ -784,7 +792,7 @@ static PyObject* result_of(Call* call) {
     if (all_results[call->form->results]->kind != RESULT_END) return results_object(call);
     if (call->lists) return Py_NewRef(call->lists);
     if (call->made) return Py_NewRef(call->made);
-    const int out = parameter_index(call->operation, KIND_OUT, NULL);
+    const int out = call->operation->has[HAS_OUT];
     return Py_NewRef(call->arguments[out]);
 }
 
@@ -800,7 +808,7 @@ static int64_t traffic(const Call* call) {
 }
 
 static int prepare(Call* call) {
-    if (take_arguments(call) || choose(call) || lay_destination(call)) return -1;
+    if (take_arguments(call) || choose(call) || lay_destination(call) || offset_source(call)) return -1;
     if (call->form->extent == EXTENT_BLOCKS && special_outputs(call)) return -1;
     if (call->form->extent == EXTENT_WINDOWS && descriptors(call)) return -1;
     if (call->kernel && call->form->extent != EXTENT_WINDOWS && call->images[OUT].held) {

@@ -104,7 +104,7 @@ static int along(Call* call, int vertical) {
 
 /* Keeps of the margins those of the sides that the border reads from memory. */
 static int sides_in_memory(Call* call) {
-    const int i = parameter_index(call->operation, KIND_FLAGS, "border");
+    const int i = call->operation->has[HAS_BORDER];
     if (i < 0) return 0;
     int32_t border;
     if (word_of(call, i, &border)) return -1;
@@ -167,7 +167,7 @@ static int plan_extent(Call* call, int32_t* height, int32_t* width) {
                       call->top | call->left | call->bottom | call->right ? " inside what it reads around them" : "");
     *height = plan->height;
     *width = plan->width;
-    const int i = parameter_index(call->operation, KIND_POINT, "offset");
+    const int i = call->operation->has[HAS_OFFSET];
     if (i >= 0 && call->given >> i & 1) {
         int32_t y, x;
         if (!call->images[OUT].held)
@@ -265,18 +265,28 @@ static int blocks_extent(Call* call, int32_t* height, int32_t* width) {
 
 static int axis_extent(Call* call, int32_t* height, int32_t* width) {
     int32_t axis;
-    if (word_of(call, parameter_index(call->operation, KIND_ENUM, "axis"), &axis)) return -1;
+    if (word_of(call, call->operation->has[HAS_AXIS], &axis)) return -1;
     const int diagonal = axis == 3 || axis == 4;
     *height = diagonal ? call->width : call->height;
     *width = diagonal ? call->height : call->width;
     return 0;
 }
 
+/* A flat block lies in rows of its side. */
+static void fold(Image* image, int side) {
+    if (image->dimensions != 1 || image->width != side * side) return;
+    image->height = image->width = side;
+    image->step = (Py_ssize_t)side * element_bytes[image->element];
+}
+
 static int block_extent(Call* call, int side, int32_t* height, int32_t* width) {
-    const Image* src = &call->images[SRC];
-    if ((int64_t)src->height * src->width != 64 || (src->height != 8 && src->dimensions != 1))
+    Image *src = &call->images[SRC], *out = &call->images[OUT];
+    fold(src, 8);
+    if (out->held) fold(out, side);
+    if (src->height != 8 || src->width != 8)
         return refuse(PyExc_ValueError, call, "src", "(%d, %d) elements came; accepted is a block of (8, 8)",
                       src->height, src->width);
+    call->height = call->width = 8;
     *height = *width = side;
     return 0;
 }
@@ -308,7 +318,7 @@ int measure(Call* call, int32_t* height, int32_t* width) {
         case EXTENT_8X8: return block_extent(call, 8, height, width);
         default:
             /* Correlations of one size with their source come without an extent. */
-            return call->images[SRC2].held && parameter_index(call->operation, KIND_IMAGE, "pattern") >= 0
+            return call->images[SRC2].held && call->operation->has[HAS_PATTERN] >= 0
                        ? correlation_extent(call, height, width)
                        : 0;
     }

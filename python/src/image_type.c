@@ -136,15 +136,15 @@ PyObject* empty_image(PyObject* module, PyObject* arguments, PyObject* keywords)
     if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "O|O:empty", names, &shape, &dtype)) return NULL;
     const Py_ssize_t count = PyTuple_Check(shape) ? PyTuple_Size(shape) : 0;
     if (count < 2 || count > 3) {
-        refuse(PyExc_TypeError, &call, "shape", "%R came; accepted are (height, width) and (height, width, channels)",
-               shape);
+        refuse(PyExc_TypeError, &call, "shape",
+               "%.80R came; accepted are (height, width) and (height, width, channels)", shape);
         return NULL;
     }
     for (Py_ssize_t i = 0; i < count; ++i)
         if (read_integer(&call, "shape", PyTuple_GetItem(shape, i), 1, i < 2 ? INT32_MAX : 4, &sides[i])) return NULL;
     const int element = dtype ? element_of_type(dtype) : U8;
     if (element < 0) {
-        refuse(PyExc_TypeError, &call, "dtype", "%R came; accepted are types of elements, as 'uint8'", dtype);
+        refuse(PyExc_TypeError, &call, "dtype", "%.80R came; accepted are types of elements, as 'uint8'", dtype);
         return NULL;
     }
     return new_image(element, (int)sides[0], (int)sides[1], (int)sides[2], (int)count);

@@ -21,7 +21,7 @@ static int shape_of(const Call* call, const char* name, PyObject* object, QorIma
 static int element_from(const Call* call, PyObject* dtype, const char* accepted, uint32_t elements, int* element) {
     *element = dtype ? element_of_type(dtype) : elements & 1u << U8 ? U8 : F32;
     if (*element >= 0 && elements >> *element & 1) return 0;
-    return refuse(PyExc_TypeError, call, "dtype", "%R came; accepted are %s", dtype, accepted);
+    return refuse(PyExc_TypeError, call, "dtype", "%.80R came; accepted are %s", dtype, accepted);
 }
 
 /* Deallocation returns what a constructor has filled so far. */
@@ -33,6 +33,7 @@ static Plan* new_plan(PyTypeObject* type, int kind, int variant, int element) {
     plan->element = (uint8_t)element;
     plan->target = NO_ELEMENT;
     plan->free_memory = free;
+    plan->vectorcall = call_plan_directly;
     return plan;
 }
 
@@ -126,9 +127,9 @@ static int resize_word(const Call* call, PyObject* word, ResizeArguments* r) {
             if (words[i].lobes) r->lobes = words[i].lobes;
             return 0;
         }
-    return refuse(PyExc_ValueError, call, "interpolation",
-                  "%R came; accepted are 'nearest', 'linear', 'cubic', 'lanczos', 'lanczos2', 'lanczos3' and 'super'",
-                  word);
+    return refuse(
+        PyExc_ValueError, call, "interpolation",
+        "%.80R came; accepted are 'nearest', 'linear', 'cubic', 'lanczos', 'lanczos2', 'lanczos3' and 'super'", word);
 }
 
 PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keywords) {
@@ -139,6 +140,9 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
     static QorResult (*const borders[])(const QorResizePlan*, QorBorderExtent*) = {
         qoriResizeGetBorderSize_8u, qoriResizeGetBorderSize_16u, qoriResizeGetBorderSize_16s,
         qoriResizeGetBorderSize_32f, qoriResizeGetBorderSize_64f};
+    static QorResult (*const buffers[])(const QorResizePlan*, QorImageSize, int32_t, int32_t*) = {
+        qoriResizeGetBufferSize_8u, qoriResizeGetBufferSize_16u, qoriResizeGetBufferSize_16s,
+        qoriResizeGetBufferSize_32f, qoriResizeGetBufferSize_64f};
     PyObject *source, *target, *word = NULL, *dtype = NULL;
     ResizeArguments r = {.c = 0.5, .lobes = 3};
     Operation operation;
@@ -178,6 +182,9 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
         status = fill_resize(&r, element, plan->memory, &member);
         QorBorderExtent border = {0, 0, 0, 0};
         if (!status) status = borders[e](plan->memory, &border);
+        for (int channels = 1; !status && channels < 5; ++channels)
+            if (channels != 2 && buffers[e](plan->memory, r.target, channels, &plan->whole_bytes[channels]))
+                plan->whole_bytes[channels] = 0;
         set_border(plan, border);
         set_shapes(plan, r.source, r.target);
         plan->antialias = r.antialias;
@@ -220,7 +227,7 @@ PyObject* resize_src_roi(PyObject* self, PyObject* rect) {
     if (!PyTuple_Check(rect) || !PyArg_ParseTuple(rect, "iiii;rect: accepted is (row, column, height, width)",
                                                   &wanted.y, &wanted.x, &wanted.height, &wanted.width)) {
         if (!PyErr_Occurred())
-            refuse(PyExc_TypeError, &call, "rect", "%R came; accepted is (row, column, height, width)", rect);
+            refuse(PyExc_TypeError, &call, "rect", "%.80R came; accepted is (row, column, height, width)", rect);
         return NULL;
     }
     const int status = functions[slots_of_elements[plan->element]](plan->memory, wanted, &source, &target);
@@ -256,7 +263,7 @@ static int coefficients_of(const Call* call, PyObject* matrix, double coefficien
     return 0;
 wrong:
     PyErr_Clear();
-    return refuse(PyExc_ValueError, call, "matrix", "%R came; accepted is ((a, b, c), (d, e, f))", matrix);
+    return refuse(PyExc_ValueError, call, "matrix", "%.80R came; accepted is ((a, b, c), (d, e, f))", matrix);
 }
 
 PyObject* make_warp(PyTypeObject* type, PyObject* arguments, PyObject* keywords) {
@@ -404,7 +411,7 @@ static PyObject* make_fourier(PyTypeObject* type, PyObject* arguments, PyObject*
         return NULL;
     f.element = dtype ? element_of_type(dtype) : F32;
     if (f.element != F32 && f.element != CF && f.element != U8) {
-        refuse(PyExc_TypeError, &call, "dtype", "%R came; accepted are 'float32', 'complex64' and 'uint8'", dtype);
+        refuse(PyExc_TypeError, &call, "dtype", "%.80R came; accepted are 'float32', 'complex64' and 'uint8'", dtype);
         return NULL;
     }
     if (fast && (order_of(&call, f.size.width, &f.order_x) || order_of(&call, f.size.height, &f.order_y))) return NULL;

@@ -3,6 +3,8 @@
 
 #include <string.h>
 
+#include <structmember.h>
+
 #include "plan_makers.h"
 
 static const int32_t type_codes[ELEMENTS] = {[U8] = 1, [U16] = 5, [I16] = 7, [F32] = 13, [F64] = 19};
@@ -13,7 +15,7 @@ int32_t type_code(int element) { return element < ELEMENTS ? type_codes[element]
  */
 
 const Plan* plan_of(const Call* call, PyObject* object) {
-    const int i = parameter_index(call->operation, KIND_PLAN, NULL);
+    const int i = call->operation->has[HAS_PLAN];
     PyTypeObject* wanted = shared.plan_types[call->operation->parameters[i].enumeration];
     if (Py_TYPE(object) == wanted) return (const Plan*)object;
     PyObject *came = PyType_GetName(Py_TYPE(object)), *name = PyType_GetName(wanted);
@@ -56,6 +58,8 @@ int64_t work_bytes(Call* call) {
             break;
         case QUERY_PLAN: status = ((QorResult(*)(const void*, int32_t*))form->ask)(plan->memory, &bytes); break;
         case QUERY_PLAN_TILE_CHANNELS:
+            if (out.height == plan->height && out.width == plan->width && plan->whole_bytes[channels])
+                return plan->whole_bytes[channels];
             status = ((QorResult(*)(const void*, QorImageSize, int32_t, int32_t*))form->ask)(plan->memory, out,
                                                                                              channels, &bytes);
             break;
@@ -81,7 +85,7 @@ int64_t work_bytes(Call* call) {
 
 /* A tile's source begins where the library says. */
 int offset_source(Call* call) {
-    const int i = parameter_index(call->operation, KIND_POINT, "offset");
+    const int i = call->operation->has[HAS_OFFSET];
     if (!call->plan || call->plan->kind != RESIZE_PLAN || i < 0 || !(call->given >> i & 1)) return 0;
     QorPoint2D at;
     const QorPoint2D offset = {call->pairs[i][1], call->pairs[i][0]};
@@ -115,15 +119,37 @@ PyObject* plan_address(PyObject* module, PyObject* object) {
     return NULL;
 }
 
+/* Operations by name, looked up once. */
+enum { PLAN_FUNCTIONS = 12 };
+static const char* const function_names[PLAN_FUNCTIONS] = {[RESIZE_PLAN] = "resize",
+                                                           [WARP_PLAN] = "warp_affine",
+                                                           [DCT_PLAN] = "dct_forward",
+                                                           [DFT_PLAN] = "dft_forward",
+                                                           [FFT_PLAN] = "fft_forward",
+                                                           [HISTOGRAM_PLAN] = "histogram",
+                                                           [LINEAR_FILTER_PLAN] = "filter_linear_border",
+                                                           [ADAPTIVE_PLAN] = "threshold_adaptive_gauss",
+                                                           [HOG_PLAN] = "hog",
+                                                           "dct_inverse",
+                                                           "dft_inverse",
+                                                           "fft_inverse"};
+static const Operation* functions[PLAN_FUNCTIONS];
+
+static void find_functions(void) {
+    for (int i = 0; i < PLAN_FUNCTIONS; ++i) {
+        functions[i] = all_operations;
+        while (strcmp(functions[i]->name, function_names[i])) ++functions[i];
+    }
+}
+
 /* The operation with the plan put behind its first argument. */
-static PyObject* with_plan(const char* name, PyObject* self, PyObject* const* arguments, Py_ssize_t count,
+static PyObject* with_plan(const Operation* operation, PyObject* self, PyObject* const* arguments, Py_ssize_t count,
                            PyObject* names) {
-    const Operation* operation = all_operations;
-    while (strcmp(operation->name, name)) ++operation;
     PyObject* all[MAX_PARAMETERS + 1];
     const Py_ssize_t keywords = names ? PyTuple_Size(names) : 0;
     if (count < 1 || count + keywords >= MAX_PARAMETERS) {
-        PyErr_Format(PyExc_TypeError, "%s: %zd positional arguments came; the first is the image", name, count);
+        PyErr_Format(PyExc_TypeError, "%s: %zd positional arguments came; the first is the image", operation->name,
+                     count);
         return NULL;
     }
     all[0] = arguments[0];
@@ -132,19 +158,29 @@ static PyObject* with_plan(const char* name, PyObject* self, PyObject* const* ar
     return run(operation, all, count + 1, names);
 }
 
-static const char* const operation_of_kind[PLAN_TYPES] = {[RESIZE_PLAN] = "resize",
-                                                          [WARP_PLAN] = "warp_affine",
-                                                          [HISTOGRAM_PLAN] = "histogram",
-                                                          [LINEAR_FILTER_PLAN] = "filter_linear_border",
-                                                          [ADAPTIVE_PLAN] = "threshold_adaptive_gauss",
-                                                          [HOG_PLAN] = "hog"};
+static int is_transform(int kind) { return kind == DCT_PLAN || kind == DFT_PLAN || kind == FFT_PLAN; }
+
+/* The protocol of calls without a tuple: in the limited API from 3.12 on, with the flag and the member that 3.11 has.
+ */
+#ifndef Py_TPFLAGS_HAVE_VECTORCALL
+#define Py_TPFLAGS_HAVE_VECTORCALL (1UL << 11)
+#endif
+
+PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t count, PyObject* names) {
+    return with_plan(functions[((Plan*)self)->kind], self, arguments, (Py_ssize_t)(count & ~((size_t)1 << 63)), names);
+}
+
+static PyMemberDef plan_members[] = {{"__vectorcalloffset__", T_PYSSIZET, offsetof(Plan, vectorcall), READONLY, NULL},
+                                     {NULL, 0, 0, 0, NULL}};
+
+static PyMemberDef no_members[] = {{NULL, 0, 0, 0, NULL}};
 
 static PyObject* call_plan(PyObject* self, PyObject* arguments, PyObject* keywords) {
     PyObject *all[MAX_PARAMETERS], *names = NULL, *result = NULL;
-    const char* name = operation_of_kind[((Plan*)self)->kind];
+    const Operation* operation = functions[((Plan*)self)->kind];
     const Py_ssize_t count = PyTuple_Size(arguments), more = keywords ? PyDict_Size(keywords) : 0;
     if (count + more >= MAX_PARAMETERS) {
-        PyErr_Format(PyExc_TypeError, "%s: %zd arguments came", name, count + more);
+        PyErr_Format(PyExc_TypeError, "%s: %zd arguments came", operation->name, count + more);
         return NULL;
     }
     for (Py_ssize_t i = 0; i < count; ++i) all[i] = PyTuple_GetItem(arguments, i);
@@ -158,22 +194,18 @@ static PyObject* call_plan(PyObject* self, PyObject* arguments, PyObject* keywor
             all[count + i++] = value;
         }
     }
-    result = with_plan(name, self, all, count, names);
+    result = with_plan(operation, self, all, count, names);
     Py_XDECREF(names);
     return result;
 }
 
-#define DIRECTION(type, direction)                                                                    \
-    static PyObject* type##_##direction(PyObject* self, PyObject* const* arguments, Py_ssize_t count, \
-                                        PyObject* names) {                                            \
-        return with_plan(#type "_" #direction, self, arguments, count, names);                        \
-    }
-DIRECTION(dct, forward)
-DIRECTION(dct, inverse)
-DIRECTION(dft, forward)
-DIRECTION(dft, inverse)
-DIRECTION(fft, forward)
-DIRECTION(fft, inverse)
+static PyObject* forward(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
+    return with_plan(functions[((Plan*)self)->kind], self, arguments, count, names);
+}
+
+static PyObject* inverse(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
+    return with_plan(functions[HOG_PLAN + 1 + ((Plan*)self)->kind - DCT_PLAN], self, arguments, count, names);
+}
 
 static PyObject* get_source_shape(PyObject* self, void* unused) {
     (void)unused;
@@ -218,16 +250,12 @@ static PyGetSetDef histogram_attributes[] = {{"dtype", get_dtype, NULL, "Name of
                                              {"levels", histogram_levels, NULL, "The levels of each channel.", NULL},
                                              {NULL, NULL, NULL, NULL, NULL}};
 
-#define METHODS(type)                                                                                           \
-    static PyMethodDef type##_methods[] = {                                                                     \
-        {"forward", (PyCFunction)(void (*)(void))type##_forward, METH_FASTCALL | METH_KEYWORDS,                 \
-         "forward($self, src, out=None, **keywords)\n--\n\nThe spectrum of an image: qori." #type "_forward."}, \
-        {"inverse", (PyCFunction)(void (*)(void))type##_inverse, METH_FASTCALL | METH_KEYWORDS,                 \
-         "inverse($self, src, out=None, **keywords)\n--\n\nThe image of a spectrum: qori." #type "_inverse."},  \
-        {NULL, NULL, 0, NULL}}
-METHODS(dct);
-METHODS(dft);
-METHODS(fft);
+static PyMethodDef transform_methods[] = {
+    {"forward", (PyCFunction)(void (*)(void))forward, METH_FASTCALL | METH_KEYWORDS,
+     "forward($self, src, out=None, **keywords)\n--\n\nThe spectrum of an image."},
+    {"inverse", (PyCFunction)(void (*)(void))inverse, METH_FASTCALL | METH_KEYWORDS,
+     "inverse($self, src, out=None, **keywords)\n--\n\nThe image of a spectrum."},
+    {NULL, NULL, 0, NULL}};
 static PyMethodDef resize_methods[] = {
     {"src_offset", resize_src_offset, METH_O,
      "src_offset($self, offset, /)\n--\n\nThe source pixel (row, column) at which a tile of the destination begins."},
@@ -249,9 +277,9 @@ typedef struct PlanType {
 static const PlanType plan_types[PLAN_TYPES] = {
     [RESIZE_PLAN] = {"qori.ResizePlan", RESIZE_DOC, make_resize, resize_methods, image_attributes},
     [WARP_PLAN] = {"qori.WarpAffinePlan", WARP_DOC, make_warp, no_methods, image_attributes},
-    [DCT_PLAN] = {"qori.DctPlan", DCT_DOC, make_dct, dct_methods, image_attributes},
-    [DFT_PLAN] = {"qori.DftPlan", DFT_DOC, make_dft, dft_methods, image_attributes},
-    [FFT_PLAN] = {"qori.FftPlan", FFT_DOC, make_fft, fft_methods, image_attributes},
+    [DCT_PLAN] = {"qori.DctPlan", DCT_DOC, make_dct, transform_methods, image_attributes},
+    [DFT_PLAN] = {"qori.DftPlan", DFT_DOC, make_dft, transform_methods, image_attributes},
+    [FFT_PLAN] = {"qori.FftPlan", FFT_DOC, make_fft, transform_methods, image_attributes},
     [HISTOGRAM_PLAN] = {"qori.HistogramPlan", HISTOGRAM_DOC, make_histogram, no_methods, histogram_attributes},
     [LINEAR_FILTER_PLAN] = {"qori.LinearFilterPlan", LINEAR_FILTER_DOC, make_linear_filter, no_methods,
                             plain_attributes},
@@ -259,6 +287,7 @@ static const PlanType plan_types[PLAN_TYPES] = {
     [HOG_PLAN] = {"qori.HogPlan", HOG_DOC, make_hog, no_methods, hog_attributes}};
 
 int make_plan_types(PyObject* module) {
+    find_functions();
     for (int kind = 0; kind < PLAN_TYPES; ++kind) {
         const PlanType* t = &plan_types[kind];
         PyType_Slot slots[] = {{Py_tp_doc, (void*)t->doc},
@@ -267,9 +296,12 @@ int make_plan_types(PyObject* module) {
                                {Py_tp_repr, (void*)represent},
                                {Py_tp_methods, t->methods},
                                {Py_tp_getset, t->attributes},
-                               {operation_of_kind[kind] ? Py_tp_call : 0, (void*)call_plan},
+                               {Py_tp_members, is_transform(kind) ? no_members : plan_members},
+                               {is_transform(kind) ? 0 : Py_tp_call, (void*)call_plan},
                                {0, NULL}};
-        PyType_Spec spec = {t->name, sizeof(Plan), 0, Py_TPFLAGS_DEFAULT | Py_TPFLAGS_IMMUTABLETYPE, slots};
+        const unsigned long flags =
+            Py_TPFLAGS_DEFAULT | Py_TPFLAGS_IMMUTABLETYPE | (is_transform(kind) ? 0 : Py_TPFLAGS_HAVE_VECTORCALL);
+        PyType_Spec spec = {t->name, sizeof(Plan), 0, (unsigned int)flags, slots};
         PyObject* type = PyType_FromModuleAndSpec(module, &spec, NULL);
         if (!type) return -1;
         shared.plan_types[kind] = (PyTypeObject*)type;

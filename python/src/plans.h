@@ -19,11 +19,14 @@ enum {
 
 /* Immutable once it has been made; any number of threads may use it. */
 typedef struct Plan {
-    PyObject_HEAD uint8_t kind, variant, element, target; /* elements of source and destination */
-    int32_t channels;                                     /* 0: any */
+    PyObject base;
+    PyObject* (*vectorcall)(PyObject* plan, PyObject* const* arguments, size_t count, PyObject* names);
+    uint8_t kind, variant, element, target; /* elements of source and destination */
+    int32_t channels;                       /* 0: any */
     int32_t source_height, source_width, height, width;
     int32_t top, left, bottom, right; /* what the operation may read around the source */
     int32_t buffer_bytes;             /* where it does not depend on the call */
+    int32_t whole_bytes[5];           /* resize, by channels: of the whole destination; 0: unknown */
     int32_t counts[4];                /* histograms: levels of each channel */
     int32_t kernel_height, kernel_width, kernel_type;
     int32_t descriptor; /* elements of one descriptor */
@@ -33,6 +36,7 @@ typedef struct Plan {
     PyObject* text; /* what repr says */
 } Plan;
 
+PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t count, PyObject* names);
 int make_plan_types(PyObject* module);
 /* The plan of an argument, or null with an exception set. */
 const Plan* plan_of(const Call* call, PyObject* object);
