@@ -55,10 +55,11 @@ class View;
 namespace detail {
 
 /** What a layout is: its digit in keys, elements from pixel to pixel, channels that operations process, planes. */
-template <unsigned Digit, int Stride, int Channels, int Planes = 1>
+template <unsigned Digit, int Stride, std::size_t Channels, std::size_t Planes = 1>
 struct LayoutFacts {
     static constexpr unsigned digit = Digit;
-    static constexpr int stride = Stride, channels = Channels, planes = Planes;
+    static constexpr int stride = Stride;
+    static constexpr std::size_t channels = Channels, planes = Planes;
 };
 template <class L>
 struct Facts : LayoutFacts<0, 1, 1> {};
@@ -267,12 +268,12 @@ class PlanarView {
 public:
     using Element = T;
     using Layout = L;
-    static constexpr int planes = Facts<L>::planes;
+    static constexpr std::size_t planes = Facts<L>::planes;
 
     constexpr PlanarView() noexcept = default;
     constexpr PlanarView(T* const (&data)[planes], int32_t step, QorImageSize size) noexcept
         : step_(step), size_(size) {
-        for (int i = 0; i < planes; ++i) data_[i] = data[i];
+        for (std::size_t i = 0; i < planes; ++i) data_[i] = data[i];
     }
     /** Nothing where steps or sizes differ. */
     constexpr explicit PlanarView(const View<T, C1> (&planesOf)[planes]) noexcept
@@ -280,7 +281,7 @@ public:
         bool alike = true;
         for (const View<T, C1>& p : planesOf)
             alike = alike && p.step() == step_ && p.width() == size_.width && p.height() == size_.height;
-        for (int i = 0; i < planes; ++i) data_[i] = alike ? planesOf[i].data() : nullptr;
+        for (std::size_t i = 0; i < planes; ++i) data_[i] = alike ? planesOf[i].data() : nullptr;
     }
 
     constexpr T* const* data() const noexcept { return data_; }
@@ -292,7 +293,8 @@ public:
 
     /** A plane; nothing where there is none of the number. */
     constexpr View<T, C1> plane(int32_t index) const noexcept {
-        return index >= 0 && index < planes ? View<T, C1>(data_[index], step_, size_) : View<T, C1>();
+        return index >= 0 && index < int32_t(planes) ? View<T, C1>(data_[std::size_t(index)], step_, size_)
+                                                     : View<T, C1>();
     }
     View<T, L> crop(QorImageRect r) const noexcept {
         return each([&](View<T, C1> plane) { return plane.crop(r); });
@@ -305,7 +307,7 @@ private:
     template <class F>
     View<T, L> each(F&& change) const noexcept {
         View<T, C1> changed[planes];
-        for (int i = 0; i < planes; ++i) changed[i] = change(plane(i));
+        for (std::size_t i = 0; i < planes; ++i) changed[i] = change(plane(int32_t(i)));
         return View<T, L>(changed);
     }
     T* data_[planes] = {};
@@ -351,14 +353,14 @@ constexpr InPlace<T, L> in_place(const View<T, L>& image) noexcept {
 }
 
 /** One element per channel: {1, 2, 3}, or of one channel 1. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Pixel {
 public:
     constexpr Pixel() noexcept = default;
     template <class... U, detail::If<sizeof...(U) == N && (std::is_convertible_v<U, T> && ...)> = 0>
     constexpr Pixel(U... channels) noexcept : values_{static_cast<T>(channels)...} {}
     constexpr Pixel(const T (&channels)[N]) noexcept {
-        for (int i = 0; i < N; ++i) values_[i] = channels[i];
+        for (std::size_t i = 0; i < N; ++i) values_[i] = channels[i];
     }
     constexpr T& operator[](int channel) noexcept { return values_[channel]; }
     constexpr const T& operator[](int channel) const noexcept { return values_[channel]; }
@@ -373,11 +375,11 @@ private:
 namespace detail {
 
 /** Where an operation puts a result per channel: a variable (of one channel), an array, a Pixel or the like. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Results {
 public:
     constexpr Results(T (&results)[N]) noexcept : data(results) {}
-    template <int M = N, If<M == 1> = 0>
+    template <std::size_t M = N, If<M == 1> = 0>
     constexpr Results(T& result) noexcept : data(&result) {}
     template <class S, If<isSpan<S&, T> && sizeof(S) == N * sizeof(T)> = 0>
     constexpr Results(S& results) noexcept : data(results.data()) {}
@@ -424,7 +426,7 @@ private:
 };
 
 /** What lies beyond an image: borderReplicate and so on, or {borderConstant, value per channel}. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Border {
 public:
     constexpr Border(int32_t mode) noexcept : mode_(mode) {}
@@ -481,60 +483,73 @@ private:
 inline const char* status_text(QorResult status) noexcept {
     switch (status) {
         case QOR_OK: return "Success.";
-    case QOR_WARN_NOTHING_TO_DO: return "The arguments describe an empty job; nothing is written.";
-    case QOR_WARN_DIV_BY_ZERO: return "A zero divisor was met; the affected results follow the function's division-by-zero rule, all others are computed.";
-    case QOR_WARN_LOG_ZERO: return "The logarithm of 0 was requested; that result is set to the type's minimum (-32768 for 16s) and the rest computed.";
-    case QOR_WARN_LOG_NEGATIVE: return "The logarithm of a negative value was requested; that result is set to the type's minimum and the rest computed. Of 7 and 8, the kind of the first such element in the row decides the warning.";
-    case QOR_WARN_NO_INTERSECTION: return "The requested region does not intersect the source image; nothing is written.";
-    case QOR_WARN_WARP_EMPTY: return "Rotation, shear and warp functions report that they took their early exit without writing.";
-    case QOR_WARN_EVEN_WEIGHT: return "An even centre weight was lowered by one; the work was done.";
-    case QOR_WARN_ADJUSTED: return "An argument did not fit and was trimmed or adjusted; the work was done with the adjusted value (each function states what).";
-    case QOR_ERR_BAD_ARG: return "A scalar argument outside its domain.";
-    case QOR_ERR_SIZE: return "A width or height < 1.";
-    case QOR_ERR_BAD_RANGE: return "A lower bound exceeds the upper, or levels not strictly increasing.";
-    case QOR_ERR_NULL_PTR: return "A required pointer is null.";
-    case QOR_ERR_NO_MEMORY: return "An internal allocation failed.";
-    case QOR_ERR_DIV_BY_ZERO: return "A constant divisor is zero.";
-    case QOR_ERR_OUT_OF_RANGE: return "An integer argument outside its allowed range.";
-    case QOR_ERR_DATA_TYPE: return "The numeric data-type code is not supported.";
-    case QOR_ERR_SCALE_RANGE: return "Empty scaling range.";
-    case QOR_ERR_STEP: return "A row step < 1 (or smaller than one row where checked).";
-    case QOR_ERR_ORDER: return "Transform order out of range.";
-    case QOR_ERR_FLAG: return "A flag code outside its allowed set.";
-    case QOR_ERR_CONTEXT: return "A specification or state record does not carry its identifier.";
-    case QOR_ERR_THRESHOLD: return "Lower threshold above upper threshold.";
-    case QOR_ERR_ZERO_MOMENT: return "A moment needed as divisor is zero.";
-    case QOR_ERR_FLIP_AXIS: return "Mirror axis code not 0, 1 or 2.";
-    case QOR_ERR_INTERPOLATION: return "Interpolation code not supported.";
-    case QOR_ERR_RESIZE_FACTOR: return "A resize factor <= 0.";
-    case QOR_ERR_COUNT: return "An element count < 1.";
-    case QOR_ERR_MASK_SIZE: return "Mask or kernel size not supported.";
-    case QOR_ERR_ANCHOR: return "Anchor outside the mask.";
-    case QOR_ERR_EPSILON: return "Negative tolerance.";
-    case QOR_ERR_STEP_TOO_SMALL: return "A step too small for the ROI plus the border that the function touches.";
-    case QOR_ERR_CHANNELS: return "Channel count outside 1..4.";
-    case QOR_ERR_ALPHA_TYPE: return "Alpha-composition operation code above 11.";
-    case QOR_ERR_DIVISOR: return "A kernel divisor is zero.";
-    case QOR_ERR_CHANNELS_UNSUPPORTED: return "A channel count that this function does not support.";
-    case QOR_ERR_COEFFS: return "Transform coefficients map the rectangle to a degenerate quadrangle.";
-    case QOR_ERR_RECT: return "The source rectangle spans less than one pixel.";
-    case QOR_ERR_QUAD: return "The quadrangle is degenerate (collinear or crossing vertices).";
-    case QOR_ERR_ZERO_MASK: return "The structuring mask has no non-zero element.";
-    case QOR_ERR_CHANNEL_ORDER: return "A channel index of a channel order is negative or too large.";
-    case QOR_ERR_LUT_LEVELS: return "Fewer than 2 lookup-table levels.";
-    case QOR_ERR_HIST_LEVELS: return "Fewer than 2 histogram levels.";
-    case QOR_ERR_STEP_ALIGN: return "A row step that is not a multiple of the element size.";
-    case QOR_ERR_NOISE: return "Negative noise power.";
-    case QOR_ERR_RESIZE_RATIO: return "The resize ratio is below the minimum of the chosen method.";
-    case QOR_ERR_QUALITY_UNDEFINED: return "The quality index is undefined (zero denominator); a quiet NaN is stored as the result.";
-    case QOR_ERR_WEIGHT: return "Centre weight < 1.";
-    case QOR_ERR_DECIMATION: return "Decimation fraction code not 1 to 4.";
-    case QOR_ERR_ROUND_MODE: return "Rounding-mode code not 0, 1 or 2.";
-    case QOR_ERR_BORDER: return "Border type not supported.";
-    case QOR_ERR_ODD_VALUE: return "A size or offset that must be even is odd.";
-    case QOR_ERR_ALGORITHM: return "A field of the algorithm argument outside its values.";
-    case QOR_ERR_DIRECTION: return "Transform direction code not 0 or 1.";
-    case QOR_ERR_UNSUPPORTED_MODE: return "A combination of modes that the library does not support.";
+        case QOR_WARN_NOTHING_TO_DO: return "The arguments describe an empty job; nothing is written.";
+        case QOR_WARN_DIV_BY_ZERO:
+            return "A zero divisor was met; the affected results follow the function's division-by-zero rule, all "
+                   "others are computed.";
+        case QOR_WARN_LOG_ZERO:
+            return "The logarithm of 0 was requested; that result is set to the type's minimum (-32768 for 16s) and "
+                   "the rest computed.";
+        case QOR_WARN_LOG_NEGATIVE:
+            return "The logarithm of a negative value was requested; that result is set to the type's minimum and "
+                   "the rest computed. Of 7 and 8, the kind of the first such element in the row decides the "
+                   "warning.";
+        case QOR_WARN_NO_INTERSECTION:
+            return "The requested region does not intersect the source image; nothing is written.";
+        case QOR_WARN_WARP_EMPTY:
+            return "Rotation, shear and warp functions report that they took their early exit without writing.";
+        case QOR_WARN_EVEN_WEIGHT: return "An even centre weight was lowered by one; the work was done.";
+        case QOR_WARN_ADJUSTED:
+            return "An argument did not fit and was trimmed or adjusted; the work was done with the adjusted value "
+                   "(each function states what).";
+        case QOR_ERR_BAD_ARG: return "A scalar argument outside its domain.";
+        case QOR_ERR_SIZE: return "A width or height < 1.";
+        case QOR_ERR_BAD_RANGE: return "A lower bound exceeds the upper, or levels not strictly increasing.";
+        case QOR_ERR_NULL_PTR: return "A required pointer is null.";
+        case QOR_ERR_NO_MEMORY: return "An internal allocation failed.";
+        case QOR_ERR_DIV_BY_ZERO: return "A constant divisor is zero.";
+        case QOR_ERR_OUT_OF_RANGE: return "An integer argument outside its allowed range.";
+        case QOR_ERR_DATA_TYPE: return "The numeric data-type code is not supported.";
+        case QOR_ERR_SCALE_RANGE: return "Empty scaling range.";
+        case QOR_ERR_STEP: return "A row step < 1 (or smaller than one row where checked).";
+        case QOR_ERR_ORDER: return "Transform order out of range.";
+        case QOR_ERR_FLAG: return "A flag code outside its allowed set.";
+        case QOR_ERR_CONTEXT: return "A specification or state record does not carry its identifier.";
+        case QOR_ERR_THRESHOLD: return "Lower threshold above upper threshold.";
+        case QOR_ERR_ZERO_MOMENT: return "A moment needed as divisor is zero.";
+        case QOR_ERR_FLIP_AXIS: return "Mirror axis code not 0, 1 or 2.";
+        case QOR_ERR_INTERPOLATION: return "Interpolation code not supported.";
+        case QOR_ERR_RESIZE_FACTOR: return "A resize factor <= 0.";
+        case QOR_ERR_COUNT: return "An element count < 1.";
+        case QOR_ERR_MASK_SIZE: return "Mask or kernel size not supported.";
+        case QOR_ERR_ANCHOR: return "Anchor outside the mask.";
+        case QOR_ERR_EPSILON: return "Negative tolerance.";
+        case QOR_ERR_STEP_TOO_SMALL:
+            return "A step too small for the ROI plus the border that the function touches.";
+        case QOR_ERR_CHANNELS: return "Channel count outside 1..4.";
+        case QOR_ERR_ALPHA_TYPE: return "Alpha-composition operation code above 11.";
+        case QOR_ERR_DIVISOR: return "A kernel divisor is zero.";
+        case QOR_ERR_CHANNELS_UNSUPPORTED: return "A channel count that this function does not support.";
+        case QOR_ERR_COEFFS: return "Transform coefficients map the rectangle to a degenerate quadrangle.";
+        case QOR_ERR_RECT: return "The source rectangle spans less than one pixel.";
+        case QOR_ERR_QUAD: return "The quadrangle is degenerate (collinear or crossing vertices).";
+        case QOR_ERR_ZERO_MASK: return "The structuring mask has no non-zero element.";
+        case QOR_ERR_CHANNEL_ORDER: return "A channel index of a channel order is negative or too large.";
+        case QOR_ERR_LUT_LEVELS: return "Fewer than 2 lookup-table levels.";
+        case QOR_ERR_HIST_LEVELS: return "Fewer than 2 histogram levels.";
+        case QOR_ERR_STEP_ALIGN: return "A row step that is not a multiple of the element size.";
+        case QOR_ERR_NOISE: return "Negative noise power.";
+        case QOR_ERR_RESIZE_RATIO: return "The resize ratio is below the minimum of the chosen method.";
+        case QOR_ERR_QUALITY_UNDEFINED:
+            return "The quality index is undefined (zero denominator); a quiet NaN is stored as the result.";
+        case QOR_ERR_WEIGHT: return "Centre weight < 1.";
+        case QOR_ERR_DECIMATION: return "Decimation fraction code not 1 to 4.";
+        case QOR_ERR_ROUND_MODE: return "Rounding-mode code not 0, 1 or 2.";
+        case QOR_ERR_BORDER: return "Border type not supported.";
+        case QOR_ERR_ODD_VALUE: return "A size or offset that must be even is odd.";
+        case QOR_ERR_ALGORITHM: return "A field of the algorithm argument outside its values.";
+        case QOR_ERR_DIRECTION: return "Transform direction code not 0 or 1.";
+        case QOR_ERR_UNSUPPORTED_MODE: return "A combination of modes that the library does not support.";
         default: return "A status that this header does not know.";
     }
 }
@@ -643,8 +658,8 @@ template <class T, class L = C1>
 inline constexpr unsigned keyOf = key<In<View<T, L>>, Out<>>;
 
 /** Channels that the members of a key process. */
-constexpr int channels(unsigned k) noexcept {
-    constexpr int counts[] = {1, 1, 2, 3, 4, 3, 3, 4, 1, 1, 1, 1, 1, 1, 1, 1};
+constexpr std::size_t channels(unsigned k) noexcept {
+    constexpr std::size_t counts[] = {1, 1, 2, 3, 4, 3, 3, 4, 1, 1, 1, 1, 1, 1, 1, 1};
     return counts[k & 15];
 }
 
@@ -676,11 +691,11 @@ struct Both<Anything, B> {
 template <class A, class B>
 using Either = typename Both<A, B>::type;
 
-template <class T, int N>
+template <class T, std::size_t N>
 struct ValueOf {
     using type = T;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct ValueOf<const T*, N> {
     using type = Pixel<T, N>;
 };
@@ -688,26 +703,26 @@ struct ValueOf<const T*, N> {
 template <class P, unsigned k>
 using Value = typename ValueOf<P, channels(k)>::type;
 
-template <class P, int N>
+template <class P, std::size_t N>
 struct ResultsOf {
     using type = P;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct ResultsOf<T*, N> {
     using type = Results<T, N>;
 };
 template <class P, unsigned k>
 using Result = typename ResultsOf<P, channels(k)>::type;
 
-template <class P, int N>
+template <class P, std::size_t N>
 struct BorderOf {
     using type = Border<P, N>;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct BorderOf<const T*, N> {
     using type = Border<T, N>;
 };
-template <int N>
+template <std::size_t N>
 struct BorderOf<Anything, N> {
     using type = Anything;
 };
@@ -725,7 +740,7 @@ struct KernelOf<const T*> {
 template <class P>
 using Weights = typename KernelOf<P>::type;
 
-template <class T, int N>
+template <class T, std::size_t N>
 constexpr const T* pass(const Pixel<T, N>& value) noexcept {
     return value.data();
 }
@@ -733,7 +748,7 @@ template <class T>
 constexpr T pass(T value) noexcept {
     return value;
 }
-template <class P, class T, int N>
+template <class P, class T, std::size_t N>
 constexpr P beyond(const Border<T, N>& border) noexcept {
     if constexpr (std::is_pointer_v<P>)
         return border.value().data();
@@ -792,7 +807,7 @@ inline constexpr int32_t dataType<double> = qor64f;
 #define QORI_AT(key, member) if constexpr (k == key) return &member;
 
 namespace detail {
-template <unsigned k> constexpr auto allocate_0() noexcept {
+template <unsigned k> inline auto allocate_0() noexcept {
     QORI_AT(0x1111, qoriMalloc_8u_C1) else
     QORI_AT(0x1212, qoriMalloc_8u_C2) else
     QORI_AT(0x1313, qoriMalloc_8u_C3) else
@@ -835,8 +850,8 @@ template <unsigned k> constexpr auto allocate_0() noexcept {
     "qori::allocate: no such call. allocate(width, height, step) of 8u, 16u, 16s, 32s, 32f, 32sc, 32fc: C1 C2 " \
     "C3 C4 AC4"
 /** Allocates an image whose rows start on 64-byte boundaries. C: qoriMalloc. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::allocate_0<k>()), bool
-    exists = false>
+template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::allocate_0<k>()),
+    bool exists = false>
 [[nodiscard]] T* allocate(int32_t width, int32_t height, int32_t* step) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::allocate_0<k>()(width, height, step);
@@ -926,7 +941,7 @@ View<const T, L> view(const Image<T, L>& image) noexcept {
 // --- operations, in the order of qori.h
 
 namespace detail {
-template <unsigned k> constexpr auto add_0() noexcept {
+template <unsigned k> inline auto add_0() noexcept {
     QORI_AT(0x1111, qoriAdd_8u_C1RSfs) else
     QORI_AT(0x1313, qoriAdd_8u_C3RSfs) else
     QORI_AT(0x1414, qoriAdd_8u_C4RSfs) else
@@ -947,7 +962,7 @@ template <unsigned k> constexpr auto add_0() noexcept {
     QORI_AT(0xa5a5, qoriAdd_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_1() noexcept {
+template <unsigned k> inline auto add_1() noexcept {
     QORI_AT(0x1111, qoriAdd_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriAdd_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriAdd_8u_C4IRSfs) else
@@ -968,7 +983,7 @@ template <unsigned k> constexpr auto add_1() noexcept {
     QORI_AT(0xa5a5, qoriAdd_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_2() noexcept {
+template <unsigned k> inline auto add_2() noexcept {
     QORI_AT(0x7171, qoriAdd_32f_C1R) else
     QORI_AT(0x7373, qoriAdd_32f_C3R) else
     QORI_AT(0x7474, qoriAdd_32f_C4R) else
@@ -978,7 +993,7 @@ template <unsigned k> constexpr auto add_2() noexcept {
     QORI_AT(0xb5b5, qoriAdd_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_3() noexcept {
+template <unsigned k> inline auto add_3() noexcept {
     QORI_AT(0x7171, qoriAdd_32f_C1IR) else
     QORI_AT(0x7373, qoriAdd_32f_C3IR) else
     QORI_AT(0x7474, qoriAdd_32f_C4IR) else
@@ -988,7 +1003,7 @@ template <unsigned k> constexpr auto add_3() noexcept {
     QORI_AT(0xb5b5, qoriAdd_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_4() noexcept {
+template <unsigned k> inline auto add_4() noexcept {
     QORI_AT(0x1111, qoriAddC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriAddC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriAddC_8u_C4RSfs) else
@@ -1009,7 +1024,7 @@ template <unsigned k> constexpr auto add_4() noexcept {
     QORI_AT(0xa5a5, qoriAddC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_5() noexcept {
+template <unsigned k> inline auto add_5() noexcept {
     QORI_AT(0x1111, qoriAddC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriAddC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriAddC_8u_C4IRSfs) else
@@ -1030,7 +1045,7 @@ template <unsigned k> constexpr auto add_5() noexcept {
     QORI_AT(0xa5a5, qoriAddC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_6() noexcept {
+template <unsigned k> inline auto add_6() noexcept {
     QORI_AT(0x7171, qoriAddC_32f_C1R) else
     QORI_AT(0x7373, qoriAddC_32f_C3R) else
     QORI_AT(0x7474, qoriAddC_32f_C4R) else
@@ -1040,7 +1055,7 @@ template <unsigned k> constexpr auto add_6() noexcept {
     QORI_AT(0xb5b5, qoriAddC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto add_7() noexcept {
+template <unsigned k> inline auto add_7() noexcept {
     QORI_AT(0x7171, qoriAddC_32f_C1IR) else
     QORI_AT(0x7373, qoriAddC_32f_C3IR) else
     QORI_AT(0x7474, qoriAddC_32f_C4IR) else
@@ -1056,11 +1071,11 @@ template <unsigned k> constexpr auto add_7() noexcept {
     "[scale]) or add(in_place(a), value, [scale]) of 8u, 16u, 16s: C1 C3 C4 AC4; 16sc, 32sc: C1 C3 AC4. add(a, " \
     "b, dst) or add(in_place(b), a) or add(a, value, dst) or add(in_place(a), value) of 32f: C1 C3 C4 AC4; " \
     "32fc: C1 C3 AC4"
-/** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even. Adds constants to an image: saturate((src
- *  + value) * 2^-scaleFactor), ties to even. C: qoriAdd, qoriAddC. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::add_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool
-    exists = false>
+/** Adds two images: saturate((src1 + src2) * 2^-scaleFactor), ties to even. Adds constants to an image:
+ *  saturate((src + value) * 2^-scaleFactor), ties to even. C: qoriAdd, qoriAddC. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::add_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1074,9 +1089,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::add_2<k>()), class F1 = decltype(detail::add_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::add_2<k>()), class F1 = decltype(detail::add_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1095,8 +1110,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1108,9 +1123,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::add_3<k>()), class F1 = decltype(detail::add_1<k>()), detail::If<detail::isImage<B>> = 0, bool
-    exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_3<k>()), class F1 = decltype(detail::add_1<k>()),
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult add(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1127,10 +1142,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::add_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::add_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1141,11 +1157,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::add_6<k>()), class F1 = decltype(detail::add_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult add(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>,
-    k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::add_6<k>()), class F1 = decltype(detail::add_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult add(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1161,10 +1177,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::add_5<k>()), bool exists = false>
-[[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t scale)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_5<k>()), bool exists = false>
+[[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::add_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -1173,10 +1189,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::add_7<k>()), class F1 = decltype(detail::add_5<k>()), bool exists = false>
-[[nodiscard]] QorResult add(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::add_7<k>()), class F1 = decltype(detail::add_5<k>()), bool exists = false>
+[[nodiscard]] QorResult add(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::add_7<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1197,7 +1213,7 @@ template <bool exists = false> QorResult add(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto subtract_0() noexcept {
+template <unsigned k> inline auto subtract_0() noexcept {
     QORI_AT(0x1111, qoriSub_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSub_8u_C3RSfs) else
     QORI_AT(0x1414, qoriSub_8u_C4RSfs) else
@@ -1218,7 +1234,7 @@ template <unsigned k> constexpr auto subtract_0() noexcept {
     QORI_AT(0xa5a5, qoriSub_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_1() noexcept {
+template <unsigned k> inline auto subtract_1() noexcept {
     QORI_AT(0x1111, qoriSub_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSub_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriSub_8u_C4IRSfs) else
@@ -1239,7 +1255,7 @@ template <unsigned k> constexpr auto subtract_1() noexcept {
     QORI_AT(0xa5a5, qoriSub_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_2() noexcept {
+template <unsigned k> inline auto subtract_2() noexcept {
     QORI_AT(0x7171, qoriSub_32f_C1R) else
     QORI_AT(0x7373, qoriSub_32f_C3R) else
     QORI_AT(0x7474, qoriSub_32f_C4R) else
@@ -1249,7 +1265,7 @@ template <unsigned k> constexpr auto subtract_2() noexcept {
     QORI_AT(0xb5b5, qoriSub_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_3() noexcept {
+template <unsigned k> inline auto subtract_3() noexcept {
     QORI_AT(0x7171, qoriSub_32f_C1IR) else
     QORI_AT(0x7373, qoriSub_32f_C3IR) else
     QORI_AT(0x7474, qoriSub_32f_C4IR) else
@@ -1259,7 +1275,7 @@ template <unsigned k> constexpr auto subtract_3() noexcept {
     QORI_AT(0xb5b5, qoriSub_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_4() noexcept {
+template <unsigned k> inline auto subtract_4() noexcept {
     QORI_AT(0x1111, qoriSubC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSubC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriSubC_8u_C4RSfs) else
@@ -1280,7 +1296,7 @@ template <unsigned k> constexpr auto subtract_4() noexcept {
     QORI_AT(0xa5a5, qoriSubC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_5() noexcept {
+template <unsigned k> inline auto subtract_5() noexcept {
     QORI_AT(0x1111, qoriSubC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSubC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriSubC_8u_C4IRSfs) else
@@ -1301,7 +1317,7 @@ template <unsigned k> constexpr auto subtract_5() noexcept {
     QORI_AT(0xa5a5, qoriSubC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_6() noexcept {
+template <unsigned k> inline auto subtract_6() noexcept {
     QORI_AT(0x7171, qoriSubC_32f_C1R) else
     QORI_AT(0x7373, qoriSubC_32f_C3R) else
     QORI_AT(0x7474, qoriSubC_32f_C4R) else
@@ -1311,7 +1327,7 @@ template <unsigned k> constexpr auto subtract_6() noexcept {
     QORI_AT(0xb5b5, qoriSubC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto subtract_7() noexcept {
+template <unsigned k> inline auto subtract_7() noexcept {
     QORI_AT(0x7171, qoriSubC_32f_C1IR) else
     QORI_AT(0x7373, qoriSubC_32f_C3IR) else
     QORI_AT(0x7474, qoriSubC_32f_C4IR) else
@@ -1328,10 +1344,11 @@ template <unsigned k> constexpr auto subtract_7() noexcept {
     "16sc, 32sc: C1 C3 AC4. subtract(a, b, dst) or subtract(in_place(a), b) or subtract(a, value, dst) or " \
     "subtract(in_place(a), value) of 32f: C1 C3 C4 AC4; 32fc: C1 C3 AC4"
 /** Subtracts the first image from the second: saturate((src2 - src1) * 2^-scaleFactor), ties to even. Subtracts
- *  constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even. C: qoriSub, qoriSubC. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+ *  constants from an image: saturate((src - value) * 2^-scaleFactor), ties to even. C: qoriSub, qoriSubC. Of two
+ *  images a is the second source of C, pSrc2 or in place pSrcDst, and b the first. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1345,9 +1362,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_2<k>()), class F1 = decltype(detail::subtract_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_2<k>()), class F1 = decltype(detail::subtract_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1368,8 +1385,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const B& b, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1381,9 +1398,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::subtract_3<k>()), class F1 = decltype(detail::subtract_1<k>()), detail::If<detail::isImage<B>>
-    = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_3<k>()), class F1 = decltype(detail::subtract_1<k>()),
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const B& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1400,10 +1417,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1415,11 +1433,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::subtract_6<k>()), class F1 = decltype(detail::subtract_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult subtract(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1,
-    2>>, k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::subtract_6<k>()), class F1 = decltype(detail::subtract_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult subtract(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1435,10 +1453,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::subtract_5<k>()), bool exists = false>
-[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t
-    scale) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_5<k>()), bool exists = false>
+[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::subtract_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -1447,10 +1465,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::subtract_7<k>()), class F1 = decltype(detail::subtract_5<k>()), bool exists = false>
-[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::subtract_7<k>()), class F1 = decltype(detail::subtract_5<k>()), bool exists = false>
+[[nodiscard]] QorResult subtract(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::subtract_7<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1471,7 +1489,7 @@ template <bool exists = false> QorResult subtract(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_0() noexcept {
+template <unsigned k> inline auto multiply_0() noexcept {
     QORI_AT(0x1111, qoriMul_8u_C1RSfs) else
     QORI_AT(0x1313, qoriMul_8u_C3RSfs) else
     QORI_AT(0x1414, qoriMul_8u_C4RSfs) else
@@ -1492,7 +1510,7 @@ template <unsigned k> constexpr auto multiply_0() noexcept {
     QORI_AT(0xa5a5, qoriMul_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_1() noexcept {
+template <unsigned k> inline auto multiply_1() noexcept {
     QORI_AT(0x1111, qoriMul_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriMul_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriMul_8u_C4IRSfs) else
@@ -1513,7 +1531,7 @@ template <unsigned k> constexpr auto multiply_1() noexcept {
     QORI_AT(0xa5a5, qoriMul_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_2() noexcept {
+template <unsigned k> inline auto multiply_2() noexcept {
     QORI_AT(0x7171, qoriMul_32f_C1R) else
     QORI_AT(0x7373, qoriMul_32f_C3R) else
     QORI_AT(0x7474, qoriMul_32f_C4R) else
@@ -1523,7 +1541,7 @@ template <unsigned k> constexpr auto multiply_2() noexcept {
     QORI_AT(0xb5b5, qoriMul_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_3() noexcept {
+template <unsigned k> inline auto multiply_3() noexcept {
     QORI_AT(0x7171, qoriMul_32f_C1IR) else
     QORI_AT(0x7373, qoriMul_32f_C3IR) else
     QORI_AT(0x7474, qoriMul_32f_C4IR) else
@@ -1533,7 +1551,7 @@ template <unsigned k> constexpr auto multiply_3() noexcept {
     QORI_AT(0xb5b5, qoriMul_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_4() noexcept {
+template <unsigned k> inline auto multiply_4() noexcept {
     QORI_AT(0x1111, qoriMulC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriMulC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriMulC_8u_C4RSfs) else
@@ -1554,7 +1572,7 @@ template <unsigned k> constexpr auto multiply_4() noexcept {
     QORI_AT(0xa5a5, qoriMulC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_5() noexcept {
+template <unsigned k> inline auto multiply_5() noexcept {
     QORI_AT(0x1111, qoriMulC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriMulC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriMulC_8u_C4IRSfs) else
@@ -1575,7 +1593,7 @@ template <unsigned k> constexpr auto multiply_5() noexcept {
     QORI_AT(0xa5a5, qoriMulC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_6() noexcept {
+template <unsigned k> inline auto multiply_6() noexcept {
     QORI_AT(0x7171, qoriMulC_32f_C1R) else
     QORI_AT(0x7373, qoriMulC_32f_C3R) else
     QORI_AT(0x7474, qoriMulC_32f_C4R) else
@@ -1585,7 +1603,7 @@ template <unsigned k> constexpr auto multiply_6() noexcept {
     QORI_AT(0xb5b5, qoriMulC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_7() noexcept {
+template <unsigned k> inline auto multiply_7() noexcept {
     QORI_AT(0x7171, qoriMulC_32f_C1IR) else
     QORI_AT(0x7373, qoriMulC_32f_C3IR) else
     QORI_AT(0x7474, qoriMulC_32f_C4IR) else
@@ -1603,9 +1621,9 @@ template <unsigned k> constexpr auto multiply_7() noexcept {
     "multiply(in_place(a), value) of 32f: C1 C3 C4 AC4; 32fc: C1 C3 AC4"
 /** Multiplies two images: saturate(src1 * src2 * 2^-scaleFactor), ties to even. Multiplies an image by constants:
  *  saturate(src * value * 2^-scaleFactor), ties to even. C: qoriMul, qoriMulC. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1619,9 +1637,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_2<k>()), class F1 = decltype(detail::multiply_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_2<k>()), class F1 = decltype(detail::multiply_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1642,8 +1660,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1655,9 +1673,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_3<k>()), class F1 = decltype(detail::multiply_1<k>()), detail::If<detail::isImage<B>>
-    = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_3<k>()), class F1 = decltype(detail::multiply_1<k>()),
+    detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1674,10 +1692,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1689,11 +1708,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_6<k>()), class F1 = decltype(detail::multiply_4<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult multiply(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1,
-    2>>, k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_6<k>()), class F1 = decltype(detail::multiply_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult multiply(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1709,10 +1728,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_5<k>()), bool exists = false>
-[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t
-    scale) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_5<k>()), bool exists = false>
+[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -1721,10 +1740,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_7<k>()), class F1 = decltype(detail::multiply_5<k>()), bool exists = false>
-[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_7<k>()), class F1 = decltype(detail::multiply_5<k>()), bool exists = false>
+[[nodiscard]] QorResult multiply(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_7<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1745,7 +1764,7 @@ template <bool exists = false> QorResult multiply(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_fraction_0() noexcept {
+template <unsigned k> inline auto multiply_fraction_0() noexcept {
     QORI_AT(0x1111, qoriMulScale_8u_C1R) else
     QORI_AT(0x1313, qoriMulScale_8u_C3R) else
     QORI_AT(0x1414, qoriMulScale_8u_C4R) else
@@ -1756,7 +1775,7 @@ template <unsigned k> constexpr auto multiply_fraction_0() noexcept {
     QORI_AT(0x3535, qoriMulScale_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_fraction_1() noexcept {
+template <unsigned k> inline auto multiply_fraction_1() noexcept {
     QORI_AT(0x1111, qoriMulScale_8u_C1IR) else
     QORI_AT(0x1313, qoriMulScale_8u_C3IR) else
     QORI_AT(0x1414, qoriMulScale_8u_C4IR) else
@@ -1767,7 +1786,7 @@ template <unsigned k> constexpr auto multiply_fraction_1() noexcept {
     QORI_AT(0x3535, qoriMulScale_16u_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_fraction_2() noexcept {
+template <unsigned k> inline auto multiply_fraction_2() noexcept {
     QORI_AT(0x1111, qoriMulCScale_8u_C1R) else
     QORI_AT(0x1313, qoriMulCScale_8u_C3R) else
     QORI_AT(0x1414, qoriMulCScale_8u_C4R) else
@@ -1778,7 +1797,7 @@ template <unsigned k> constexpr auto multiply_fraction_2() noexcept {
     QORI_AT(0x3535, qoriMulCScale_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_fraction_3() noexcept {
+template <unsigned k> inline auto multiply_fraction_3() noexcept {
     QORI_AT(0x1111, qoriMulCScale_8u_C1IR) else
     QORI_AT(0x1313, qoriMulCScale_8u_C3IR) else
     QORI_AT(0x1414, qoriMulCScale_8u_C4IR) else
@@ -1793,12 +1812,12 @@ template <unsigned k> constexpr auto multiply_fraction_3() noexcept {
 #define QORI_WORDS \
     "qori::multiply_fraction: no such call. multiply_fraction(a, b, dst) or multiply_fraction(in_place(b), a) " \
     "or multiply_fraction(a, value, dst) or multiply_fraction(in_place(a), value) of 8u, 16u: C1 C3 C4 AC4"
-/** Multiplies two images as fractions of the largest value: round(src1 * src2 / max), max 255 or 65535. Multiplies an
- *  image by constants as fractions of the maximum: round(src * value / max), max 255 or 65535. C: qoriMulScale,
+/** Multiplies two images as fractions of the largest value: round(src1 * src2 / max), max 255 or 65535. Multiplies
+ *  an image by constants as fractions of the maximum: round(src * value / max), max 255 or 65535. C: qoriMulScale,
  *  qoriMulCScale. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_fraction_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_fraction_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -1812,8 +1831,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_fraction_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_fraction_1<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -1825,11 +1844,11 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_fraction_2<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult multiply_fraction(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst) noexcept
-    {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_fraction_2<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult multiply_fraction(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b,
+    C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -1841,10 +1860,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::multiply_fraction_3<k>()), bool exists = false>
-[[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_fraction_3<k>()), bool exists = false>
+[[nodiscard]] QorResult multiply_fraction(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Arg<F0, 0>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::multiply_fraction_3<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -1862,7 +1881,7 @@ template <bool exists = false> QorResult multiply_fraction(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto divide_0() noexcept {
+template <unsigned k> inline auto divide_0() noexcept {
     QORI_AT(0x1111, qoriDivC_8u_C1RSfs) else
     QORI_AT(0x1313, qoriDivC_8u_C3RSfs) else
     QORI_AT(0x1414, qoriDivC_8u_C4RSfs) else
@@ -1883,7 +1902,7 @@ template <unsigned k> constexpr auto divide_0() noexcept {
     QORI_AT(0xa5a5, qoriDivC_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_1() noexcept {
+template <unsigned k> inline auto divide_1() noexcept {
     QORI_AT(0x1111, qoriDivC_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriDivC_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriDivC_8u_C4IRSfs) else
@@ -1904,7 +1923,7 @@ template <unsigned k> constexpr auto divide_1() noexcept {
     QORI_AT(0xa5a5, qoriDivC_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_2() noexcept {
+template <unsigned k> inline auto divide_2() noexcept {
     QORI_AT(0x7171, qoriDivC_32f_C1R) else
     QORI_AT(0x7373, qoriDivC_32f_C3R) else
     QORI_AT(0x7474, qoriDivC_32f_C4R) else
@@ -1914,7 +1933,7 @@ template <unsigned k> constexpr auto divide_2() noexcept {
     QORI_AT(0xb5b5, qoriDivC_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_3() noexcept {
+template <unsigned k> inline auto divide_3() noexcept {
     QORI_AT(0x7171, qoriDivC_32f_C1IR) else
     QORI_AT(0x7373, qoriDivC_32f_C3IR) else
     QORI_AT(0x7474, qoriDivC_32f_C4IR) else
@@ -1924,7 +1943,7 @@ template <unsigned k> constexpr auto divide_3() noexcept {
     QORI_AT(0xb5b5, qoriDivC_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_4() noexcept {
+template <unsigned k> inline auto divide_4() noexcept {
     QORI_AT(0x1111, qoriDiv_8u_C1RSfs) else
     QORI_AT(0x1313, qoriDiv_8u_C3RSfs) else
     QORI_AT(0x1414, qoriDiv_8u_C4RSfs) else
@@ -1945,7 +1964,7 @@ template <unsigned k> constexpr auto divide_4() noexcept {
     QORI_AT(0xa5a5, qoriDiv_32sc_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_5() noexcept {
+template <unsigned k> inline auto divide_5() noexcept {
     QORI_AT(0x1111, qoriDiv_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriDiv_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriDiv_8u_C4IRSfs) else
@@ -1966,7 +1985,7 @@ template <unsigned k> constexpr auto divide_5() noexcept {
     QORI_AT(0xa5a5, qoriDiv_32sc_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_6() noexcept {
+template <unsigned k> inline auto divide_6() noexcept {
     QORI_AT(0x7171, qoriDiv_32f_C1R) else
     QORI_AT(0x7373, qoriDiv_32f_C3R) else
     QORI_AT(0x7474, qoriDiv_32f_C4R) else
@@ -1976,7 +1995,7 @@ template <unsigned k> constexpr auto divide_6() noexcept {
     QORI_AT(0xb5b5, qoriDiv_32fc_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_7() noexcept {
+template <unsigned k> inline auto divide_7() noexcept {
     QORI_AT(0x7171, qoriDiv_32f_C1IR) else
     QORI_AT(0x7373, qoriDiv_32f_C3IR) else
     QORI_AT(0x7474, qoriDiv_32f_C4IR) else
@@ -1986,7 +2005,7 @@ template <unsigned k> constexpr auto divide_7() noexcept {
     QORI_AT(0xb5b5, qoriDiv_32fc_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_8() noexcept {
+template <unsigned k> inline auto divide_8() noexcept {
     QORI_AT(0x1111, qoriDiv_Round_8u_C1RSfs) else
     QORI_AT(0x1313, qoriDiv_Round_8u_C3RSfs) else
     QORI_AT(0x1414, qoriDiv_Round_8u_C4RSfs) else
@@ -2001,7 +2020,7 @@ template <unsigned k> constexpr auto divide_8() noexcept {
     QORI_AT(0x4545, qoriDiv_Round_16s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto divide_9() noexcept {
+template <unsigned k> inline auto divide_9() noexcept {
     QORI_AT(0x1111, qoriDiv_Round_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriDiv_Round_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriDiv_Round_8u_C4IRSfs) else
@@ -2023,13 +2042,15 @@ template <unsigned k> constexpr auto divide_9() noexcept {
     "C1 C3 AC4. divide(a, value, dst) or divide(in_place(a), value) or divide(a, b, dst) or divide(in_place(a)," \
     " b) of 32f: C1 C3 C4 AC4; 32fc: C1 C3 AC4. divide(a, b, dst, [rounding], [scale]) or divide(in_place(a), " \
     "b, [rounding], [scale]) of 8u, 16u, 16s: C1 C3 C4 AC4"
-/** Divides an image by constants: saturate(src / value * 2^-scaleFactor), ties to even. Divides the second image by
- *  the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even. Divides the second image by the first, rounding
- *  as told: saturate(round(src2 / src1 * 2^-scaleFactor)). C: qoriDivC, qoriDiv, qoriDiv_Round. */
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst, int32_t scale)
-    noexcept {
+/** Divides an image by constants: saturate(src / value * 2^-scaleFactor), ties to even. Divides the second image
+ *  by the first: saturate(src2 / src1 * 2^-scaleFactor), ties to even. Divides the second image by the first,
+ *  rounding as told: saturate(round(src2 / src1 * 2^-scaleFactor)). C: qoriDivC, qoriDiv, qoriDiv_Round. Of two
+ *  images a is the second source of C, pSrc2 or in place pSrcDst, and b the first. */
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> && detail::isImage<C>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Arg<F0, 2>, k>& b, C&& dst,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -2041,11 +2062,11 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_2<k>()), class F1 = decltype(detail::divide_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult divide(const A& a, const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>,
-    k>& b, C&& dst) noexcept {
+template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_2<k>()), class F1 = decltype(detail::divide_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult divide(const A& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 2>, detail::Arg<F1, 2>>, k>& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& dstV = detail::view(dst);
@@ -2061,10 +2082,10 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::divide_1<k>()), bool exists = false>
-[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b, int32_t scale)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_1<k>()), bool exists = false>
+[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Arg<F0, 0>, k>& b,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::divide_1<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
@@ -2073,10 +2094,10 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::divide_3<k>()), class F1 = decltype(detail::divide_1<k>()), bool exists = false>
-[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const detail::Value<detail::Either<detail::Arg<F0, 0>,
-    detail::Arg<F1, 0>>, k>& b) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_3<k>()), class F1 = decltype(detail::divide_1<k>()), bool exists = false>
+[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a,
+    const detail::Value<detail::Either<detail::Arg<F0, 0>, detail::Arg<F1, 0>>, k>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         return detail::divide_3<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
@@ -2088,9 +2109,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_4<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_4<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2104,10 +2125,10 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_6<k>()), class F1 = decltype(detail::divide_4<k>()), class F2 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_6<k>()), class F1 = decltype(detail::divide_4<k>()),
+    class F2 = decltype(detail::divide_8<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2134,8 +2155,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_5<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_5<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2147,9 +2168,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_7<k>()), class F1 = decltype(detail::divide_5<k>()), class F2 =
-    decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_7<k>()), class F1 = decltype(detail::divide_5<k>()),
+    class F2 = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2171,9 +2192,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_8<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2187,9 +2208,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::divide_8<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0,
-    bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::divide_8<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const A& a, const B& b, C&& dst, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2203,10 +2224,10 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding, int32_t scale) noexcept
-    {
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -2217,8 +2238,8 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::divide_9<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult divide(const InPlace<TA, LA>& a, const B& b, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -2239,7 +2260,7 @@ template <bool exists = false> QorResult divide(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto absolute_0() noexcept {
+template <unsigned k> inline auto absolute_0() noexcept {
     QORI_AT(0x4141, qoriAbs_16s_C1R) else
     QORI_AT(0x4343, qoriAbs_16s_C3R) else
     QORI_AT(0x4444, qoriAbs_16s_C4R) else
@@ -2250,7 +2271,7 @@ template <unsigned k> constexpr auto absolute_0() noexcept {
     QORI_AT(0x7575, qoriAbs_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto absolute_1() noexcept {
+template <unsigned k> inline auto absolute_1() noexcept {
     QORI_AT(0x4141, qoriAbs_16s_C1IR) else
     QORI_AT(0x4343, qoriAbs_16s_C3IR) else
     QORI_AT(0x4444, qoriAbs_16s_C4IR) else
@@ -2265,8 +2286,9 @@ template <unsigned k> constexpr auto absolute_1() noexcept {
 #define QORI_WORDS \
     "qori::absolute: no such call. absolute(src, dst) or absolute(in_place(src)) of 16s, 32f: C1 C3 C4 AC4"
 /** Takes the absolute value. C: qoriAbs. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::absolute_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::absolute_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult absolute(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2278,8 +2300,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::absolute_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::absolute_1<k>()), bool exists = false>
 [[nodiscard]] QorResult absolute(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2298,7 +2320,7 @@ template <bool exists = false> QorResult absolute(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto square_0() noexcept {
+template <unsigned k> inline auto square_0() noexcept {
     QORI_AT(0x1111, qoriSqr_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSqr_8u_C3RSfs) else
     QORI_AT(0x1414, qoriSqr_8u_C4RSfs) else
@@ -2313,7 +2335,7 @@ template <unsigned k> constexpr auto square_0() noexcept {
     QORI_AT(0x4545, qoriSqr_16s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto square_1() noexcept {
+template <unsigned k> inline auto square_1() noexcept {
     QORI_AT(0x1111, qoriSqr_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSqr_8u_C3IRSfs) else
     QORI_AT(0x1414, qoriSqr_8u_C4IRSfs) else
@@ -2328,14 +2350,14 @@ template <unsigned k> constexpr auto square_1() noexcept {
     QORI_AT(0x4545, qoriSqr_16s_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto square_2() noexcept {
+template <unsigned k> inline auto square_2() noexcept {
     QORI_AT(0x7171, qoriSqr_32f_C1R) else
     QORI_AT(0x7373, qoriSqr_32f_C3R) else
     QORI_AT(0x7474, qoriSqr_32f_C4R) else
     QORI_AT(0x7575, qoriSqr_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto square_3() noexcept {
+template <unsigned k> inline auto square_3() noexcept {
     QORI_AT(0x7171, qoriSqr_32f_C1IR) else
     QORI_AT(0x7373, qoriSqr_32f_C3IR) else
     QORI_AT(0x7474, qoriSqr_32f_C4IR) else
@@ -2347,8 +2369,9 @@ template <unsigned k> constexpr auto square_3() noexcept {
     "qori::square: no such call. square(src, dst, [scale]) or square(in_place(src), [scale]) of 8u, 16u, 16s: " \
     "C1 C3 C4 AC4. square(src, dst) or square(in_place(src)) of 32f: C1 C3 C4 AC4"
 /** Squares: dst = saturate(round(src * src * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C: qoriSqr. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::square_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::square_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult square(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2360,9 +2383,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::square_2<k>()), class F1 = decltype(detail::square_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::square_2<k>()), class F1 = decltype(detail::square_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult square(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2379,8 +2402,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::square_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::square_1<k>()), bool exists = false>
 [[nodiscard]] QorResult square(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2390,8 +2413,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::square_3<k>()), class F1 = decltype(detail::square_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::square_3<k>()), class F1 = decltype(detail::square_1<k>()), bool exists = false>
 [[nodiscard]] QorResult square(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2413,7 +2436,7 @@ template <bool exists = false> QorResult square(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sqrt_0() noexcept {
+template <unsigned k> inline auto sqrt_0() noexcept {
     QORI_AT(0x1111, qoriSqrt_8u_C1RSfs) else
     QORI_AT(0x1313, qoriSqrt_8u_C3RSfs) else
     QORI_AT(0x1515, qoriSqrt_8u_AC4RSfs) else
@@ -2425,7 +2448,7 @@ template <unsigned k> constexpr auto sqrt_0() noexcept {
     QORI_AT(0x4545, qoriSqrt_16s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sqrt_1() noexcept {
+template <unsigned k> inline auto sqrt_1() noexcept {
     QORI_AT(0x1111, qoriSqrt_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriSqrt_8u_C3IRSfs) else
     QORI_AT(0x1515, qoriSqrt_8u_AC4IRSfs) else
@@ -2437,13 +2460,13 @@ template <unsigned k> constexpr auto sqrt_1() noexcept {
     QORI_AT(0x4545, qoriSqrt_16s_AC4IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sqrt_2() noexcept {
+template <unsigned k> inline auto sqrt_2() noexcept {
     QORI_AT(0x7171, qoriSqrt_32f_C1R) else
     QORI_AT(0x7373, qoriSqrt_32f_C3R) else
     QORI_AT(0x7575, qoriSqrt_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sqrt_3() noexcept {
+template <unsigned k> inline auto sqrt_3() noexcept {
     QORI_AT(0x7171, qoriSqrt_32f_C1IR) else
     QORI_AT(0x7373, qoriSqrt_32f_C3IR) else
     QORI_AT(0x7575, qoriSqrt_32f_AC4IR) else
@@ -2456,8 +2479,9 @@ template <unsigned k> constexpr auto sqrt_3() noexcept {
     "AC4. sqrt(src, dst) of 32f: C1 C3 AC4. sqrt(in_place(src)) of 32f: C1 C3 AC4 C4"
 /** Square root: dst = saturate(round(sqrt(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C:
  *  qoriSqrt. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult sqrt(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2469,9 +2493,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sqrt_2<k>()), class F1 = decltype(detail::sqrt_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sqrt_2<k>()), class F1 = decltype(detail::sqrt_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult sqrt(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2488,8 +2512,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::sqrt_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::sqrt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult sqrt(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2499,8 +2523,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::sqrt_3<k>()), class F1 = decltype(detail::sqrt_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::sqrt_3<k>()), class F1 = decltype(detail::sqrt_1<k>()), bool exists = false>
 [[nodiscard]] QorResult sqrt(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2522,7 +2546,7 @@ template <bool exists = false> QorResult sqrt(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto exp_0() noexcept {
+template <unsigned k> inline auto exp_0() noexcept {
     QORI_AT(0x1111, qoriExp_8u_C1RSfs) else
     QORI_AT(0x1313, qoriExp_8u_C3RSfs) else
     QORI_AT(0x3131, qoriExp_16u_C1RSfs) else
@@ -2531,7 +2555,7 @@ template <unsigned k> constexpr auto exp_0() noexcept {
     QORI_AT(0x4343, qoriExp_16s_C3RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto exp_1() noexcept {
+template <unsigned k> inline auto exp_1() noexcept {
     QORI_AT(0x1111, qoriExp_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriExp_8u_C3IRSfs) else
     QORI_AT(0x3131, qoriExp_16u_C1IRSfs) else
@@ -2540,12 +2564,12 @@ template <unsigned k> constexpr auto exp_1() noexcept {
     QORI_AT(0x4343, qoriExp_16s_C3IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto exp_2() noexcept {
+template <unsigned k> inline auto exp_2() noexcept {
     QORI_AT(0x7171, qoriExp_32f_C1R) else
     QORI_AT(0x7373, qoriExp_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto exp_3() noexcept {
+template <unsigned k> inline auto exp_3() noexcept {
     QORI_AT(0x7171, qoriExp_32f_C1IR) else
     QORI_AT(0x7373, qoriExp_32f_C3IR) else
     return Missing{};
@@ -2555,8 +2579,9 @@ template <unsigned k> constexpr auto exp_3() noexcept {
     "qori::exp: no such call. exp(src, dst, [scale]) or exp(in_place(src), [scale]) of 8u, 16u, 16s: C1 C3. " \
     "exp(src, dst) or exp(in_place(src)) of 32f: C1 C3"
 /** Exponential: dst = saturate(round(e^src * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C: qoriExp. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult exp(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2568,9 +2593,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::exp_2<k>()), class F1 = decltype(detail::exp_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::exp_2<k>()), class F1 = decltype(detail::exp_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult exp(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2587,8 +2612,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::exp_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::exp_1<k>()), bool exists = false>
 [[nodiscard]] QorResult exp(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2598,8 +2623,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::exp_3<k>()), class F1 = decltype(detail::exp_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::exp_3<k>()), class F1 = decltype(detail::exp_1<k>()), bool exists = false>
 [[nodiscard]] QorResult exp(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2621,7 +2646,7 @@ template <bool exists = false> QorResult exp(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto log_0() noexcept {
+template <unsigned k> inline auto log_0() noexcept {
     QORI_AT(0x1111, qoriLn_8u_C1RSfs) else
     QORI_AT(0x1313, qoriLn_8u_C3RSfs) else
     QORI_AT(0x3131, qoriLn_16u_C1RSfs) else
@@ -2630,7 +2655,7 @@ template <unsigned k> constexpr auto log_0() noexcept {
     QORI_AT(0x4343, qoriLn_16s_C3RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto log_1() noexcept {
+template <unsigned k> inline auto log_1() noexcept {
     QORI_AT(0x1111, qoriLn_8u_C1IRSfs) else
     QORI_AT(0x1313, qoriLn_8u_C3IRSfs) else
     QORI_AT(0x3131, qoriLn_16u_C1IRSfs) else
@@ -2639,12 +2664,12 @@ template <unsigned k> constexpr auto log_1() noexcept {
     QORI_AT(0x4343, qoriLn_16s_C3IRSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto log_2() noexcept {
+template <unsigned k> inline auto log_2() noexcept {
     QORI_AT(0x7171, qoriLn_32f_C1R) else
     QORI_AT(0x7373, qoriLn_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto log_3() noexcept {
+template <unsigned k> inline auto log_3() noexcept {
     QORI_AT(0x7171, qoriLn_32f_C1IR) else
     QORI_AT(0x7373, qoriLn_32f_C3IR) else
     return Missing{};
@@ -2655,8 +2680,9 @@ template <unsigned k> constexpr auto log_3() noexcept {
     "log(src, dst) or log(in_place(src)) of 32f: C1 C3"
 /** Natural logarithm: dst = saturate(round(ln(src) * 2^-scaleFactor)), ties to even; 32f without scaleFactor. C:
  *  qoriLn. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::log_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::log_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult log(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2668,9 +2694,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::log_2<k>()), class F1 = decltype(detail::log_0<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::log_2<k>()), class F1 = decltype(detail::log_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult log(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2687,8 +2713,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::log_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::log_1<k>()), bool exists = false>
 [[nodiscard]] QorResult log(const InPlace<TA, LA>& src, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2698,8 +2724,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::log_3<k>()), class F1 = decltype(detail::log_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::log_3<k>()), class F1 = decltype(detail::log_1<k>()), bool exists = false>
 [[nodiscard]] QorResult log(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2721,7 +2747,7 @@ template <bool exists = false> QorResult log(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto pad_constant_0() noexcept {
+template <unsigned k> inline auto pad_constant_0() noexcept {
     QORI_AT(0x1111, qoriCopyConstBorder_8u_C1R) else
     QORI_AT(0x1313, qoriCopyConstBorder_8u_C3R) else
     QORI_AT(0x1414, qoriCopyConstBorder_8u_C4R) else
@@ -2749,11 +2775,11 @@ template <unsigned k> constexpr auto pad_constant_0() noexcept {
     "qori::pad_constant: no such call. pad_constant(src, dst, top, left, value) of 8u, 16u, 16s, 32s, 32f: C1 " \
     "C3 C4 AC4"
 /** Copies an image into a larger one and fills the frame around it with a constant pixel. C: qoriCopyConstBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pad_constant_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult pad_constant(const A& src, B&& dst, int32_t top, int32_t left, const
-    detail::Value<detail::Arg<F0, 8>, k>& value) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::pad_constant_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult pad_constant(const A& src, B&& dst, int32_t top, int32_t left,
+    const detail::Value<detail::Arg<F0, 8>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -2764,16 +2790,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult pad_constant(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult pad_constant(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto pad_replicate_0() noexcept {
+template <unsigned k> inline auto pad_replicate_0() noexcept {
     QORI_AT(0x1111, qoriCopyReplicateBorder_8u_C1R) else
     QORI_AT(0x1313, qoriCopyReplicateBorder_8u_C3R) else
     QORI_AT(0x1414, qoriCopyReplicateBorder_8u_C4R) else
@@ -2796,7 +2822,7 @@ template <unsigned k> constexpr auto pad_replicate_0() noexcept {
     QORI_AT(0x7575, qoriCopyReplicateBorder_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto pad_replicate_1() noexcept {
+template <unsigned k> inline auto pad_replicate_1() noexcept {
     QORI_AT(0x1111, qoriCopyReplicateBorder_8u_C1IR) else
     QORI_AT(0x1313, qoriCopyReplicateBorder_8u_C3IR) else
     QORI_AT(0x1414, qoriCopyReplicateBorder_8u_C4IR) else
@@ -2823,11 +2849,11 @@ template <unsigned k> constexpr auto pad_replicate_1() noexcept {
 #define QORI_WORDS \
     "qori::pad_replicate: no such call. pad_replicate(src, dst, top, left) or pad_replicate(in_place(src), " \
     "dst_roi_size, top, left) of 8u, 16u, 16s, 32s, 32f: C1 C3 C4 AC4"
-/** Copies an image into a larger one and repeats its outermost pixels in the frame around it. Repeats the outermost
- *  pixels of an image in the frame around it, inside a larger image. C: qoriCopyReplicateBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pad_replicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+/** Copies an image into a larger one and repeats its outermost pixels in the frame around it. Repeats the
+ *  outermost pixels of an image in the frame around it, inside a larger image. C: qoriCopyReplicateBorder. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::pad_replicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult pad_replicate(const A& src, B&& dst, int32_t top, int32_t left) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2839,10 +2865,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::pad_replicate_1<k>()), bool exists = false>
-[[nodiscard]] QorResult pad_replicate(const InPlace<TA, LA>& src, QorImageSize dst_roi_size, int32_t top, int32_t
-    left) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::pad_replicate_1<k>()), bool exists = false>
+[[nodiscard]] QorResult pad_replicate(const InPlace<TA, LA>& src, QorImageSize dst_roi_size, int32_t top,
+    int32_t left) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::pad_replicate_1<k>()(srcV.data(), srcV.step(), srcV.size(), dst_roi_size, top, left);
@@ -2851,16 +2877,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_box_0() noexcept {
+template <unsigned k> inline auto filter_box_0() noexcept {
     QORI_AT(0x1111, qoriFilterBox_8u_C1R) else
     QORI_AT(0x1313, qoriFilterBox_8u_C3R) else
     QORI_AT(0x1414, qoriFilterBox_8u_C4R) else
@@ -2880,7 +2906,7 @@ template <unsigned k> constexpr auto filter_box_0() noexcept {
     QORI_AT(0x8181, qoriFilterBox_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_box_1() noexcept {
+template <unsigned k> inline auto filter_box_1() noexcept {
     QORI_AT(0x1111, qoriFilterBox_8u_C1IR) else
     QORI_AT(0x1313, qoriFilterBox_8u_C3IR) else
     QORI_AT(0x1414, qoriFilterBox_8u_C4IR) else
@@ -2905,9 +2931,9 @@ template <unsigned k> constexpr auto filter_box_1() noexcept {
     "filter_box(in_place(src), size) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** The mean of the window of maskSize around each pixel, channel by channel. The mean of the window of maskSize
  *  around each pixel, in place. C: qoriFilterBox. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_box(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2920,8 +2946,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::filter_box_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::filter_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult filter_box(const InPlace<TA, LA>& src, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -2931,9 +2957,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_box(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_box(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -2941,13 +2967,13 @@ template <bool exists = false> QorResult filter_box(detail::Anything = {}, detai
 
 /** Reports how many bytes the buffer of a box filter with a border takes, at any alignment. C:
  *  qoriFilterBoxBorderGetBufferSize. */
-[[nodiscard]] inline QorResult filter_box_border_get_buffer_size(QorImageSize roi_size, QorImageSize size, int32_t
-    data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_box_border_get_buffer_size(QorImageSize roi_size, QorImageSize size,
+    int32_t data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterBoxBorderGetBufferSize(roi_size, size, data_type, num_channels, buffer_size);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_box_border_0() noexcept {
+template <unsigned k> inline auto filter_box_border_0() noexcept {
     QORI_AT(0x1111, qoriFilterBoxBorder_8u_C1R) else
     QORI_AT(0x1313, qoriFilterBoxBorder_8u_C3R) else
     QORI_AT(0x1414, qoriFilterBoxBorder_8u_C4R) else
@@ -2972,18 +2998,18 @@ template <unsigned k> constexpr auto filter_box_border_0() noexcept {
     "16u, 32f: C1 C3 C4 AC4"
 /** The mean of the centred window of maskSize around each pixel, channel by channel, with a border. C:
  *  qoriFilterBoxBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size, const detail::Edge<detail::Arg<F0,
-    7>, k>& border, Buffer& buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterBoxBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -2992,11 +3018,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size, const detail::Edge<detail::Arg<F0,
-    7>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -3004,7 +3030,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterBoxBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -3013,9 +3039,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_box_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_box_border(const A& src, B&& dst, QorImageSize size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3025,7 +3051,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterBoxBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -3043,7 +3069,7 @@ template <bool exists = false> QorResult filter_box_border(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto convert_0() noexcept {
+template <unsigned k> inline auto convert_0() noexcept {
     QORI_AT(0x1131, qoriConvert_8u16u_C1R) else
     QORI_AT(0x1333, qoriConvert_8u16u_C3R) else
     QORI_AT(0x1434, qoriConvert_8u16u_C4R) else
@@ -3112,7 +3138,7 @@ template <unsigned k> constexpr auto convert_0() noexcept {
     QORI_AT(0x6525, qoriConvert_32s8s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto convert_1() noexcept {
+template <unsigned k> inline auto convert_1() noexcept {
     QORI_AT(0x1121, qoriConvert_8u8s_C1RSfs) else
     QORI_AT(0x3121, qoriConvert_16u8s_C1RSfs) else
     QORI_AT(0x4121, qoriConvert_16s8s_C1RSfs) else
@@ -3132,7 +3158,7 @@ template <unsigned k> constexpr auto convert_1() noexcept {
     QORI_AT(0x7151, qoriConvert_32f32u_C1RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto convert_2() noexcept {
+template <unsigned k> inline auto convert_2() noexcept {
     QORI_AT(0x7111, qoriConvert_32f8u_C1R) else
     QORI_AT(0x7313, qoriConvert_32f8u_C3R) else
     QORI_AT(0x7414, qoriConvert_32f8u_C4R) else
@@ -3151,7 +3177,7 @@ template <unsigned k> constexpr auto convert_2() noexcept {
     QORI_AT(0x7545, qoriConvert_32f16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto convert_3() noexcept {
+template <unsigned k> inline auto convert_3() noexcept {
     QORI_AT(0x5151, qoriConvert_32f32u_C1IRSfs) else
     return Missing{};
 }
@@ -3167,9 +3193,10 @@ template <unsigned k> constexpr auto convert_3() noexcept {
 /** Converts to a wider type, exactly. Converts integers: dst = saturate(round(src * 2^-scaleFactor)), rounding the
  *  magnitude. Converts float to integer: rounded by roundMode, saturated. Converts float to integer: dst =
  *  saturate(round(src * 2^-scaleFactor)); the product is exact. C: qoriConvert. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_0<k>()), class F1 = decltype(detail::convert_2<k>()), class F2 =
-    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::convert_0<k>()), class F1 = decltype(detail::convert_2<k>()),
+    class F2 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3193,8 +3220,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3207,9 +3235,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::convert_2<k>()), class F1 = decltype(detail::convert_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::convert_2<k>()), class F1 = decltype(detail::convert_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult convert(const A& src, B&& dst, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3226,8 +3254,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src, QorRoundingMode rounding, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3237,8 +3265,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src, QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3248,8 +3276,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::convert_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::convert_3<k>()), bool exists = false>
 [[nodiscard]] QorResult convert(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3268,7 +3296,7 @@ template <bool exists = false> QorResult convert(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto unpack_bits_0() noexcept {
+template <unsigned k> inline auto unpack_bits_0() noexcept {
     QORI_AT(0x1111, qoriConvert_1u8u_C1R) else
     return Missing{};
 }
@@ -3276,9 +3304,9 @@ template <unsigned k> constexpr auto unpack_bits_0() noexcept {
 #define QORI_WORDS \
     "qori::unpack_bits: no such call. unpack_bits(src, dst, [bit_offset]) of 8u: C1"
 /** Unpacks bits into bytes: a set bit gives 255, a clear one 0. C: qoriConvert. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult unpack_bits(const A& src, B&& dst, int32_t bit_offset) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3291,9 +3319,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::unpack_bits_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult unpack_bits(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3306,16 +3334,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto copy_0() noexcept {
+template <unsigned k> inline auto copy_0() noexcept {
     QORI_AT(0x1111, qoriCopy_8u_C1R) else
     QORI_AT(0x1313, qoriCopy_8u_C3R) else
     QORI_AT(0x1414, qoriCopy_8u_C4R) else
@@ -3398,7 +3426,7 @@ template <unsigned k> constexpr auto copy_0() noexcept {
     QORI_AT(0x7774, qoriCopy_32f_P4C4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto copy_1() noexcept {
+template <unsigned k> inline auto copy_1() noexcept {
     QORI_AT(0x1111, qoriCopy_8u_C1MR) else
     QORI_AT(0x1313, qoriCopy_8u_C3MR) else
     QORI_AT(0x1414, qoriCopy_8u_C4MR) else
@@ -3427,10 +3455,11 @@ template <unsigned k> constexpr auto copy_1() noexcept {
     "ChannelOfC4->C1 C1->ChannelOfC3 C1->ChannelOfC4 ChannelOfC3 ChannelOfC4 AC4->C3 C3->AC4 C3->P3 C4->P4 " \
     "P3->C3 P4->C4. copy(src, dst, mask) of 8u, 16s, 16u, 32s, 32f: C1 C3 C4 AC4"
 /** Copies a region pixel by pixel. Copies the pixels whose mask element is not zero; all others keep their value.
- *  Other threads must not write them meanwhile: kept elements less than 32 bytes from a copied one may be rewritten
- *  with their own value. C: qoriCopy. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+ *  Other threads must not write them meanwhile: kept elements less than 32 bytes from a copied one may be
+ *  rewritten with their own value. C: qoriCopy. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3442,8 +3471,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy(const A& src, B&& dst, const View<const uint8_t, C1>& mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3466,7 +3496,7 @@ template <bool exists = false> QorResult copy(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto copy_managed_0() noexcept {
+template <unsigned k> inline auto copy_managed_0() noexcept {
     QORI_AT(0x1111, qoriCopyManaged_8u_C1R) else
     return Missing{};
 }
@@ -3474,9 +3504,9 @@ template <unsigned k> constexpr auto copy_managed_0() noexcept {
 #define QORI_WORDS \
     "qori::copy_managed: no such call. copy_managed(src, dst, [flags]) of 8u: C1"
 /** Copies a region of bytes with the caller's advice on the use of the cache. C: qoriCopyManaged. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy_managed(const A& src, B&& dst, int32_t flags) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3488,9 +3518,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::copy_managed_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult copy_managed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3502,16 +3532,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult copy_managed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult copy_managed(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto duplicate_0() noexcept {
+template <unsigned k> inline auto duplicate_0() noexcept {
     QORI_AT(0x1113, qoriDup_8u_C1C3R) else
     QORI_AT(0x1114, qoriDup_8u_C1C4R) else
     return Missing{};
@@ -3520,8 +3550,9 @@ template <unsigned k> constexpr auto duplicate_0() noexcept {
 #define QORI_WORDS \
     "qori::duplicate: no such call. duplicate(src, dst) of 8u: C1->C3 C1->C4"
 /** Writes every element of a single-channel image to all channels of the destination pixel. C: qoriDup. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::duplicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::duplicate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult duplicate(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3533,9 +3564,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -3549,13 +3580,13 @@ template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail
 }
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrNorm_8u32f_C1R) else
     QORI_AT(0x3171, qoriCrossCorrNorm_16u32f_C1R) else
     QORI_AT(0x7171, qoriCrossCorrNorm_32f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrNorm_8u_C1RSfs) else
     return Missing{};
 }
@@ -3565,11 +3596,11 @@ template <unsigned k> constexpr auto cross_corr_norm_1() noexcept {
     "16u->32f, 32f: C1. cross_corr_norm(src, pattern, dst, algorithm, [scale], [buffer]) of 8u: C1"
 /** Correlates a template with the source at every placement: plain, normalised or zero-mean normalised. C:
  *  qoriCrossCorrNorm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, Buffer& buffer)
-    noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm,
+    Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& patternV = detail::view(pattern);
@@ -3589,8 +3620,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_0<k>()), class F1 = decltype(detail::cross_corr_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_0<k>()), class F1 = decltype(detail::cross_corr_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3628,9 +3659,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, int32_t scale,
     Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3652,11 +3683,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
-[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm, int32_t scale)
-    noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
+[[nodiscard]] QorResult cross_corr_norm(const A& src, const B& pattern, C&& dst, int32_t algorithm,
+    int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& patternV = detail::view(pattern);
@@ -3686,7 +3717,7 @@ template <bool exists = false> QorResult cross_corr_norm(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_full_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrFull_Norm_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrFull_Norm_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrFull_Norm_8u32f_C4R) else
@@ -3705,7 +3736,7 @@ template <unsigned k> constexpr auto cross_corr_full_norm_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrFull_Norm_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_full_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrFull_Norm_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrFull_Norm_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrFull_Norm_8u_C4RSfs) else
@@ -3717,8 +3748,9 @@ template <unsigned k> constexpr auto cross_corr_full_norm_1() noexcept {
     "qori::cross_corr_full_norm: no such call. cross_corr_full_norm(src, pattern, dst) of 8u->32f, 8s->32f, " \
     "16u->32f, 32f: C1 C3 C4 AC4. cross_corr_full_norm(src, pattern, dst, [scale]) of 8u: C1 C3 C4 AC4"
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrFull_Norm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_0<k>()), class F1 = decltype(detail::cross_corr_full_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_0<k>()),
+    class F1 = decltype(detail::cross_corr_full_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3742,9 +3774,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3768,7 +3800,7 @@ template <bool exists = false> QorResult cross_corr_full_norm(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_same_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrSame_Norm_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrSame_Norm_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrSame_Norm_8u32f_C4R) else
@@ -3787,7 +3819,7 @@ template <unsigned k> constexpr auto cross_corr_same_norm_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrSame_Norm_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_same_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrSame_Norm_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrSame_Norm_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrSame_Norm_8u_C4RSfs) else
@@ -3799,8 +3831,9 @@ template <unsigned k> constexpr auto cross_corr_same_norm_1() noexcept {
     "qori::cross_corr_same_norm: no such call. cross_corr_same_norm(src, pattern, dst) of 8u->32f, 8s->32f, " \
     "16u->32f, 32f: C1 C3 C4 AC4. cross_corr_same_norm(src, pattern, dst, [scale]) of 8u: C1 C3 C4 AC4"
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrSame_Norm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_0<k>()), class F1 = decltype(detail::cross_corr_same_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_0<k>()),
+    class F1 = decltype(detail::cross_corr_same_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3822,9 +3855,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3847,7 +3880,7 @@ template <bool exists = false> QorResult cross_corr_same_norm(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_valid_norm_0() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrValid_Norm_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrValid_Norm_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrValid_Norm_8u32f_C4R) else
@@ -3866,7 +3899,7 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrValid_Norm_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_valid_norm_1() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrValid_Norm_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrValid_Norm_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrValid_Norm_8u_C4RSfs) else
@@ -3878,8 +3911,9 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_1() noexcept {
     "qori::cross_corr_valid_norm: no such call. cross_corr_valid_norm(src, pattern, dst) of 8u->32f, 8s->32f, " \
     "16u->32f, 32f: C1 C3 C4 AC4. cross_corr_valid_norm(src, pattern, dst, [scale]) of 8u: C1 C3 C4 AC4"
 /** Normalised correlation with a template, channel by channel: C / sqrt(S2 * T2). C: qoriCrossCorrValid_Norm. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_0<k>()), class F1 = decltype(detail::cross_corr_valid_norm_1<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_0<k>()),
+    class F1 = decltype(detail::cross_corr_valid_norm_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -3903,9 +3937,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3929,7 +3963,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm(detail::Anything 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_full_norm_level_0() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_level_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrFull_NormLevel_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrFull_NormLevel_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrFull_NormLevel_8u32f_C4R) else
@@ -3949,7 +3983,7 @@ template <unsigned k> constexpr auto cross_corr_full_norm_level_0() noexcept {
     QORI_AT(0x8181, qoriCrossCorrFull_NormLevel_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_full_norm_level_1() noexcept {
+template <unsigned k> inline auto cross_corr_full_norm_level_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrFull_NormLevel_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrFull_NormLevel_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrFull_NormLevel_8u_C4RSfs) else
@@ -3963,10 +3997,10 @@ template <unsigned k> constexpr auto cross_corr_full_norm_level_1() noexcept {
     "8u: C1 C3 C4 AC4"
 /** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n). C:
  *  qoriCrossCorrFull_NormLevel. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_level_0<k>()), class F1 =
-    decltype(detail::cross_corr_full_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_level_0<k>()),
+    class F1 = decltype(detail::cross_corr_full_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -3989,9 +4023,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_full_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_full_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_full_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4015,7 +4049,7 @@ template <bool exists = false> QorResult cross_corr_full_norm_level(detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_same_norm_level_0() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_level_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrSame_NormLevel_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrSame_NormLevel_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrSame_NormLevel_8u32f_C4R) else
@@ -4034,7 +4068,7 @@ template <unsigned k> constexpr auto cross_corr_same_norm_level_0() noexcept {
     QORI_AT(0x7575, qoriCrossCorrSame_NormLevel_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_same_norm_level_1() noexcept {
+template <unsigned k> inline auto cross_corr_same_norm_level_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrSame_NormLevel_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrSame_NormLevel_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrSame_NormLevel_8u_C4RSfs) else
@@ -4048,10 +4082,10 @@ template <unsigned k> constexpr auto cross_corr_same_norm_level_1() noexcept {
     "C4 AC4"
 /** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n). C:
  *  qoriCrossCorrSame_NormLevel. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_level_0<k>()), class F1 =
-    decltype(detail::cross_corr_same_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_level_0<k>()),
+    class F1 = decltype(detail::cross_corr_same_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4072,9 +4106,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_same_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_same_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_same_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4097,7 +4131,7 @@ template <bool exists = false> QorResult cross_corr_same_norm_level(detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_valid_norm_level_0() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_level_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrValid_NormLevel_8u32f_C1R) else
     QORI_AT(0x1373, qoriCrossCorrValid_NormLevel_8u32f_C3R) else
     QORI_AT(0x1474, qoriCrossCorrValid_NormLevel_8u32f_C4R) else
@@ -4117,7 +4151,7 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_level_0() noexcept {
     QORI_AT(0x8181, qoriCrossCorrValid_NormLevel_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto cross_corr_valid_norm_level_1() noexcept {
+template <unsigned k> inline auto cross_corr_valid_norm_level_1() noexcept {
     QORI_AT(0x1111, qoriCrossCorrValid_NormLevel_8u_C1RSfs) else
     QORI_AT(0x1313, qoriCrossCorrValid_NormLevel_8u_C3RSfs) else
     QORI_AT(0x1414, qoriCrossCorrValid_NormLevel_8u_C4RSfs) else
@@ -4131,10 +4165,10 @@ template <unsigned k> constexpr auto cross_corr_valid_norm_level_1() noexcept {
     "[scale]) of 8u: C1 C3 C4 AC4"
 /** Zero-mean normalised correlation with a template, channel by channel: (C - S1 * T1 / A) / (sqrt(V) * n). C:
  *  qoriCrossCorrValid_NormLevel. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_level_0<k>()), class F1 =
-    decltype(detail::cross_corr_valid_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_level_0<k>()),
+    class F1 = decltype(detail::cross_corr_valid_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm_level(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4157,9 +4191,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_norm_level_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_norm_level_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid_norm_level(const A& src, const B& pattern, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4183,7 +4217,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm_level(detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto cross_corr_valid_0() noexcept {
+template <unsigned k> inline auto cross_corr_valid_0() noexcept {
     QORI_AT(0x1171, qoriCrossCorrValid_8u32f_C1R) else
     QORI_AT(0x2171, qoriCrossCorrValid_8s32f_C1R) else
     QORI_AT(0x3171, qoriCrossCorrValid_16u32f_C1R) else
@@ -4195,9 +4229,9 @@ template <unsigned k> constexpr auto cross_corr_valid_0() noexcept {
     "qori::cross_corr_valid: no such call. cross_corr_valid(src, pattern, dst) of 8u->32f, 8s->32f, 16u->32f, " \
     "32f: C1"
 /** Correlation with a template at the placements inside the source: dst = sum s t. C: qoriCrossCorrValid. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::cross_corr_valid_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::cross_corr_valid_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult cross_corr_valid(const A& src, const B& pattern, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4248,15 +4282,15 @@ template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {},
 
 /** Makes a plan in memory from qorMalloc, to be released with qoriDCTFwdFree_32f or qoriDCTInvFree_32f. C:
  *  qoriDCTFwdInitAlloc_32f. */
-[[nodiscard]] inline QorResult dct_fwd_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size, QorAccuracyHint
-    hint) noexcept {
+[[nodiscard]] inline QorResult dct_fwd_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size,
+    QorAccuracyHint hint) noexcept {
     return qoriDCTFwdInitAlloc_32f(plan, roi_size, hint);
 }
 
 /** Makes a plan in memory from qorMalloc, to be released with qoriDCTFwdFree_32f or qoriDCTInvFree_32f. C:
  *  qoriDCTInvInitAlloc_32f. */
-[[nodiscard]] inline QorResult dct_inv_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size, QorAccuracyHint
-    hint) noexcept {
+[[nodiscard]] inline QorResult dct_inv_init_alloc_32f(QorDct2DPlan** plan, QorImageSize roi_size,
+    QorAccuracyHint hint) noexcept {
     return qoriDCTInvInitAlloc_32f(plan, roi_size, hint);
 }
 
@@ -4283,7 +4317,7 @@ template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {},
 }
 
 namespace detail {
-template <unsigned k> constexpr auto dct_fwd_0() noexcept {
+template <unsigned k> inline auto dct_fwd_0() noexcept {
     QORI_AT(0x7171, qoriDCTFwd_32f_C1R) else
     QORI_AT(0x7373, qoriDCTFwd_32f_C3R) else
     QORI_AT(0x7474, qoriDCTFwd_32f_C4R) else
@@ -4293,9 +4327,11 @@ template <unsigned k> constexpr auto dct_fwd_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::dct_fwd: no such call. dct_fwd(src, dst, plan, buffer) of 32f: C1 C3 C4 AC4"
-/** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C: qoriDCTFwd. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_fwd_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** The forward cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C:
+ *  qoriDCTFwd. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_fwd_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dct_fwd(const A& src, B&& dst, const QorDct2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4315,7 +4351,7 @@ template <bool exists = false> QorResult dct_fwd(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_inv_0() noexcept {
+template <unsigned k> inline auto dct_inv_0() noexcept {
     QORI_AT(0x7171, qoriDCTInv_32f_C1R) else
     QORI_AT(0x7373, qoriDCTInv_32f_C3R) else
     QORI_AT(0x7474, qoriDCTInv_32f_C4R) else
@@ -4325,9 +4361,11 @@ template <unsigned k> constexpr auto dct_inv_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::dct_inv: no such call. dct_inv(src, dst, plan, buffer) of 32f: C1 C3 C4 AC4"
-/** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C: qoriDCTInv. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_inv_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** The inverse cosine transform of an image, channel by channel; AC4 neither reads nor writes alpha. C:
+ *  qoriDCTInv. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_inv_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dct_inv(const A& src, B&& dst, const QorDct2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4347,22 +4385,22 @@ template <bool exists = false> QorResult dct_inv(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_forward_0() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_0() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Fwd_32f_C1) else
     QORI_AT(0x4141, qoriDCT8x8Fwd_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_forward_1() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_1() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Fwd_32f_C1I) else
     QORI_AT(0x4141, qoriDCT8x8Fwd_16s_C1I) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_forward_2() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_2() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Fwd_16s_C1R) else
     QORI_AT(0x1141, qoriDCT8x8Fwd_8u16s_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_forward_3() noexcept {
+template <unsigned k> inline auto dct_8x8_forward_3() noexcept {
     QORI_AT(0x1141, qoriDCT8x8FwdLS_8u16s_C1R) else
     return Missing{};
 }
@@ -4371,9 +4409,10 @@ template <unsigned k> constexpr auto dct_8x8_forward_3() noexcept {
     "qori::dct_8x8_forward: no such call. dct_8x8_forward(src, dst) or dct_8x8_forward(src) of 32f, 16s: C1. " \
     "dct_8x8_forward(src, dst) of 16s, 8u->16s: C1. dct_8x8_forward(src, dst, shift) of 8u->16s: C1"
 /** The forward cosine transform of a block of floats. The forward cosine transform of 8x8 pixels of an image. The
- *  forward cosine transform of 8x8 pixels of an image, with a value added to each. C: qoriDCT8x8Fwd, qoriDCT8x8FwdLS. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_0<k>()), bool exists = false>
+ *  forward cosine transform of 8x8 pixels of an image, with a value added to each. C: qoriDCT8x8Fwd,
+ *  qoriDCT8x8FwdLS. */
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_forward_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_0<k>()(src, dst);
@@ -4382,8 +4421,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_forward_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_forward_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_1<k>()(src);
@@ -4392,8 +4431,8 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, clas
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_2<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_forward_2<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A& src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4404,8 +4443,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_forward_3<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_forward_3<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_forward(const A& src, B* dst, int16_t shift) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4425,22 +4464,22 @@ template <bool exists = false> QorResult dct_8x8_forward(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_0() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Inv_32f_C1) else
     QORI_AT(0x4141, qoriDCT8x8Inv_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_1() noexcept {
     QORI_AT(0x7171, qoriDCT8x8Inv_32f_C1I) else
     QORI_AT(0x4141, qoriDCT8x8Inv_16s_C1I) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_2() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_2() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_16s_C1R) else
     QORI_AT(0x4111, qoriDCT8x8Inv_16s8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_3() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_3() noexcept {
     QORI_AT(0x4111, qoriDCT8x8InvLSClip_16s8u_C1R) else
     return Missing{};
 }
@@ -4448,11 +4487,11 @@ template <unsigned k> constexpr auto dct_8x8_inverse_3() noexcept {
 #define QORI_WORDS \
     "qori::dct_8x8_inverse: no such call. dct_8x8_inverse(src, dst) or dct_8x8_inverse(src) of 32f, 16s: C1. " \
     "dct_8x8_inverse(src, dst) of 16s, 16s->8u: C1. dct_8x8_inverse(src, dst, shift, low, high) of 16s->8u: C1"
-/** The inverse cosine transform of a block of floats. The inverse cosine transform into 8x8 pixels of an image. The
- *  inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two bounds. C:
- *  qoriDCT8x8Inv, qoriDCT8x8InvLSClip. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_0<k>()), bool exists = false>
+/** The inverse cosine transform of a block of floats. The inverse cosine transform into 8x8 pixels of an image.
+ *  The inverse cosine transform into 8x8 pixels of an image, with a value added to each and kept within two
+ *  bounds. C: qoriDCT8x8Inv, qoriDCT8x8InvLSClip. */
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_0<k>()(src, dst);
@@ -4461,8 +4500,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_1<k>()(src);
@@ -4471,8 +4510,8 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, clas
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_8x8_inverse_2<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
@@ -4483,8 +4522,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>, class F0 =
-    decltype(detail::dct_8x8_inverse_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B>>,
+    class F0 = decltype(detail::dct_8x8_inverse_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse(const A* src, B&& dst, int16_t shift, uint8_t low, uint8_t high) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
@@ -4504,11 +4543,11 @@ template <bool exists = false> QorResult dct_8x8_inverse(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_2x2_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_2x2_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_2x2_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_2x2_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_2x2_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_2x2_16s_C1I) else
     return Missing{};
 }
@@ -4518,8 +4557,8 @@ template <unsigned k> constexpr auto dct_8x8_inverse_2x2_1() noexcept {
     " C1"
 /** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4. C:
  *  qoriDCT8x8Inv_2x2. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2x2_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_2x2_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_2x2(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_0<k>()(src, dst);
@@ -4528,8 +4567,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_2x2_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_2x2_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_2x2(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_1<k>()(src);
@@ -4547,11 +4586,11 @@ template <bool exists = false> QorResult dct_8x8_inverse_2x2(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_4x4_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_4x4_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_4x4_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_4x4_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_4x4_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_4x4_16s_C1I) else
     return Missing{};
 }
@@ -4561,8 +4600,8 @@ template <unsigned k> constexpr auto dct_8x8_inverse_4x4_1() noexcept {
     " C1"
 /** The inverse cosine transform of a block whose coefficients are zero but for the lowest 2x2 or 4x4. C:
  *  qoriDCT8x8Inv_4x4. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_4x4_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_4x4_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_4x4(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_0<k>()(src, dst);
@@ -4571,8 +4610,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_4x4_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_4x4_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_4x4(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_1<k>()(src);
@@ -4590,11 +4629,11 @@ template <bool exists = false> QorResult dct_8x8_inverse_4x4(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_inverse_10bit_0() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_10bit_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_A10_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_inverse_10bit_1() noexcept {
+template <unsigned k> inline auto dct_8x8_inverse_10bit_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8Inv_A10_16s_C1I) else
     return Missing{};
 }
@@ -4604,8 +4643,8 @@ template <unsigned k> constexpr auto dct_8x8_inverse_10bit_1() noexcept {
     "of 16s: C1"
 /** The inverse cosine transform of a block of 16-bit coefficients, for pixels of ten bits and more. C:
  *  qoriDCT8x8Inv_A10. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_10bit_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_10bit_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_10bit(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_0<k>()(src, dst);
@@ -4614,8 +4653,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_inverse_10bit_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_inverse_10bit_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_inverse_10bit(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_1<k>()(src);
@@ -4633,11 +4672,11 @@ template <bool exists = false> QorResult dct_8x8_inverse_10bit(detail::Anything 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_to_2x2_inverse_0() noexcept {
+template <unsigned k> inline auto dct_8x8_to_2x2_inverse_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To2x2Inv_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_to_2x2_inverse_1() noexcept {
+template <unsigned k> inline auto dct_8x8_to_2x2_inverse_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To2x2Inv_16s_C1I) else
     return Missing{};
 }
@@ -4646,8 +4685,8 @@ template <unsigned k> constexpr auto dct_8x8_to_2x2_inverse_1() noexcept {
     "qori::dct_8x8_to_2x2_inverse: no such call. dct_8x8_to_2x2_inverse(src, dst) or " \
     "dct_8x8_to_2x2_inverse(src) of 16s: C1"
 /** Makes 2x2 pixels of a block's coefficients, a quarter of its size in each direction. C: qoriDCT8x8To2x2Inv. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_to_2x2_inverse_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_to_2x2_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_2x2_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_0<k>()(src, dst);
@@ -4656,8 +4695,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_to_2x2_inverse_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_to_2x2_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_2x2_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_1<k>()(src);
@@ -4675,11 +4714,11 @@ template <bool exists = false> QorResult dct_8x8_to_2x2_inverse(detail::Anything
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dct_8x8_to_4x4_inverse_0() noexcept {
+template <unsigned k> inline auto dct_8x8_to_4x4_inverse_0() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To4x4Inv_16s_C1) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dct_8x8_to_4x4_inverse_1() noexcept {
+template <unsigned k> inline auto dct_8x8_to_4x4_inverse_1() noexcept {
     QORI_AT(0x4141, qoriDCT8x8To4x4Inv_16s_C1I) else
     return Missing{};
 }
@@ -4688,8 +4727,8 @@ template <unsigned k> constexpr auto dct_8x8_to_4x4_inverse_1() noexcept {
     "qori::dct_8x8_to_4x4_inverse: no such call. dct_8x8_to_4x4_inverse(src, dst) or " \
     "dct_8x8_to_4x4_inverse(src) of 16s: C1"
 /** Makes 4x4 pixels of a block's coefficients, half of its size in each direction. C: qoriDCT8x8To4x4Inv. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::dct_8x8_to_4x4_inverse_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::dct_8x8_to_4x4_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_4x4_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_0<k>()(src, dst);
@@ -4698,8 +4737,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>, class F0 =
-    decltype(detail::dct_8x8_to_4x4_inverse_1<k>()), bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
+    class F0 = decltype(detail::dct_8x8_to_4x4_inverse_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dct_8x8_to_4x4_inverse(A* src) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_1<k>()(src);
@@ -4717,7 +4756,7 @@ template <bool exists = false> QorResult dct_8x8_to_4x4_inverse(detail::Anything
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto zigzag_8x8_forward_0() noexcept {
+template <unsigned k> inline auto zigzag_8x8_forward_0() noexcept {
     QORI_AT(0x4141, qoriZigzagFwd8x8_16s_C1) else
     return Missing{};
 }
@@ -4725,8 +4764,8 @@ template <unsigned k> constexpr auto zigzag_8x8_forward_0() noexcept {
 #define QORI_WORDS \
     "qori::zigzag_8x8_forward: no such call. zigzag_8x8_forward(src, dst) of 16s: C1"
 /** Puts a block's coefficients in zig-zag order. C: qoriZigzagFwd8x8. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::zigzag_8x8_forward_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::zigzag_8x8_forward_0<k>()), bool exists = false>
 [[nodiscard]] QorResult zigzag_8x8_forward(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_forward_0<k>()(src, dst);
@@ -4744,7 +4783,7 @@ template <bool exists = false> QorResult zigzag_8x8_forward(detail::Anything = {
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto zigzag_8x8_inverse_0() noexcept {
+template <unsigned k> inline auto zigzag_8x8_inverse_0() noexcept {
     QORI_AT(0x4141, qoriZigzagInv8x8_16s_C1) else
     return Missing{};
 }
@@ -4752,8 +4791,8 @@ template <unsigned k> constexpr auto zigzag_8x8_inverse_0() noexcept {
 #define QORI_WORDS \
     "qori::zigzag_8x8_inverse: no such call. zigzag_8x8_inverse(src, dst) of 16s: C1"
 /** Puts coefficients in zig-zag order back into rows. C: qoriZigzagInv8x8. */
-template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>, class F0 =
-    decltype(detail::zigzag_8x8_inverse_0<k>()), bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detail::Out<B*>>,
+    class F0 = decltype(detail::zigzag_8x8_inverse_0<k>()), bool exists = false>
 [[nodiscard]] QorResult zigzag_8x8_inverse(const A* src, B* dst) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_inverse_0<k>()(src, dst);
@@ -4770,8 +4809,8 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
 }
 #undef QORI_WORDS
 
-/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call. C:
- *  qoriDFTGetSize_R_32f. */
+/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call.
+ *  C: qoriDFTGetSize_R_32f. */
 [[nodiscard]] inline QorResult dft_get_size_r_32f(QorImageSize roi_size, QorFftNormFlag norm, QorAccuracyHint hint,
     int32_t* plan_size, int32_t* init_buf_size, int32_t* buf_size) noexcept {
     return qoriDFTGetSize_R_32f(roi_size, norm, hint, plan_size, init_buf_size, buf_size);
@@ -4830,7 +4869,8 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
     return qoriDFTGetBufSize_R_32s(plan, buf_size);
 }
 
-/** Allocates and prepares a transform of complex images; qoriDFTFree_C_32fc releases it. C: qoriDFTInitAlloc_C_32fc. */
+/** Allocates and prepares a transform of complex images; qoriDFTFree_C_32fc releases it. C:
+ *  qoriDFTInitAlloc_C_32fc. */
 [[nodiscard]] inline QorResult dft_init_alloc_c_32fc(QorFft2DPlan** plan, QorImageSize roi_size, QorFftNormFlag norm,
     QorAccuracyHint hint) noexcept {
     return qoriDFTInitAlloc_C_32fc(plan, roi_size, norm, hint);
@@ -4841,27 +4881,28 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
     return qoriDFTFree_C_32fc(plan);
 }
 
-/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C: qoriDFTGetBufSize_C_32fc. */
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C:
+ *  qoriDFTGetBufSize_C_32fc. */
 [[nodiscard]] inline QorResult dft_get_buf_size_c_32fc(const QorFft2DPlan* plan, int32_t* buf_size) noexcept {
     return qoriDFTGetBufSize_C_32fc(plan, buf_size);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto dft_fwd_r_to_pack_0() noexcept {
+template <unsigned k> inline auto dft_fwd_r_to_pack_0() noexcept {
     QORI_AT(0x7171, qoriDFTFwd_RToPack_32f_C1R) else
     QORI_AT(0x7373, qoriDFTFwd_RToPack_32f_C3R) else
     QORI_AT(0x7474, qoriDFTFwd_RToPack_32f_C4R) else
     QORI_AT(0x7575, qoriDFTFwd_RToPack_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_fwd_r_to_pack_1() noexcept {
+template <unsigned k> inline auto dft_fwd_r_to_pack_1() noexcept {
     QORI_AT(0x7171, qoriDFTFwd_RToPack_32f_C1IR) else
     QORI_AT(0x7373, qoriDFTFwd_RToPack_32f_C3IR) else
     QORI_AT(0x7474, qoriDFTFwd_RToPack_32f_C4IR) else
     QORI_AT(0x7575, qoriDFTFwd_RToPack_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_fwd_r_to_pack_2() noexcept {
+template <unsigned k> inline auto dft_fwd_r_to_pack_2() noexcept {
     QORI_AT(0x1161, qoriDFTFwd_RToPack_8u32s_C1RSfs) else
     QORI_AT(0x1363, qoriDFTFwd_RToPack_8u32s_C3RSfs) else
     QORI_AT(0x1464, qoriDFTFwd_RToPack_8u32s_C4RSfs) else
@@ -4873,11 +4914,11 @@ template <unsigned k> constexpr auto dft_fwd_r_to_pack_2() noexcept {
     "qori::dft_fwd_r_to_pack: no such call. dft_fwd_r_to_pack(src, dst, plan, buffer) or " \
     "dft_fwd_r_to_pack(in_place(src), plan, buffer) of 32f: C1 C3 C4 AC4. dft_fwd_r_to_pack(src, dst, plan, " \
     "scale, buffer) of 8u->32s: C1 C3 C4 AC4"
-/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an 8u
- *  image, each channel by itself, packed, in 32s. C: qoriDFTFwd_RToPack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an
+ *  8u image, each channel by itself, packed, in 32s. C: qoriDFTFwd_RToPack. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4888,10 +4929,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_fwd_r_to_pack_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -4900,11 +4941,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult dft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -4924,21 +4965,21 @@ template <bool exists = false> QorResult dft_fwd_r_to_pack(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dft_inv_pack_to_r_0() noexcept {
+template <unsigned k> inline auto dft_inv_pack_to_r_0() noexcept {
     QORI_AT(0x7171, qoriDFTInv_PackToR_32f_C1R) else
     QORI_AT(0x7373, qoriDFTInv_PackToR_32f_C3R) else
     QORI_AT(0x7474, qoriDFTInv_PackToR_32f_C4R) else
     QORI_AT(0x7575, qoriDFTInv_PackToR_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_inv_pack_to_r_1() noexcept {
+template <unsigned k> inline auto dft_inv_pack_to_r_1() noexcept {
     QORI_AT(0x7171, qoriDFTInv_PackToR_32f_C1IR) else
     QORI_AT(0x7373, qoriDFTInv_PackToR_32f_C3IR) else
     QORI_AT(0x7474, qoriDFTInv_PackToR_32f_C4IR) else
     QORI_AT(0x7575, qoriDFTInv_PackToR_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_inv_pack_to_r_2() noexcept {
+template <unsigned k> inline auto dft_inv_pack_to_r_2() noexcept {
     QORI_AT(0x6111, qoriDFTInv_PackToR_32s8u_C1RSfs) else
     QORI_AT(0x6313, qoriDFTInv_PackToR_32s8u_C3RSfs) else
     QORI_AT(0x6414, qoriDFTInv_PackToR_32s8u_C4RSfs) else
@@ -4952,9 +4993,9 @@ template <unsigned k> constexpr auto dft_inv_pack_to_r_2() noexcept {
     "scale, buffer) of 32s->8u: C1 C3 C4 AC4"
 /** The real image of a packed spectrum, each channel by itself. The 8u image of a packed spectrum of 32s, each
  *  channel by itself. C: qoriDFTInv_PackToR. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -4965,10 +5006,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_inv_pack_to_r_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -4977,11 +5018,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult dft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5001,11 +5042,11 @@ template <bool exists = false> QorResult dft_inv_pack_to_r(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dft_fwd_c_to_c_0() noexcept {
+template <unsigned k> inline auto dft_fwd_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriDFTFwd_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_fwd_c_to_c_1() noexcept {
+template <unsigned k> inline auto dft_fwd_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriDFTFwd_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5014,9 +5055,9 @@ template <unsigned k> constexpr auto dft_fwd_c_to_c_1() noexcept {
     "qori::dft_fwd_c_to_c: no such call. dft_fwd_c_to_c(src, dst, plan, buffer) or " \
     "dft_fwd_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The spectrum of a complex image, frequency (u, v) at pixel (u, v). C: qoriDFTFwd_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_fwd_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5027,10 +5068,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_fwd_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_fwd_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5039,20 +5080,20 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dft_inv_c_to_c_0() noexcept {
+template <unsigned k> inline auto dft_inv_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriDFTInv_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dft_inv_c_to_c_1() noexcept {
+template <unsigned k> inline auto dft_inv_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriDFTInv_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5061,9 +5102,9 @@ template <unsigned k> constexpr auto dft_inv_c_to_c_1() noexcept {
     "qori::dft_inv_c_to_c: no such call. dft_inv_c_to_c(src, dst, plan, buffer) or " \
     "dft_inv_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The complex image of a complex spectrum. C: qoriDFTInv_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dft_inv_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5074,10 +5115,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dft_inv_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dft_inv_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5086,16 +5127,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto min_0() noexcept {
+template <unsigned k> inline auto min_0() noexcept {
     QORI_AT(0x1111, qoriMin_8u_C1R) else
     QORI_AT(0x1313, qoriMin_8u_C3R) else
     QORI_AT(0x1414, qoriMin_8u_C4R) else
@@ -5120,7 +5161,7 @@ template <unsigned k> constexpr auto min_0() noexcept {
 /** Smallest element of each channel. C: qoriMin. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::min_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult min(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
+[[nodiscard]] QorResult (min)(const A& src, detail::Result<detail::Arg<F0, 3>, k> min) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::min_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data);
@@ -5129,7 +5170,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult min(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult (min)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
@@ -5138,7 +5179,7 @@ template <bool exists = false> QorResult min(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto max_0() noexcept {
+template <unsigned k> inline auto max_0() noexcept {
     QORI_AT(0x1111, qoriMax_8u_C1R) else
     QORI_AT(0x1313, qoriMax_8u_C3R) else
     QORI_AT(0x1414, qoriMax_8u_C4R) else
@@ -5163,7 +5204,7 @@ template <unsigned k> constexpr auto max_0() noexcept {
 /** Largest element of each channel. C: qoriMax. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::max_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult max(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
+[[nodiscard]] QorResult (max)(const A& src, detail::Result<detail::Arg<F0, 3>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::max_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data);
@@ -5172,7 +5213,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+template <bool exists = false> QorResult (max)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
@@ -5181,7 +5222,7 @@ template <bool exists = false> QorResult max(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto min_max_0() noexcept {
+template <unsigned k> inline auto min_max_0() noexcept {
     QORI_AT(0x1111, qoriMinMax_8u_C1R) else
     QORI_AT(0x1313, qoriMinMax_8u_C3R) else
     QORI_AT(0x1414, qoriMinMax_8u_C4R) else
@@ -5204,8 +5245,8 @@ template <unsigned k> constexpr auto min_max_0() noexcept {
 #define QORI_WORDS \
     "qori::min_max: no such call. min_max(src, min, max) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Smallest and largest element of each channel, in one pass. C: qoriMinMax. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::min_max_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::min_max_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min_max(const A& src, detail::Result<detail::Arg<F0, 3>, k> min,
     detail::Result<detail::Arg<F0, 4>, k> max) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5225,7 +5266,7 @@ template <bool exists = false> QorResult min_max(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto min_index_0() noexcept {
+template <unsigned k> inline auto min_index_0() noexcept {
     QORI_AT(0x1111, qoriMinIndx_8u_C1R) else
     QORI_AT(0x1313, qoriMinIndx_8u_C3R) else
     QORI_AT(0x1414, qoriMinIndx_8u_C4R) else
@@ -5249,8 +5290,8 @@ template <unsigned k> constexpr auto min_index_0() noexcept {
     "qori::min_index: no such call. min_index(src, min, column, row) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Smallest element of each channel and the first pixel, from the top and then from the left, that holds it. C:
  *  qoriMinIndx. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::min_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::min_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult min_index(const A& src, detail::Result<detail::Arg<F0, 3>, k> min,
     detail::Result<detail::Arg<F0, 4>, k> column, detail::Result<detail::Arg<F0, 5>, k> row) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5261,16 +5302,16 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult min_index(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult min_index(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto max_index_0() noexcept {
+template <unsigned k> inline auto max_index_0() noexcept {
     QORI_AT(0x1111, qoriMaxIndx_8u_C1R) else
     QORI_AT(0x1313, qoriMaxIndx_8u_C3R) else
     QORI_AT(0x1414, qoriMaxIndx_8u_C4R) else
@@ -5294,8 +5335,8 @@ template <unsigned k> constexpr auto max_index_0() noexcept {
     "qori::max_index: no such call. max_index(src, max, column, row) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest element of each channel and the first pixel, from the top and then from the left, that holds it. C:
  *  qoriMaxIndx. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::max_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::max_index_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult max_index(const A& src, detail::Result<detail::Arg<F0, 3>, k> max,
     detail::Result<detail::Arg<F0, 4>, k> column, detail::Result<detail::Arg<F0, 5>, k> row) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5306,16 +5347,16 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult max_index(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult max_index(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto block_min_max_0() noexcept {
+template <unsigned k> inline auto block_min_max_0() noexcept {
     QORI_AT(0x1111, qoriBlockMinMax_8u_C1R) else
     QORI_AT(0x3131, qoriBlockMinMax_16u_C1R) else
     QORI_AT(0x4141, qoriBlockMinMax_16s_C1R) else
@@ -5327,9 +5368,9 @@ template <unsigned k> constexpr auto block_min_max_0() noexcept {
     "qori::block_min_max: no such call. block_min_max(src, min, max, block, global_min, global_max) of 8u, 16u," \
     " 16s, 32f: C1"
 /** Smallest and largest element of every block of a grid, and of the whole region. C: qoriBlockMinMax. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B, C>>, class F0 =
-    decltype(detail::block_min_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>>
-    = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B, C>>,
+    class F0 = decltype(detail::block_min_max_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult block_min_max(const A& src, B&& min, C&& max, QorImageSize block,
     detail::Result<detail::Arg<F0, 8>, k> global_min, detail::Result<detail::Arg<F0, 9>, k> global_max) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5344,16 +5385,16 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult block_min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult block_min_max(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto count_in_range_0() noexcept {
+template <unsigned k> inline auto count_in_range_0() noexcept {
     QORI_AT(0x1111, qoriCountInRange_8u_C1R) else
     QORI_AT(0x1313, qoriCountInRange_8u_C3R) else
     QORI_AT(0x1515, qoriCountInRange_8u_AC4R) else
@@ -5366,10 +5407,10 @@ template <unsigned k> constexpr auto count_in_range_0() noexcept {
 #define QORI_WORDS \
     "qori::count_in_range: no such call. count_in_range(src, count, lower, upper) of 8u, 32f: C1 C3 AC4"
 /** Counts the pixels of each channel with lowerBound <= value <= upperBound. C: qoriCountInRange. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::count_in_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult count_in_range(const A& src, detail::Result<detail::Arg<F0, 3>, k> count, const
-    detail::Value<detail::Arg<F0, 4>, k>& lower, const detail::Value<detail::Arg<F0, 5>, k>& upper) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::count_in_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult count_in_range(const A& src, detail::Result<detail::Arg<F0, 3>, k> count,
+    const detail::Value<detail::Arg<F0, 4>, k>& lower, const detail::Value<detail::Arg<F0, 5>, k>& upper) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::count_in_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), count.data, detail::pass(lower),
@@ -5379,24 +5420,24 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult count_in_range(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult count_in_range(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
-/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call. C:
- *  qoriFFTGetSize_R_32f. */
+/** Reports how many bytes the plan of a transform of real images of 32f takes, its initialisation and each call.
+ *  C: qoriFFTGetSize_R_32f. */
 [[nodiscard]] inline QorResult fft_get_size_r_32f(int32_t order_x, int32_t order_y, QorFftNormFlag norm,
     QorAccuracyHint hint, int32_t* plan_size, int32_t* init_buf_size, int32_t* buf_size) noexcept {
     return qoriFFTGetSize_R_32f(order_x, order_y, norm, hint, plan_size, init_buf_size, buf_size);
 }
 
 /** Prepares a transform of real images of 32f. C: qoriFFTInit_R_32f. */
-[[nodiscard]] inline QorResult fft_init_r_32f(int32_t order_x, int32_t order_y, QorFftNormFlag norm, QorAccuracyHint
-    hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
+[[nodiscard]] inline QorResult fft_init_r_32f(int32_t order_x, int32_t order_y, QorFftNormFlag norm,
+    QorAccuracyHint hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
     return qoriFFTInit_R_32f(order_x, order_y, norm, hint, plan, init_buf);
 }
 
@@ -5408,8 +5449,8 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
 }
 
 /** Prepares a transform of complex images. C: qoriFFTInit_C_32fc. */
-[[nodiscard]] inline QorResult fft_init_c_32fc(int32_t order_x, int32_t order_y, QorFftNormFlag norm, QorAccuracyHint
-    hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
+[[nodiscard]] inline QorResult fft_init_c_32fc(int32_t order_x, int32_t order_y, QorFftNormFlag norm,
+    QorAccuracyHint hint, QorFft2DPlan* plan, uint8_t* init_buf) noexcept {
     return qoriFFTInit_C_32fc(order_x, order_y, norm, hint, plan, init_buf);
 }
 
@@ -5447,7 +5488,8 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
     return qoriFFTGetBufSize_R_32s(plan, buf_size);
 }
 
-/** Allocates and prepares a transform of complex images; qoriFFTFree_C_32fc releases it. C: qoriFFTInitAlloc_C_32fc. */
+/** Allocates and prepares a transform of complex images; qoriFFTFree_C_32fc releases it. C:
+ *  qoriFFTInitAlloc_C_32fc. */
 [[nodiscard]] inline QorResult fft_init_alloc_c_32fc(QorFft2DPlan** plan, int32_t order_x, int32_t order_y,
     QorFftNormFlag norm, QorAccuracyHint hint) noexcept {
     return qoriFFTInitAlloc_C_32fc(plan, order_x, order_y, norm, hint);
@@ -5458,27 +5500,28 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
     return qoriFFTFree_C_32fc(plan);
 }
 
-/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C: qoriFFTGetBufSize_C_32fc. */
+/** Reports how many bytes the buffer of a call with this plan takes, at any alignment. C:
+ *  qoriFFTGetBufSize_C_32fc. */
 [[nodiscard]] inline QorResult fft_get_buf_size_c_32fc(const QorFft2DPlan* plan, int32_t* buf_size) noexcept {
     return qoriFFTGetBufSize_C_32fc(plan, buf_size);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto fft_fwd_r_to_pack_0() noexcept {
+template <unsigned k> inline auto fft_fwd_r_to_pack_0() noexcept {
     QORI_AT(0x7171, qoriFFTFwd_RToPack_32f_C1R) else
     QORI_AT(0x7373, qoriFFTFwd_RToPack_32f_C3R) else
     QORI_AT(0x7474, qoriFFTFwd_RToPack_32f_C4R) else
     QORI_AT(0x7575, qoriFFTFwd_RToPack_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_fwd_r_to_pack_1() noexcept {
+template <unsigned k> inline auto fft_fwd_r_to_pack_1() noexcept {
     QORI_AT(0x7171, qoriFFTFwd_RToPack_32f_C1IR) else
     QORI_AT(0x7373, qoriFFTFwd_RToPack_32f_C3IR) else
     QORI_AT(0x7474, qoriFFTFwd_RToPack_32f_C4IR) else
     QORI_AT(0x7575, qoriFFTFwd_RToPack_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_fwd_r_to_pack_2() noexcept {
+template <unsigned k> inline auto fft_fwd_r_to_pack_2() noexcept {
     QORI_AT(0x1161, qoriFFTFwd_RToPack_8u32s_C1RSfs) else
     QORI_AT(0x1363, qoriFFTFwd_RToPack_8u32s_C3RSfs) else
     QORI_AT(0x1464, qoriFFTFwd_RToPack_8u32s_C4RSfs) else
@@ -5490,11 +5533,11 @@ template <unsigned k> constexpr auto fft_fwd_r_to_pack_2() noexcept {
     "qori::fft_fwd_r_to_pack: no such call. fft_fwd_r_to_pack(src, dst, plan, buffer) or " \
     "fft_fwd_r_to_pack(in_place(src), plan, buffer) of 32f: C1 C3 C4 AC4. fft_fwd_r_to_pack(src, dst, plan, " \
     "scale, buffer) of 8u->32s: C1 C3 C4 AC4"
-/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an 8u
- *  image, each channel by itself, packed, in 32s. C: qoriFFTFwd_RToPack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+/** The spectrum of a real image, each channel by itself, in the packed layout (QorFft2DPlan). The spectrum of an
+ *  8u image, each channel by itself, packed, in 32s. C: qoriFFTFwd_RToPack. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_fwd_r_to_pack_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5505,10 +5548,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_fwd_r_to_pack_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_fwd_r_to_pack(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5517,11 +5560,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_fwd_r_to_pack_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult fft_fwd_r_to_pack(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5541,21 +5584,21 @@ template <bool exists = false> QorResult fft_fwd_r_to_pack(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fft_inv_pack_to_r_0() noexcept {
+template <unsigned k> inline auto fft_inv_pack_to_r_0() noexcept {
     QORI_AT(0x7171, qoriFFTInv_PackToR_32f_C1R) else
     QORI_AT(0x7373, qoriFFTInv_PackToR_32f_C3R) else
     QORI_AT(0x7474, qoriFFTInv_PackToR_32f_C4R) else
     QORI_AT(0x7575, qoriFFTInv_PackToR_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_inv_pack_to_r_1() noexcept {
+template <unsigned k> inline auto fft_inv_pack_to_r_1() noexcept {
     QORI_AT(0x7171, qoriFFTInv_PackToR_32f_C1IR) else
     QORI_AT(0x7373, qoriFFTInv_PackToR_32f_C3IR) else
     QORI_AT(0x7474, qoriFFTInv_PackToR_32f_C4IR) else
     QORI_AT(0x7575, qoriFFTInv_PackToR_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_inv_pack_to_r_2() noexcept {
+template <unsigned k> inline auto fft_inv_pack_to_r_2() noexcept {
     QORI_AT(0x6111, qoriFFTInv_PackToR_32s8u_C1RSfs) else
     QORI_AT(0x6313, qoriFFTInv_PackToR_32s8u_C3RSfs) else
     QORI_AT(0x6414, qoriFFTInv_PackToR_32s8u_C4RSfs) else
@@ -5569,9 +5612,9 @@ template <unsigned k> constexpr auto fft_inv_pack_to_r_2() noexcept {
     "scale, buffer) of 32s->8u: C1 C3 C4 AC4"
 /** The real image of a packed spectrum, each channel by itself. The 8u image of a packed spectrum of 32s, each
  *  channel by itself. C: qoriFFTInv_PackToR. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_inv_pack_to_r_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5582,10 +5625,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_inv_pack_to_r_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_inv_pack_to_r(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5594,11 +5637,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_inv_pack_to_r_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult fft_inv_pack_to_r(const A& src, B&& dst, const QorFft2DPlan* plan, int32_t scale,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5618,11 +5661,11 @@ template <bool exists = false> QorResult fft_inv_pack_to_r(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fft_fwd_c_to_c_0() noexcept {
+template <unsigned k> inline auto fft_fwd_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriFFTFwd_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_fwd_c_to_c_1() noexcept {
+template <unsigned k> inline auto fft_fwd_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriFFTFwd_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5631,9 +5674,9 @@ template <unsigned k> constexpr auto fft_fwd_c_to_c_1() noexcept {
     "qori::fft_fwd_c_to_c: no such call. fft_fwd_c_to_c(src, dst, plan, buffer) or " \
     "fft_fwd_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The spectrum of a complex image, frequency (u, v) at pixel (u, v). C: qoriFFTFwd_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_fwd_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_fwd_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5644,10 +5687,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_fwd_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_fwd_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_fwd_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5656,20 +5699,20 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fft_inv_c_to_c_0() noexcept {
+template <unsigned k> inline auto fft_inv_c_to_c_0() noexcept {
     QORI_AT(0xb1b1, qoriFFTInv_CToC_32fc_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fft_inv_c_to_c_1() noexcept {
+template <unsigned k> inline auto fft_inv_c_to_c_1() noexcept {
     QORI_AT(0xb1b1, qoriFFTInv_CToC_32fc_C1IR) else
     return Missing{};
 }
@@ -5678,9 +5721,9 @@ template <unsigned k> constexpr auto fft_inv_c_to_c_1() noexcept {
     "qori::fft_inv_c_to_c: no such call. fft_inv_c_to_c(src, dst, plan, buffer) or " \
     "fft_inv_c_to_c(in_place(src), plan, buffer) of 32fc: C1"
 /** The complex image of a complex spectrum. C: qoriFFTInv_CToC. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::fft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::fft_inv_c_to_c_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult fft_inv_c_to_c(const A& src, B&& dst, const QorFft2DPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -5691,10 +5734,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::fft_inv_c_to_c_1<k>()), bool exists = false>
-[[nodiscard]] QorResult fft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan, uint8_t* buffer) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::fft_inv_c_to_c_1<k>()), bool exists = false>
+[[nodiscard]] QorResult fft_inv_c_to_c(const InPlace<TA, LA>& src, const QorFft2DPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::fft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
@@ -5703,16 +5746,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_linear_0() noexcept {
+template <unsigned k> inline auto filter_linear_0() noexcept {
     QORI_AT(0x61111, qoriFilter_8u_C1R) else
     QORI_AT(0x61313, qoriFilter_8u_C3R) else
     QORI_AT(0x61414, qoriFilter_8u_C4R) else
@@ -5727,7 +5770,7 @@ template <unsigned k> constexpr auto filter_linear_0() noexcept {
     QORI_AT(0x63535, qoriFilter_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_1() noexcept {
+template <unsigned k> inline auto filter_linear_1() noexcept {
     QORI_AT(0x77171, qoriFilter_32f_C1R) else
     QORI_AT(0x77373, qoriFilter_32f_C3R) else
     QORI_AT(0x77474, qoriFilter_32f_C4R) else
@@ -5759,7 +5802,7 @@ template <unsigned k> constexpr auto filter_linear_1() noexcept {
     QORI_AT(0x71444, qoriFilter32f_8u16s_C4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_2() noexcept {
+template <unsigned k> inline auto filter_linear_2() noexcept {
     QORI_AT(0x41111, qoriFilter_Round16s_8u_C1R) else
     QORI_AT(0x41313, qoriFilter_Round16s_8u_C3R) else
     QORI_AT(0x41414, qoriFilter_Round16s_8u_C4R) else
@@ -5774,7 +5817,7 @@ template <unsigned k> constexpr auto filter_linear_2() noexcept {
     QORI_AT(0x63535, qoriFilter_Round32s_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_2_bytes() noexcept {
+template <unsigned k> inline auto filter_linear_2_bytes() noexcept {
     QORI_AT(0x41111, qoriFilterRoundGetBufSize16s_8u_C1R) else
     QORI_AT(0x41313, qoriFilterRoundGetBufSize16s_8u_C3R) else
     QORI_AT(0x41414, qoriFilterRoundGetBufSize16s_8u_C4R) else
@@ -5789,7 +5832,7 @@ template <unsigned k> constexpr auto filter_linear_2_bytes() noexcept {
     QORI_AT(0x63535, qoriFilterRoundGetBufSize32s_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_3() noexcept {
+template <unsigned k> inline auto filter_linear_3() noexcept {
     QORI_AT(0x71111, qoriFilter_Round32f_8u_C1R) else
     QORI_AT(0x71313, qoriFilter_Round32f_8u_C3R) else
     QORI_AT(0x71414, qoriFilter_Round32f_8u_C4R) else
@@ -5804,7 +5847,7 @@ template <unsigned k> constexpr auto filter_linear_3() noexcept {
     QORI_AT(0x73535, qoriFilter_Round32f_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto filter_linear_3_bytes() noexcept {
+template <unsigned k> inline auto filter_linear_3_bytes() noexcept {
     QORI_AT(0x71111, qoriFilterRoundGetBufSize32f_8u_C1R) else
     QORI_AT(0x71313, qoriFilterRoundGetBufSize32f_8u_C3R) else
     QORI_AT(0x71414, qoriFilterRoundGetBufSize32f_8u_C4R) else
@@ -5828,11 +5871,11 @@ template <unsigned k> constexpr auto filter_linear_3_bytes() noexcept {
     "C3 C4 AC4. filter_linear(src, dst, kernel, [rounding], [buffer]) of 8u by 32f, 16s by 32f, 16u by 32f: C1 " \
     "C3 C4 AC4"
 /** Convolves with integers around an anchor: dst = saturate(round(sum / divisor)), ties to even. Convolves with
- *  floats around an anchor; sums are fused multiply-adds in the type of the pixels. Convolves with integers around an
- *  anchor: dst = saturate(round(sum / divisor)) by a rounding mode. Convolves with floats around an anchor: dst =
- *  saturate(round(sum)) by a rounding mode. C: qoriFilter, qoriFilter_Round16s, qoriFilter_Round32f. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_0<k>()), class F1 = decltype(detail::filter_linear_2<k>()),
+ *  floats around an anchor; sums are fused multiply-adds in the type of the pixels. Convolves with integers around
+ *  an anchor: dst = saturate(round(sum / divisor)) by a rounding mode. Convolves with floats around an anchor: dst
+ *  = saturate(round(sum)) by a rounding mode. C: qoriFilter, qoriFilter_Round16s, qoriFilter_Round32f. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_0<k>()), class F1 = decltype(detail::filter_linear_2<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5857,9 +5900,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_1<k>()), class F1 = decltype(detail::filter_linear_0<k>()), class F2 =
-    decltype(detail::filter_linear_3<k>()), class F3 = decltype(detail::filter_linear_2<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_1<k>()), class F1 = decltype(detail::filter_linear_0<k>()),
+    class F2 = decltype(detail::filter_linear_3<k>()), class F3 = decltype(detail::filter_linear_2<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5901,11 +5944,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor, QorRoundingMode
-    rounding, Buffer& buffer) noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor,
+    QorRoundingMode rounding, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5921,11 +5964,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor, QorRoundingMode
-    rounding) noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, int32_t divisor,
+    QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5942,9 +5985,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, QorRoundingMode rounding,
     Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -5962,11 +6005,11 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>, class F0 =
-    decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel, QorRoundingMode rounding)
-    noexcept {
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, detail::Out<B>, C>,
+    class F0 = decltype(detail::filter_linear_3<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_linear(const A& src, B&& dst, const Kernel<C>& kernel,
+    QorRoundingMode rounding) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -5983,16 +6026,16 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_round_get_buf_size16s_0() noexcept {
+template <unsigned k> inline auto filter_round_get_buf_size16s_0() noexcept {
     QORI_AT(0x1111, qoriFilterRoundGetBufSize16s_8u_C1R) else
     QORI_AT(0x1313, qoriFilterRoundGetBufSize16s_8u_C3R) else
     QORI_AT(0x1414, qoriFilterRoundGetBufSize16s_8u_C4R) else
@@ -6005,10 +6048,10 @@ template <unsigned k> constexpr auto filter_round_get_buf_size16s_0() noexcept {
     "buffer_size) of 8u: C1 C3 C4 AC4"
 /** Reports the bytes of work buffer of qoriFilter_Round16s: 16 * kw * kh + 4 * w * channels + 15. C:
  *  qoriFilterRoundGetBufSize16s. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size16s_0<k>()), bool exists = false>
-[[nodiscard]] QorResult filter_round_get_buf_size16s(QorImageSize kernel_size, int32_t roi_width, int32_t*
-    buffer_size) noexcept {
+template <class T, class L, unsigned k = detail::keyOf<T, L>,
+    class F0 = decltype(detail::filter_round_get_buf_size16s_0<k>()), bool exists = false>
+[[nodiscard]] QorResult filter_round_get_buf_size16s(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size16s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6019,7 +6062,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_round_get_buf_size32f_0() noexcept {
+template <unsigned k> inline auto filter_round_get_buf_size32f_0() noexcept {
     QORI_AT(0x1111, qoriFilterRoundGetBufSize32f_8u_C1R) else
     QORI_AT(0x4141, qoriFilterRoundGetBufSize32f_16s_C1R) else
     QORI_AT(0x3131, qoriFilterRoundGetBufSize32f_16u_C1R) else
@@ -6038,12 +6081,12 @@ template <unsigned k> constexpr auto filter_round_get_buf_size32f_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_round_get_buf_size32f: no such call. filter_round_get_buf_size32f(kernel_size, roi_width, " \
     "buffer_size) of 8u, 16s, 16u: C1 C3 C4 AC4"
-/** Reports the bytes of work buffer of qoriFilter_Round32f: 16 * kw * kh + 8 * w * channels + 43, for four channels +
- *  15. C: qoriFilterRoundGetBufSize32f. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size32f_0<k>()), bool exists = false>
-[[nodiscard]] QorResult filter_round_get_buf_size32f(QorImageSize kernel_size, int32_t roi_width, int32_t*
-    buffer_size) noexcept {
+/** Reports the bytes of work buffer of qoriFilter_Round32f: 16 * kw * kh + 8 * w * channels + 43, for four
+ *  channels + 15. C: qoriFilterRoundGetBufSize32f. */
+template <class T, class L, unsigned k = detail::keyOf<T, L>,
+    class F0 = decltype(detail::filter_round_get_buf_size32f_0<k>()), bool exists = false>
+[[nodiscard]] QorResult filter_round_get_buf_size32f(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32f_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6054,7 +6097,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_round_get_buf_size32s_0() noexcept {
+template <unsigned k> inline auto filter_round_get_buf_size32s_0() noexcept {
     QORI_AT(0x4141, qoriFilterRoundGetBufSize32s_16s_C1R) else
     QORI_AT(0x4343, qoriFilterRoundGetBufSize32s_16s_C3R) else
     QORI_AT(0x4444, qoriFilterRoundGetBufSize32s_16s_C4R) else
@@ -6069,12 +6112,12 @@ template <unsigned k> constexpr auto filter_round_get_buf_size32s_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_round_get_buf_size32s: no such call. filter_round_get_buf_size32s(kernel_size, roi_width, " \
     "buffer_size) of 16s, 16u: C1 C3 C4 AC4"
-/** Reports the bytes of work buffer of qoriFilter_Round32s: 16 * kw * kh + 4 * w * channels + 31 for 16s, 16 * kw *
- *  kh + 8 * w * channels + 43 for 16u. C: qoriFilterRoundGetBufSize32s. */
-template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
-    decltype(detail::filter_round_get_buf_size32s_0<k>()), bool exists = false>
-[[nodiscard]] QorResult filter_round_get_buf_size32s(QorImageSize kernel_size, int32_t roi_width, int32_t*
-    buffer_size) noexcept {
+/** Reports the bytes of work buffer of qoriFilter_Round32s: 16 * kw * kh + 4 * w * channels + 31 for 16s, 16 * kw
+ *  * kh + 8 * w * channels + 43 for 16u. C: qoriFilterRoundGetBufSize32s. */
+template <class T, class L, unsigned k = detail::keyOf<T, L>,
+    class F0 = decltype(detail::filter_round_get_buf_size32s_0<k>()), bool exists = false>
+[[nodiscard]] QorResult filter_round_get_buf_size32s(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6085,7 +6128,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_get_buf_size_0() noexcept {
+template <unsigned k> inline auto filter_get_buf_size_0() noexcept {
     QORI_AT(0x8181, qoriFilterGetBufSize_64f_C1R) else
     return Missing{};
 }
@@ -6096,8 +6139,8 @@ template <unsigned k> constexpr auto filter_get_buf_size_0() noexcept {
 /** Reports 0: the 64f filter takes no work buffer. C: qoriFilterGetBufSize. */
 template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltype(detail::filter_get_buf_size_0<k>()),
     bool exists = false>
-[[nodiscard]] QorResult filter_get_buf_size(QorImageSize kernel_size, int32_t roi_width, int32_t* buffer_size)
-    noexcept {
+[[nodiscard]] QorResult filter_get_buf_size(QorImageSize kernel_size, int32_t roi_width,
+    int32_t* buffer_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::filter_get_buf_size_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
@@ -6109,25 +6152,27 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
 
 /** Reports how many bytes the plan of a general filter and the work buffer of its calls take. C:
  *  qoriFilterBorderGetSize. */
-[[nodiscard]] inline QorResult filter_border_get_size(QorImageSize kernel_size, QorImageSize dst_roi_size, int32_t
-    data_type, int32_t kernel_type, int32_t num_channels, int32_t* spec_size, int32_t* buffer_size) noexcept {
-    return qoriFilterBorderGetSize(kernel_size, dst_roi_size, data_type, kernel_type, num_channels, spec_size, buffer_size);
+[[nodiscard]] inline QorResult filter_border_get_size(QorImageSize kernel_size, QorImageSize dst_roi_size,
+    int32_t data_type, int32_t kernel_type, int32_t num_channels, int32_t* spec_size, int32_t* buffer_size) noexcept {
+    return qoriFilterBorderGetSize(kernel_size, dst_roi_size, data_type, kernel_type, num_channels, spec_size,
+        buffer_size);
 }
 
 /** Fills the plan of a filter by integers and a divisor. C: qoriFilterBorderInit_16s. */
-[[nodiscard]] inline QorResult filter_border_init_16s(const int16_t* kernel, QorImageSize kernel_size, int32_t
-    divisor, int32_t data_type, int32_t num_channels, QorRoundingMode rounding, QorLinearFilterPlan* plan) noexcept {
+[[nodiscard]] inline QorResult filter_border_init_16s(const int16_t* kernel, QorImageSize kernel_size,
+    int32_t divisor, int32_t data_type, int32_t num_channels, QorRoundingMode rounding,
+    QorLinearFilterPlan* plan) noexcept {
     return qoriFilterBorderInit_16s(kernel, kernel_size, divisor, data_type, num_channels, rounding, plan);
 }
 
 /** Fills the plan of a filter by floats. C: qoriFilterBorderInit_32f. */
-[[nodiscard]] inline QorResult filter_border_init_32f(const float* kernel, QorImageSize kernel_size, int32_t
-    data_type, int32_t num_channels, QorRoundingMode rounding, QorLinearFilterPlan* plan) noexcept {
+[[nodiscard]] inline QorResult filter_border_init_32f(const float* kernel, QorImageSize kernel_size,
+    int32_t data_type, int32_t num_channels, QorRoundingMode rounding, QorLinearFilterPlan* plan) noexcept {
     return qoriFilterBorderInit_32f(kernel, kernel_size, data_type, num_channels, rounding, plan);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_border_0() noexcept {
+template <unsigned k> inline auto filter_border_0() noexcept {
     QORI_AT(0x1111, qoriFilterBorder_8u_C1R) else
     QORI_AT(0x1313, qoriFilterBorder_8u_C3R) else
     QORI_AT(0x1414, qoriFilterBorder_8u_C4R) else
@@ -6146,13 +6191,13 @@ template <unsigned k> constexpr auto filter_border_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_border: no such call. filter_border(src, dst, border, plan, buffer) of 8u, 16s, 16u, 32f: C1 " \
     "C3 C4"
-/** Convolves with the kernel of a plan: dst(x, y) = sum of K(i, j) * src(x + ax - i, y + ay - j), divided and rounded
- *  as the plan says. C: qoriFilterBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult filter_border(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border, const
-    QorLinearFilterPlan* plan, uint8_t* buffer) noexcept {
+/** Convolves with the kernel of a plan: dst(x, y) = sum of K(i, j) * src(x + ax - i, y + ay - j), divided and
+ *  rounded as the plan says. C: qoriFilterBorder. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult filter_border(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border,
+    const QorLinearFilterPlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6164,16 +6209,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_border(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_border(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_min_0() noexcept {
+template <unsigned k> inline auto filter_min_0() noexcept {
     QORI_AT(0x1111, qoriFilterMin_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMin_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMin_8u_C4R) else
@@ -6196,9 +6241,9 @@ template <unsigned k> constexpr auto filter_min_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_min: no such call. filter_min(src, dst, size) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The smallest element of a rectangle around each pixel, channel by channel. C: qoriFilterMin. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_min_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_min_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_min(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6211,16 +6256,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_min(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_min(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_max_0() noexcept {
+template <unsigned k> inline auto filter_max_0() noexcept {
     QORI_AT(0x1111, qoriFilterMax_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMax_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMax_8u_C4R) else
@@ -6243,9 +6288,9 @@ template <unsigned k> constexpr auto filter_max_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_max: no such call. filter_max(src, dst, size) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The largest element of a rectangle around each pixel, channel by channel. C: qoriFilterMax. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_max_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_max(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6258,16 +6303,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_max(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_max(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_gauss_0() noexcept {
+template <unsigned k> inline auto filter_gauss_0() noexcept {
     QORI_AT(0x1111, qoriFilterGauss_8u_C1R) else
     QORI_AT(0x1313, qoriFilterGauss_8u_C3R) else
     QORI_AT(0x1414, qoriFilterGauss_8u_C4R) else
@@ -6290,9 +6335,9 @@ template <unsigned k> constexpr auto filter_gauss_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_gauss: no such call. filter_gauss(src, dst, mask) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
 /** The mean of 3 x 3 or 5 x 5 pixels with Gaussian weights, channel by channel. C: qoriFilterGauss. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_gauss(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6304,16 +6349,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto histogram_range_0() noexcept {
+template <unsigned k> inline auto histogram_range_0() noexcept {
     QORI_AT(0x1111, qoriHistogramRange_8u_C1R) else
     QORI_AT(0x1313, qoriHistogramRange_8u_C3R) else
     QORI_AT(0x1414, qoriHistogramRange_8u_C4R) else
@@ -6338,10 +6383,10 @@ template <unsigned k> constexpr auto histogram_range_0() noexcept {
     " C3 C4 AC4"
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1]. C:
  *  qoriHistogramRange. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult histogram_range(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels, const
-    detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult histogram_range(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels,
+    const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
@@ -6360,7 +6405,7 @@ template <bool exists = false> QorResult histogram_range(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto histogram_even_0() noexcept {
+template <unsigned k> inline auto histogram_even_0() noexcept {
     QORI_AT(0x1111, qoriHistogramEven_8u_C1R) else
     QORI_AT(0x1313, qoriHistogramEven_8u_C3R) else
     QORI_AT(0x1414, qoriHistogramEven_8u_C4R) else
@@ -6381,11 +6426,11 @@ template <unsigned k> constexpr auto histogram_even_0() noexcept {
     "16s: C1 C3 C4 AC4"
 /** Counts the pixels between levels spaced evenly from lowerLevel to upperLevel, and returns the levels. C:
  *  qoriHistogramEven. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult histogram_even(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels, const
-    detail::Value<detail::Arg<F0, 5>, k>& n_levels, const detail::Value<detail::Arg<F0, 6>, k>& lower, const
-    detail::Value<detail::Arg<F0, 7>, k>& upper) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult histogram_even(const A& src, detail::Arg<F0, 3> hist, detail::Arg<F0, 4> levels,
+    const detail::Value<detail::Arg<F0, 5>, k>& n_levels, const detail::Value<detail::Arg<F0, 6>, k>& lower,
+    const detail::Value<detail::Arg<F0, 7>, k>& upper) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_even_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
@@ -6395,17 +6440,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 /** Sizes of the record and of the scratch buffer of the prepared histograms. C: qoriHistogramGetBufferSize. */
-[[nodiscard]] inline QorResult histogram_get_buffer_size(int32_t data_type, QorImageSize roi_size, const int32_t*
-    n_levels, int32_t num_channels, int32_t uniform, int32_t* spec_size, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult histogram_get_buffer_size(int32_t data_type, QorImageSize roi_size,
+    const int32_t* n_levels, int32_t num_channels, int32_t uniform, int32_t* spec_size,
+    int32_t* buffer_size) noexcept {
     return qoriHistogramGetBufferSize(data_type, roi_size, n_levels, num_channels, uniform, spec_size, buffer_size);
 }
 
@@ -6416,8 +6462,8 @@ template <bool exists = false> QorResult histogram_even(detail::Anything = {}, d
 }
 
 /** Prepares a histogram with levels spaced uniformly from pLowerLevel to pUpperLevel. C: qoriHistogramUniformInit. */
-[[nodiscard]] inline QorResult histogram_uniform_init(int32_t data_type, const float* lower, const float* upper, const
-    int32_t* n_levels, int32_t num_channels, QorHistogramSpec* plan) noexcept {
+[[nodiscard]] inline QorResult histogram_uniform_init(int32_t data_type, const float* lower, const float* upper,
+    const int32_t* n_levels, int32_t num_channels, QorHistogramSpec* plan) noexcept {
     return qoriHistogramUniformInit(data_type, lower, upper, n_levels, num_channels, plan);
 }
 
@@ -6427,7 +6473,7 @@ template <bool exists = false> QorResult histogram_even(detail::Anything = {}, d
 }
 
 namespace detail {
-template <unsigned k> constexpr auto histogram_0() noexcept {
+template <unsigned k> inline auto histogram_0() noexcept {
     QORI_AT(0x1111, qoriHistogram_8u_C1R) else
     QORI_AT(0x1313, qoriHistogram_8u_C3R) else
     QORI_AT(0x1414, qoriHistogram_8u_C4R) else
@@ -6446,10 +6492,10 @@ template <unsigned k> constexpr auto histogram_0() noexcept {
 #define QORI_WORDS \
     "qori::histogram: no such call. histogram(src, hist, plan, buffer) of 8u, 16u, 16s, 32f: C1 C3 C4"
 /** Counts the pixels between the levels of a prepared histogram. C: qoriHistogram. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::histogram_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult histogram(const A& src, detail::Arg<F0, 3> hist, const QorHistogramSpec* plan, uint8_t*
-    buffer) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult histogram(const A& src, detail::Arg<F0, 3> hist, const QorHistogramSpec* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::histogram_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, plan, buffer);
@@ -6458,15 +6504,16 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult histogram(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult histogram(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
-/** Reports how many bytes the plan of a descriptor takes, at any alignment: 16 blockSize^2 + 72. C: qoriHOGGetSize. */
+/** Reports how many bytes the plan of a descriptor takes, at any alignment: 16 blockSize^2 + 72. C:
+ *  qoriHOGGetSize. */
 [[nodiscard]] inline QorResult hog_get_size(const QorHogConfig* config, int32_t* plan_size) noexcept {
     return qoriHOGGetSize(config, plan_size);
 }
@@ -6483,13 +6530,13 @@ template <bool exists = false> QorResult histogram(detail::Anything = {}, detail
 
 /** Reports how many bytes the buffer takes, at any alignment: 12 for each pixel of the region. C:
  *  qoriHOGGetBufferSize. */
-[[nodiscard]] inline QorResult hog_get_buffer_size(const QorHogPlan* plan, QorImageSize roi_size, int32_t*
-    buffer_size) noexcept {
+[[nodiscard]] inline QorResult hog_get_buffer_size(const QorHogPlan* plan, QorImageSize roi_size,
+    int32_t* buffer_size) noexcept {
     return qoriHOGGetBufferSize(plan, roi_size, buffer_size);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto hog_0() noexcept {
+template <unsigned k> inline auto hog_0() noexcept {
     QORI_AT(0x1111, qoriHOG_8u32f_C1R) else
     QORI_AT(0x3131, qoriHOG_16u32f_C1R) else
     QORI_AT(0x4141, qoriHOG_16s32f_C1R) else
@@ -6507,8 +6554,8 @@ template <unsigned k> constexpr auto hog_0() noexcept {
 /** Descriptors of windows by the orientations of their gradients (Dalal and Triggs 2005). C: qoriHOG. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::hog_0<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult hog(const A& src, const QorPoint2D* locations, int32_t n_locations, float* dst, const
-    QorHogPlan* plan, const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t* buffer) noexcept {
+[[nodiscard]] QorResult hog(const A& src, const QorPoint2D* locations, int32_t n_locations, float* dst,
+    const QorHogPlan* plan, const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::hog_0<k>()(srcV.data(), srcV.step(), srcV.size(), locations, n_locations, dst, plan,
@@ -6527,12 +6574,12 @@ template <bool exists = false> QorResult hog(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lbp_3x3_0() noexcept {
+template <unsigned k> inline auto lbp_3x3_0() noexcept {
     QORI_AT(0x1111, qoriLBPImage3x3_8u_C1R) else
     QORI_AT(0x7111, qoriLBPImage3x3_32f8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lbp_3x3_1() noexcept {
+template <unsigned k> inline auto lbp_3x3_1() noexcept {
     QORI_AT(0x1111, qoriLBPImageMode3x3_8u_C1R) else
     QORI_AT(0x7111, qoriLBPImageMode3x3_32f8u_C1R) else
     return Missing{};
@@ -6542,12 +6589,13 @@ template <unsigned k> constexpr auto lbp_3x3_1() noexcept {
     "qori::lbp_3x3: no such call. lbp_3x3(src, dst, [border]) or lbp_3x3(src, dst, [border], [mode]) of 8u, " \
     "32f->8u: C1"
 /** Local binary patterns of the eight neighbours: a bit is set where the neighbour is at least the pixel. Local
- *  binary patterns of the eight neighbours, whose order the caller chooses. C: qoriLBPImage3x3, qoriLBPImageMode3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Either<detail::Arg<F0, 6>,
-    detail::Arg<F1, 7>>, k>& border) noexcept {
+ *  binary patterns of the eight neighbours, whose order the caller chooses. C: qoriLBPImage3x3,
+ *  qoriLBPImageMode3x3. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst,
+    const detail::Edge<detail::Either<detail::Arg<F0, 6>, detail::Arg<F1, 7>>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6565,9 +6613,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_3x3_0<k>()), class F1 = decltype(detail::lbp_3x3_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6588,10 +6636,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border, uint8_t
-    mode) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_3x3_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lbp_3x3(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border,
+    uint8_t mode) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6612,14 +6661,14 @@ template <bool exists = false> QorResult lbp_3x3(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lbp_5x5_0() noexcept {
+template <unsigned k> inline auto lbp_5x5_0() noexcept {
     QORI_AT(0x1111, qoriLBPImage5x5_8u_C1R) else
     QORI_AT(0x1131, qoriLBPImage5x5_8u16u_C1R) else
     QORI_AT(0x7111, qoriLBPImage5x5_32f8u_C1R) else
     QORI_AT(0x7131, qoriLBPImage5x5_32f16u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lbp_5x5_1() noexcept {
+template <unsigned k> inline auto lbp_5x5_1() noexcept {
     QORI_AT(0x1111, qoriLBPImageMode5x5_8u_C1R) else
     QORI_AT(0x1131, qoriLBPImageMode5x5_8u16u_C1R) else
     QORI_AT(0x7111, qoriLBPImageMode5x5_32f8u_C1R) else
@@ -6630,14 +6679,14 @@ template <unsigned k> constexpr auto lbp_5x5_1() noexcept {
 #define QORI_WORDS \
     "qori::lbp_5x5: no such call. lbp_5x5(src, dst, [border]) or lbp_5x5(src, dst, [border], [mode]) of 8u, " \
     "8u->16u, 32f->8u, 32f->16u: C1"
-/** Local binary patterns of neighbours two pixels away: a bit is set where the neighbour is at least the pixel. Local
- *  binary patterns of neighbours two pixels away, whose order the caller chooses. C: qoriLBPImage5x5,
+/** Local binary patterns of neighbours two pixels away: a bit is set where the neighbour is at least the pixel.
+ *  Local binary patterns of neighbours two pixels away, whose order the caller chooses. C: qoriLBPImage5x5,
  *  qoriLBPImageMode5x5. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Either<detail::Arg<F0, 6>,
-    detail::Arg<F1, 7>>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst,
+    const detail::Edge<detail::Either<detail::Arg<F0, 6>, detail::Arg<F1, 7>>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6655,9 +6704,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_5x5_0<k>()), class F1 = decltype(detail::lbp_5x5_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6678,10 +6727,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border, uint8_t
-    mode) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_5x5_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lbp_5x5(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 7>, k>& border,
+    uint8_t mode) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6702,7 +6752,7 @@ template <bool exists = false> QorResult lbp_5x5(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lbp_horizontal_0() noexcept {
+template <unsigned k> inline auto lbp_horizontal_0() noexcept {
     QORI_AT(0x1111, qoriLBPImageHorizCorr_8u_C1R) else
     QORI_AT(0x3111, qoriLBPImageHorizCorr_16u_C1R) else
     return Missing{};
@@ -6710,13 +6760,13 @@ template <unsigned k> constexpr auto lbp_horizontal_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::lbp_horizontal: no such call. lbp_horizontal(src, dst, [border]) of 8u, 16u->8u: C1"
-/** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three rows. C:
- *  qoriLBPImageHorizCorr. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst, const detail::Edge<detail::Arg<F0, 6>, k>& border)
-    noexcept {
+/** Local binary patterns of the eight neighbours, the horizontal ones corrected: compared as sums of three rows.
+ *  C: qoriLBPImageHorizCorr. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst,
+    const detail::Edge<detail::Arg<F0, 6>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6728,9 +6778,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lbp_horizontal_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult lbp_horizontal(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -6744,16 +6794,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_0() noexcept {
+template <unsigned k> inline auto lut_0() noexcept {
     QORI_AT(0x1111, qoriLUT_8u_C1R) else
     QORI_AT(0x3131, qoriLUT_16u_C1R) else
     QORI_AT(0x4141, qoriLUT_16s_C1R) else
@@ -6772,7 +6822,7 @@ template <unsigned k> constexpr auto lut_0() noexcept {
     QORI_AT(0x7575, qoriLUT_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_1() noexcept {
+template <unsigned k> inline auto lut_1() noexcept {
     QORI_AT(0x1111, qoriLUT_8u_C1IR) else
     QORI_AT(0x3131, qoriLUT_16u_C1IR) else
     QORI_AT(0x4141, qoriLUT_16s_C1IR) else
@@ -6796,10 +6846,11 @@ template <unsigned k> constexpr auto lut_1() noexcept {
     "qori::lut: no such call. lut(src, dst, values, levels, n_levels) or lut(in_place(src), values, levels, " \
     "n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to constants: dst = pValues[k] where pLevels[k] <= src < pLevels[k + 1], else src. C: qoriLUT. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lut(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
-    detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels,
+    const detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6811,10 +6862,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_1<k>()), bool exists = false>
-[[nodiscard]] QorResult lut(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels, const
-    detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_1<k>()), bool exists = false>
+[[nodiscard]] QorResult lut(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
+    const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::lut_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels, detail::pass(n_levels));
@@ -6832,7 +6883,7 @@ template <bool exists = false> QorResult lut(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_linear_0() noexcept {
+template <unsigned k> inline auto lut_linear_0() noexcept {
     QORI_AT(0x1111, qoriLUT_Linear_8u_C1R) else
     QORI_AT(0x3131, qoriLUT_Linear_16u_C1R) else
     QORI_AT(0x4141, qoriLUT_Linear_16s_C1R) else
@@ -6851,7 +6902,7 @@ template <unsigned k> constexpr auto lut_linear_0() noexcept {
     QORI_AT(0x7575, qoriLUT_Linear_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_linear_1() noexcept {
+template <unsigned k> inline auto lut_linear_1() noexcept {
     QORI_AT(0x1111, qoriLUT_Linear_8u_C1IR) else
     QORI_AT(0x3131, qoriLUT_Linear_16u_C1IR) else
     QORI_AT(0x4141, qoriLUT_Linear_16s_C1IR) else
@@ -6876,11 +6927,11 @@ template <unsigned k> constexpr auto lut_linear_1() noexcept {
     "lut_linear(in_place(src), values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to straight lines from pValues[k] at pLevels[k] to pValues[k + 1] at pLevels[k + 1]; else dst =
  *  src. C: qoriLUT_Linear. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lut_linear(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
-    detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_linear(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels,
+    const detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6892,8 +6943,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_linear_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_linear_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut_linear(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
     const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6905,16 +6956,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_cubic_0() noexcept {
+template <unsigned k> inline auto lut_cubic_0() noexcept {
     QORI_AT(0x1111, qoriLUT_Cubic_8u_C1R) else
     QORI_AT(0x3131, qoriLUT_Cubic_16u_C1R) else
     QORI_AT(0x4141, qoriLUT_Cubic_16s_C1R) else
@@ -6933,7 +6984,7 @@ template <unsigned k> constexpr auto lut_cubic_0() noexcept {
     QORI_AT(0x7575, qoriLUT_Cubic_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_cubic_1() noexcept {
+template <unsigned k> inline auto lut_cubic_1() noexcept {
     QORI_AT(0x1111, qoriLUT_Cubic_8u_C1IR) else
     QORI_AT(0x3131, qoriLUT_Cubic_16u_C1IR) else
     QORI_AT(0x4141, qoriLUT_Cubic_16s_C1IR) else
@@ -6957,10 +7008,11 @@ template <unsigned k> constexpr auto lut_cubic_1() noexcept {
     "qori::lut_cubic: no such call. lut_cubic(src, dst, values, levels, n_levels) or lut_cubic(in_place(src), " \
     "values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to cubics through the nodes (pLevels, pValues) around them; else dst = src. C: qoriLUT_Cubic. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult lut_cubic(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels, const
-    detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_cubic(const A& src, B&& dst, detail::Arg<F0, 5> values, detail::Arg<F0, 6> levels,
+    const detail::Value<detail::Arg<F0, 7>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -6972,8 +7024,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::lut_cubic_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_cubic_1<k>()), bool exists = false>
 [[nodiscard]] QorResult lut_cubic(const InPlace<TA, LA>& src, detail::Arg<F0, 3> values, detail::Arg<F0, 4> levels,
     const detail::Value<detail::Arg<F0, 5>, k>& n_levels) noexcept {
     if constexpr (detail::found<F0>) {
@@ -6985,16 +7037,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_0() noexcept {
+template <unsigned k> inline auto filter_median_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedian_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedian_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMedian_8u_C4R) else
@@ -7018,9 +7070,9 @@ template <unsigned k> constexpr auto filter_median_0() noexcept {
     "qori::filter_median: no such call. filter_median(src, dst, size) of 8u, 16u, 16s: C1 C3 C4 AC4; 32f: C1 C3" \
     " C4; 64f: C1"
 /** The median of a rectangle around an anchor, channel by channel. C: qoriFilterMedian. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median(const A& src, B&& dst, Window size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7033,9 +7085,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult filter_median(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult filter_median(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
@@ -7043,20 +7095,20 @@ template <bool exists = false> QorResult filter_median(detail::Anything = {}, de
 
 /** Reports maskSize.width * maskSize.height * 4 bytes, which no function takes: qoriFilterMedian_32f allocates. C:
  *  qoriFilterMedianGetBufferSize_32f. */
-[[nodiscard]] inline QorResult filter_median_get_buffer_size_32f(QorImageSize roi_size, QorImageSize size, int32_t
-    num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_median_get_buffer_size_32f(QorImageSize roi_size, QorImageSize size,
+    int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterMedianGetBufferSize_32f(roi_size, size, num_channels, buffer_size);
 }
 
 /** Reports maskSize.width * maskSize.height * 8 bytes, which no function takes: qoriFilterMedian_64f allocates. C:
  *  qoriFilterMedianGetBufferSize_64f. */
-[[nodiscard]] inline QorResult filter_median_get_buffer_size_64f(QorImageSize roi_size, QorImageSize size, int32_t
-    num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_median_get_buffer_size_64f(QorImageSize roi_size, QorImageSize size,
+    int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterMedianGetBufferSize_64f(roi_size, size, num_channels, buffer_size);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_horiz_0() noexcept {
+template <unsigned k> inline auto filter_median_horiz_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianHoriz_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedianHoriz_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMedianHoriz_8u_C4R) else
@@ -7075,9 +7127,9 @@ template <unsigned k> constexpr auto filter_median_horiz_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_median_horiz: no such call. filter_median_horiz(src, dst, mask) of 8u, 16s, 16u: C1 C3 C4 AC4"
 /** The median of 3 or 5 pixels of a row (mask3x1, mask5x1), channel by channel. C: qoriFilterMedianHoriz. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_horiz_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_horiz_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_horiz(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7099,7 +7151,7 @@ template <bool exists = false> QorResult filter_median_horiz(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_vert_0() noexcept {
+template <unsigned k> inline auto filter_median_vert_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianVert_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedianVert_8u_C3R) else
     QORI_AT(0x1414, qoriFilterMedianVert_8u_C4R) else
@@ -7118,9 +7170,9 @@ template <unsigned k> constexpr auto filter_median_vert_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_median_vert: no such call. filter_median_vert(src, dst, mask) of 8u, 16s, 16u: C1 C3 C4 AC4"
 /** The median of 3 or 5 pixels of a column (mask1x3, mask1x5), channel by channel. C: qoriFilterMedianVert. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_vert_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_vert_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_vert(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7142,7 +7194,7 @@ template <bool exists = false> QorResult filter_median_vert(detail::Anything = {
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_cross_0() noexcept {
+template <unsigned k> inline auto filter_median_cross_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianCross_8u_C1R) else
     QORI_AT(0x1313, qoriFilterMedianCross_8u_C3R) else
     QORI_AT(0x1515, qoriFilterMedianCross_8u_AC4R) else
@@ -7157,11 +7209,11 @@ template <unsigned k> constexpr auto filter_median_cross_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::filter_median_cross: no such call. filter_median_cross(src, dst, mask) of 8u, 16s, 16u: C1 C3 AC4"
-/** The median of a pixel and those up to one or two away in its row and its column (mask3x3: 5 pixels, mask5x5: 9).
- *  C: qoriFilterMedianCross. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_cross_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+/** The median of a pixel and those up to one or two away in its row and its column (mask3x3: 5 pixels, mask5x5:
+ *  9). C: qoriFilterMedianCross. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_cross_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_cross(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7183,7 +7235,7 @@ template <bool exists = false> QorResult filter_median_cross(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_color_0() noexcept {
+template <unsigned k> inline auto filter_median_color_0() noexcept {
     QORI_AT(0x1313, qoriFilterMedianColor_8u_C3R) else
     QORI_AT(0x1515, qoriFilterMedianColor_8u_AC4R) else
     QORI_AT(0x4343, qoriFilterMedianColor_16s_C3R) else
@@ -7195,11 +7247,11 @@ template <unsigned k> constexpr auto filter_median_color_0() noexcept {
 }   // namespace detail
 #define QORI_WORDS \
     "qori::filter_median_color: no such call. filter_median_color(src, dst, mask) of 8u, 16s, 32f: C3 AC4"
-/** The colour median of a square: of its 9 or 25 pixels, the one with the smallest sum of distances to the others. C:
- *  qoriFilterMedianColor. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_color_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+/** The colour median of a square: of its 9 or 25 pixels, the one with the smallest sum of distances to the others.
+ *  C: qoriFilterMedianColor. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_color_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult filter_median_color(const A& src, B&& dst, QorFixedMaskSize mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7221,7 +7273,7 @@ template <bool exists = false> QorResult filter_median_color(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_weighted_0() noexcept {
+template <unsigned k> inline auto filter_median_weighted_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianWeightedCenter3x3_8u_C1R) else
     return Missing{};
 }
@@ -7229,9 +7281,9 @@ template <unsigned k> constexpr auto filter_median_weighted_0() noexcept {
 #define QORI_WORDS \
     "qori::filter_median_weighted: no such call. filter_median_weighted(src, dst, weight) of 8u: C1"
 /** The median of 3 x 3 pixels of which the middle one counts `weight` times. C: qoriFilterMedianWeightedCenter3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_weighted_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_weighted_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_median_weighted(const A& src, B&& dst, int32_t weight) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7253,13 +7305,13 @@ template <bool exists = false> QorResult filter_median_weighted(detail::Anything
 #undef QORI_WORDS
 
 /** Reports how many bytes of work buffer a median with a border takes. C: qoriFilterMedianBorderGetBufferSize. */
-[[nodiscard]] inline QorResult filter_median_border_get_buffer_size(QorImageSize roi_size, QorImageSize size, int32_t
-    data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
+[[nodiscard]] inline QorResult filter_median_border_get_buffer_size(QorImageSize roi_size, QorImageSize size,
+    int32_t data_type, int32_t num_channels, int32_t* buffer_size) noexcept {
     return qoriFilterMedianBorderGetBufferSize(roi_size, size, data_type, num_channels, buffer_size);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto filter_median_border_0() noexcept {
+template <unsigned k> inline auto filter_median_border_0() noexcept {
     QORI_AT(0x1111, qoriFilterMedianBorder_8u_C1R) else
     QORI_AT(0x3131, qoriFilterMedianBorder_16u_C1R) else
     QORI_AT(0x4141, qoriFilterMedianBorder_16s_C1R) else
@@ -7271,18 +7323,18 @@ template <unsigned k> constexpr auto filter_median_border_0() noexcept {
     "qori::filter_median_border: no such call. filter_median_border(src, dst, size, [border], [buffer]) of 8u, " \
     "16u, 16s, 32f: C1"
 /** The median of a rectangle centred on each pixel, of odd sides, with a border. C: qoriFilterMedianBorder. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size, const
-    detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_border_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterMedianBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -7291,11 +7343,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size, const
-    detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_border_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -7303,7 +7355,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterMedianBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -7312,9 +7364,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::filter_median_border_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::filter_median_border_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult filter_median_border(const A& src, B&& dst, QorImageSize size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7324,7 +7376,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriFilterMedianBorderGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
@@ -7342,7 +7394,7 @@ template <bool exists = false> QorResult filter_median_border(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto mirror_0() noexcept {
+template <unsigned k> inline auto mirror_0() noexcept {
     QORI_AT(0x1111, qoriMirror_8u_C1R) else
     QORI_AT(0x1313, qoriMirror_8u_C3R) else
     QORI_AT(0x1414, qoriMirror_8u_C4R) else
@@ -7365,7 +7417,7 @@ template <unsigned k> constexpr auto mirror_0() noexcept {
     QORI_AT(0x7575, qoriMirror_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto mirror_1() noexcept {
+template <unsigned k> inline auto mirror_1() noexcept {
     QORI_AT(0x1111, qoriMirror_8u_C1IR) else
     QORI_AT(0x1313, qoriMirror_8u_C3IR) else
     QORI_AT(0x1414, qoriMirror_8u_C4IR) else
@@ -7394,8 +7446,9 @@ template <unsigned k> constexpr auto mirror_1() noexcept {
     "32f: C1 C3 C4 AC4"
 /** Reflects an image about its horizontal or vertical axis, both, or a diagonal. Reflects an image about its
  *  horizontal or vertical axis, or both, in place. C: qoriMirror. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::mirror_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::mirror_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult mirror(const A& src, B&& dst, QorFlipAxis axis) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7408,8 +7461,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::mirror_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::mirror_1<k>()), bool exists = false>
 [[nodiscard]] QorResult mirror(const InPlace<TA, LA>& src, QorFlipAxis axis) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7428,7 +7481,7 @@ template <bool exists = false> QorResult mirror(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto erode_3x3_0() noexcept {
+template <unsigned k> inline auto erode_3x3_0() noexcept {
     QORI_AT(0x1111, qoriErode3x3_8u_C1R) else
     QORI_AT(0x1313, qoriErode3x3_8u_C3R) else
     QORI_AT(0x1414, qoriErode3x3_8u_C4R) else
@@ -7444,7 +7497,7 @@ template <unsigned k> constexpr auto erode_3x3_0() noexcept {
     QORI_AT(0x8181, qoriErode3x3_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto erode_3x3_1() noexcept {
+template <unsigned k> inline auto erode_3x3_1() noexcept {
     QORI_AT(0x1111, qoriErode3x3_8u_C1IR) else
     QORI_AT(0x1313, qoriErode3x3_8u_C3IR) else
     QORI_AT(0x1414, qoriErode3x3_8u_C4IR) else
@@ -7463,10 +7516,11 @@ template <unsigned k> constexpr auto erode_3x3_1() noexcept {
 #define QORI_WORDS \
     "qori::erode_3x3: no such call. erode_3x3(src, dst) of 8u, 16u, 32f: C1 C3 C4 AC4; 64f: C1. " \
     "erode_3x3(in_place(src)) of 8u, 16u, 32f: C1 C3 C4 AC4"
-/** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel. Erosion by
- *  the 3 x 3 square in place. C: qoriErode3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::erode_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Erosion by the 3 x 3 square: the smallest of each pixel and its eight neighbours, channel by channel. Erosion
+ *  by the 3 x 3 square in place. C: qoriErode3x3. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::erode_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult erode_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7478,8 +7532,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::erode_3x3_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::erode_3x3_1<k>()), bool exists = false>
 [[nodiscard]] QorResult erode_3x3(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7489,16 +7543,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dilate_3x3_0() noexcept {
+template <unsigned k> inline auto dilate_3x3_0() noexcept {
     QORI_AT(0x1111, qoriDilate3x3_8u_C1R) else
     QORI_AT(0x1313, qoriDilate3x3_8u_C3R) else
     QORI_AT(0x1414, qoriDilate3x3_8u_C4R) else
@@ -7514,7 +7568,7 @@ template <unsigned k> constexpr auto dilate_3x3_0() noexcept {
     QORI_AT(0x8181, qoriDilate3x3_64f_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dilate_3x3_1() noexcept {
+template <unsigned k> inline auto dilate_3x3_1() noexcept {
     QORI_AT(0x1111, qoriDilate3x3_8u_C1IR) else
     QORI_AT(0x1313, qoriDilate3x3_8u_C3IR) else
     QORI_AT(0x1414, qoriDilate3x3_8u_C4IR) else
@@ -7533,11 +7587,11 @@ template <unsigned k> constexpr auto dilate_3x3_1() noexcept {
 #define QORI_WORDS \
     "qori::dilate_3x3: no such call. dilate_3x3(src, dst) of 8u, 16u, 32f: C1 C3 C4 AC4; 64f: C1. " \
     "dilate_3x3(in_place(src)) of 8u, 16u, 32f: C1 C3 C4 AC4"
-/** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel. Dilation by
- *  the 3 x 3 square in place. C: qoriDilate3x3. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dilate_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+/** Dilation by the 3 x 3 square: the largest of each pixel and its eight neighbours, channel by channel. Dilation
+ *  by the 3 x 3 square in place. C: qoriDilate3x3. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dilate_3x3_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dilate_3x3(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7549,8 +7603,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dilate_3x3_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dilate_3x3_1<k>()), bool exists = false>
 [[nodiscard]] QorResult dilate_3x3(const InPlace<TA, LA>& src) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7560,16 +7614,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto erode_0() noexcept {
+template <unsigned k> inline auto erode_0() noexcept {
     QORI_AT(0x1111, qoriErode_8u_C1R) else
     QORI_AT(0x1313, qoriErode_8u_C3R) else
     QORI_AT(0x1414, qoriErode_8u_C4R) else
@@ -7584,7 +7638,7 @@ template <unsigned k> constexpr auto erode_0() noexcept {
     QORI_AT(0x7575, qoriErode_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto erode_1() noexcept {
+template <unsigned k> inline auto erode_1() noexcept {
     QORI_AT(0x1111, qoriErode_8u_C1IR) else
     QORI_AT(0x1313, qoriErode_8u_C3IR) else
     QORI_AT(0x1515, qoriErode_8u_AC4IR) else
@@ -7600,10 +7654,11 @@ template <unsigned k> constexpr auto erode_1() noexcept {
 #define QORI_WORDS \
     "qori::erode: no such call. erode(src, dst, structure) of 8u, 16u, 32f: C1 C3 C4 AC4. erode(in_place(src), " \
     "structure) of 8u, 16u, 32f: C1 C3 AC4"
-/** Erosion by a mask of bytes: the smallest of the pixels under its non-zero bytes, channel by channel. Erosion by a
- *  mask of bytes in place. C: qoriErode. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::erode_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Erosion by a mask of bytes: the smallest of the pixels under its non-zero bytes, channel by channel. Erosion by
+ *  a mask of bytes in place. C: qoriErode. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::erode_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult erode(const A& src, B&& dst, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7616,8 +7671,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::erode_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::erode_1<k>()), bool exists = false>
 [[nodiscard]] QorResult erode(const InPlace<TA, LA>& src, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7637,7 +7692,7 @@ template <bool exists = false> QorResult erode(detail::Anything = {}, detail::An
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dilate_0() noexcept {
+template <unsigned k> inline auto dilate_0() noexcept {
     QORI_AT(0x1111, qoriDilate_8u_C1R) else
     QORI_AT(0x1313, qoriDilate_8u_C3R) else
     QORI_AT(0x1414, qoriDilate_8u_C4R) else
@@ -7652,7 +7707,7 @@ template <unsigned k> constexpr auto dilate_0() noexcept {
     QORI_AT(0x7575, qoriDilate_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dilate_1() noexcept {
+template <unsigned k> inline auto dilate_1() noexcept {
     QORI_AT(0x1111, qoriDilate_8u_C1IR) else
     QORI_AT(0x1313, qoriDilate_8u_C3IR) else
     QORI_AT(0x1515, qoriDilate_8u_AC4IR) else
@@ -7668,10 +7723,11 @@ template <unsigned k> constexpr auto dilate_1() noexcept {
 #define QORI_WORDS \
     "qori::dilate: no such call. dilate(src, dst, structure) of 8u, 16u, 32f: C1 C3 C4 AC4. " \
     "dilate(in_place(src), structure) of 8u, 16u, 32f: C1 C3 AC4"
-/** Dilation by a mask of bytes: the largest of the pixels under its non-zero bytes, channel by channel. Dilation by a
- *  mask of bytes in place. C: qoriDilate. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::dilate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Dilation by a mask of bytes: the largest of the pixels under its non-zero bytes, channel by channel. Dilation
+ *  by a mask of bytes in place. C: qoriDilate. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::dilate_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult dilate(const A& src, B&& dst, const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7684,10 +7740,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::dilate_1<k>()), bool exists = false>
-[[nodiscard]] QorResult dilate(const InPlace<TA, LA>& src, const detail::Weights<const uint8_t*>& structure) noexcept
-    {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::dilate_1<k>()), bool exists = false>
+[[nodiscard]] QorResult dilate(const InPlace<TA, LA>& src,
+    const detail::Weights<const uint8_t*>& structure) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::dilate_1<k>()(srcV.data(), srcV.step(), srcV.size(), structure.data(), structure.size(),
@@ -7706,7 +7762,7 @@ template <bool exists = false> QorResult dilate(detail::Anything = {}, detail::A
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sum_0() noexcept {
+template <unsigned k> inline auto sum_0() noexcept {
     QORI_AT(0x1111, qoriSum_8u_C1R) else
     QORI_AT(0x1313, qoriSum_8u_C3R) else
     QORI_AT(0x1414, qoriSum_8u_C4R) else
@@ -7721,7 +7777,7 @@ template <unsigned k> constexpr auto sum_0() noexcept {
     QORI_AT(0x4545, qoriSum_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto sum_1() noexcept {
+template <unsigned k> inline auto sum_1() noexcept {
     QORI_AT(0x7171, qoriSum_32f_C1R) else
     QORI_AT(0x7373, qoriSum_32f_C3R) else
     QORI_AT(0x7474, qoriSum_32f_C4R) else
@@ -7735,8 +7791,8 @@ template <unsigned k> constexpr auto sum_1() noexcept {
 /** Adds the elements of each channel. C: qoriSum. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::sum_0<k>()),
     class F1 = decltype(detail::sum_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult sum(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k>
-    sum) noexcept {
+[[nodiscard]] QorResult sum(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> sum) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::sum_0<k>()(srcV.data(), srcV.step(), srcV.size(), sum.data);
@@ -7768,7 +7824,7 @@ template <bool exists = false> QorResult sum(detail::Anything = {}, detail::Anyt
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto mean_0() noexcept {
+template <unsigned k> inline auto mean_0() noexcept {
     QORI_AT(0x1111, qoriMean_8u_C1R) else
     QORI_AT(0x1313, qoriMean_8u_C3R) else
     QORI_AT(0x1414, qoriMean_8u_C4R) else
@@ -7783,7 +7839,7 @@ template <unsigned k> constexpr auto mean_0() noexcept {
     QORI_AT(0x4545, qoriMean_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto mean_1() noexcept {
+template <unsigned k> inline auto mean_1() noexcept {
     QORI_AT(0x7171, qoriMean_32f_C1R) else
     QORI_AT(0x7373, qoriMean_32f_C3R) else
     QORI_AT(0x7474, qoriMean_32f_C4R) else
@@ -7797,8 +7853,8 @@ template <unsigned k> constexpr auto mean_1() noexcept {
 /** Averages the elements of each channel: their sum over width * height. C: qoriMean. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::mean_0<k>()),
     class F1 = decltype(detail::mean_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k>
-    mean) noexcept {
+[[nodiscard]] QorResult mean(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> mean) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::mean_0<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data);
@@ -7812,8 +7868,8 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
 }
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 = decltype(detail::mean_1<k>()),
     detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Arg<F0, 3>, k> mean, QorAccuracyHint hint) noexcept
-    {
+[[nodiscard]] QorResult mean(const A& src, detail::Result<detail::Arg<F0, 3>, k> mean,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::mean_1<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data, hint);
@@ -7831,7 +7887,7 @@ template <bool exists = false> QorResult mean(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_inf_0() noexcept {
+template <unsigned k> inline auto norm_inf_0() noexcept {
     QORI_AT(0x1111, qoriNorm_Inf_8u_C1R) else
     QORI_AT(0x1313, qoriNorm_Inf_8u_C3R) else
     QORI_AT(0x1414, qoriNorm_Inf_8u_C4R) else
@@ -7855,8 +7911,8 @@ template <unsigned k> constexpr auto norm_inf_0() noexcept {
 #define QORI_WORDS \
     "qori::norm_inf: no such call. norm_inf(src, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4; 32s: C1"
 /** Largest magnitude of each channel: max |src|. C: qoriNorm_Inf. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_inf_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_inf_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult norm_inf(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -7875,7 +7931,7 @@ template <bool exists = false> QorResult norm_inf(detail::Anything = {}, detail:
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_l1_0() noexcept {
+template <unsigned k> inline auto norm_l1_0() noexcept {
     QORI_AT(0x1111, qoriNorm_L1_8u_C1R) else
     QORI_AT(0x1313, qoriNorm_L1_8u_C3R) else
     QORI_AT(0x1414, qoriNorm_L1_8u_C4R) else
@@ -7890,7 +7946,7 @@ template <unsigned k> constexpr auto norm_l1_0() noexcept {
     QORI_AT(0x4545, qoriNorm_L1_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_l1_1() noexcept {
+template <unsigned k> inline auto norm_l1_1() noexcept {
     QORI_AT(0x7171, qoriNorm_L1_32f_C1R) else
     QORI_AT(0x7373, qoriNorm_L1_32f_C3R) else
     QORI_AT(0x7474, qoriNorm_L1_32f_C4R) else
@@ -7902,11 +7958,11 @@ template <unsigned k> constexpr auto norm_l1_1() noexcept {
     "qori::norm_l1: no such call. norm_l1(src, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_l1(src, norm, [hint]) " \
     "of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of each channel: sum |src|. C: qoriNorm_L1. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l1_0<k>()), class F1 = decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0,
-    bool exists = false>
-[[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>,
-    k> norm) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l1_0<k>()), class F1 = decltype(detail::norm_l1_1<k>()),
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l1(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l1_0<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data);
@@ -7918,10 +7974,10 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm, QorAccuracyHint hint)
-    noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l1_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l1(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l1_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
@@ -7939,7 +7995,7 @@ template <bool exists = false> QorResult norm_l1(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_l2_0() noexcept {
+template <unsigned k> inline auto norm_l2_0() noexcept {
     QORI_AT(0x1111, qoriNorm_L2_8u_C1R) else
     QORI_AT(0x1313, qoriNorm_L2_8u_C3R) else
     QORI_AT(0x1414, qoriNorm_L2_8u_C4R) else
@@ -7954,7 +8010,7 @@ template <unsigned k> constexpr auto norm_l2_0() noexcept {
     QORI_AT(0x4545, qoriNorm_L2_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_l2_1() noexcept {
+template <unsigned k> inline auto norm_l2_1() noexcept {
     QORI_AT(0x7171, qoriNorm_L2_32f_C1R) else
     QORI_AT(0x7373, qoriNorm_L2_32f_C3R) else
     QORI_AT(0x7474, qoriNorm_L2_32f_C4R) else
@@ -7966,11 +8022,11 @@ template <unsigned k> constexpr auto norm_l2_1() noexcept {
     "qori::norm_l2: no such call. norm_l2(src, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_l2(src, norm, [hint]) " \
     "of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of each channel: the square root of sum src^2. C: qoriNorm_L2. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l2_0<k>()), class F1 = decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0,
-    bool exists = false>
-[[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>,
-    k> norm) noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l2_0<k>()), class F1 = decltype(detail::norm_l2_1<k>()),
+    detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l2(const A& src,
+    detail::Result<detail::Either<detail::Arg<F0, 3>, detail::Arg<F1, 3>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l2_0<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data);
@@ -7982,10 +8038,10 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm, QorAccuracyHint hint)
-    noexcept {
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::norm_l2_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+[[nodiscard]] QorResult norm_l2(const A& src, detail::Result<detail::Arg<F0, 3>, k> norm,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::norm_l2_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
@@ -8003,7 +8059,7 @@ template <bool exists = false> QorResult norm_l2(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_diff_inf_0() noexcept {
+template <unsigned k> inline auto norm_diff_inf_0() noexcept {
     QORI_AT(0x1111, qoriNormDiff_Inf_8u_C1R) else
     QORI_AT(0x1313, qoriNormDiff_Inf_8u_C3R) else
     QORI_AT(0x1414, qoriNormDiff_Inf_8u_C4R) else
@@ -8026,9 +8082,9 @@ template <unsigned k> constexpr auto norm_diff_inf_0() noexcept {
 #define QORI_WORDS \
     "qori::norm_diff_inf: no such call. norm_diff_inf(a, b, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest magnitude of the difference in each channel: max |src1 - src2|. C: qoriNormDiff_Inf. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_diff_inf(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -8040,16 +8096,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_diff_l1_0() noexcept {
+template <unsigned k> inline auto norm_diff_l1_0() noexcept {
     QORI_AT(0x1111, qoriNormDiff_L1_8u_C1R) else
     QORI_AT(0x1313, qoriNormDiff_L1_8u_C3R) else
     QORI_AT(0x1414, qoriNormDiff_L1_8u_C4R) else
@@ -8064,7 +8120,7 @@ template <unsigned k> constexpr auto norm_diff_l1_0() noexcept {
     QORI_AT(0x4545, qoriNormDiff_L1_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_diff_l1_1() noexcept {
+template <unsigned k> inline auto norm_diff_l1_1() noexcept {
     QORI_AT(0x7171, qoriNormDiff_L1_32f_C1R) else
     QORI_AT(0x7373, qoriNormDiff_L1_32f_C3R) else
     QORI_AT(0x7474, qoriNormDiff_L1_32f_C4R) else
@@ -8076,11 +8132,11 @@ template <unsigned k> constexpr auto norm_diff_l1_1() noexcept {
     "qori::norm_diff_l1: no such call. norm_diff_l1(a, b, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_diff_l1(a, " \
     "b, norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of the difference in each channel: sum |src1 - src2|. C: qoriNormDiff_L1. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l1_0<k>()), class F1 = decltype(detail::norm_diff_l1_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l1_0<k>()), class F1 = decltype(detail::norm_diff_l1_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8097,9 +8153,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_diff_l1(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8112,16 +8168,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_diff_l2_0() noexcept {
+template <unsigned k> inline auto norm_diff_l2_0() noexcept {
     QORI_AT(0x1111, qoriNormDiff_L2_8u_C1R) else
     QORI_AT(0x1313, qoriNormDiff_L2_8u_C3R) else
     QORI_AT(0x1414, qoriNormDiff_L2_8u_C4R) else
@@ -8136,7 +8192,7 @@ template <unsigned k> constexpr auto norm_diff_l2_0() noexcept {
     QORI_AT(0x4545, qoriNormDiff_L2_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_diff_l2_1() noexcept {
+template <unsigned k> inline auto norm_diff_l2_1() noexcept {
     QORI_AT(0x7171, qoriNormDiff_L2_32f_C1R) else
     QORI_AT(0x7373, qoriNormDiff_L2_32f_C3R) else
     QORI_AT(0x7474, qoriNormDiff_L2_32f_C4R) else
@@ -8148,11 +8204,11 @@ template <unsigned k> constexpr auto norm_diff_l2_1() noexcept {
     "qori::norm_diff_l2: no such call. norm_diff_l2(a, b, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_diff_l2(a, " \
     "b, norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of the difference in each channel: the square root of sum (src1 - src2)^2. C: qoriNormDiff_L2. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l2_0<k>()), class F1 = decltype(detail::norm_diff_l2_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l2_0<k>()), class F1 = decltype(detail::norm_diff_l2_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8169,9 +8225,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_diff_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_diff_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_diff_l2(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8184,16 +8240,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_rel_inf_0() noexcept {
+template <unsigned k> inline auto norm_rel_inf_0() noexcept {
     QORI_AT(0x1111, qoriNormRel_Inf_8u_C1R) else
     QORI_AT(0x1313, qoriNormRel_Inf_8u_C3R) else
     QORI_AT(0x1414, qoriNormRel_Inf_8u_C4R) else
@@ -8216,9 +8272,9 @@ template <unsigned k> constexpr auto norm_rel_inf_0() noexcept {
 #define QORI_WORDS \
     "qori::norm_rel_inf: no such call. norm_rel_inf(a, b, norm) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Largest magnitude of the difference over that of src2, per channel. C: qoriNormRel_Inf. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_inf_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_rel_inf(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -8230,16 +8286,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_rel_l1_0() noexcept {
+template <unsigned k> inline auto norm_rel_l1_0() noexcept {
     QORI_AT(0x1111, qoriNormRel_L1_8u_C1R) else
     QORI_AT(0x1313, qoriNormRel_L1_8u_C3R) else
     QORI_AT(0x1414, qoriNormRel_L1_8u_C4R) else
@@ -8254,7 +8310,7 @@ template <unsigned k> constexpr auto norm_rel_l1_0() noexcept {
     QORI_AT(0x4545, qoriNormRel_L1_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_rel_l1_1() noexcept {
+template <unsigned k> inline auto norm_rel_l1_1() noexcept {
     QORI_AT(0x7171, qoriNormRel_L1_32f_C1R) else
     QORI_AT(0x7373, qoriNormRel_L1_32f_C3R) else
     QORI_AT(0x7474, qoriNormRel_L1_32f_C4R) else
@@ -8266,11 +8322,11 @@ template <unsigned k> constexpr auto norm_rel_l1_1() noexcept {
     "qori::norm_rel_l1: no such call. norm_rel_l1(a, b, norm) of 8u, 16u, 16s: C1 C3 C4 AC4. norm_rel_l1(a, b, " \
     "norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Sum of magnitudes of the difference over that of src2, per channel. C: qoriNormRel_L1. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l1_0<k>()), class F1 = decltype(detail::norm_rel_l1_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l1_0<k>()), class F1 = decltype(detail::norm_rel_l1_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8286,9 +8342,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l1_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_rel_l1(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8301,16 +8357,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto norm_rel_l2_0() noexcept {
+template <unsigned k> inline auto norm_rel_l2_0() noexcept {
     QORI_AT(0x1111, qoriNormRel_L2_8u_C1R) else
     QORI_AT(0x1313, qoriNormRel_L2_8u_C3R) else
     QORI_AT(0x1414, qoriNormRel_L2_8u_C4R) else
@@ -8325,7 +8381,7 @@ template <unsigned k> constexpr auto norm_rel_l2_0() noexcept {
     QORI_AT(0x4545, qoriNormRel_L2_16s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto norm_rel_l2_1() noexcept {
+template <unsigned k> inline auto norm_rel_l2_1() noexcept {
     QORI_AT(0x7171, qoriNormRel_L2_32f_C1R) else
     QORI_AT(0x7373, qoriNormRel_L2_32f_C3R) else
     QORI_AT(0x7474, qoriNormRel_L2_32f_C4R) else
@@ -8338,11 +8394,11 @@ template <unsigned k> constexpr auto norm_rel_l2_1() noexcept {
     "norm, [hint]) of 32f: C1 C3 C4 AC4"
 /** Euclidean norm of the difference over that of src2, per channel: the square root of the quotient of squares. C:
  *  qoriNormRel_L2. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l2_0<k>()), class F1 = decltype(detail::norm_rel_l2_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l2_0<k>()), class F1 = decltype(detail::norm_rel_l2_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>,
-    detail::Arg<F1, 5>>, k> norm) noexcept {
+[[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> norm) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8358,9 +8414,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::norm_rel_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::norm_rel_l2_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult norm_rel_l2(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> norm,
     QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8373,16 +8429,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto dot_0() noexcept {
+template <unsigned k> inline auto dot_0() noexcept {
     QORI_AT(0x1111, qoriDotProd_8u64f_C1R) else
     QORI_AT(0x1313, qoriDotProd_8u64f_C3R) else
     QORI_AT(0x1414, qoriDotProd_8u64f_C4R) else
@@ -8409,7 +8465,7 @@ template <unsigned k> constexpr auto dot_0() noexcept {
     QORI_AT(0x6565, qoriDotProd_32s64f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto dot_1() noexcept {
+template <unsigned k> inline auto dot_1() noexcept {
     QORI_AT(0x7171, qoriDotProd_32f64f_C1R) else
     QORI_AT(0x7373, qoriDotProd_32f64f_C3R) else
     QORI_AT(0x7474, qoriDotProd_32f64f_C4R) else
@@ -8421,11 +8477,11 @@ template <unsigned k> constexpr auto dot_1() noexcept {
     "qori::dot: no such call. dot(a, b, dot) of 8u, 8s, 16u, 16s, 32u, 32s: C1 C3 C4 AC4. dot(a, b, dot, " \
     "[hint]) of 32f: C1 C3 C4 AC4"
 /** Dot product of two images, per channel: sum src1 * src2. C: qoriDotProd. */
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::dot_0<k>()), class F1 = decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1,
-    5>>, k> dot) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::dot_0<k>()), class F1 = decltype(detail::dot_1<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult dot(const A& a, const B& b,
+    detail::Result<detail::Either<detail::Arg<F0, 5>, detail::Arg<F1, 5>>, k> dot) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8441,10 +8497,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>, class F0 =
-    decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> dot, QorAccuracyHint hint)
-    noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::Out<>>,
+    class F0 = decltype(detail::dot_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult dot(const A& a, const B& b, detail::Result<detail::Arg<F0, 5>, k> dot,
+    QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
         const auto& bV = detail::view(b);
@@ -8465,8 +8522,8 @@ template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anyt
 
 /** Weighted sum of vectors: pDst[j] = sum over i of pWeights[i] * ppSrcRows[i][j]. C: qoriDotProdCol_32f_L2,
  *  qoriDotProdCol_64f_L2. */
-[[nodiscard]] inline QorResult sum_weighted_rows(const float* const* src, const float* weights, int32_t n_rows, float*
-    dst, int32_t len) noexcept {
+[[nodiscard]] inline QorResult sum_weighted_rows(const float* const* src, const float* weights, int32_t n_rows,
+    float* dst, int32_t len) noexcept {
     return qoriDotProdCol_32f_L2(src, weights, n_rows, dst, len);
 }
 [[nodiscard]] inline QorResult sum_weighted_rows(const double* const* src, const double* weights, int32_t n_rows,
@@ -8475,7 +8532,7 @@ template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anyt
 }
 
 namespace detail {
-template <unsigned k> constexpr auto otsu_threshold_0() noexcept {
+template <unsigned k> inline auto otsu_threshold_0() noexcept {
     QORI_AT(0x1111, qoriComputeThreshold_Otsu_8u_C1R) else
     return Missing{};
 }
@@ -8484,8 +8541,8 @@ template <unsigned k> constexpr auto otsu_threshold_0() noexcept {
     "qori::otsu_threshold: no such call. otsu_threshold(src, threshold) of 8u: C1"
 /** The threshold by Otsu's method: the level that sets the elements up to it and those above it furthest apart. C:
  *  qoriComputeThreshold_Otsu. */
-template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class F0 =
-    decltype(detail::otsu_threshold_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::otsu_threshold_0<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult otsu_threshold(const A& src, detail::Result<detail::Arg<F0, 3>, k> threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -8495,16 +8552,16 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_palette_0() noexcept {
+template <unsigned k> inline auto lut_palette_0() noexcept {
     QORI_AT(0x1111, qoriLUTPalette_8u_C1R) else
     QORI_AT(0x3131, qoriLUTPalette_16u_C1R) else
     QORI_AT(0x1151, qoriLUTPalette_8u32u_C1R) else
@@ -8520,7 +8577,7 @@ template <unsigned k> constexpr auto lut_palette_0() noexcept {
     QORI_AT(0x3535, qoriLUTPalette_16u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto lut_palette_1() noexcept {
+template <unsigned k> inline auto lut_palette_1() noexcept {
     QORI_AT(0x1314, qoriLUTPalette_8u_C3A0C4R) else
     QORI_AT(0x3334, qoriLUTPalette_16u_C3A0C4R) else
     return Missing{};
@@ -8532,9 +8589,9 @@ template <unsigned k> constexpr auto lut_palette_1() noexcept {
     "of 8u, 16u: C3->C4"
 /** Looks elements up in a palette: dst = pTable[src AND (2^nBitSize - 1)]. Looks three channels up in palettes of
  *  their own and puts alpha before them. C: qoriLUTPalette. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_palette_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult lut_palette(const A& src, B&& dst, detail::Arg<F0, 5> table, int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -8547,11 +8604,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lut_palette(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table, int32_t
-    n_bit_size) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_palette_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_palette(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table,
+    int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8563,16 +8620,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult lut_palette(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult lut_palette(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto lut_palette_swap_0() noexcept {
+template <unsigned k> inline auto lut_palette_swap_0() noexcept {
     QORI_AT(0x1314, qoriLUTPaletteSwap_8u_C3A0C4R) else
     QORI_AT(0x3334, qoriLUTPaletteSwap_16u_C3A0C4R) else
     return Missing{};
@@ -8582,11 +8639,11 @@ template <unsigned k> constexpr auto lut_palette_swap_0() noexcept {
     "qori::lut_palette_swap: no such call. lut_palette_swap(src, dst, alpha, table, n_bit_size) of 8u, 16u: " \
     "C3->C4"
 /** Looks three channels up in palettes of their own, reverses them and puts alpha behind. C: qoriLUTPaletteSwap. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::lut_palette_swap_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult lut_palette_swap(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table, int32_t
-    n_bit_size) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_palette_swap_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult lut_palette_swap(const A& src, B&& dst, int32_t alpha, detail::Arg<F0, 6> table,
+    int32_t n_bit_size) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8607,7 +8664,7 @@ template <bool exists = false> QorResult lut_palette_swap(detail::Anything = {},
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_size_0() noexcept {
+template <unsigned k> inline auto resize_get_size_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetSize_8u) else
     QORI_AT(0x3131, qoriResizeGetSize_16u) else
     QORI_AT(0x4141, qoriResizeGetSize_16s) else
@@ -8620,10 +8677,10 @@ template <unsigned k> constexpr auto resize_get_size_0() noexcept {
     "qori::resize_get_size: no such call. resize_get_size(src_size, dst_size, interpolation, antialias, " \
     "plan_size, init_buf_size) of 8u, 16u, 16s, 32f, 64f: C1"
 /** Reports how many bytes a plan and the buffer for its initialisation take. C: qoriResizeGetSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_size_0<k>()), bool exists =
-    false>
-[[nodiscard]] QorResult resize_get_size(QorImageSize src_size, QorImageSize dst_size, QorInterpolationKind
-    interpolation, int32_t antialias, int32_t* plan_size, int32_t* init_buf_size) noexcept {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_size_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_get_size(QorImageSize src_size, QorImageSize dst_size,
+    QorInterpolationKind interpolation, int32_t antialias, int32_t* plan_size, int32_t* init_buf_size) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_size_0<k>()(src_size, dst_size, interpolation, antialias, plan_size, init_buf_size);
     } else {
@@ -8634,7 +8691,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_buffer_size_0() noexcept {
+template <unsigned k> inline auto resize_get_buffer_size_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetBufferSize_8u) else
     QORI_AT(0x3131, qoriResizeGetBufferSize_16u) else
     QORI_AT(0x4141, qoriResizeGetBufferSize_16s) else
@@ -8648,8 +8705,8 @@ template <unsigned k> constexpr auto resize_get_buffer_size_0() noexcept {
     " of 8u, 16u, 16s, 32f, 64f: C1"
 /** Reports how many bytes of work buffer a tile takes; each thread needs a buffer of its own. C:
  *  qoriResizeGetBufferSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_buffer_size_0<k>()), bool
-    exists = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_buffer_size_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_get_buffer_size(const QorResizePlan* plan, QorImageSize dst_size, int32_t num_channels,
     int32_t* buf_size) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8662,7 +8719,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_border_size_0() noexcept {
+template <unsigned k> inline auto resize_get_border_size_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetBorderSize_8u) else
     QORI_AT(0x3131, qoriResizeGetBorderSize_16u) else
     QORI_AT(0x4141, qoriResizeGetBorderSize_16s) else
@@ -8676,8 +8733,8 @@ template <unsigned k> constexpr auto resize_get_border_size_0() noexcept {
     "64f: C1"
 /** Reports how many pixels around the source the filter of a plan may reach; zeros for nearest and super. C:
  *  qoriResizeGetBorderSize. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_border_size_0<k>()), bool
-    exists = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_border_size_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_get_border_size(const QorResizePlan* plan, QorBorderExtent* border) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_border_size_0<k>()(plan, border);
@@ -8689,7 +8746,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_src_offset_0() noexcept {
+template <unsigned k> inline auto resize_get_src_offset_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetSrcOffset_8u) else
     QORI_AT(0x3131, qoriResizeGetSrcOffset_16u) else
     QORI_AT(0x4141, qoriResizeGetSrcOffset_16s) else
@@ -8703,10 +8760,10 @@ template <unsigned k> constexpr auto resize_get_src_offset_0() noexcept {
     " 16s, 32f, 64f: C1"
 /** Reports the source pixel at which pSrc must point for a tile: floor(dstOffset * source length / destination
  *  length). C: qoriResizeGetSrcOffset. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_offset_0<k>()), bool
-    exists = false>
-[[nodiscard]] QorResult resize_get_src_offset(const QorResizePlan* plan, QorPoint2D dst_offset, QorPoint2D*
-    src_offset) noexcept {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_offset_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_get_src_offset(const QorResizePlan* plan, QorPoint2D dst_offset,
+    QorPoint2D* src_offset) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_get_src_offset_0<k>()(plan, dst_offset, src_offset);
     } else {
@@ -8717,7 +8774,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_get_src_roi_0() noexcept {
+template <unsigned k> inline auto resize_get_src_roi_0() noexcept {
     QORI_AT(0x1111, qoriResizeGetSrcRoi_8u) else
     QORI_AT(0x3131, qoriResizeGetSrcRoi_16u) else
     QORI_AT(0x4141, qoriResizeGetSrcRoi_16s) else
@@ -8731,8 +8788,8 @@ template <unsigned k> constexpr auto resize_get_src_roi_0() noexcept {
     "16s, 32f, 64f: C1"
 /** Reports the smallest source rectangle that holds every pixel that a destination rectangle is made of. C:
  *  qoriResizeGetSrcRoi. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_roi_0<k>()), bool exists
-    = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_get_src_roi_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_get_src_roi(const QorResizePlan* plan, QorImageRect rect, QorImageRect* src_rect,
     QorImageRect* dst_rect) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8745,7 +8802,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_nearest_init_0() noexcept {
+template <unsigned k> inline auto resize_nearest_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeNearestInit_8u) else
     QORI_AT(0x3131, qoriResizeNearestInit_16u) else
     QORI_AT(0x4141, qoriResizeNearestInit_16s) else
@@ -8756,12 +8813,12 @@ template <unsigned k> constexpr auto resize_nearest_init_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_nearest_init: no such call. resize_nearest_init(src_size, dst_size, plan) of 8u, 16u, 16s, " \
     "32f: C1"
-/** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination - 1e-10).
- *  C: qoriResizeNearestInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_nearest_init_0<k>()), bool exists
-    = false>
-[[nodiscard]] QorResult resize_nearest_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan)
-    noexcept {
+/** Fills the plan of a nearest-neighbour resize: the source index is trunc((i + 0.5) * source / destination -
+ *  1e-10). C: qoriResizeNearestInit. */
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_nearest_init_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_nearest_init(QorImageSize src_size, QorImageSize dst_size,
+    QorResizePlan* plan) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_nearest_init_0<k>()(src_size, dst_size, plan);
     } else {
@@ -8772,7 +8829,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_linear_init_0() noexcept {
+template <unsigned k> inline auto resize_linear_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeLinearInit_8u) else
     QORI_AT(0x3131, qoriResizeLinearInit_16u) else
     QORI_AT(0x4141, qoriResizeLinearInit_16s) else
@@ -8786,10 +8843,10 @@ template <unsigned k> constexpr auto resize_linear_init_0() noexcept {
     " 64f: C1"
 /** Fills the plan of a linear resize. The 8u plan holds 14-bit weights and serves 8u only; the others are one. C:
  *  qoriResizeLinearInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_linear_init_0<k>()), bool exists
-    = false>
-[[nodiscard]] QorResult resize_linear_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan) noexcept
-    {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_linear_init_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_linear_init(QorImageSize src_size, QorImageSize dst_size,
+    QorResizePlan* plan) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_linear_init_0<k>()(src_size, dst_size, plan);
     } else {
@@ -8800,7 +8857,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_cubic_init_0() noexcept {
+template <unsigned k> inline auto resize_cubic_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeCubicInit_8u) else
     QORI_AT(0x3131, qoriResizeCubicInit_16u) else
     QORI_AT(0x4141, qoriResizeCubicInit_16s) else
@@ -8811,10 +8868,10 @@ template <unsigned k> constexpr auto resize_cubic_init_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_cubic_init: no such call. resize_cubic_init(src_size, dst_size, b, c, plan, init_buf) of 8u, " \
     "16u, 16s, 32f: C1"
-/** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline. C:
- *  qoriResizeCubicInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_cubic_init_0<k>()), bool exists =
-    false>
+/** Fills the plan of a cubic resize from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline.
+ *  C: qoriResizeCubicInit. */
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_cubic_init_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_cubic_init(QorImageSize src_size, QorImageSize dst_size, float b, float c,
     QorResizePlan* plan, uint8_t* init_buf) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8827,7 +8884,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_lanczos_init_0() noexcept {
+template <unsigned k> inline auto resize_lanczos_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeLanczosInit_8u) else
     QORI_AT(0x3131, qoriResizeLanczosInit_16u) else
     QORI_AT(0x4141, qoriResizeLanczosInit_16s) else
@@ -8840,8 +8897,8 @@ template <unsigned k> constexpr auto resize_lanczos_init_0() noexcept {
     " 8u, 16u, 16s, 32f: C1"
 /** Fills the plan of a Lanczos resize with 2 or 3 lobes; the weights of each position sum to 1. C:
  *  qoriResizeLanczosInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_lanczos_init_0<k>()), bool exists
-    = false>
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_lanczos_init_0<k>()),
+    bool exists = false>
 [[nodiscard]] QorResult resize_lanczos_init(QorImageSize src_size, QorImageSize dst_size, uint32_t lobes,
     QorResizePlan* plan, uint8_t* init_buf) noexcept {
     if constexpr (detail::found<F0>) {
@@ -8854,7 +8911,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_super_init_0() noexcept {
+template <unsigned k> inline auto resize_super_init_0() noexcept {
     QORI_AT(0x1111, qoriResizeSuperInit_8u) else
     QORI_AT(0x3131, qoriResizeSuperInit_16u) else
     QORI_AT(0x4141, qoriResizeSuperInit_16s) else
@@ -8867,10 +8924,10 @@ template <unsigned k> constexpr auto resize_super_init_0() noexcept {
     "C1"
 /** Fills the plan of a super-sampling reduction: each pixel is the mean of the source area that it covers. C:
  *  qoriResizeSuperInit. */
-template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_super_init_0<k>()), bool exists =
-    false>
-[[nodiscard]] QorResult resize_super_init(QorImageSize src_size, QorImageSize dst_size, QorResizePlan* plan) noexcept
-    {
+template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::resize_super_init_0<k>()),
+    bool exists = false>
+[[nodiscard]] QorResult resize_super_init(QorImageSize src_size, QorImageSize dst_size,
+    QorResizePlan* plan) noexcept {
     if constexpr (detail::found<F0>) {
         return detail::resize_super_init_0<k>()(src_size, dst_size, plan);
     } else {
@@ -8896,13 +8953,13 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
 
 /** Fills the plan of a Lanczos resize whose filter widens with the reduction; serves 8u, 16u, 16s and 32f. C:
  *  qoriResizeAntialiasingLanczosInit. */
-[[nodiscard]] inline QorResult resize_antialiasing_lanczos_init(QorImageSize src_size, QorImageSize dst_size, uint32_t
-    lobes, QorResizePlan* plan, uint8_t* init_buf) noexcept {
+[[nodiscard]] inline QorResult resize_antialiasing_lanczos_init(QorImageSize src_size, QorImageSize dst_size,
+    uint32_t lobes, QorResizePlan* plan, uint8_t* init_buf) noexcept {
     return qoriResizeAntialiasingLanczosInit(src_size, dst_size, lobes, plan, init_buf);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto resize_nearest_0() noexcept {
+template <unsigned k> inline auto resize_nearest_0() noexcept {
     QORI_AT(0x1111, qoriResizeNearest_8u_C1R) else
     QORI_AT(0x1313, qoriResizeNearest_8u_C3R) else
     QORI_AT(0x1414, qoriResizeNearest_8u_C4R) else
@@ -8922,11 +8979,11 @@ template <unsigned k> constexpr auto resize_nearest_0() noexcept {
     "qori::resize_nearest: no such call. resize_nearest(src, dst, offset, plan, buffer) of 8u, 16u, 16s, 32f: " \
     "C1 C3 C4"
 /** Resizes a tile by the nearest source pixel, moved bit for bit. C: qoriResizeNearest. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_nearest(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_nearest(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8937,16 +8994,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_super_0() noexcept {
+template <unsigned k> inline auto resize_super_0() noexcept {
     QORI_AT(0x1111, qoriResizeSuper_8u_C1R) else
     QORI_AT(0x1313, qoriResizeSuper_8u_C3R) else
     QORI_AT(0x1414, qoriResizeSuper_8u_C4R) else
@@ -8966,11 +9023,11 @@ template <unsigned k> constexpr auto resize_super_0() noexcept {
     "qori::resize_super: no such call. resize_super(src, dst, offset, plan, buffer) of 8u, 16u, 16s, 32f: C1 C3" \
     " C4"
 /** Reduces a tile to means of areas; integers round to nearest, ties to even. C: qoriResizeSuper. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_super_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_super(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_super_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_super(const A& src, B&& dst, QorPoint2D offset, const QorResizePlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -8981,16 +9038,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_super(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_super(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_linear_0() noexcept {
+template <unsigned k> inline auto resize_linear_0() noexcept {
     QORI_AT(0x1111, qoriResizeLinear_8u_C1R) else
     QORI_AT(0x1313, qoriResizeLinear_8u_C3R) else
     QORI_AT(0x1414, qoriResizeLinear_8u_C4R) else
@@ -9012,13 +9069,13 @@ template <unsigned k> constexpr auto resize_linear_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_linear: no such call. resize_linear(src, dst, offset, border, plan, buffer) of 8u, 16u, 16s, " \
     "32f, 64f: C1 C3 C4"
-/** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single precision.
- *  C: qoriResizeLinear. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_linear(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0, 7>,
-    k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile by linear interpolation: 8u in 14-bit fixed point, 64f in double, the others in single
+ *  precision. C: qoriResizeLinear. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_linear(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9029,16 +9086,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_linear(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_linear(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_cubic_0() noexcept {
+template <unsigned k> inline auto resize_cubic_0() noexcept {
     QORI_AT(0x1111, qoriResizeCubic_8u_C1R) else
     QORI_AT(0x1313, qoriResizeCubic_8u_C3R) else
     QORI_AT(0x1414, qoriResizeCubic_8u_C4R) else
@@ -9057,13 +9114,13 @@ template <unsigned k> constexpr auto resize_cubic_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_cubic: no such call. resize_cubic(src, dst, offset, border, plan, buffer) of 8u, 16u, 16s, " \
     "32f: C1 C3 C4"
-/** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and saturate. C:
- *  qoriResizeCubic. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_cubic(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0, 7>,
-    k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile by cubic filtering in single precision; integers round to nearest, ties to even, and saturate.
+ *  C: qoriResizeCubic. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_cubic(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9074,16 +9131,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_lanczos_0() noexcept {
+template <unsigned k> inline auto resize_lanczos_0() noexcept {
     QORI_AT(0x1111, qoriResizeLanczos_8u_C1R) else
     QORI_AT(0x1313, qoriResizeLanczos_8u_C3R) else
     QORI_AT(0x1414, qoriResizeLanczos_8u_C4R) else
@@ -9102,12 +9159,13 @@ template <unsigned k> constexpr auto resize_lanczos_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_lanczos: no such call. resize_lanczos(src, dst, offset, border, plan, buffer) of 8u, 16u, " \
     "16s, 32f: C1 C3 C4"
-/** Resizes a tile by Lanczos filtering; integers round to nearest, ties to even, and saturate. C: qoriResizeLanczos. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_lanczos_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult resize_lanczos(const A& src, B&& dst, QorPoint2D offset, const detail::Edge<detail::Arg<F0,
-    7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile by Lanczos filtering; integers round to nearest, ties to even, and saturate. C:
+ *  qoriResizeLanczos. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_lanczos_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_lanczos(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9118,16 +9176,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto resize_antialiasing_0() noexcept {
+template <unsigned k> inline auto resize_antialiasing_0() noexcept {
     QORI_AT(0x1111, qoriResizeAntialiasing_8u_C1R) else
     QORI_AT(0x1313, qoriResizeAntialiasing_8u_C3R) else
     QORI_AT(0x1414, qoriResizeAntialiasing_8u_C4R) else
@@ -9146,13 +9204,13 @@ template <unsigned k> constexpr auto resize_antialiasing_0() noexcept {
 #define QORI_WORDS \
     "qori::resize_antialiasing: no such call. resize_antialiasing(src, dst, offset, border, plan, buffer) of " \
     "8u, 16u, 16s, 32f: C1 C3 C4"
-/** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and saturate. C:
- *  qoriResizeAntialiasing. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::resize_antialiasing_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult resize_antialiasing(const A& src, B&& dst, QorPoint2D offset, const
-    detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
+/** Resizes a tile with the filter of an antialiasing plan; integers round to nearest, ties to even, and saturate.
+ *  C: qoriResizeAntialiasing. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::resize_antialiasing_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult resize_antialiasing(const A& src, B&& dst, QorPoint2D offset,
+    const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorResizePlan* plan, uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9172,7 +9230,7 @@ template <bool exists = false> QorResult resize_antialiasing(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto rescale_0() noexcept {
+template <unsigned k> inline auto rescale_0() noexcept {
     QORI_AT(0x1131, qoriScale_8u16u_C1R) else
     QORI_AT(0x1333, qoriScale_8u16u_C3R) else
     QORI_AT(0x1434, qoriScale_8u16u_C4R) else
@@ -9187,7 +9245,7 @@ template <unsigned k> constexpr auto rescale_0() noexcept {
     QORI_AT(0x1565, qoriScale_8u32s_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto rescale_1() noexcept {
+template <unsigned k> inline auto rescale_1() noexcept {
     QORI_AT(0x1171, qoriScale_8u32f_C1R) else
     QORI_AT(0x1373, qoriScale_8u32f_C3R) else
     QORI_AT(0x1474, qoriScale_8u32f_C4R) else
@@ -9198,7 +9256,7 @@ template <unsigned k> constexpr auto rescale_1() noexcept {
     QORI_AT(0x7515, qoriScale_32f8u_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto rescale_2() noexcept {
+template <unsigned k> inline auto rescale_2() noexcept {
     QORI_AT(0x3111, qoriScale_16u8u_C1R) else
     QORI_AT(0x3313, qoriScale_16u8u_C3R) else
     QORI_AT(0x3414, qoriScale_16u8u_C4R) else
@@ -9221,9 +9279,9 @@ template <unsigned k> constexpr auto rescale_2() noexcept {
 /** Maps 0..255 linearly onto the whole range of the destination type. Maps 0..255 linearly onto vMin..vMax: dst =
  *  vMin + x * k, k = (vMax - vMin) / 255, in 32-bit float. Maps the whole range of the source type linearly onto
  *  0..255. C: qoriScale. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_0<k>()), class F1 = decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> &&
-    detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::rescale_0<k>()), class F1 = decltype(detail::rescale_2<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9240,8 +9298,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::rescale_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst, float low, float high) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9253,8 +9312,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::rescale_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult rescale(const A& src, B&& dst, QorAccuracyHint hint) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9275,7 +9335,7 @@ template <bool exists = false> QorResult rescale(detail::Anything = {}, detail::
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto fill_0() noexcept {
+template <unsigned k> inline auto fill_0() noexcept {
     QORI_AT(0x1111, qoriSet_8u_C1R) else
     QORI_AT(0x1313, qoriSet_8u_C3R) else
     QORI_AT(0x1414, qoriSet_8u_C4R) else
@@ -9308,7 +9368,7 @@ template <unsigned k> constexpr auto fill_0() noexcept {
     QORI_AT(0x7979, qoriSet_32f_C4CR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto fill_1() noexcept {
+template <unsigned k> inline auto fill_1() noexcept {
     QORI_AT(0x1111, qoriSet_8u_C1MR) else
     QORI_AT(0x1313, qoriSet_8u_C3MR) else
     QORI_AT(0x1414, qoriSet_8u_C4MR) else
@@ -9351,8 +9411,8 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
 }
 template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class F0 = decltype(detail::fill_1<k>()),
     detail::If<detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult fill(const detail::Value<detail::Arg<F0, 0>, k>& value, B&& dst, const View<const uint8_t,
-    C1>& mask) noexcept {
+[[nodiscard]] QorResult fill(const detail::Value<detail::Arg<F0, 0>, k>& value, B&& dst,
+    const View<const uint8_t, C1>& mask) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& dstV = detail::view(dst);
         const auto& maskV = detail::view(mask);
@@ -9373,21 +9433,21 @@ template <bool exists = false> QorResult fill(detail::Anything = {}, detail::Any
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_packed_0() noexcept {
+template <unsigned k> inline auto multiply_packed_0() noexcept {
     QORI_AT(0x7171, qoriMulPack_32f_C1R) else
     QORI_AT(0x7373, qoriMulPack_32f_C3R) else
     QORI_AT(0x7474, qoriMulPack_32f_C4R) else
     QORI_AT(0x7575, qoriMulPack_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_1() noexcept {
+template <unsigned k> inline auto multiply_packed_1() noexcept {
     QORI_AT(0x7171, qoriMulPack_32f_C1IR) else
     QORI_AT(0x7373, qoriMulPack_32f_C3IR) else
     QORI_AT(0x7474, qoriMulPack_32f_C4IR) else
     QORI_AT(0x7575, qoriMulPack_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_2() noexcept {
+template <unsigned k> inline auto multiply_packed_2() noexcept {
     QORI_AT(0x4141, qoriMulPack_16s_C1RSfs) else
     QORI_AT(0x4343, qoriMulPack_16s_C3RSfs) else
     QORI_AT(0x4444, qoriMulPack_16s_C4RSfs) else
@@ -9398,7 +9458,7 @@ template <unsigned k> constexpr auto multiply_packed_2() noexcept {
     QORI_AT(0x6565, qoriMulPack_32s_AC4RSfs) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_3() noexcept {
+template <unsigned k> inline auto multiply_packed_3() noexcept {
     QORI_AT(0x4141, qoriMulPack_16s_C1IRSfs) else
     QORI_AT(0x4343, qoriMulPack_16s_C3IRSfs) else
     QORI_AT(0x4444, qoriMulPack_16s_C4IRSfs) else
@@ -9415,8 +9475,8 @@ template <unsigned k> constexpr auto multiply_packed_3() noexcept {
     " C1 C3 C4 AC4. multiply_packed(a, b, dst, [scale]) or multiply_packed(in_place(b), a, [scale]) of 16s, " \
     "32s: C1 C3 C4 AC4"
 /** Multiplies two packed spectra, each channel by itself: a convolution of their images. C: qoriMulPack. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_packed_0<k>()), class F1 = decltype(detail::multiply_packed_2<k>()),
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_packed_0<k>()), class F1 = decltype(detail::multiply_packed_2<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9438,8 +9498,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_packed_1<k>()), class F1 = decltype(detail::multiply_packed_3<k>()),
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_packed_1<k>()), class F1 = decltype(detail::multiply_packed_3<k>()),
     detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const InPlace<TA, LA>& b, const B& a) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9457,9 +9517,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_packed_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_packed_2<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const A& a, const B& b, C&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9473,8 +9533,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>, class F0
-    = decltype(detail::multiply_packed_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
+template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::multiply_packed_3<k>()), detail::If<detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed(const InPlace<TA, LA>& b, const B& a, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& bV = detail::view(b);
@@ -9495,14 +9555,14 @@ template <bool exists = false> QorResult multiply_packed(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto multiply_packed_conj_0() noexcept {
+template <unsigned k> inline auto multiply_packed_conj_0() noexcept {
     QORI_AT(0x7171, qoriMulPackConj_32f_C1R) else
     QORI_AT(0x7373, qoriMulPackConj_32f_C3R) else
     QORI_AT(0x7474, qoriMulPackConj_32f_C4R) else
     QORI_AT(0x7575, qoriMulPackConj_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto multiply_packed_conj_1() noexcept {
+template <unsigned k> inline auto multiply_packed_conj_1() noexcept {
     QORI_AT(0x7171, qoriMulPackConj_32f_C1IR) else
     QORI_AT(0x7373, qoriMulPackConj_32f_C3IR) else
     QORI_AT(0x7474, qoriMulPackConj_32f_C4IR) else
@@ -9513,10 +9573,11 @@ template <unsigned k> constexpr auto multiply_packed_conj_1() noexcept {
 #define QORI_WORDS \
     "qori::multiply_packed_conj: no such call. multiply_packed_conj(a, b, dst) or multiply_packed_conj(a, " \
     "in_place(b)) of 32f: C1 C3 C4 AC4"
-/** Multiplies a packed spectrum by the conjugate of a second one: a correlation of their images. C: qoriMulPackConj. */
-template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>, class F0 =
-    decltype(detail::multiply_packed_conj_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B> &&
-    detail::isImage<C>> = 0, bool exists = false>
+/** Multiplies a packed spectrum by the conjugate of a second one: a correlation of their images. C:
+ *  qoriMulPackConj. */
+template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, detail::Out<C>>,
+    class F0 = decltype(detail::multiply_packed_conj_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::isImage<C>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed_conj(const A& a, const B& b, C&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9530,8 +9591,8 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, detail::Out<InPlace<TB, LB>>>, class F0
-    = decltype(detail::multiply_packed_conj_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
+template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, detail::Out<InPlace<TB, LB>>>,
+    class F0 = decltype(detail::multiply_packed_conj_1<k>()), detail::If<detail::isImage<A>> = 0, bool exists = false>
 [[nodiscard]] QorResult multiply_packed_conj(const A& a, const InPlace<TB, LB>& b) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& aV = detail::view(a);
@@ -9552,12 +9613,12 @@ template <bool exists = false> QorResult multiply_packed_conj(detail::Anything =
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto magnitude_packed_0() noexcept {
+template <unsigned k> inline auto magnitude_packed_0() noexcept {
     QORI_AT(0x7171, qoriMagnitudePack_32f_C1R) else
     QORI_AT(0x7373, qoriMagnitudePack_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto magnitude_packed_1() noexcept {
+template <unsigned k> inline auto magnitude_packed_1() noexcept {
     QORI_AT(0x4141, qoriMagnitudePack_16s_C1RSfs) else
     QORI_AT(0x4343, qoriMagnitudePack_16s_C3RSfs) else
     QORI_AT(0x6161, qoriMagnitudePack_32s_C1RSfs) else
@@ -9569,8 +9630,8 @@ template <unsigned k> constexpr auto magnitude_packed_1() noexcept {
     "qori::magnitude_packed: no such call. magnitude_packed(src, dst) of 32f: C1 C3. magnitude_packed(src, dst," \
     " [scale]) of 16s, 32s: C1 C3"
 /** The magnitude of every frequency of a packed spectrum, as a full image. C: qoriMagnitudePack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::magnitude_packed_0<k>()), class F1 = decltype(detail::magnitude_packed_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::magnitude_packed_0<k>()), class F1 = decltype(detail::magnitude_packed_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult magnitude_packed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9588,9 +9649,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::magnitude_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::magnitude_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult magnitude_packed(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9612,12 +9673,12 @@ template <bool exists = false> QorResult magnitude_packed(detail::Anything = {},
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto phase_packed_0() noexcept {
+template <unsigned k> inline auto phase_packed_0() noexcept {
     QORI_AT(0x7171, qoriPhasePack_32f_C1R) else
     QORI_AT(0x7373, qoriPhasePack_32f_C3R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto phase_packed_1() noexcept {
+template <unsigned k> inline auto phase_packed_1() noexcept {
     QORI_AT(0x4141, qoriPhasePack_16s_C1RSfs) else
     QORI_AT(0x4343, qoriPhasePack_16s_C3RSfs) else
     QORI_AT(0x6161, qoriPhasePack_32s_C1RSfs) else
@@ -9629,8 +9690,8 @@ template <unsigned k> constexpr auto phase_packed_1() noexcept {
     "qori::phase_packed: no such call. phase_packed(src, dst) of 32f: C1 C3. phase_packed(src, dst, [scale]) of" \
     " 16s, 32s: C1 C3"
 /** The phase of every frequency of a packed spectrum, as a full image. C: qoriPhasePack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::phase_packed_0<k>()), class F1 = decltype(detail::phase_packed_1<k>()),
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::phase_packed_0<k>()), class F1 = decltype(detail::phase_packed_1<k>()),
     detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult phase_packed(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9648,9 +9709,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::phase_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::phase_packed_1<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult phase_packed(const A& src, B&& dst, int32_t scale) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9662,16 +9723,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult phase_packed(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult phase_packed(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto unpack_spectrum_0() noexcept {
+template <unsigned k> inline auto unpack_spectrum_0() noexcept {
     QORI_AT(0x71b1, qoriPackToCplxExtend_32f32fc_C1R) else
     QORI_AT(0x61a1, qoriPackToCplxExtend_32s32sc_C1R) else
     return Missing{};
@@ -9680,9 +9741,9 @@ template <unsigned k> constexpr auto unpack_spectrum_0() noexcept {
 #define QORI_WORDS \
     "qori::unpack_spectrum: no such call. unpack_spectrum(src, dst) of 32f->32fc, 32s->32sc: C1"
 /** Every frequency of a packed spectrum, as a full complex image. C: qoriPackToCplxExtend. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::unpack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::unpack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult unpack_spectrum(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9703,7 +9764,7 @@ template <bool exists = false> QorResult unpack_spectrum(detail::Anything = {}, 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto pack_spectrum_0() noexcept {
+template <unsigned k> inline auto pack_spectrum_0() noexcept {
     QORI_AT(0xb171, qoriCplxExtendToPack_32fc32f_C1R) else
     QORI_AT(0xb373, qoriCplxExtendToPack_32fc32f_C3R) else
     QORI_AT(0xa161, qoriCplxExtendToPack_32sc32s_C1R) else
@@ -9716,9 +9777,9 @@ template <unsigned k> constexpr auto pack_spectrum_0() noexcept {
 #define QORI_WORDS \
     "qori::pack_spectrum: no such call. pack_spectrum(src, dst) of 32fc->32f, 32sc->32s, 16sc->16s: C1 C3"
 /** Packs the spectrum of a real image that is given as a full complex one. C: qoriCplxExtendToPack. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::pack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::pack_spectrum_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult pack_spectrum(const A& src, B&& dst) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -9730,16 +9791,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_0() noexcept {
+template <unsigned k> inline auto threshold_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_8u_AC4R) else
@@ -9754,7 +9815,7 @@ template <unsigned k> constexpr auto threshold_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_1() noexcept {
+template <unsigned k> inline auto threshold_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_8u_AC4IR) else
@@ -9769,7 +9830,7 @@ template <unsigned k> constexpr auto threshold_1() noexcept {
     QORI_AT(0x7575, qoriThreshold_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_2() noexcept {
+template <unsigned k> inline auto threshold_2() noexcept {
     QORI_AT(0x1111, qoriThreshold_Val_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_Val_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_Val_8u_AC4R) else
@@ -9784,7 +9845,7 @@ template <unsigned k> constexpr auto threshold_2() noexcept {
     QORI_AT(0x7575, qoriThreshold_Val_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_3() noexcept {
+template <unsigned k> inline auto threshold_3() noexcept {
     QORI_AT(0x1111, qoriThreshold_Val_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_Val_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_Val_8u_AC4IR) else
@@ -9804,10 +9865,12 @@ template <unsigned k> constexpr auto threshold_3() noexcept {
     "qori::threshold: no such call. threshold(src, dst, threshold, op) or threshold(in_place(src), threshold, " \
     "op) or threshold(src, dst, threshold, value, op) or threshold(in_place(src), threshold, value, op) of 8u, " \
     "16s, 16u, 32f: C1 C3 AC4"
-/** Clips to a threshold: dst = max(src, threshold) with cmpLess, min(src, threshold) with cmpGreater. Replaces what
- *  is less (cmpLess) or greater (cmpGreater) than a threshold by a value. C: qoriThreshold, qoriThreshold_Val. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+/** Clips to a threshold: dst = max(src, threshold) with cmpLess, min(src, threshold) with cmpGreater. Replaces
+ *  what is less (cmpLess) or greater (cmpGreater) than a threshold by a value. C: qoriThreshold,
+ *  qoriThreshold_Val. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9821,8 +9884,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>& threshold,
     QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9833,10 +9896,11 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
-[[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold, const
-    detail::Value<detail::Arg<F0, 6>, k>& value, QorCompareOp op) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult threshold(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
+    const detail::Value<detail::Arg<F0, 6>, k>& value, QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9848,8 +9912,8 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_3<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_3<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>& threshold,
     const detail::Value<detail::Arg<F0, 4>, k>& value, QorCompareOp op) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9861,16 +9925,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult threshold(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult threshold(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_gt_0() noexcept {
+template <unsigned k> inline auto threshold_gt_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_GT_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_GT_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_GT_8u_AC4R) else
@@ -9885,7 +9949,7 @@ template <unsigned k> constexpr auto threshold_gt_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_GT_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_gt_1() noexcept {
+template <unsigned k> inline auto threshold_gt_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_GT_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_GT_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_GT_8u_AC4IR) else
@@ -9900,7 +9964,7 @@ template <unsigned k> constexpr auto threshold_gt_1() noexcept {
     QORI_AT(0x7575, qoriThreshold_GT_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_gt_2() noexcept {
+template <unsigned k> inline auto threshold_gt_2() noexcept {
     QORI_AT(0x1111, qoriThreshold_GTVal_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_GTVal_8u_C3R) else
     QORI_AT(0x1414, qoriThreshold_GTVal_8u_C4R) else
@@ -9919,7 +9983,7 @@ template <unsigned k> constexpr auto threshold_gt_2() noexcept {
     QORI_AT(0x7575, qoriThreshold_GTVal_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_gt_3() noexcept {
+template <unsigned k> inline auto threshold_gt_3() noexcept {
     QORI_AT(0x1111, qoriThreshold_GTVal_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_GTVal_8u_C3IR) else
     QORI_AT(0x1414, qoriThreshold_GTVal_8u_C4IR) else
@@ -9943,13 +10007,13 @@ template <unsigned k> constexpr auto threshold_gt_3() noexcept {
     "qori::threshold_gt: no such call. threshold_gt(src, dst, threshold) or threshold_gt(in_place(src), " \
     "threshold) of 8u, 16s, 16u, 32f: C1 C3 AC4. threshold_gt(src, dst, threshold, value) or " \
     "threshold_gt(in_place(src), threshold, value) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
-/** Clips above a threshold: dst = src > threshold ? threshold : src. Replaces what exceeds a threshold: dst = src >
- *  threshold ? value : src. C: qoriThreshold_GT, qoriThreshold_GTVal. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_gt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult threshold_gt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold)
-    noexcept {
+/** Clips above a threshold: dst = src > threshold ? threshold : src. Replaces what exceeds a threshold: dst = src
+ *  > threshold ? value : src. C: qoriThreshold_GT, qoriThreshold_GTVal. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_gt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult threshold_gt(const A& src, B&& dst,
+    const detail::Value<detail::Arg<F0, 5>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -9961,10 +10025,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_gt_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_gt_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_gt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
@@ -9973,9 +10037,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_gt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_gt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold_gt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     const detail::Value<detail::Arg<F0, 6>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -9989,10 +10053,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_gt_3<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold, const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_gt_3<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_gt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold,
+    const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_gt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
@@ -10002,16 +10067,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_lt_0() noexcept {
+template <unsigned k> inline auto threshold_lt_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_LT_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_LT_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_LT_8u_AC4R) else
@@ -10026,7 +10091,7 @@ template <unsigned k> constexpr auto threshold_lt_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_LT_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_lt_1() noexcept {
+template <unsigned k> inline auto threshold_lt_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_LT_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_LT_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_LT_8u_AC4IR) else
@@ -10041,7 +10106,7 @@ template <unsigned k> constexpr auto threshold_lt_1() noexcept {
     QORI_AT(0x7575, qoriThreshold_LT_32f_AC4IR) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_lt_2() noexcept {
+template <unsigned k> inline auto threshold_lt_2() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTVal_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_LTVal_8u_C3R) else
     QORI_AT(0x1414, qoriThreshold_LTVal_8u_C4R) else
@@ -10060,7 +10125,7 @@ template <unsigned k> constexpr auto threshold_lt_2() noexcept {
     QORI_AT(0x7575, qoriThreshold_LTVal_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_lt_3() noexcept {
+template <unsigned k> inline auto threshold_lt_3() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTVal_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_LTVal_8u_C3IR) else
     QORI_AT(0x1414, qoriThreshold_LTVal_8u_C4IR) else
@@ -10084,13 +10149,13 @@ template <unsigned k> constexpr auto threshold_lt_3() noexcept {
     "qori::threshold_lt: no such call. threshold_lt(src, dst, threshold) or threshold_lt(in_place(src), " \
     "threshold) of 8u, 16s, 16u, 32f: C1 C3 AC4. threshold_lt(src, dst, threshold, value) or " \
     "threshold_lt(in_place(src), threshold, value) of 8u, 16s, 16u, 32f: C1 C3 C4 AC4"
-/** Clips below a threshold: dst = src < threshold ? threshold : src. Replaces what falls below a threshold: dst = src
- *  < threshold ? value : src. C: qoriThreshold_LT, qoriThreshold_LTVal. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_lt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
-[[nodiscard]] QorResult threshold_lt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold)
-    noexcept {
+/** Clips below a threshold: dst = src < threshold ? threshold : src. Replaces what falls below a threshold: dst =
+ *  src < threshold ? value : src. C: qoriThreshold_LT, qoriThreshold_LTVal. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_lt_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult threshold_lt(const A& src, B&& dst,
+    const detail::Value<detail::Arg<F0, 5>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10102,10 +10167,10 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_lt_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_lt_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_lt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
@@ -10114,9 +10179,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_lt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_lt_2<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold_lt(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& threshold,
     const detail::Value<detail::Arg<F0, 6>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10130,10 +10195,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_lt_3<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    threshold, const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_lt_3<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_lt(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& threshold,
+    const detail::Value<detail::Arg<F0, 4>, k>& value) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_lt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
@@ -10143,16 +10209,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything =
-    {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_outside_0() noexcept {
+template <unsigned k> inline auto threshold_outside_0() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTValGTVal_8u_C1R) else
     QORI_AT(0x1313, qoriThreshold_LTValGTVal_8u_C3R) else
     QORI_AT(0x1515, qoriThreshold_LTValGTVal_8u_AC4R) else
@@ -10167,7 +10233,7 @@ template <unsigned k> constexpr auto threshold_outside_0() noexcept {
     QORI_AT(0x7575, qoriThreshold_LTValGTVal_32f_AC4R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_outside_1() noexcept {
+template <unsigned k> inline auto threshold_outside_1() noexcept {
     QORI_AT(0x1111, qoriThreshold_LTValGTVal_8u_C1IR) else
     QORI_AT(0x1313, qoriThreshold_LTValGTVal_8u_C3IR) else
     QORI_AT(0x1515, qoriThreshold_LTValGTVal_8u_AC4IR) else
@@ -10189,12 +10255,12 @@ template <unsigned k> constexpr auto threshold_outside_1() noexcept {
     "AC4"
 /** Replaces on both sides: dst = src < thresholdLT ? valueLT : src > thresholdGT ? valueGT : src. C:
  *  qoriThreshold_LTValGTVal. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_outside_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_outside_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult threshold_outside(const A& src, B&& dst, const detail::Value<detail::Arg<F0, 5>, k>& below,
-    const detail::Value<detail::Arg<F0, 6>, k>& value_below, const detail::Value<detail::Arg<F0, 7>, k>& above, const
-    detail::Value<detail::Arg<F0, 8>, k>& value_above) noexcept {
+    const detail::Value<detail::Arg<F0, 6>, k>& value_below, const detail::Value<detail::Arg<F0, 7>, k>& above,
+    const detail::Value<detail::Arg<F0, 8>, k>& value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10206,10 +10272,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_outside_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_outside(const InPlace<TA, LA>& src, const detail::Value<detail::Arg<F0, 3>, k>&
-    below, const detail::Value<detail::Arg<F0, 4>, k>& value_below, const detail::Value<detail::Arg<F0, 5>, k>& above,
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_outside_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_outside(const InPlace<TA, LA>& src,
+    const detail::Value<detail::Arg<F0, 3>, k>& below, const detail::Value<detail::Arg<F0, 4>, k>& value_below,
+    const detail::Value<detail::Arg<F0, 5>, k>& above,
     const detail::Value<detail::Arg<F0, 6>, k>& value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10236,11 +10303,11 @@ template <bool exists = false> QorResult threshold_outside(detail::Anything = {}
 }
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_adaptive_box_0() noexcept {
+template <unsigned k> inline auto threshold_adaptive_box_0() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveBox_8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_adaptive_box_1() noexcept {
+template <unsigned k> inline auto threshold_adaptive_box_1() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveBox_8u_C1IR) else
     return Missing{};
 }
@@ -10249,21 +10316,22 @@ template <unsigned k> constexpr auto threshold_adaptive_box_1() noexcept {
     "qori::threshold_adaptive_box: no such call. threshold_adaptive_box(src, dst, size, delta, [border], " \
     "[value_above], [value_below], [buffer]) or threshold_adaptive_box(in_place(src), size, delta, [border], " \
     "[value_above], [value_below], [buffer]) of 8u: C1"
-/** valGT where the source is greater than the mean of the square around it minus delta, else valLE. In place, valGT
- *  where a pixel is greater than the mean of the square around it minus delta, else valLE. C:
+/** valGT where the source is greater than the mean of the square around it minus delta, else valLE. In place,
+ *  valGT where a pixel is greater than the mean of the square around it minus delta, else valLE. C:
  *  qoriThresholdAdaptiveBox. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below, Buffer& buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below,
+    Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
@@ -10273,11 +10341,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10285,7 +10353,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
@@ -10295,11 +10363,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border, uint8_t value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10307,7 +10375,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
@@ -10316,11 +10384,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 10>, k>& border) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 10>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10328,7 +10396,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
@@ -10337,9 +10405,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_box_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_box_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const A& src, B&& dst, QorImageSize size, float delta) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10349,7 +10417,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
@@ -10358,15 +10426,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below, Buffer& buffer) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below,
+    Buffer& buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10375,16 +10444,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above, uint8_t value_below) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10393,16 +10462,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border, uint8_t value_above) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             0, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10411,16 +10480,16 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta, const
-    detail::Edge<detail::Arg<F0, 8>, k>& border) noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta,
+    const detail::Edge<detail::Arg<F0, 8>, k>& border) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10429,8 +10498,8 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_box_1<k>()), bool exists = false>
 [[nodiscard]] QorResult threshold_adaptive_box(const InPlace<TA, LA>& src, QorImageSize size, float delta) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10438,7 +10507,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         Buffer buffer;
         int32_t bytes = 0;
         if (const QorResult asked = qoriThresholdAdaptiveBoxGetBufferSize(srcV.size(), size,
-            detail::dataType<detail::ElementOf<decltype(srcV)>>, detail::channels(k), &bytes)) return asked;
+            detail::dataType<detail::ElementOf<decltype(srcV)>>, int32_t(detail::channels(k)), &bytes)) return asked;
         if (!buffer.fits(bytes)) return QOR_ERR_NO_MEMORY;
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
@@ -10463,17 +10532,17 @@ template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything
 }
 
 /** Makes the weights of an adaptive threshold. C: qoriThresholdAdaptiveGaussInit. */
-[[nodiscard]] inline QorResult threshold_adaptive_gauss_init(QorImageSize roi_size, QorImageSize size, int32_t
-    data_type, int32_t num_channels, float sigma, QorAdaptiveGaussSpec* plan) noexcept {
+[[nodiscard]] inline QorResult threshold_adaptive_gauss_init(QorImageSize roi_size, QorImageSize size,
+    int32_t data_type, int32_t num_channels, float sigma, QorAdaptiveGaussSpec* plan) noexcept {
     return qoriThresholdAdaptiveGaussInit(roi_size, size, data_type, num_channels, sigma, plan);
 }
 
 namespace detail {
-template <unsigned k> constexpr auto threshold_adaptive_gauss_0() noexcept {
+template <unsigned k> inline auto threshold_adaptive_gauss_0() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveGauss_8u_C1R) else
     return Missing{};
 }
-template <unsigned k> constexpr auto threshold_adaptive_gauss_1() noexcept {
+template <unsigned k> inline auto threshold_adaptive_gauss_1() noexcept {
     QORI_AT(0x1111, qoriThresholdAdaptiveGauss_8u_C1IR) else
     return Missing{};
 }
@@ -10483,14 +10552,14 @@ template <unsigned k> constexpr auto threshold_adaptive_gauss_1() noexcept {
     "value_below, border, plan, buffer) or threshold_adaptive_gauss(in_place(src), delta, value_above, " \
     "value_below, border, plan, buffer) of 8u: C1"
 /** valGT where the source is greater than the weighted mean of the square around it minus delta, else valLE. In
- *  place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else valLE. C:
- *  qoriThresholdAdaptiveGauss. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::threshold_adaptive_gauss_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
-[[nodiscard]] QorResult threshold_adaptive_gauss(const A& src, B&& dst, float delta, uint8_t value_above, uint8_t
-    value_below, const detail::Edge<detail::Arg<F0, 9>, k>& border, const QorAdaptiveGaussSpec* plan, uint8_t* buffer)
-    noexcept {
+ *  place, valGT where a pixel is greater than the weighted mean of the square around it minus delta, else valLE.
+ *  C: qoriThresholdAdaptiveGauss. */
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::threshold_adaptive_gauss_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_gauss(const A& src, B&& dst, float delta, uint8_t value_above,
+    uint8_t value_below, const detail::Edge<detail::Arg<F0, 9>, k>& border, const QorAdaptiveGaussSpec* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10503,11 +10572,11 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>, class F0 =
-    decltype(detail::threshold_adaptive_gauss_1<k>()), bool exists = false>
-[[nodiscard]] QorResult threshold_adaptive_gauss(const InPlace<TA, LA>& src, float delta, uint8_t value_above, uint8_t
-    value_below, const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorAdaptiveGaussSpec* plan, uint8_t* buffer)
-    noexcept {
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::threshold_adaptive_gauss_1<k>()), bool exists = false>
+[[nodiscard]] QorResult threshold_adaptive_gauss(const InPlace<TA, LA>& src, float delta, uint8_t value_above,
+    uint8_t value_below, const detail::Edge<detail::Arg<F0, 7>, k>& border, const QorAdaptiveGaussSpec* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         return detail::threshold_adaptive_gauss_1<k>()(srcV.data(), srcV.step(), srcV.size(), delta, value_above,
@@ -10535,36 +10604,40 @@ template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anythi
 [[nodiscard]] inline QorResult warp_affine_get_size(QorImageSize src_size, QorImageSize dst_size, int32_t data_type,
     const double* matrix, QorInterpolationKind interpolation, int32_t inverse, int32_t border, int32_t* plan_size,
     int32_t* init_buf_size) noexcept {
-    return qoriWarpAffineGetSize(src_size, dst_size, data_type, matrix, interpolation, inverse, border, plan_size, init_buf_size);
+    return qoriWarpAffineGetSize(src_size, dst_size, data_type, matrix, interpolation, inverse, border, plan_size,
+        init_buf_size);
 }
 
 /** Fills the plan of a warp by the nearest pixel. Arguments and statuses as for qoriWarpAffineLinearInit. C:
  *  qoriWarpAffineNearestInit. */
-[[nodiscard]] inline QorResult warp_affine_nearest_init(QorImageSize src_size, QorImageSize dst_size, int32_t
-    data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border, const double*
-    border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
-    return qoriWarpAffineNearestInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border, border_value, smooth_edge, plan);
+[[nodiscard]] inline QorResult warp_affine_nearest_init(QorImageSize src_size, QorImageSize dst_size,
+    int32_t data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border,
+    const double* border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
+    return qoriWarpAffineNearestInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border,
+        border_value, smooth_edge, plan);
 }
 
 /** Fills the plan of a linear warp, for one element type and channel count. C: qoriWarpAffineLinearInit. */
-[[nodiscard]] inline QorResult warp_affine_linear_init(QorImageSize src_size, QorImageSize dst_size, int32_t
-    data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border, const double*
-    border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
-    return qoriWarpAffineLinearInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border, border_value, smooth_edge, plan);
+[[nodiscard]] inline QorResult warp_affine_linear_init(QorImageSize src_size, QorImageSize dst_size,
+    int32_t data_type, const double* matrix, int32_t inverse, int32_t num_channels, int32_t border,
+    const double* border_value, int32_t smooth_edge, QorWarpPlan* plan) noexcept {
+    return qoriWarpAffineLinearInit(src_size, dst_size, data_type, matrix, inverse, num_channels, border,
+        border_value, smooth_edge, plan);
 }
 
 /** Fills the plan of a cubic warp from the two-parameter family: (0, 0.5) interpolates, (1, 0) is the B-spline. C:
  *  qoriWarpAffineCubicInit. */
 [[nodiscard]] inline QorResult warp_affine_cubic_init(QorImageSize src_size, QorImageSize dst_size, int32_t data_type,
-    const double* matrix, int32_t inverse, int32_t num_channels, double b, double c, int32_t border, const double*
-    border_value, int32_t smooth_edge, QorWarpPlan* plan, uint8_t* init_buf) noexcept {
-    return qoriWarpAffineCubicInit(src_size, dst_size, data_type, matrix, inverse, num_channels, b, c, border, border_value, smooth_edge, plan, init_buf);
+    const double* matrix, int32_t inverse, int32_t num_channels, double b, double c, int32_t border,
+    const double* border_value, int32_t smooth_edge, QorWarpPlan* plan, uint8_t* init_buf) noexcept {
+    return qoriWarpAffineCubicInit(src_size, dst_size, data_type, matrix, inverse, num_channels, b, c, border,
+        border_value, smooth_edge, plan, init_buf);
 }
 
 /** Reports how many bytes of work buffer a tile takes, at least 64; each thread needs a buffer of its own. C:
  *  qoriWarpGetBufferSize. */
-[[nodiscard]] inline QorResult warp_get_buffer_size(const QorWarpPlan* plan, QorImageSize dst_size, int32_t* buf_size)
-    noexcept {
+[[nodiscard]] inline QorResult warp_get_buffer_size(const QorWarpPlan* plan, QorImageSize dst_size,
+    int32_t* buf_size) noexcept {
     return qoriWarpGetBufferSize(plan, dst_size, buf_size);
 }
 
@@ -10575,7 +10648,7 @@ template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anythi
 }
 
 namespace detail {
-template <unsigned k> constexpr auto warp_affine_nearest_0() noexcept {
+template <unsigned k> inline auto warp_affine_nearest_0() noexcept {
     QORI_AT(0x1111, qoriWarpAffineNearest_8u_C1R) else
     QORI_AT(0x1313, qoriWarpAffineNearest_8u_C3R) else
     QORI_AT(0x1414, qoriWarpAffineNearest_8u_C4R) else
@@ -10599,9 +10672,9 @@ template <unsigned k> constexpr auto warp_affine_nearest_0() noexcept {
     "16s, 32f, 64f: C1 C3 C4"
 /** Warps a tile: each destination pixel is the source pixel nearest to its position, moved bit for bit. C:
  *  qoriWarpAffineNearest. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool
-    exists = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::warp_affine_nearest_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult warp_affine_nearest(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
     uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
@@ -10623,7 +10696,7 @@ template <bool exists = false> QorResult warp_affine_nearest(detail::Anything = 
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto warp_affine_linear_0() noexcept {
+template <unsigned k> inline auto warp_affine_linear_0() noexcept {
     QORI_AT(0x1111, qoriWarpAffineLinear_8u_C1R) else
     QORI_AT(0x1313, qoriWarpAffineLinear_8u_C3R) else
     QORI_AT(0x1414, qoriWarpAffineLinear_8u_C4R) else
@@ -10647,11 +10720,11 @@ template <unsigned k> constexpr auto warp_affine_linear_0() noexcept {
     "16s, 32f, 64f: C1 C3 C4"
 /** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single. C:
  *  qoriWarpAffineLinear. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult warp_affine_linear(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::warp_affine_linear_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult warp_affine_linear(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10671,7 +10744,7 @@ template <bool exists = false> QorResult warp_affine_linear(detail::Anything = {
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto warp_affine_cubic_0() noexcept {
+template <unsigned k> inline auto warp_affine_cubic_0() noexcept {
     QORI_AT(0x1111, qoriWarpAffineCubic_8u_C1R) else
     QORI_AT(0x1313, qoriWarpAffineCubic_8u_C3R) else
     QORI_AT(0x1414, qoriWarpAffineCubic_8u_C4R) else
@@ -10695,11 +10768,11 @@ template <unsigned k> constexpr auto warp_affine_cubic_0() noexcept {
     "32f, 64f: C1 C3 C4"
 /** Warps a tile by cubic filtering of 4 x 4 pixels: 64f and 32f in double precision, integers in single. C:
  *  qoriWarpAffineCubic. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::warp_affine_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
-[[nodiscard]] QorResult warp_affine_cubic(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan, uint8_t*
-    buffer) noexcept {
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::warp_affine_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
+[[nodiscard]] QorResult warp_affine_cubic(const A& src, B&& dst, QorPoint2D offset, const QorWarpPlan* plan,
+    uint8_t* buffer) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -10719,7 +10792,7 @@ template <bool exists = false> QorResult warp_affine_cubic(detail::Anything = {}
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sum_window_row_0() noexcept {
+template <unsigned k> inline auto sum_window_row_0() noexcept {
     QORI_AT(0x1171, qoriSumWindowRow_8u32f_C1R) else
     QORI_AT(0x1373, qoriSumWindowRow_8u32f_C3R) else
     QORI_AT(0x1474, qoriSumWindowRow_8u32f_C4R) else
@@ -10737,9 +10810,9 @@ template <unsigned k> constexpr auto sum_window_row_0() noexcept {
     " C1 C3 C4"
 /** dst(x, y) = the sum of src(x - anchor, y) to src(x - anchor + maskSize - 1, y), channel by channel. C:
  *  qoriSumWindowRow. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sum_window_row_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists =
-    false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sum_window_row_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult sum_window_row(const A& src, B&& dst, int32_t size, int32_t anchor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10752,16 +10825,16 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return QOR_ERR_BAD_ARG;
     }
 }
-template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything
-    = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
+    detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
     static_assert(exists, QORI_WORDS);
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
 
 namespace detail {
-template <unsigned k> constexpr auto sum_window_column_0() noexcept {
+template <unsigned k> inline auto sum_window_column_0() noexcept {
     QORI_AT(0x1171, qoriSumWindowColumn_8u32f_C1R) else
     QORI_AT(0x1373, qoriSumWindowColumn_8u32f_C3R) else
     QORI_AT(0x1474, qoriSumWindowColumn_8u32f_C4R) else
@@ -10779,9 +10852,9 @@ template <unsigned k> constexpr auto sum_window_column_0() noexcept {
     "16s->32f: C1 C3 C4"
 /** dst(x, y) = the sum of src(x, y - anchor) to src(x, y - anchor + maskSize - 1), channel by channel. C:
  *  qoriSumWindowColumn. */
-template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>, class F0 =
-    decltype(detail::sum_window_column_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0, bool exists
-    = false>
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::sum_window_column_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
+    bool exists = false>
 [[nodiscard]] QorResult sum_window_column(const A& src, B&& dst, int32_t size, int32_t anchor) noexcept {
     if constexpr (detail::found<F0>) {
         const auto& srcV = detail::view(src);
@@ -10817,9 +10890,9 @@ namespace detail {
 template <class Record>
 class Plan {
 public:
-    /** Of the making: QOR_OK, a warning or the error for which there is no plan. */
-    QorResult status() const noexcept { return status_; }
-    explicit operator bool() const noexcept { return memory_ && usable(); }
+    /** Of the making: QOR_OK, a warning or the error for which there is no plan; QOR_ERR_CONTEXT once it moved away. */
+    QorResult status() const noexcept { return usable() && !memory_ ? QorResult(QOR_ERR_CONTEXT) : status_; }
+    explicit operator bool() const noexcept { return usable() && memory_; }
     /** As the functions of qori.h take it. */
     const Record* get() const noexcept { return *this ? reinterpret_cast<const Record*>(memory_.data()) : nullptr; }
 
@@ -10920,7 +10993,8 @@ public:
         if (!detail::isSize(srcV.size(), src_.width, src_.height)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         QorPoint2D at{};
-        const QorResult query = resize_get_buffer_size<T>(this->get(), dstV.size(), detail::channels(k), &bytes);
+        const QorResult query =
+            resize_get_buffer_size<T>(this->get(), dstV.size(), int32_t(detail::channels(k)), &bytes);
         if (query == QOR_WARN_NOTHING_TO_DO) return query;
         if (const QorResult r = detail::need(buffer, query, bytes)) return r;
         if (const QorResult r = resize_get_src_offset<T>(this->get(), offset, &at)) return r;
@@ -10954,7 +11028,7 @@ private:
         }
         return QOR_ERR_UNSUPPORTED_MODE;
     }
-    template <unsigned k, class A, class B, int N>
+    template <unsigned k, class A, class B, std::size_t N>
     QorResult run(const A& s, const B& d, QorPoint2D at, const Border<T, N>& border, uint8_t* buffer) const noexcept {
         const QorResizePlan* plan = this->get();
         [[maybe_unused]] const auto bordered = [&](auto member) {
@@ -10981,14 +11055,15 @@ private:
  *  destination positions, inverse ones the other way. Nearest, linear or cubic. */
 template <class T, class L = C1>
 class WarpAffinePlan : public detail::Plan<QorWarpPlan> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
     static_assert(detail::found<decltype(detail::warp_affine_linear_0<k>())>,
                   "qori::WarpAffinePlan<T, L> of 8u 16u 16s 32f 64f: C1 C3 C4");
 
 public:
     WarpAffinePlan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
-                   const Border<double, channels>& border = {borderReplicate}, bool inverse = false) noexcept
+                   const Border<double, count>& border = {borderReplicate}, bool inverse = false) noexcept
         : src_(src), dst_(dst), kind_(how.kind) {
         int32_t bytes = 0, initBytes = 0;
         const int32_t type = detail::dataType<T>, mode = border.mode();
@@ -11042,7 +11117,8 @@ private:
  *  anchor, and turned by 180 degrees. */
 template <class T, class L = C1>
 class LinearFilterPlan : public detail::Plan<QorLinearFilterPlan> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static_assert(detail::found<decltype(detail::filter_border_0<detail::keyOf<T, L>>())>,
                   "qori::LinearFilterPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
 
@@ -11061,7 +11137,7 @@ public:
             return filter_border_init_32f(kernel.data(), kernel_, detail::dataType<T>, channels, rounding, plan);
         });
     }
-    [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst, const Border<T, channels>& border,
+    [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst, const Border<T, count>& border,
                                        Buffer& buffer) const noexcept {
         if (!*this) return this->status();
         if (detail::differ(src, dst)) return QOR_ERR_SIZE;
@@ -11071,7 +11147,7 @@ public:
         return filter_border(src, dst, border, this->get(), buffer.data());
     }
     [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst,
-                                       const Border<T, channels>& border = {borderReplicate}) const noexcept {
+                                       const Border<T, count>& border = {borderReplicate}) const noexcept {
         Buffer buffer;
         return (*this)(src, dst, border, buffer);
     }
@@ -11354,21 +11430,22 @@ public:
 /** Levels of histograms of images of T in the layout L, C1, C3 or C4. Counts are of levels, one more than bins. */
 template <class T, class L = C1>
 class HistogramPlan : public detail::Plan<QorHistogramSpec> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
     static_assert(detail::found<decltype(detail::histogram_0<k>())>,
                   "qori::HistogramPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
 
 public:
     /** Given levels, a list for each channel. */
-    HistogramPlan(const float* const (&levels)[channels], const Pixel<int32_t, channels>& counts) noexcept {
+    HistogramPlan(const float* const (&levels)[count], const Pixel<int32_t, count>& counts) noexcept {
         prepare(counts, 0, [&](QorHistogramSpec* plan, uint8_t*) {
             return histogram_init(detail::dataType<T>, levels, counts.data(), channels, plan);
         });
     }
     /** Levels spaced evenly from the lower to the upper one. */
-    HistogramPlan(const Pixel<float, channels>& lower, const Pixel<float, channels>& upper,
-                  const Pixel<int32_t, channels>& counts) noexcept {
+    HistogramPlan(const Pixel<float, count>& lower, const Pixel<float, count>& upper,
+                  const Pixel<int32_t, count>& counts) noexcept {
         prepare(counts, 1, [&](QorHistogramSpec* plan, uint8_t*) {
             return histogram_uniform_init(detail::dataType<T>, lower.data(), upper.data(), counts.data(), channels,
                                           plan);
@@ -11386,13 +11463,13 @@ public:
         return (*this)(src, hist, buffer);
     }
     /** The levels as they are used: a list for each channel. */
-    [[nodiscard]] QorResult levels(float* const (&lists)[channels]) const noexcept {
+    [[nodiscard]] QorResult levels(float* const (&lists)[count]) const noexcept {
         return *this ? histogram_get_levels(this->get(), lists) : this->status();
     }
 
 private:
     template <class Fill>
-    void prepare(const Pixel<int32_t, channels>& counts, int32_t uniform, Fill&& fill) noexcept {
+    void prepare(const Pixel<int32_t, count>& counts, int32_t uniform, Fill&& fill) noexcept {
         int32_t bytes = 0;
         const QorResult query =
             histogram_get_buffer_size(detail::dataType<T>, {1, 1}, counts.data(), channels, uniform, &bytes, &bytes_);

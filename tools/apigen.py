@@ -216,6 +216,7 @@ def main(arguments):
             write(Path(operands[0]).with_suffix(".hpp"), door_cpp_text.header(families))
         elif command == "build":
             folder, *chosen = operands
+            door_cpp.check(families)
             build(choose(families, chosen), Path(folder))
         else:
             for name in operands:

@@ -267,3 +267,9 @@ def refuse_doubles(operation, signatures):
         if shape in seen:
             raise DoorError(f"{operation}: two ways to call it look alike: {shape}")
         seen.add(shape)
+
+
+def check(families):
+    """Every member has a way to be called that is no other's."""
+    for name, forms in forms_of([m for f in families for g in f.groups for m in g.members]).items():
+        signatures_of(name, forms)

@@ -14,7 +14,7 @@ WIDTH = 118
 # --- choices among members ------------------------------------------------------------------------------------------
 
 def chain(name, members):
-    lines = [f"template <unsigned k> constexpr auto {name}() noexcept {{"]
+    lines = [f"template <unsigned k> inline auto {name}() noexcept {{"]
     lines += [f"    QORI_AT(0x{key:04x}, {member}) else" for key, member in members]
     return lines + ["    return Missing{};", "}"]
 
@@ -208,7 +208,7 @@ def work_memory(choice, images):
         elif c.kind == "data_type":
             texts.append("detail::dataType<detail::ElementOf<decltype(srcV)>>")
         elif c.kind == "channels":
-            texts.append("detail::channels(k)")
+            texts.append("int32_t(detail::channels(k))")
         elif c.kind == "columns":
             texts.append("dstV.width()")
         elif c.kind == "bytes":
@@ -241,10 +241,25 @@ def body(signature, choice, number):
 
 # --- functions ------------------------------------------------------------------------------------------------------
 
+def declared(operation):
+    """The name where it is declared; in parentheses it is no macro."""
+    return f"({operation})" if operation in MACROS else operation
+
+
 def wrapped(text, indent=""):
-    lines = textwrap.wrap(text, WIDTH, initial_indent=indent, subsequent_indent=indent + "    ", break_long_words=False,
-                          break_on_hyphens=False)
-    return [line.rstrip() for line in lines]
+    """Lines that break behind the commas of the outermost list, so that arguments of templates stay together."""
+    bound, depth = [], 0
+    least = 2 if text.startswith("template <template") else 1
+    for before, character in zip(" " + text, text):
+        depth += (character in "<({") - (character in ">)}" and before not in "-=")
+        outer = before == "," and depth <= least
+        bound.append("\0" if character == " " and not outer else character)
+    lines = textwrap.wrap("".join(bound), WIDTH, initial_indent=indent, subsequent_indent=indent + "    ",
+                          break_long_words=False, break_on_hyphens=False)
+    if any(len(line) > WIDTH + 2 for line in lines):
+        lines = textwrap.wrap(text, WIDTH, initial_indent=indent, subsequent_indent=indent + "    ", break_long_words=False,
+                              break_on_hyphens=False)
+    return [line.replace("\0", " ").rstrip() for line in lines]
 
 
 def template_head(signature, own, key, conditions):
@@ -272,7 +287,7 @@ def by_images(signature):
             weight = f", {letter}"
     key = f"detail::key<detail::In<{', '.join(ins)}>, detail::Out<{', '.join(outs)}>{weight}>"
     lines = wrapped(template_head(signature, own, key, conditions))
-    lines += wrapped(f"[[nodiscard]] QorResult {signature.operation}({', '.join(parameters)}) noexcept {{")
+    lines += wrapped(f"[[nodiscard]] QorResult {declared(signature.operation)}({', '.join(parameters)}) noexcept {{")
     return lines + alternatives(signature)
 
 
@@ -306,16 +321,17 @@ def plain(signature):
     head = "" if member.result == "void" else "[[nodiscard]] "
     call = f"{'' if member.result == 'void' else 'return '}{member.name}({names});"
     lines = wrapped(f"{head}inline {member.result} {signature.operation}({', '.join(parameters)}) noexcept {{")
-    return lines + [f"    {call}", "}"]
+    return lines + wrapped(call, "    ") + ["}"]
 
 
 MOST_ARGUMENTS = 10
+MACROS = ("min", "max")      # of <windows.h>, where nobody prevents them
 
 
 def otherwise(operation):
     """Takes whatever no other overload does and says what there is."""
     nothing = ", ".join(["detail::Anything = {}"] * MOST_ARGUMENTS)
-    return wrapped(f"template <bool exists = false> QorResult {operation}({nothing}) noexcept {{") + \
+    return wrapped(f"template <bool exists = false> QorResult {declared(operation)}({nothing}) noexcept {{") + \
         ["    static_assert(exists, QORI_WORDS);", "    return QOR_ERR_BAD_ARG;", "}"]
 
 
@@ -323,8 +339,10 @@ def documentation(forms):
     briefs = list(dict.fromkeys(form.anyone().group.keys["brief"] for form in forms))
     names = list(dict.fromkeys("qori" + form.c_operation for form in forms))
     text = " ".join(briefs) + " C: " + ", ".join(names) + "."
-    return textwrap.wrap(text, WIDTH, initial_indent="/** ", subsequent_indent=" *  ")[:-1] + [
-        textwrap.wrap(text, WIDTH, initial_indent="/** ", subsequent_indent=" *  ")[-1] + " */"]
+    if any(form.anyone().operation.reversed for form in forms):
+        text += " Of two images a is the second source of C, pSrc2 or in place pSrcDst, and b the first."
+    lines = textwrap.wrap(text, WIDTH - 3, initial_indent="/** ", subsequent_indent=" *  ")
+    return lines[:-1] + [lines[-1] + " */"]
 
 
 def operation_text(operation, forms):
@@ -349,8 +367,19 @@ def texts(header):
     lines = []
     for m in pattern.finditer(body_text):
         said = re.sub(r"\s*\n\s*\*\s*", " ", m["after"] or m["before"]).strip()
-        lines.append(f'    case {m["name"]}: return "{said}";')
-    return "\n".join(lines)
+        if len(said) < 70:
+            lines.append(f'case {m["name"]}: return "{said}";')
+        else:
+            pieces = textwrap.wrap(said, 96, drop_whitespace=False)
+            lines += [f"case {m['name']}:", *(f'    {"return" if p is pieces[0] else "      "} "{p}"' for p in pieces)]
+            lines[-1] += ";"
+    return lines
+
+
+def texts_in(part, template):
+    marker = re.search(r"^( *)// @TEXTS@\n", part, re.MULTILINE)
+    cases = "".join(f"{marker[1]}{line}\n" for line in texts(template))
+    return part[:marker.start()].lstrip() + cases + part[marker.end():].rstrip()
 
 
 def header(families):
@@ -365,7 +394,7 @@ def header(families):
     at = ["", "// One member of a choice among those of a form.",
           "#define QORI_AT(key, member) if constexpr (k == key) return &member;"]
     part = {path.stem: path.read_text() for path in (API / "cpp").glob("*.hpp")}
-    lines = [part["views"].rstrip(), "", part["values"].strip().replace("    // @TEXTS@", texts(template)), "",
+    lines = [part["views"].rstrip(), "", texts_in(part["values"], template), "",
              part["choice"].rstrip(), *at]
     for name, forms in first.items():
         lines += operation_text(name, forms)

@@ -77,8 +77,8 @@ template <class T, class L = C1>
 inline constexpr unsigned keyOf = key<In<View<T, L>>, Out<>>;
 
 /** Channels that the members of a key process. */
-constexpr int channels(unsigned k) noexcept {
-    constexpr int counts[] = {1, 1, 2, 3, 4, 3, 3, 4, 1, 1, 1, 1, 1, 1, 1, 1};
+constexpr std::size_t channels(unsigned k) noexcept {
+    constexpr std::size_t counts[] = {1, 1, 2, 3, 4, 3, 3, 4, 1, 1, 1, 1, 1, 1, 1, 1};
     return counts[k & 15];
 }
 
@@ -110,11 +110,11 @@ struct Both<Anything, B> {
 template <class A, class B>
 using Either = typename Both<A, B>::type;
 
-template <class T, int N>
+template <class T, std::size_t N>
 struct ValueOf {
     using type = T;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct ValueOf<const T*, N> {
     using type = Pixel<T, N>;
 };
@@ -122,26 +122,26 @@ struct ValueOf<const T*, N> {
 template <class P, unsigned k>
 using Value = typename ValueOf<P, channels(k)>::type;
 
-template <class P, int N>
+template <class P, std::size_t N>
 struct ResultsOf {
     using type = P;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct ResultsOf<T*, N> {
     using type = Results<T, N>;
 };
 template <class P, unsigned k>
 using Result = typename ResultsOf<P, channels(k)>::type;
 
-template <class P, int N>
+template <class P, std::size_t N>
 struct BorderOf {
     using type = Border<P, N>;
 };
-template <class T, int N>
+template <class T, std::size_t N>
 struct BorderOf<const T*, N> {
     using type = Border<T, N>;
 };
-template <int N>
+template <std::size_t N>
 struct BorderOf<Anything, N> {
     using type = Anything;
 };
@@ -159,7 +159,7 @@ struct KernelOf<const T*> {
 template <class P>
 using Weights = typename KernelOf<P>::type;
 
-template <class T, int N>
+template <class T, std::size_t N>
 constexpr const T* pass(const Pixel<T, N>& value) noexcept {
     return value.data();
 }
@@ -167,7 +167,7 @@ template <class T>
 constexpr T pass(T value) noexcept {
     return value;
 }
-template <class P, class T, int N>
+template <class P, class T, std::size_t N>
 constexpr P beyond(const Border<T, N>& border) noexcept {
     if constexpr (std::is_pointer_v<P>)
         return border.value().data();

@@ -11,9 +11,9 @@ namespace detail {
 template <class Record>
 class Plan {
 public:
-    /** Of the making: QOR_OK, a warning or the error for which there is no plan. */
-    QorResult status() const noexcept { return status_; }
-    explicit operator bool() const noexcept { return memory_ && usable(); }
+    /** Of the making: QOR_OK, a warning or the error for which there is no plan; QOR_ERR_CONTEXT once it moved away. */
+    QorResult status() const noexcept { return usable() && !memory_ ? QorResult(QOR_ERR_CONTEXT) : status_; }
+    explicit operator bool() const noexcept { return usable() && memory_; }
     /** As the functions of qori.h take it. */
     const Record* get() const noexcept { return *this ? reinterpret_cast<const Record*>(memory_.data()) : nullptr; }
 
@@ -114,7 +114,8 @@ public:
         if (!detail::isSize(srcV.size(), src_.width, src_.height)) return QOR_ERR_SIZE;
         int32_t bytes = 0;
         QorPoint2D at{};
-        const QorResult query = resize_get_buffer_size<T>(this->get(), dstV.size(), detail::channels(k), &bytes);
+        const QorResult query =
+            resize_get_buffer_size<T>(this->get(), dstV.size(), int32_t(detail::channels(k)), &bytes);
         if (query == QOR_WARN_NOTHING_TO_DO) return query;
         if (const QorResult r = detail::need(buffer, query, bytes)) return r;
         if (const QorResult r = resize_get_src_offset<T>(this->get(), offset, &at)) return r;
@@ -148,7 +149,7 @@ private:
         }
         return QOR_ERR_UNSUPPORTED_MODE;
     }
-    template <unsigned k, class A, class B, int N>
+    template <unsigned k, class A, class B, std::size_t N>
     QorResult run(const A& s, const B& d, QorPoint2D at, const Border<T, N>& border, uint8_t* buffer) const noexcept {
         const QorResizePlan* plan = this->get();
         [[maybe_unused]] const auto bordered = [&](auto member) {
@@ -175,14 +176,15 @@ private:
  *  destination positions, inverse ones the other way. Nearest, linear or cubic. */
 template <class T, class L = C1>
 class WarpAffinePlan : public detail::Plan<QorWarpPlan> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
     static_assert(detail::found<decltype(detail::warp_affine_linear_0<k>())>,
                   "qori::WarpAffinePlan<T, L> of 8u 16u 16s 32f 64f: C1 C3 C4");
 
 public:
     WarpAffinePlan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
-                   const Border<double, channels>& border = {borderReplicate}, bool inverse = false) noexcept
+                   const Border<double, count>& border = {borderReplicate}, bool inverse = false) noexcept
         : src_(src), dst_(dst), kind_(how.kind) {
         int32_t bytes = 0, initBytes = 0;
         const int32_t type = detail::dataType<T>, mode = border.mode();
@@ -236,7 +238,8 @@ private:
  *  anchor, and turned by 180 degrees. */
 template <class T, class L = C1>
 class LinearFilterPlan : public detail::Plan<QorLinearFilterPlan> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static_assert(detail::found<decltype(detail::filter_border_0<detail::keyOf<T, L>>())>,
                   "qori::LinearFilterPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
 
@@ -255,7 +258,7 @@ public:
             return filter_border_init_32f(kernel.data(), kernel_, detail::dataType<T>, channels, rounding, plan);
         });
     }
-    [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst, const Border<T, channels>& border,
+    [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst, const Border<T, count>& border,
                                        Buffer& buffer) const noexcept {
         if (!*this) return this->status();
         if (detail::differ(src, dst)) return QOR_ERR_SIZE;
@@ -265,7 +268,7 @@ public:
         return filter_border(src, dst, border, this->get(), buffer.data());
     }
     [[nodiscard]] QorResult operator()(View<const T, L> src, View<T, L> dst,
-                                       const Border<T, channels>& border = {borderReplicate}) const noexcept {
+                                       const Border<T, count>& border = {borderReplicate}) const noexcept {
         Buffer buffer;
         return (*this)(src, dst, border, buffer);
     }

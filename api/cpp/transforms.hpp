@@ -262,21 +262,22 @@ public:
 /** Levels of histograms of images of T in the layout L, C1, C3 or C4. Counts are of levels, one more than bins. */
 template <class T, class L = C1>
 class HistogramPlan : public detail::Plan<QorHistogramSpec> {
-    static constexpr int channels = detail::Facts<L>::channels;
+    static constexpr std::size_t count = detail::Facts<L>::channels;
+    static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
     static_assert(detail::found<decltype(detail::histogram_0<k>())>,
                   "qori::HistogramPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
 
 public:
     /** Given levels, a list for each channel. */
-    HistogramPlan(const float* const (&levels)[channels], const Pixel<int32_t, channels>& counts) noexcept {
+    HistogramPlan(const float* const (&levels)[count], const Pixel<int32_t, count>& counts) noexcept {
         prepare(counts, 0, [&](QorHistogramSpec* plan, uint8_t*) {
             return histogram_init(detail::dataType<T>, levels, counts.data(), channels, plan);
         });
     }
     /** Levels spaced evenly from the lower to the upper one. */
-    HistogramPlan(const Pixel<float, channels>& lower, const Pixel<float, channels>& upper,
-                  const Pixel<int32_t, channels>& counts) noexcept {
+    HistogramPlan(const Pixel<float, count>& lower, const Pixel<float, count>& upper,
+                  const Pixel<int32_t, count>& counts) noexcept {
         prepare(counts, 1, [&](QorHistogramSpec* plan, uint8_t*) {
             return histogram_uniform_init(detail::dataType<T>, lower.data(), upper.data(), counts.data(), channels,
                                           plan);
@@ -294,13 +295,13 @@ public:
         return (*this)(src, hist, buffer);
     }
     /** The levels as they are used: a list for each channel. */
-    [[nodiscard]] QorResult levels(float* const (&lists)[channels]) const noexcept {
+    [[nodiscard]] QorResult levels(float* const (&lists)[count]) const noexcept {
         return *this ? histogram_get_levels(this->get(), lists) : this->status();
     }
 
 private:
     template <class Fill>
-    void prepare(const Pixel<int32_t, channels>& counts, int32_t uniform, Fill&& fill) noexcept {
+    void prepare(const Pixel<int32_t, count>& counts, int32_t uniform, Fill&& fill) noexcept {
         int32_t bytes = 0;
         const QorResult query =
             histogram_get_buffer_size(detail::dataType<T>, {1, 1}, counts.data(), channels, uniform, &bytes, &bytes_);

@@ -1,13 +1,13 @@
 
 /** One element per channel: {1, 2, 3}, or of one channel 1. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Pixel {
 public:
     constexpr Pixel() noexcept = default;
     template <class... U, detail::If<sizeof...(U) == N && (std::is_convertible_v<U, T> && ...)> = 0>
     constexpr Pixel(U... channels) noexcept : values_{static_cast<T>(channels)...} {}
     constexpr Pixel(const T (&channels)[N]) noexcept {
-        for (int i = 0; i < N; ++i) values_[i] = channels[i];
+        for (std::size_t i = 0; i < N; ++i) values_[i] = channels[i];
     }
     constexpr T& operator[](int channel) noexcept { return values_[channel]; }
     constexpr const T& operator[](int channel) const noexcept { return values_[channel]; }
@@ -22,11 +22,11 @@ private:
 namespace detail {
 
 /** Where an operation puts a result per channel: a variable (of one channel), an array, a Pixel or the like. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Results {
 public:
     constexpr Results(T (&results)[N]) noexcept : data(results) {}
-    template <int M = N, If<M == 1> = 0>
+    template <std::size_t M = N, If<M == 1> = 0>
     constexpr Results(T& result) noexcept : data(&result) {}
     template <class S, If<isSpan<S&, T> && sizeof(S) == N * sizeof(T)> = 0>
     constexpr Results(S& results) noexcept : data(results.data()) {}
@@ -73,7 +73,7 @@ private:
 };
 
 /** What lies beyond an image: borderReplicate and so on, or {borderConstant, value per channel}. */
-template <class T, int N>
+template <class T, std::size_t N>
 class Border {
 public:
     constexpr Border(int32_t mode) noexcept : mode_(mode) {}

@@ -55,10 +55,11 @@ class View;
 namespace detail {
 
 /** What a layout is: its digit in keys, elements from pixel to pixel, channels that operations process, planes. */
-template <unsigned Digit, int Stride, int Channels, int Planes = 1>
+template <unsigned Digit, int Stride, std::size_t Channels, std::size_t Planes = 1>
 struct LayoutFacts {
     static constexpr unsigned digit = Digit;
-    static constexpr int stride = Stride, channels = Channels, planes = Planes;
+    static constexpr int stride = Stride;
+    static constexpr std::size_t channels = Channels, planes = Planes;
 };
 template <class L>
 struct Facts : LayoutFacts<0, 1, 1> {};
@@ -267,12 +268,12 @@ class PlanarView {
 public:
     using Element = T;
     using Layout = L;
-    static constexpr int planes = Facts<L>::planes;
+    static constexpr std::size_t planes = Facts<L>::planes;
 
     constexpr PlanarView() noexcept = default;
     constexpr PlanarView(T* const (&data)[planes], int32_t step, QorImageSize size) noexcept
         : step_(step), size_(size) {
-        for (int i = 0; i < planes; ++i) data_[i] = data[i];
+        for (std::size_t i = 0; i < planes; ++i) data_[i] = data[i];
     }
     /** Nothing where steps or sizes differ. */
     constexpr explicit PlanarView(const View<T, C1> (&planesOf)[planes]) noexcept
@@ -280,7 +281,7 @@ public:
         bool alike = true;
         for (const View<T, C1>& p : planesOf)
             alike = alike && p.step() == step_ && p.width() == size_.width && p.height() == size_.height;
-        for (int i = 0; i < planes; ++i) data_[i] = alike ? planesOf[i].data() : nullptr;
+        for (std::size_t i = 0; i < planes; ++i) data_[i] = alike ? planesOf[i].data() : nullptr;
     }
 
     constexpr T* const* data() const noexcept { return data_; }
@@ -292,7 +293,8 @@ public:
 
     /** A plane; nothing where there is none of the number. */
     constexpr View<T, C1> plane(int32_t index) const noexcept {
-        return index >= 0 && index < planes ? View<T, C1>(data_[index], step_, size_) : View<T, C1>();
+        return index >= 0 && index < int32_t(planes) ? View<T, C1>(data_[std::size_t(index)], step_, size_)
+                                                     : View<T, C1>();
     }
     View<T, L> crop(QorImageRect r) const noexcept {
         return each([&](View<T, C1> plane) { return plane.crop(r); });
@@ -305,7 +307,7 @@ private:
     template <class F>
     View<T, L> each(F&& change) const noexcept {
         View<T, C1> changed[planes];
-        for (int i = 0; i < planes; ++i) changed[i] = change(plane(i));
+        for (std::size_t i = 0; i < planes; ++i) changed[i] = change(plane(int32_t(i)));
         return View<T, L>(changed);
     }
     T* data_[planes] = {};

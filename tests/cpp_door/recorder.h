@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // A library that computes nothing and remembers its last call: which member, and with which arguments.
 #pragma once
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: Apache-2.0
 // Pairs of functions that do one thing: c_NAME by qori.h, door_NAME by qori.hpp. Their code is the same.
 #include "qori.hpp"
 
