@@ -1,4 +1,5 @@
 """The documentation's generator: parts of names, statuses in order, recipes, dead links."""
+import re
 import sys
 import tempfile
 import unittest
@@ -9,6 +10,7 @@ sys.path[:0] = [str(ROOT / "tools" / "docs"), str(ROOT / "tools")]
 import links  # noqa: E402
 import reference  # noqa: E402
 import registry  # noqa: E402
+import signatures  # noqa: E402
 
 
 class Reference(unittest.TestCase):
@@ -44,6 +46,15 @@ class Reference(unittest.TestCase):
 
     def test_text_of_the_registry_is_not_markup(self):
         self.assertEqual(reference.escape("a * b < c_d | [e]"), r"a \* b \< c\_d \| \[e\]")
+
+    def test_plans_of_the_signatures_are_those_of_the_cpp_header(self):
+        header = (ROOT / "include" / "qori.hpp").read_text()
+        used = {p.members[0].operation.plan for p in self.pages.values()} - {""}
+        self.assertEqual(set(signatures.PLANS), used)
+        for name, text in signatures.PLANS.items():
+            self.assertRegex(header, rf"class {name}\b")
+            for method in set(re.findall(r"plan\.(\w+)\(", text.replace("WAY", "forward"))):
+                self.assertIn(f"QorResult {method}(", header)
 
     def test_what_does_not_exist_is_an_empty_cell(self):
         table = "\n".join(reference.existing(self.pages["filter_median"]))
