@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Runs a photograph through the library and writes a contact sheet.
+// Runs a photograph through the library and writes a contact sheet; the panels as pictures of their own too, where a
+// folder is named.
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
@@ -50,8 +51,17 @@ void show(const Picture& sheet, int x, int y, const Picture& picture) {
                             sheet.step(), small.size()));
 }
 
-/// Draws a panel, or says why there is none, and returns what is written below it.
-std::string place(const Picture& sheet, const Panel& panel, const Picture& photo, int x, int y) {
+std::string numbered(const std::string& folder, size_t number) {
+    std::string file = folder;
+    file += '/';
+    file += std::to_string(number);
+    file += ".png";
+    return file;
+}
+
+/// Draws a panel, or says why there is none, and returns what is written below it. The file may be none.
+std::string place(const Picture& sheet, const Panel& panel, const Picture& photo, int x, int y,
+                  const std::string& file) {
     if (photo.width() < panel.smallest.width || photo.height() < panel.smallest.height) {
         constexpr uint8_t kEmpty[3] = {32, 35, 42};
         require(qoriSet_8u_C3R(kEmpty, sheet.at(x, y), sheet.step(), kCell));
@@ -59,13 +69,15 @@ std::string place(const Picture& sheet, const Panel& panel, const Picture& photo
     }
     const Result result = timed(panel, photo);
     show(sheet, x, y, result.picture);
+    if (!file.empty()) writePng(file, thumbnail(result.picture, kCell));
     char text[160];
     std::snprintf(text, sizeof text, "%s   %.3f ms, %.0f Mpix/s", panel.functions, result.milliseconds,
                   1e-3 * photo.width() * photo.height() / result.milliseconds);
     return text;
 }
 
-void drawPanels(const Picture& sheet, const Typeface& type, const std::vector<Panel>& panels, const Picture& photo) {
+void drawPanels(const Picture& sheet, const Typeface& type, const std::vector<Panel>& panels, const Picture& photo,
+                const std::string& folder) {
     for (size_t i = 0; i < panels.size(); ++i) {
         const Panel& panel = panels[i];
         const int column = static_cast<int>(i) % kColumns, row = static_cast<int>(i) / kColumns;
@@ -74,7 +86,7 @@ void drawPanels(const Picture& sheet, const Typeface& type, const std::vector<Pa
         std::fflush(stdout);
         std::string text;
         try {
-            text = place(sheet, panel, photo, x, y);
+            text = place(sheet, panel, photo, x, y, folder.empty() ? folder : numbered(folder, i + 1));
         } catch (const std::bad_alloc&) {
             std::puts("out of memory");
             throw;
@@ -88,7 +100,7 @@ void drawPanels(const Picture& sheet, const Typeface& type, const std::vector<Pa
     }
 }
 
-void run(const char* photoFile, const char* sheetFile, const char* fontFile) {
+void run(const char* photoFile, const char* sheetFile, const char* fontFile, const std::string& folder) {
     const Picture photo = readPicture(photoFile);
     const Typeface type(fontFile);
     std::vector<Panel> panels;
@@ -106,7 +118,7 @@ void run(const char* photoFile, const char* sheetFile, const char* fontFile) {
                   version->versionText, static_cast<int>(8 * sizeof(void*)), photo.width(), photo.height());
     std::printf("%s\n", title);
     type.draw(sheet, kGap, 56, 30, title, kBright);
-    drawPanels(sheet, type, panels, photo);
+    drawPanels(sheet, type, panels, photo, folder);
     std::printf("writing %s\n", sheetFile);
     std::fflush(stdout);
     writePng(sheetFile, sheet);
@@ -116,12 +128,12 @@ void run(const char* photoFile, const char* sheetFile, const char* fontFile) {
 }  // namespace demo
 
 int main(int argc, char** argv) {
-    if (argc != 4) {
-        std::fprintf(stderr, "usage: demo PICTURE SHEET.png TYPEFACE.ttf\n");
+    if (argc != 4 && argc != 5) {
+        std::fprintf(stderr, "usage: demo PICTURE SHEET.png TYPEFACE.ttf [FOLDER]\n");
         return 2;
     }
     try {
-        demo::run(argv[1], argv[2], argv[3]);
+        demo::run(argv[1], argv[2], argv[3], argc == 5 ? argv[4] : "");
         return 0;
     } catch (const std::bad_alloc&) {
         std::fprintf(stderr, "demo: out of memory\n");
