@@ -64,7 +64,6 @@ class Case:
         self.member, self.operation, self.rng = member, member.operation, np.random.default_rng(seed)
         self.height, self.width, self.margins = 11, 13, (0, 0, 0, 0)
         self.python, self.c, self.made, self.results, self.keep = {}, [], [], [], []
-        self.scratch = self.rng.integers(0, 255, 1 << 20, "u1")
         self.layout, self.in_place = member.layout, "I" in member.kind
         self.names = {a.name for a in member.arguments}
         self.source, self.target = member.source, member.target
@@ -397,7 +396,9 @@ class Case:
         self.c.append(ct.c_void_p(_core._address(self.plan)))
 
     def buffer(self, argument):
-        self.c.append(ct.c_void_p(address(self.scratch)))
+        scratch = self.rng.integers(0, 255, 1 << 20, "u1")
+        self.keep.append(scratch)
+        self.c.append(ct.c_void_p(address(scratch)))
 
     def call_c(self):
         function = getattr(LIBRARY, self.member.name)
