@@ -64,6 +64,9 @@ set_target_properties(readme_example PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJE
 add_test(NAME readme_example COMMAND readme_example)
 set_tests_properties(readme_example PROPERTIES PASS_REGULAR_EXPRESSION "green of pixel \\(9, 9\\): 128")
 
+add_test(NAME readme_is_current COMMAND ${python} ${checks}/readme_is_current.py ${readme}
+    ${PROJECT_SOURCE_DIR}/examples/python/first_steps.py ${PROJECT_SOURCE_DIR}/examples/cpp/first.cpp)
+
 # Every header of the library compiles alone, and all of them in one source: names that mean two things show there.
 if(NOT WIN32)
     set(headers_folder ${CMAKE_CURRENT_BINARY_DIR}/headers)
