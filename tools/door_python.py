@@ -1,21 +1,17 @@
-"""The Python door: tables of operations, forms and argument programs for python/src, stubs and lists of names.
+"""The Python door: the tables that python/src includes, and the check that nothing is left out.
 
-An operation is one function of the package. A form is what one C member, with its in-place twin where there is one, makes
-of it: element types, layouts, the parameters that it takes. A program says where each C argument of a member comes from.
+A program says where each C argument of a member comes from; a trampoline calls what has one erased signature.
 """
 import re
-from collections import defaultdict
-from dataclasses import dataclass, field
 
+from door_python_model import (ELEMENTS, ENUMS, OUT, OUT2, MASK, PLAN_TYPES, SRC, SRC2, doc, elements_of, enum_word, functions,
+                               key_of, public)
+from door_python_stubs import package_stub, stub
 from registry import ROOT, RegistryError, all_members, processed
 import roles
 
-ELEMENTS = ["uint8_t", "int8_t", "uint16_t", "int16_t", "uint32_t", "int32_t", "int64_t", "float", "double",
-            "QorComplex16s", "QorComplex32s", "QorComplex32f"]
 ERASED = {"int64_t": "l", "QorImageSize": "l", "QorPoint2D": "l", "QorComplex32s": "l", "float": "f", "double": "d",
           "QorComplex32f": "c"}
-SRC, SRC2, OUT, MASK, OUT2 = range(5)
-ALPHA, CHANNEL, PLANAR = 8, 16, 32
 # The plans' types, and which of a plan's variants each operation takes (python/src/plans.h).
 PLANS = {"ResizeNearest": "NEAREST", "ResizeLinear": "LINEAR", "ResizeCubic": "CUBIC", "ResizeLanczos": "LANCZOS",
          "ResizeSuper": "SUPER", "ResizeAntialiasing": "ANTIALIAS", "WarpAffineNearest": "NEAREST",
@@ -23,8 +19,6 @@ PLANS = {"ResizeNearest": "NEAREST", "ResizeLinear": "LINEAR", "ResizeCubic": "C
          "FilterBorder": "ANY", "ThresholdAdaptiveGauss": "ANY", "HOG": "ANY", "DFTFwd_RToPack": "REAL",
          "DFTInv_PackToR": "REAL", "DFTFwd_CToC": "COMPLEX", "DFTInv_CToC": "COMPLEX", "FFTFwd_RToPack": "REAL",
          "FFTInv_PackToR": "REAL", "FFTFwd_CToC": "COMPLEX", "FFTInv_CToC": "COMPLEX"}
-PLAN_TYPES = ["ResizePlan", "WarpAffinePlan", "DctPlan", "DftPlan", "FftPlan", "HistogramPlan", "LinearFilterPlan",
-              "AdaptiveGaussPlan", "HogPlan"]
 # How the bytes of work memory are asked for, by the query's arguments.
 QUERIES = {("region", "size", "data_type", "channels", "bytes"): "WINDOW",
            ("size_of", "size_of", "flags", "bytes"): "CORRELATION", ("size_of", "columns", "bytes"): "KERNEL_ROW",
@@ -34,196 +28,6 @@ QUERIES = {("region", "size", "data_type", "channels", "bytes"): "WINDOW",
            ("size_of", "region", "data_type", "data_type", "channels", "bytes", "bytes"): "FILTER_BORDER",
            ("region", "size", "data_type", "channels", "bytes", "bytes"): "ADAPTIVE"}
 
-
-@dataclass
-class Parameter:
-    name: str
-    kind: str                       # KIND_... of python/src/core.h
-    image: int = -1
-    enum: str = ""
-    default: str | None = None
-    annotation: str = "Any"
-    optional: bool = False
-
-
-@dataclass
-class Form:
-    member: object
-    twin: object = None             # in place
-    accepts: set = field(default_factory=set)
-    requires: set = field(default_factory=set)
-
-
-@dataclass
-class Function:
-    name: str
-    parameters: list = field(default_factory=list)
-    positional: int = 0
-    forms: list = field(default_factory=list)
-
-    def index(self, name, kind=None):
-        for i, p in enumerate(self.parameters):
-            if p.name == name and (kind is None or p.kind == kind):
-                return i
-        return -1
-
-
-# --- what a member's arguments mean to a caller ---------------------------------------------------------------------
-
-def layout_class(layout):
-    channels = int(re.search(r"\d", layout)[0])
-    return channels | (ALPHA if layout.startswith("A") else 0) | (PLANAR if "P" in layout else 0)
-
-
-def layouts(member, inserts):
-    """Classes of the source's and the destination's pixels as a caller sees them: alpha that is kept is the
-    destination's matter, or the source's where there is no destination."""
-    code = member.layout
-    source, target = layout_class(member.source_layout.rstrip("C") if code in ("C3C", "C4C") else member.source_layout), 0
-    target = layout_class(member.target_layout.rstrip("C") if code in ("C3C", "C4C") else member.target_layout)
-    if code in ("C3C", "C4C"):
-        source, target = source | CHANNEL, target | CHANNEL
-    elif code in ("C3C1", "C4C1"):
-        source |= CHANNEL
-    elif code in ("C1C3", "C1C4") and inserts:
-        target |= CHANNEL
-    elif code == "AC4C3":
-        source &= ~ALPHA
-    if "24u" in member.types:
-        target = 3
-    elif member.operation.extent == "windows":
-        target = 1
-    return source, target
-
-
-def annotation(argument):
-    return {"value": "Value", "scalar": "float" if argument.element in ("float", "double") else "int", "enum": "str | int",
-            "flags": "str | int", "size": "tuple[int, int]", "point": "tuple[int, int]", "kernel": "Array",
-            "lists_in": "Lists", "plan_in": "Plan", "mask": "Array"}.get(argument.kind, "Any")
-
-
-def public(argument, member):
-    """The function's parameters that a C argument asks for: (name, kind, image)."""
-    kind, name = argument.kind, argument.name
-    if kind in ("image_in", "planes_in", "array_in", "rows_in") and name not in ("weights", "locations"):
-        return [(name, "IMAGE", SRC if name in ("src", "a") else SRC2)]
-    if kind in ("image_inout", "array_inout"):
-        return [(name, "IMAGE", SRC if name in ("src", "a") else SRC2), ("out", "OUT", OUT)]
-    if kind in ("image_out", "planes_out", "array_out", "lists_out"):
-        if name == "levels":
-            return [("levels", "COUNTS", -1)]
-        return [("out", "OUT", OUT)]
-    if kind == "mask":
-        return [(name, "IMAGE", MASK)]
-    simple = {"value": "VALUE", "scalar": "NUMBER", "enum": "ENUM", "flags": "FLAGS", "size": "SIZE", "point": "POINT",
-              "kernel": "KERNEL", "plan_in": "PLAN", "lists_in": "LISTS"}
-    if kind == "array_in":
-        return [(name, "VECTOR" if name == "weights" else "POINTS", -1)]
-    if kind == "rows":
-        return [("before", "SIZE", -1), ("after", "SIZE", -1)]
-    if kind in simple:
-        return [(name, simple[kind], -1)]
-    if kind in ("step", "region", "size_of", "count", "bits", "buffer", "channels", "data_type", "result", "columns"):
-        return []
-    raise RegistryError(f"{member.name}: the Python door cannot make {argument.c_name}, a {kind}")
-
-
-def optional(argument, kind, operation):
-    return (argument.default is not None or kind == "OUT" or argument.name == "anchor" or
-            (kind == "SIZE" and argument.kind == "rows") or argument.name == "locations")
-
-
-def collect(members):
-    """The function of an operation's members: its forms and parameters."""
-    function = Function(members[0].operation.snake)
-    codes = {m.layout for m in members}
-    inserts = "C3C" in codes and "C1C3" in codes
-    pairs = {}
-    for member in members:
-        key = (member.c_operation, member.types, member.layout, member.suffix, member.kind.replace("I", ""))
-        form = pairs.setdefault(key, Form(None))
-        if "I" in member.kind:
-            form.twin = member
-        else:
-            form.member = member
-    found = {}                      # (name, kind) in order: [parameter, forms that require it]
-    for form in pairs.values():
-        form.inserts = inserts
-        for member in filter(None, (form.member, form.twin)):
-            for argument in member.arguments:
-                for name, kind, image in public(argument, member):
-                    entry = found.setdefault((name, kind), Parameter(
-                        name, kind, image, argument.detail if kind in ("ENUM", "FLAGS") else
-                        member.operation.plan if kind == "PLAN" else "", argument.default,
-                        annotation(argument)))
-                    form.accepts.add((name, kind))
-                    if not optional(argument, kind, member.operation) and name != "after":
-                        form.requires.add((name, kind))
-        source, target = layouts(form.member or form.twin, inserts)
-        form.layouts = source, target
-    function.forms = sorted(pairs.values(), key=lambda f: (key_of(f), len(f.accepts), (f.member or f.twin).name))
-    everywhere = set.intersection(*(f.requires for f in function.forms))
-    either = {("b", "IMAGE"), ("b", "VALUE")}
-    required = [p for k, p in found.items() if (k in everywhere or k in either) and p.kind != "OUT"]
-    images = sorted((p for p in required if p.kind == "IMAGE"), key=lambda p: p.image)
-    images += [p for p in required if p.name == "b" and p.kind == "VALUE"]
-    plans = [p for p in required if p.kind == "PLAN"]
-    others = [p for p in required if p not in images and p not in plans]
-    others.sort(key=lambda p: ["KERNEL", "LISTS", "VECTOR"].index(p.kind) if p.kind in ("KERNEL", "LISTS", "VECTOR") else 3)
-    out = [p for p in found.values() if p.kind == "OUT"]
-    rest = [p for p in found.values() if p not in required and p.kind != "OUT"]
-    for p in rest:
-        p.optional = True
-    if not any(p.kind == "IMAGE" for p in images):              # fills what is given
-        for p in out:
-            p.optional, p.name = False, "dst"
-        function.parameters = out + others + rest
-        function.positional = len(out + others)
-    else:
-        for p in out:
-            p.optional = True
-        function.parameters = images + plans + others + out + rest
-        function.positional = len(images + plans + others + out)
-    add_choices(function, codes)
-    return function
-
-
-def add_choices(function, codes):
-    """Keywords that choose among forms of one signature."""
-    classes = [f.layouts for f in function.forms]
-    if any((source | target) & ALPHA for source, target in classes):
-        function.parameters.append(Parameter("keep_alpha", "KEEP_ALPHA", default="False", annotation="bool", optional=True))
-    if any((source | target) & CHANNEL for source, target in classes):
-        function.parameters.append(Parameter("channel", "CHANNEL", annotation="int", optional=True))
-    if function.index("out") < 0:
-        return
-    targets, channels = defaultdict(set), defaultdict(set)
-    for form in function.forms:
-        m = form.member or form.twin
-        targets[m.source, form.layouts[0]].add(m.target)
-        channels[m.source, form.layouts[0] & 7].add(form.layouts[1] & 7)
-    if any(len(t) > 1 for t in targets.values()):
-        function.parameters.append(Parameter("dtype", "DTYPE", annotation="DType", optional=True))
-    if function.name == "duplicate":
-        function.parameters.append(Parameter("channels", "CHANNELS", annotation="int", optional=True))
-    if any((f.member or f.twin).operation.extent == "bits" for f in function.forms):
-        function.parameters.append(Parameter("width", "WIDTH", annotation="int", optional=True))
-
-
-def functions(families):
-    groups = defaultdict(list)
-    for family in families:
-        for member in (m for g in family.groups for m in g.members):
-            if member.purpose == "operation":
-                groups[member.operation.snake].append(member)
-    found = [collect(groups[name]) for name in sorted(groups)]
-    for function in found:
-        if len(function.parameters) > 24:
-            raise RegistryError(f"{function.name}: more parameters than the Python door counts")
-    return found
-
-
-# --- C tables -------------------------------------------------------------------------------------------------------
 
 def erased(member):
     return "".join("p" if a.stars else ERASED.get(a.element, "i") for a in member.arguments)
@@ -238,7 +42,6 @@ def element(c_type, member):
 def instruction(argument, before, member, function, results):
     """(operation, a, b, c) of python/src/core.h for one C argument."""
     kind = argument.kind
-    in_place = "I" in member.kind
     frame = member.operation.extent == "frame"
     if kind == "step":
         return ("STEP", before[1], 0, 0)
@@ -390,47 +193,6 @@ def quoted(text):
     return '"' + text.replace("\\", "\\\\").replace('"', '\\"').replace("\n", "\\n") + '"'
 
 
-def signature(function):
-    parts = []
-    for i, p in enumerate(function.parameters):
-        if p.name == "b" and p.kind == "VALUE" and i and function.parameters[i - 1].name == "b":
-            continue
-        if i == function.positional:
-            parts.append("*")
-        default = "" if not p.optional else "=" + default_text(p)
-        parts.append(p.name + default)
-    return f"{function.name}({', '.join(parts)})"
-
-
-def default_text(p):
-    if p.default is None or p.kind == "POINT":
-        return "None"
-    if p.kind in ("ENUM", "FLAGS"):
-        return "0" if p.default == "0" else repr(enum_word(p.enum, p.default))
-    return p.default
-
-
-def enum_word(enum, name):
-    """The word for an enumerator: its name in snake_case without the prefix that all of its enumeration share."""
-    names = ENUMS[enum]
-    first = [re.match(r"[a-z]+", n)[0] for n in names]
-    prefix = first[0] if all(f == first[0] for f in first) and all(len(n) > len(first[0]) for n in names) else ""
-    return roles.snake_case(name[len(prefix):]).replace("_axis", "").strip("_")
-
-
-def doc(function):
-    briefs = list(dict.fromkeys((f.member or f.twin).group.keys["brief"] for f in function.forms))
-    members = [m for f in function.forms for m in (f.member, f.twin) if m]
-    lines = [signature(function), "--", ""] + briefs
-    if any(m.operation.reversed for m in members):
-        lines += ["", "The arguments stand in their natural order; the C functions take them the other way round."]
-    names = list(dict.fromkeys("qori" + m.c_operation for m in members))
-    return "\n".join(lines + ["", "C: " + ", ".join(names) + "."])
-
-
-ENUMS = roles.enumerations((ROOT / "api" / "header.h.in").read_text())
-
-
 def statuses(header):
     body = re.search(r"typedef enum QorStatusCode \{(.*?)\n\}", header, re.DOTALL)[1]
     found = []
@@ -512,23 +274,6 @@ def index_table(function):
         "{" + ", ".join(f"{{{lo}, {n}}}" for lo, n in row) + "}" for row in spans(function)) + "}};\n"
 
 
-def reads(member):
-    return any(a.kind.endswith(("_in", "_inout")) and a.kind != "plan_in" for a in member.arguments)
-
-
-def elements_of(member):
-    """Of the first image that is given and of the destination; names without element types tell by their arguments."""
-    if member.source == "void":
-        return (next(a.element for a in member.arguments if a.stars),) * 2
-    return member.source if reads(member) else member.target, member.target
-
-
-def key_of(form):
-    main = form.member or form.twin
-    layout = form.layouts[0 if reads(main) else 1]
-    return ELEMENTS.index(elements_of(main)[0]), (layout & 7) + (5 if layout & PLANAR else 0)
-
-
 def spans(function):
     table = [[(0, 0)] * 10 for _ in ELEMENTS]
     for i, form in enumerate(function.forms):
@@ -548,172 +293,6 @@ def trampolines(signatures):
         passed = ", ".join(f"a[{i}].{c}" for i, c in enumerate(letters))
         text.append(f"static int call_{n}(Function f, const Slot* a) {{ return ((int32_t (*)({declared}))f)({passed}); }}")
     return text + ["static const Trampoline trampolines[] = {" + ", ".join(f"call_{n}" for n in signatures.values()) + "};"]
-
-
-# --- stubs ----------------------------------------------------------------------------------------------------------
-
-STUB = '''# Generated by tools/apigen.py.
-from collections.abc import Sequence
-from typing import Any, TypeAlias, final
-
-from numpy.typing import NDArray
-
-Array: TypeAlias = NDArray[Any]
-Number: TypeAlias = float | complex
-Value: TypeAlias = Number | Sequence[Number] | Array
-Numbers: TypeAlias = float | tuple[float, ...]
-Position: TypeAlias = tuple[int, int] | tuple[tuple[int, int], ...]
-Lists: TypeAlias = Array | Sequence[float] | Sequence[Array] | Sequence[Sequence[float]]
-Pair: TypeAlias = int | tuple[int, int] | Sequence[int]
-DType: TypeAlias = str | type | Any
-Source: TypeAlias = "Array | memoryview | Image"
-
-class Error(ValueError):
-    code: int
-
-class Warning(UserWarning): ...
-
-@final
-class Image:
-    @property
-    def shape(self) -> tuple[int, ...]: ...
-    @property
-    def dtype(self) -> str: ...
-
-def empty(shape: tuple[int, int] | tuple[int, int, int], dtype: DType = "uint8") -> Image: ...
-def version() -> str: ...
-def _members() -> list[tuple[str, str | None, str | None]]: ...
-def _member(function: str, /, *arguments: Any, **keywords: Any) -> str: ...
-def _address(plan: Any, /) -> int: ...
-
-class _ImagePlan:
-    @property
-    def src_shape(self) -> tuple[int, int]: ...
-    @property
-    def dst_shape(self) -> tuple[int, int]: ...
-    @property
-    def dtype(self) -> str: ...
-    @property
-    def border(self) -> tuple[int, int, int, int]: ...
-
-@final
-class ResizePlan(_ImagePlan):
-    def __new__(cls, src_shape: Pair, dst_shape: Pair, interpolation: str = "linear", dtype: DType = "uint8", *,
-                antialias: bool = False, b: float = 0.0, c: float = 0.5, lobes: int = 3) -> ResizePlan: ...
-    def __call__(self, src: Source, out: Source | None = None, *, offset: Pair | None = None, border: str | int = "replicate",
-                 border_value: Value = 0) -> Array: ...
-    def src_offset(self, offset: Pair, /) -> tuple[int, int]: ...
-    def src_roi(self, rect: tuple[int, int, int, int], /) -> tuple[tuple[int, int, int, int], tuple[int, int, int, int]]: ...
-
-@final
-class WarpAffinePlan(_ImagePlan):
-    def __new__(cls, src_shape: Pair, dst_shape: Pair, matrix: Sequence[Sequence[float]] | Array, interpolation: str = "linear",
-                dtype: DType = "uint8", channels: int = 1, *, inverse: bool = False, border: str | int = "constant",
-                border_value: Value = 0, b: float = 0.0, c: float = 0.5) -> WarpAffinePlan: ...
-    def __call__(self, src: Source, out: Source | None = None, *, offset: Pair | None = None) -> Array: ...
-
-class _Transform(_ImagePlan):
-    def forward(self, src: Source, out: Source | None = None, *, scale: int = 0, keep_alpha: bool = False) -> Array: ...
-    def inverse(self, src: Source, out: Source | None = None, *, scale: int = 0, keep_alpha: bool = False) -> Array: ...
-
-@final
-class DctPlan(_Transform):
-    def __new__(cls, shape: Pair, *, hint: str | int = "fast") -> DctPlan: ...
-
-@final
-class DftPlan(_Transform):
-    def __new__(cls, shape: Pair, dtype: DType = "float32", *, norm: str | int = "div_inv_by_n",
-                hint: str | int = "fast") -> DftPlan: ...
-
-@final
-class FftPlan(_Transform):
-    def __new__(cls, shape: Pair, dtype: DType = "float32", *, norm: str | int = "div_inv_by_n",
-                hint: str | int = "fast") -> FftPlan: ...
-
-@final
-class HistogramPlan:
-    def __new__(cls, levels: Lists | int, dtype: DType = "uint8", channels: int = 1, *, lower: Value | None = None,
-                upper: Value | None = None) -> HistogramPlan: ...
-    def __call__(self, src: Source, out: Any = None) -> Any: ...
-    @property
-    def dtype(self) -> str: ...
-    @property
-    def levels(self) -> tuple[tuple[float, ...], ...]: ...
-
-@final
-class LinearFilterPlan:
-    def __new__(cls, kernel: Source, dtype: DType = "uint8", channels: int = 1, *, divisor: int = 1,
-                rounding: str | int = "nearest_even") -> LinearFilterPlan: ...
-    def __call__(self, src: Source, out: Source | None = None, *, border: str | int = "replicate",
-                 border_value: Value = 0) -> Array: ...
-    @property
-    def dtype(self) -> str: ...
-
-@final
-class AdaptiveGaussPlan:
-    def __new__(cls, size: Pair, *, sigma: float = 0.0) -> AdaptiveGaussPlan: ...
-    def __call__(self, src: Source, delta: float, out: Source | None = None, *, value_above: int = 255, value_below: int = 0,
-                 border: str | int = "replicate", border_value: Value = 0) -> Array: ...
-    @property
-    def dtype(self) -> str: ...
-
-@final
-class HogPlan:
-    def __new__(cls, window: Pair = (128, 64), *, cell: int = 8, block: int = 16, stride: int = 8, bins: int = 9,
-                sigma: float = 8.0, limit: float = 0.2, columns_first: bool = False) -> HogPlan: ...
-    def __call__(self, src: Source, out: Source | None = None, *, locations: Sequence[Pair] | Array | None = None,
-                 border: str | int = "replicate", border_value: Value = 0) -> Array: ...
-    @property
-    def descriptor_size(self) -> int: ...
-
-'''
-ANNOTATIONS = {"IMAGE": "Source", "OUT": "Source", "VALUE": "Value", "ENUM": "str | int", "FLAGS": "str | int", "SIZE": "Pair",
-               "POINT": "Pair", "KERNEL": "Source", "LISTS": "Lists", "VECTOR": "Lists", "POINTS": "Sequence[Pair] | Array",
-               "COUNTS": "int | Sequence[int]", "KEEP_ALPHA": "bool", "CHANNEL": "int", "DTYPE": "DType", "CHANNELS": "int",
-               "WIDTH": "int"}
-
-
-def annotated(function, p):
-    text = p.enum if p.kind == "PLAN" else ANNOTATIONS.get(p.kind, p.annotation)
-    if p.kind == "IMAGE" and p.name == "b" and function.index("b", "VALUE") > 0:
-        text = "Source | Value"
-    levels = any((f.member or f.twin).operation.extent in ("levels", "blocks") for f in function.forms)
-    if p.kind == "OUT" and levels:
-        text = "Any"
-    if not p.optional:
-        return f"{p.name}: {text}"
-    default = default_text(p)
-    return f"{p.name}: {text} | None = {default}" if default == "None" and text != "Any" else f"{p.name}: {text} = {default}"
-
-
-def returned(function):
-    main = function.forms[0].member or function.forms[0].twin
-    if main.operation.extent in ("levels", "blocks"):
-        return "Any"
-    results = [a.name for a in main.arguments if a.kind == "result"]
-    if not results:
-        return "Array"
-    parts = ["Position" if name == "column" else "Numbers" for name in results if name != "row"]
-    return parts[0] if len(parts) == 1 else f"tuple[{', '.join(parts)}]"
-
-
-def stub(families):
-    lines = []
-    for function in functions(families):
-        parts = []
-        for i, p in enumerate(function.parameters):
-            if p.name == "b" and p.kind == "VALUE" and i and function.parameters[i - 1].name == "b":
-                continue
-            if i == function.positional:
-                parts.append("*")
-            parts.append(annotated(function, p))
-        lines.append(f"def {function.name}({', '.join(parts)}) -> {returned(function)}: ...")
-    return STUB + "\n".join(lines) + "\n"
-
-
-def package_stub(families):
-    names = sorted([f.name for f in functions(families)] + [*PLAN_TYPES, "Error", "Warning", "Image", "empty", "version"])
-    return "# Generated by tools/apigen.py.\n" + "".join(f"from ._core import {n} as {n}\n" for n in names) + "\n__version__: str\n"
 
 
 # --- completeness ---------------------------------------------------------------------------------------------------

@@ -8,6 +8,11 @@
 
 /* Memory of a call, freed at its end. */
 void* allocate(Call* call, size_t bytes) {
+    if (bytes <= sizeof call->small - (size_t)call->small_used) {
+        void* small = call->small + call->small_used;
+        call->small_used += (int)(bytes + 63) & ~63;
+        return small;
+    }
     if (call->block_count == (int)(sizeof call->blocks / sizeof *call->blocks)) {
         refuse(PyExc_ValueError, call, NULL, "more lists came than a call keeps");
         return NULL;

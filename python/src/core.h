@@ -268,6 +268,8 @@ typedef struct Call {
     } values[8], results[6];
     int value_count;
     Slot slots[MAX_SLOTS];
+    int small_used;
+    _Alignas(64) uint8_t small[2048]; /* for what a small call needs, without malloc */
 } Call;
 
 /* --- module.c: what is imported once; one interpreter --- */

@@ -62,7 +62,7 @@ int find_numpy(int import_it) {
     PyObject* name = PyUnicode_FromString("numpy");
     PyObject* numpy = name ? PyImport_GetModule(name) : NULL;
     Py_XDECREF(name);
-    if (numpy == Py_None) Py_CLEAR(numpy);              /* an import that has been forbidden */
+    if (numpy == Py_None) Py_CLEAR(numpy); /* an import that has been forbidden */
     if (!numpy) {
         if (PyErr_Occurred() || !import_it) return PyErr_Occurred() ? -1 : 0;
         numpy = PyImport_ImportModule("numpy");

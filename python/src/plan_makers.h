@@ -61,6 +61,17 @@ int32_t type_code(int element);
 int plan_serves(const Plan* plan, const Form* form);
 int offset_source(Call* call);
 
+/* plan_parts.c: a call that only names the constructor, for refusals; then what fills a plan. Deallocation returns what
+ * a constructor has filled so far. */
+Call* named(Call* call, Operation* operation, const char* name);
+int shape_of(const Call* call, const char* name, PyObject* object, QorImageSize* size);
+int element_from(const Call* call, PyObject* dtype, const char* accepted, uint32_t elements, int* element);
+Plan* new_plan(PyTypeObject* type, int kind, int variant, int element);
+int take_memory(Plan* plan, int32_t bytes);
+PyObject* finish(Plan* plan, Call* call, const char* member, int status);
+void set_shapes(Plan* plan, QorImageSize source, QorImageSize target);
+void set_border(Plan* plan, QorBorderExtent border);
+
 PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keywords);
 PyObject* make_warp(PyTypeObject* type, PyObject* arguments, PyObject* keywords);
 PyObject* make_dct(PyTypeObject* type, PyObject* arguments, PyObject* keywords);

@@ -1,0 +1,62 @@
+/* What constructors of plans share. */
+#include "plan_makers.h"
+
+#include <stdlib.h>
+#include <string.h>
+
+/* A call that only names the constructor, for refusals. */
+Call* named(Call* call, Operation* operation, const char* name) {
+    memset(operation, 0, sizeof *operation);
+    operation->name = name;
+    return start_call(call, operation);
+}
+
+int shape_of(const Call* call, const char* name, PyObject* object, QorImageSize* size) {
+    return read_pair(call, name, object, &size->height, &size->width);
+}
+
+int element_from(const Call* call, PyObject* dtype, const char* accepted, uint32_t elements, int* element) {
+    *element = dtype ? element_of_type(dtype) : elements & 1u << U8 ? U8 : F32;
+    if (*element >= 0 && elements >> *element & 1) return 0;
+    return refuse(PyExc_TypeError, call, "dtype", "%.80R came; accepted are %s", dtype, accepted);
+}
+
+/* Deallocation returns what a constructor has filled so far. */
+Plan* new_plan(PyTypeObject* type, int kind, int variant, int element) {
+    Plan* plan = (Plan*)((allocfunc)PyType_GetSlot(type, Py_tp_alloc))(type, 0);
+    if (!plan) return NULL;
+    plan->kind = (uint8_t)kind;
+    plan->variant = (uint8_t)variant;
+    plan->element = (uint8_t)element;
+    plan->target = NO_ELEMENT;
+    plan->free_memory = free;
+    plan->vectorcall = call_plan_directly;
+    return plan;
+}
+
+int take_memory(Plan* plan, int32_t bytes) {
+    plan->memory = calloc(bytes > 0 ? (size_t)bytes : 1, 1);
+    if (!plan->memory) PyErr_NoMemory();
+    return plan->memory ? 0 : -1;
+}
+
+PyObject* finish(Plan* plan, Call* call, const char* member, int status) {
+    free_call(call);
+    if (!PyErr_Occurred() && (!status || !status_result(call, member, status)) && plan->text) return (PyObject*)plan;
+    Py_DECREF((PyObject*)plan);
+    return NULL;
+}
+
+void set_shapes(Plan* plan, QorImageSize source, QorImageSize target) {
+    plan->source_height = source.height;
+    plan->source_width = source.width;
+    plan->height = target.height;
+    plan->width = target.width;
+}
+
+void set_border(Plan* plan, QorBorderExtent border) {
+    plan->top = border.top;
+    plan->left = border.left;
+    plan->bottom = border.bottom;
+    plan->right = border.right;
+}
