@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Calls exports the way an awkward caller would: from a stack aligned no better than the system asks (4 bytes, 16 on
-// 64-bit Windows) and under every rounding mode, with subnormals flushed and exceptions trapping in turn, and checks that
-// the control register and, on 64-bit Windows, the vector registers of the caller come back as they were.
+// 64-bit Windows) and under every rounding mode, with subnormals flushed and exceptions trapping in turn, and checks
+// that the control register and, on 64-bit Windows, the vector registers of the caller come back as they were.
 #pragma once
 #include <gtest/gtest.h>
 
