@@ -152,7 +152,9 @@ def save(picture, path):
         picture.save(path, "WEBP", quality=quality, method=2)
     else:
         picture.save(path, "WEBP", lossless=True, quality=40, method=2)
-    while path.stat().st_size > LIMIT and quality > 20:
+    while path.stat().st_size > LIMIT and quality > 10:
         quality -= 16
+        if quality < 50:
+            picture.thumbnail([side * 4 // 5 for side in picture.size])
         picture.save(path, "WEBP", quality=quality, method=2)
     return path.name
