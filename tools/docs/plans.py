@@ -188,9 +188,8 @@ class HogConfig(ct.Structure):
     _fields_ = [("integers", ct.c_int32 * 5), ("sigma", ct.c_float), ("limit", ct.c_float), ("window", Pair)]
 
 
-def hog_plan(model, window=(128, 64), *, cell=8, stride=None, bins=9, sigma=8.0, limit=0.2, columns_first=False):
-    stride = cell if stride is None else stride
-    integers = [int(columns_first), cell, 2 * cell, stride, bins]
+def hog_plan(model, window=(128, 64), *, cell=8, block=16, stride=8, bins=9, sigma=8.0, limit=0.2, columns_first=False):
+    integers = [int(columns_first), cell, block, stride, bins]
     config = HogConfig((ct.c_int32 * 5)(*integers), sigma, limit, Pair(window[1], window[0]))
     model.keep.append(config)
     texts = [*map(str, integers), literal(sigma), literal(limit), f"{{{window[1]}, {window[0]}}}"]

@@ -100,6 +100,27 @@ def graph(values, low=None, high=None):
     return np.array(picture)
 
 
+def gradients(descriptor, window, cell=8, bins=9):
+    """Of each cell the edges that its histogram tells, one stroke a bin, as bright as the mean of its blocks."""
+    rows, columns = window[0] // cell, window[1] // cell
+    blocks = np.asarray(descriptor).reshape(rows - 1, columns - 1, 2, 2, bins)
+    total, count = np.zeros((rows, columns, bins)), np.zeros((rows, columns, 1))
+    for i in range(2):
+        for j in range(2):
+            total[i:rows - 1 + i, j:columns - 1 + j] += blocks[:, :, i, j]
+            count[i:rows - 1 + i, j:columns - 1 + j] += 1
+    mean, size = total / count, 3 * cell
+    light = np.clip(mean * (255 / mean.max()), 0, 255).astype(int)
+    picture = Image.new("L", (columns * size, rows * size))
+    draw = ImageDraw.Draw(picture)
+    for row, column, index in sorted(np.ndindex(mean.shape), key=lambda place: light[place]):
+        along = (index + 0.5) * np.pi / bins + np.pi / 2
+        x, y = (column + 0.5) * size, (row + 0.5) * size
+        dx, dy = 0.45 * size * np.cos(along), 0.45 * size * np.sin(along)
+        draw.line((x - dx, y - dy, x + dx, y + dy), int(light[row, column, index]), 2)
+    return np.array(picture.resize((columns * size // 2, rows * size // 2), Image.Resampling.BOX))
+
+
 def picture_of(array, crop=None):
     """Bytes as they are shown: a part magnified, small ones enlarged, alpha over squares."""
     array = np.asarray(array)
@@ -131,7 +152,9 @@ def save(picture, path):
         picture.save(path, "WEBP", quality=quality, method=2)
     else:
         picture.save(path, "WEBP", lossless=True, quality=40, method=2)
-    while path.stat().st_size > LIMIT and quality > 20:
+    while path.stat().st_size > LIMIT and quality > 10:
         quality -= 16
+        if quality < 50:
+            picture.thumbnail([side * 4 // 5 for side in picture.size])
         picture.save(path, "WEBP", quality=quality, method=2)
     return path.name
