@@ -261,6 +261,7 @@ def doc(function):
     members = [m for f in function.forms for m in (f.member, f.twin) if m]
     lines = [signature(function), "--", ""] + briefs
     if any(m.operation.reversed for m in members):
-        lines += ["", "The arguments stand in their natural order; the C functions take them the other way round."]
+        c_name = "qori" + next(m.c_operation for m in members if m.operation.reversed)
+        lines += ["", f"{function.name}(a, b, out) stands in the natural order: what C writes as {c_name}(b, a, out)."]
     names = list(dict.fromkeys("qori" + m.c_operation for m in members))
     return "\n".join(lines + ["", "C: " + ", ".join(names) + "."])

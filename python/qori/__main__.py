@@ -4,6 +4,7 @@ list   the operations, one a line
 show   an operation's arguments and the C members behind it
 run    an operation on a picture file, into another (needs Pillow): python -m qori run mirror in.png out.png axis=vertical
 """
+# pyright: reportPrivateUsage=false
 import ast
 import inspect
 import sys

@@ -83,7 +83,7 @@ static int bits_step(Call* call, const Step* steps, Slot* slot) {
     (void)steps;
     int bits = 0;
     while (bits < 30 && 1 << bits < call->counts[0]) ++bits;
-    for (int i = 0; i < 3; ++i)
+    for (int i = 0; i < 4; ++i)
         if ((!i || call->counts[i]) && call->counts[i] != 1 << bits)
             return refuse(PyExc_ValueError, call, "table",
                           "%d entries came; accepted are powers of 2, the same for all channels", call->counts[i]);

@@ -154,6 +154,7 @@ REFUSED = [
     (lambda a: qori.ResizePlan((8, 8), (4, 4), "best"), ValueError, "'lanczos3'"),
     (lambda a: qori.FftPlan((8, 12)), ValueError, "powers of 2"),
     (lambda a: qori.lut_palette(a, np.zeros(100, "u1")), ValueError, "powers of 2"),
+    (lambda a: qori.lut_palette(np.zeros((2, 2, 4), "u1"), [np.zeros(n, "u1") for n in (8, 8, 8, 2)]), ValueError, "2 entries"),
     (lambda a: qori.histogram_range(a, np.arange(5)), TypeError, "accepted is int32"),
 ]
 

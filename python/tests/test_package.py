@@ -23,7 +23,7 @@ def test_command_line(tmp_path):
     names = python("-m", "qori", "list").stdout.split()
     assert "add" in names and "resize" in names
     shown = python("-m", "qori", "show", "subtract").stdout
-    assert shown.startswith("subtract(a, b, out=None, *, scale=0") and "qoriSub_8u_C3IRSfs" in shown and "other way round" in shown
+    assert shown.startswith("subtract(a, b, out=None, *, scale=0") and "qoriSub_8u_C3IRSfs" in shown and "C writes as qoriSub(b, a, out)" in shown
     assert python("-m", "qori", "run", "mirror", tmp_path / "in.png", tmp_path / "out.png", "axis=vertical").returncode == 0
     assert (np.asarray(Image.open(tmp_path / "out.png"))[0, 0] == (21, 22, 23)).all()
     failed = python("-m", "qori", "run", "mirror", tmp_path / "in.png", tmp_path / "out.png", "axis=9")
