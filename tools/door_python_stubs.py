@@ -108,7 +108,7 @@ class AdaptiveGaussPlan:
 
 @final
 class HogPlan:
-    def __new__(cls, window: Pair = (128, 64), *, cell: int = 8, block: int = 16, stride: int = 8, bins: int = 9,
+    def __new__(cls, window: Pair = (128, 64), *, cell: int = 8, block: int = ..., stride: int = ..., bins: int = 9,
                 sigma: float = 8.0, limit: float = 0.2, columns_first: bool = False) -> HogPlan: ...
     def __call__(self, src: Source, out: Source | None = None, *, locations: Sequence[Pair] | Array | None = None,
                  border: str | int = "replicate", border_value: Value = 0) -> Array: ...

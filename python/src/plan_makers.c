@@ -282,7 +282,9 @@ PyObject* make_adaptive(PyTypeObject* type, PyObject* arguments, PyObject* keywo
 PyObject* make_hog(PyTypeObject* type, PyObject* arguments, PyObject* keywords) {
     static char* names[] = {"window", "cell", "block", "stride", "bins", "sigma", "limit", "columns_first", NULL};
     PyObject* window = NULL;
-    QorHogConfig config = {0, 8, 16, 8, 9, 8.0f, 0.2f, {64, 128}};
+    /* Where they are not given, blocks are of 2 x 2 cells, a cell apart. */
+    const int32_t none = INT32_MIN;
+    QorHogConfig config = {0, 8, none, none, 9, 8.0f, 0.2f, {64, 128}};
     int32_t plan_bytes = 0, bytes = 0;
     int columns = 0;
     Operation operation;
@@ -293,6 +295,10 @@ PyObject* make_hog(PyTypeObject* type, PyObject* arguments, PyObject* keywords) 
                                      &config.normParam, &columns) ||
         (window && shape_of(&call, "window", window, &config.winSize)))
         return NULL;
+    if (config.cellSize > 0 && config.cellSize < 1 << 24) {
+        if (config.blockSize == none) config.blockSize = 2 * config.cellSize;
+        if (config.blockStride == none) config.blockStride = config.cellSize;
+    }
     config.blockOrder = columns;
     int status = qoriHOGGetSize(&config, &plan_bytes);
     Plan* plan = new_plan(type, HOG_PLAN, PLAN_ANY, NO_ELEMENT);

@@ -11,8 +11,17 @@ Call* named(Call* call, Operation* operation, const char* name) {
     return start_call(call, operation);
 }
 
+/* The shape of an array of several channels serves as it is: these stand last, and no size depends on them. */
 int shape_of(const Call* call, const char* name, PyObject* object, QorImageSize* size) {
-    return read_pair(call, name, object, &size->height, &size->width);
+    PyObject* pair = NULL;
+    if (PyTuple_Check(object) && PyTuple_Size(object) == 3) {
+        int64_t channels;
+        if (read_integer(call, name, PyTuple_GetItem(object, 2), 1, 4, &channels)) return -1;
+        if (!(pair = PyTuple_GetSlice(object, 0, 2))) return -1;
+    }
+    const int failed = read_pair(call, name, pair ? pair : object, &size->height, &size->width);
+    Py_XDECREF(pair);
+    return failed;
 }
 
 int element_from(const Call* call, PyObject* dtype, const char* accepted, uint32_t elements, int* element) {

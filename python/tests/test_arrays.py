@@ -69,6 +69,9 @@ def test_arguments_stand_in_natural_order():
     assert (qori.subtract(a, 4) == 5).all() and (qori.divide(a, 3) == 3).all()
     assert qori.max_index(ramp(3, 4)) == (11, (2, 3))
     assert qori.min_max(ramp(3, 4, 3)) == ((0, 1, 2), (33, 34, 35))
+    assert qori.ResizePlan((4, 8, 3), (2, 16, 3)).src_shape == (4, 8)                 # photo.shape serves as it is
+    photo = ramp(16, 16)
+    assert (qori.HogPlan((16, 16), cell=4)(photo) == qori.HogPlan((16, 16), cell=4, block=8, stride=4)(photo)).all()
     tall = qori.ResizePlan((4, 8), (2, 16))
     assert tall(ramp(4, 8)).shape == (2, 16) and (tall.src_shape, tall.dst_shape) == ((4, 8), (2, 16))
     shift = qori.WarpAffinePlan((5, 6), (5, 6), ((1, 0, 1), (0, 1, 2)), "nearest")      # one row down, two columns right
@@ -151,6 +154,7 @@ REFUSED = [
     (lambda a: qori.ResizePlan((8, 8), (4, 4))(a.astype("f4")), TypeError, "no form"),
     (lambda a: qori.resize(a, qori.DctPlan((8, 8))), TypeError, "argument plan: .*DctPlan came; accepted is a ResizePlan"),
     (lambda a: qori.resize(a, "linear"), TypeError, "argument plan"),
+    (lambda a: qori.ResizePlan((8, 8, 5), (4, 4)), ValueError, "src_shape"),
     (lambda a: qori.ResizePlan((8, 8), (4, 4), "best"), ValueError, "'lanczos3'"),
     (lambda a: qori.FftPlan((8, 12)), ValueError, "powers of 2"),
     (lambda a: qori.lut_palette(a, np.zeros(100, "u1")), ValueError, "powers of 2"),
