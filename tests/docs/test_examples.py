@@ -11,7 +11,7 @@ import pytest
 ROOT = Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(ROOT / "tools" / "docs"))
 import paths  # noqa: E402
-import door_python  # noqa: E402
+import door_python_model  # noqa: E402
 import examples  # noqa: E402
 import gallery  # noqa: E402
 import recipes  # noqa: E402
@@ -100,6 +100,6 @@ def test_the_programs_of_a_page_run(path, tmp_path):
 
 
 def test_every_operation_has_pictures_an_example_and_a_wrong_use():
-    operations = {f.name for f in door_python.functions(registry.load(ROOT / "api"))}
+    operations = {f.name for f in door_python_model.functions(registry.load(ROOT / "api"))}
     assert set(RECIPES) == operations
     assert not [n for n, r in RECIPES.items() if not (r.example and r.wrong and r.rows)]

@@ -4,8 +4,9 @@ import ctypes as ct
 import numpy as np
 
 import choice
-import door_python
+import door_python_model
 import registry
+import roles
 from c_text import C_NAME, DATA_TYPE, ELEMENT, FLOATS, SCALAR, Pair, listed, literal, number, size
 
 IMAGES = ("image_in", "image_out", "image_inout", "array_in", "array_out", "array_inout", "planes_in", "planes_out")
@@ -13,9 +14,9 @@ IMAGES = ("image_in", "image_out", "image_inout", "array_in", "array_out", "arra
 
 def enumerated(enum, value):
     """(C text, number) of a word, of words joined by |, or of a number."""
-    table = door_python.ENUMS[enum]
+    table = door_python_model.ENUMS[enum]
     if isinstance(value, str):
-        words = {door_python.enum_word(enum, n): n for n in table} | {n: n for n in table}
+        words = {door_python_model.enum_word(enum, n): n for n in table} | {n: n for n in table}
         names = [words[w.strip()] for w in value.split("|")]
         return " | ".join(names), sum(table[n] for n in names)
     return next((n for n, v in table.items() if v == value), str(value)), int(value)
@@ -214,7 +215,7 @@ class Arguments:
     # --- work memory ------------------------------------------------------------------------------------------------
 
     def work_memory(self, a):
-        query = self.model.members[door_python.roles.buffer_query(self.member)]
+        query = self.model.members[roles.buffer_query(self.member)]
         holders = {b.detail: (ct.c_int32 * 1)() for b in query.arguments if b.kind == "bytes"}
         self.model.declare_bytes([what + "Bytes" for what in holders])
         self.model.call(query, [(f"&{b.detail}Bytes", holders[b.detail]) if b.kind == "bytes" else self.asked(b)
@@ -233,7 +234,7 @@ class Arguments:
             return number(self.channels if self.first.ndim > 2 else 1)
         if b.kind == "data_type":
             name = DATA_TYPE[C_NAME[self.first.dtype] if b.detail == "src" else facts["kernel"]]
-            return name, door_python.ENUMS["QorDataType"][name]
+            return name, door_python_model.ENUMS["QorDataType"][name]
         if "size" in facts and b.kind in ("size", "size_of"):
             return size(facts["size"])
         if b.kind == "scalar":

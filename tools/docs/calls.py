@@ -9,7 +9,7 @@ import numpy as np
 
 import arguments
 import choice
-import door_python
+import door_python_model
 import registry
 from c_text import ELEMENT, SCALAR
 
@@ -27,7 +27,7 @@ class Model:
         self.library = ct.CDLL(str(library))
         families = registry.load(registry.ROOT / "api")
         self.members = {m.name: m for m in registry.all_members(families)}
-        self.functions = {f.name: f for f in door_python.functions(families)}
+        self.functions = {f.name: f for f in door_python_model.functions(families)}
         self.restart()
 
     def restart(self):

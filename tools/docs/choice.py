@@ -3,7 +3,7 @@ from dataclasses import dataclass, field
 
 import numpy as np
 
-import door_python
+import door_python_model
 from c_text import ELEMENT
 
 CHOOSERS = {"keep_alpha", "channel", "dtype", "channels", "width"}      # keywords that are no arguments in C
@@ -44,10 +44,10 @@ def bind(function, args, kwargs):
 def pixel_class(array, keep_alpha=False, channel=False):
     """The class of a picture's pixels as the forms have it."""
     channels = 1 if array.ndim < 3 else array.shape[2]
-    code = channels | (door_python.ALPHA if keep_alpha else 0)
-    code |= door_python.CHANNEL if channel and channels > 1 else 0
+    code = channels | (door_python_model.ALPHA if keep_alpha else 0)
+    code |= door_python_model.CHANNEL if channel and channels > 1 else 0
     planar = array.ndim == 3 and channels > 1 and array.strides[2] != array.itemsize
-    return code | (door_python.PLANAR if planar else 0)
+    return code | (door_python_model.PLANAR if planar else 0)
 
 
 def takes(form, given):
@@ -59,20 +59,20 @@ def takes(form, given):
 
 
 def fits_layouts(form, given, first, main):
-    parts = door_python.CHANNEL | door_python.ALPHA
-    key = form.layouts[0 if door_python.reads(main) else 1]
+    parts = door_python_model.CHANNEL | door_python_model.ALPHA
+    key = form.layouts[0 if door_python_model.reads(main) else 1]
     target = given.get("out", given.get("dst"))
     if key != pixel_class(first, given.get("keep_alpha"), "channel" in given):
         return False
-    if ("channel" in given) != bool((form.layouts[0] | form.layouts[1]) & door_python.CHANNEL):
+    if ("channel" in given) != bool((form.layouts[0] | form.layouts[1]) & door_python_model.CHANNEL):
         return False
     if target is None:
         return not form.layouts[1] & parts
-    return target.ndim < 2 or not (form.layouts[1] ^ pixel_class(target)) & (7 | door_python.PLANAR)
+    return target.ndim < 2 or not (form.layouts[1] ^ pixel_class(target)) & (7 | door_python_model.PLANAR)
 
 
 def fits_elements(given, first, main):
-    source, target = (ELEMENT[e] for e in door_python.elements_of(main))
+    source, target = (ELEMENT[e] for e in door_python_model.elements_of(main))
     kernels = {ELEMENT[a.element] for a in main.arguments if a.kind == "kernel"}
     if "kernel" in given and kernels and given["kernel"].dtype not in kernels:
         return False
@@ -91,7 +91,7 @@ def choose(function, given, first):
         if member is None or not takes(form, given) or (plan and main.c_operation not in plan.operations) or \
                 not fits_elements(given, first, main) or not fits_layouts(form, given, first, main):
             continue
-        target = ELEMENT[door_python.elements_of(main)[1]]
+        target = ELEMENT[door_python_model.elements_of(main)[1]]
         rank = (target != first.dtype, form.layouts[0] != form.layouts[1], len(form.accepts), len(found))
         found.append((rank, member))
     if not found:

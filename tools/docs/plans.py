@@ -6,7 +6,7 @@ import numpy as np
 from arguments import enumerated
 from c_text import C_NAME, DATA_TYPE, TYPE_CODE, Pair, listed, literal, number, size
 from choice import Plan
-from door_python import ENUMS
+from door_python_model import ENUMS
 
 INTERPOLATION = {"nearest": "interpNearest", "linear": "interpLinear", "cubic": "interpCubic", "super": "interpSuper",
                  "lanczos": "interpLanczos"}

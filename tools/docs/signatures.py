@@ -3,7 +3,7 @@ import functools
 import re
 
 import door_cpp
-import door_python
+import door_python_model
 import registry
 
 CPP_TYPES = {"in": "View<const T, L>", "out": "View<T, L>", "inout": "InPlace<T, L>", "mask": "View<const uint8_t, C1>",
@@ -50,11 +50,11 @@ QorResult plan(View<const uint8_t> src, View<uint8_t> dst, float delta,
 
 @functools.cache
 def python_functions():
-    return {f.name: f for f in door_python.functions(registry.load(registry.ROOT / "api"))}
+    return {f.name: f for f in door_python_model.functions(registry.load(registry.ROOT / "api"))}
 
 
 def python_signature(members):
-    return "qori." + door_python.signature(python_functions()[members[0].operation.snake])
+    return "qori." + door_python_model.signature(python_functions()[members[0].operation.snake])
 
 
 def cpp_type(argument, c_argument):
