@@ -40,8 +40,9 @@ def listed(address):
     return i >= 0 and address < ranges[i][1]
 
 
-# The compiler's own probe of large frames, which is assembly and faults only where the stack has ended.
-PROBE = "___chkstk_ms"
+# The compiler's own probe of large frames, which is assembly and faults only where the stack has ended; and lists of
+# addresses that the linker puts behind the code, which disassemble to anything.
+LEFT_OUT = re.compile(r"___chkstk_ms$|\.[cd]tors\b|__[CD]TOR_LIST__$")
 
 moves_stack = re.compile(r"call|push|pop|leave|(?:sub|add|and|lea|mov)q? .*,%rsp$")
 wants_alignment = re.compile(r"vmov(?:dqa|ap[sd]) .*\(.*%ymm|vmov(?:dqa|ap[sd]) %ymm.*\(")
@@ -56,7 +57,7 @@ with subprocess.Popen([objdump, "-d", "--no-show-raw-insn", "-j", ".text", dll],
             continue
         instructions += 1
         code = re.sub(" +", " ", code.rstrip())
-        if name != PROBE and moves_stack.match(code) and not listed(int(address, 16)):
+        if not LEFT_OUT.match(name) and moves_stack.match(code) and not listed(int(address, 16)):
             unlisted.add(name)
         if wants_alignment.match(code):
             aligned.add(name)
