@@ -14,7 +14,6 @@ QORI_INLINE __m128 mix(__m128 a, __m128 b, __m128 f) { return _mm_fmadd_ps(f, b,
 QORI_INLINE __m256d mix(__m256d a, __m256d b, __m256d f) { return _mm256_fmadd_pd(f, b, _mm256_fnmadd_pd(f, a, a)); }
 QORI_INLINE __m128d mix(__m128d a, __m128d b, __m128d f) { return _mm_fmadd_pd(f, b, _mm_fnmadd_pd(f, a, a)); }
 QORI_INLINE float mix(float a, float b, float f) { return __builtin_fmaf(f, b, __builtin_fmaf(-f, a, a)); }
-QORI_INLINE double mix(double a, double b, double f) { return __builtin_fma(f, b, __builtin_fma(-f, a, a)); }
 
 // --- one channel, eight pixels at a time ----------------------------------------------------------------------------
 

@@ -188,6 +188,7 @@ QORI_INLINE int32_t clampIndex(int32_t index, int32_t first, int32_t last) {
 /// Has the line that will be read some rows later brought near: tilted rows cross many lines, in no order that the
 /// processor foresees.
 QORI_INLINE void prefetchAhead(const uint8_t* at, ptrdiff_t ahead) {
+    // As a number, which may lie outside the image. NOLINTNEXTLINE(performance-no-int-to-ptr)
     _mm_prefetch(reinterpret_cast<const char*>(reinterpret_cast<uintptr_t>(at) + static_cast<uintptr_t>(ahead)),
                  _MM_HINT_T0);
 }
