@@ -124,9 +124,9 @@ unsigned codeOf(const std::vector<Neighbour>& neighbours, Pixel pixel) {
 
 template <class T, class D, class Function>
 void sweepMember(const char* name, int side, Function function) {
-    using WithMode = QorResult(QORI_CALL*)(const T*, int32_t, D*, int32_t, QorImageSize, uint8_t, int32_t, T);
     sweepPatterns(side / 2, sizeof(T) + sizeof(D), name, [=](const Job& job) {
-        constexpr bool hasMode = std::is_same_v<Function, WithMode>;
+        constexpr bool hasMode =
+            std::is_invocable_v<Function, const T*, int32_t, D*, int32_t, QorImageSize, uint8_t, int32_t, T>;
         const auto mode = hasMode ? random().value<uint8_t>() : uint8_t{0};
         const std::vector<Neighbour> neighbours = neighboursOf(side, 8 * sizeof(D), mode % 4);
         checkPatterns<T, D>(

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // What the tests of medians share.
 #pragma once
+#include <cmath>
+
 #include "harness/window.h"
 #include "reference/median.h"
 
@@ -10,7 +12,10 @@ namespace qori::test {
 template <class T>
 T drawQuiet() {
     const T value = random().value<T>();
-    return value == value ? value : static_cast<T>(value + value);
+    if constexpr (std::is_floating_point_v<T>)
+        return std::isnan(value) ? value + value : value;
+    else
+        return value;
 }
 
 /// One image in three of any values, one of two neighbours of each other and of zero, one that grows slowly: bins of

@@ -273,14 +273,14 @@ public:
           result_(static_cast<size_t>(side) * static_cast<size_t>(count) * static_cast<size_t>(rows)) {}
 
     void set(int pattern, int x, int y, bool one) {
-        pixels_[static_cast<size_t>((y * count_ + pattern) * side_ + x)] = one ? 255 : 0;
+        pixels_.data()[(y * count_ + pattern) * side_ + x] = one ? 255 : 0;
     }
     void run() {
         const int width = side_ * count_, anchor = side_ / 2;
         ASSERT_EQ(QOR_OK, qoriFilterMedian_8u_C1R(pixels_.data() + anchor * width + anchor, width, result_.data(),
                                                   width, {width - side_ + 1, rows_}, {side_, side_}, {anchor, anchor}));
     }
-    int result(int pattern, int y) const { return result_[static_cast<size_t>((y * count_ + pattern) * side_)]; }
+    int result(int pattern, int y) const { return result_.data()[(y * count_ + pattern) * side_]; }
 
 private:
     int side_, rows_, count_;

@@ -58,8 +58,8 @@ std::vector<double> hogBlock(const QorHogConfig& config, int x, int y, Vote vote
             for (int cell = 0; cell < 4; ++cell) {
                 const double weight = static_cast<double>(
                     static_cast<float>(hogWeight(i, cell % 2, config) * hogWeight(j, cell / 2, config)));
-                sums[static_cast<size_t>(cell * n + v.bin)] += weight * static_cast<double>(v.first);
-                sums[static_cast<size_t>(cell * n + (v.bin + 1) % n)] += weight * static_cast<double>(v.second);
+                sums.data()[cell * n + v.bin] += weight * static_cast<double>(v.first);
+                sums.data()[cell * n + (v.bin + 1) % n] += weight * static_cast<double>(v.second);
             }
         }
     const auto normalise = [&] {

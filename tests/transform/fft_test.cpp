@@ -132,8 +132,9 @@ TEST(Fft, PlansAreRefusedInOrder) {
 
 /// A constant is its own mean, and has no other frequency.
 TEST(Fft, ConstantsAreExact) {
-    for (const auto& [flag, expected] : {std::pair{fftDivFwdByN, 3.0f}, {fftNoDiv, 3.0f * 32 * 16}}) {
+    for (const auto flag : {fftDivFwdByN, fftNoDiv}) {
         const QorImageSize size{32, 16};
+        const float expected = flag == fftNoDiv ? 3.0f * 32 * 16 : 3.0f;
         const Plan plan(Fft::exportsOf(Elements::real), size, flag);
         const TestImage image(kDst, shapeOf(size), 4);
         image.fill<float>(1, [] { return 3.0f; });
