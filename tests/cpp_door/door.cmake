@@ -34,16 +34,16 @@ set(door_compilers ${CMAKE_CXX_COMPILER} $<$<BOOL:${QORI_CLANG}>:${QORI_CLANG}>)
 
 # Every member, over a library that only remembers.
 set(calls ${CMAKE_CURRENT_BINARY_DIR}/cpp_door)
-set(parts 6)
-math(EXPR last "${parts} - 1")
+set(call_files 6)
+math(EXPR last "${call_files} - 1")
 set(call_sources ${calls}/recorded.cpp ${calls}/calls.cpp)
-foreach(part RANGE ${last})
-    list(APPEND call_sources ${calls}/calls_${part}.cpp)
+foreach(number RANGE ${last})
+    list(APPEND call_sources ${calls}/calls_${number}.cpp)
 endforeach()
 file(GLOB door_generators ${PROJECT_SOURCE_DIR}/tools/*.py)
 file(GLOB door_registry ${PROJECT_SOURCE_DIR}/api/*.toml)
 add_custom_command(OUTPUT ${calls}/calls.stamp BYPRODUCTS ${call_sources}
-    COMMAND ${python} ${door}/every_member.py ${calls} ${parts}
+    COMMAND ${python} ${door}/every_member.py ${calls} ${call_files}
     COMMAND ${CMAKE_COMMAND} -E touch ${calls}/calls.stamp
     DEPENDS ${door}/every_member.py ${door_generators} ${door_registry} VERBATIM)
 add_custom_target(door_call_sources DEPENDS ${calls}/calls.stamp)
