@@ -17,15 +17,12 @@ ROOT = Path(__file__).resolve().parent.parent
 sys.path.insert(0, str(ROOT / "tools"))
 import sbom  # noqa: E402
 
-COPYRIGHT = """Format: https://www.debian.org/doc/packaging-manuals/copyright-format/1.0/
-Upstream-Name: qori
+COPYRIGHT = """qori: image-processing primitives
 
-Files: *
 Copyright: 2026 the qori developers
 License: Apache-2.0
 
-License: Apache-2.0
- On Debian systems the text of this licence is in /usr/share/common-licenses/Apache-2.0.
+On Debian systems the text of this licence is in /usr/share/common-licenses/Apache-2.0.
 """
 
 
