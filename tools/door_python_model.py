@@ -228,16 +228,21 @@ def key_of(form):
 ENUMS = roles.enumerations((ROOT / "api" / "header.h.in").read_text())
 
 
-def signature(function):
-    parts = []
+def parameter_list(function, text):
+    """text(parameter) of each; an operand that may be an image or numbers stands once."""
+    texts = []
     for i, p in enumerate(function.parameters):
         if p.name == "b" and p.kind == "VALUE" and i and function.parameters[i - 1].name == "b":
             continue
         if i == function.positional:
-            parts.append("*")
-        default = "" if not p.optional else "=" + default_text(p)
-        parts.append(p.name + default)
-    return f"{function.name}({', '.join(parts)})"
+            texts.append("*")
+        texts.append(text(p))
+    return ", ".join(texts)
+
+
+def signature(function):
+    texts = parameter_list(function, lambda p: p.name + ("=" + default_text(p) if p.optional else ""))
+    return f"{function.name}({texts})"
 
 
 def default_text(p):
