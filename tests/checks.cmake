@@ -3,6 +3,7 @@ set(python ${Python3_EXECUTABLE})
 set(checks ${CMAKE_CURRENT_SOURCE_DIR}/checks)
 
 add_test(NAME apigen COMMAND ${python} ${checks}/apigen_test.py)
+add_test(NAME interface COMMAND ${python} ${checks}/interface_test.py)
 add_test(NAME docs_generator COMMAND ${python} ${checks}/docs_test.py)
 add_test(NAME layers COMMAND ${python} ${checks}/layers.py ${PROJECT_SOURCE_DIR})
 add_test(NAME header_is_current COMMAND ${python} ${checks}/header_is_current.py ${PROJECT_SOURCE_DIR})

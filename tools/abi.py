@@ -20,9 +20,10 @@ class InterfaceError(Exception):
 
 
 def declarations(header):
-    """The header's own declarations, each on a line. The system's types stay names."""
+    """The header's own declarations, as the library sees them, each on a line. The system's types stay names."""
     text = Path(header).read_text().replace("#include <stdint.h>", "")
-    text = subprocess.run(["cc", "-E", "-P", "-x", "c", "-"], input=text, check=True, capture_output=True, text=True).stdout
+    text = subprocess.run(["cc", "-E", "-P", "-DQORI_BUILDING", "-x", "c", "-"], input=text, check=True,
+                          capture_output=True, text=True).stdout
     lines, depth, line = [], 0, ""
     for character in re.sub(r"\s+", " ", text):
         line += character
