@@ -35,6 +35,17 @@ start_wine() {
             exit 1
         fi
     fi
+    # Without wine32 a 32-bit program does nothing and ends with status 0, as if its tests had passed.
+    local folder status
+    for folder in system32 syswow64; do
+        status=0
+        wine "C:\\windows\\$folder\\cmd.exe" /c exit 7 >/dev/null 2>&1 || status=$?
+        if [[ $status -ne 7 ]]; then
+            echo "${0##*/}: Wine does not run programs of both widths; scripts/setup windows installs what is missing." \
+                "If nothing is, remove $WINEPREFIX" >&2
+            exit 1
+        fi
+    done
 }
 
 # Keeps Wine's own processes running until stop_wine. A test that started them would hand them its output, and whoever
