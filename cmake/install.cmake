@@ -23,7 +23,8 @@ if(WIN32)
     endif()
     set(link_name qorik5-8.2)
 else()
-    set_target_properties(qorik5 PROPERTIES INSTALL_RPATH "$ORIGIN")
+    # The companion lies beside it, in the build too: no folder of the build gets into what is installed.
+    set_target_properties(qorik5 PROPERTIES INSTALL_RPATH "$ORIGIN" BUILD_WITH_INSTALL_RPATH ON)
     install(TARGETS qorik5 qorcore LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} COMPONENT runtime
         NAMELINK_COMPONENT development)
     set(link_name qorik5)

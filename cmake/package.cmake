@@ -6,6 +6,9 @@ set(CPACK_PACKAGE_CONTACT "qori developers <developers@qori.invalid>")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
 set(CPACK_STRIP_FILES ON)
 set(CPACK_COMPONENTS_ALL runtime development documentation)
+if(TARGET qori_python)
+    list(APPEND CPACK_COMPONENTS_ALL python)
+endif()
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_RELEASE 1)
@@ -33,6 +36,9 @@ qori_package(development libqori-dev libdevel "image-processing primitives (deve
     "This package has the headers, and files for CMake and pkg-config.")
 qori_package(documentation qori-doc doc "image-processing primitives (documentation)"
     "This package has a page for each family of operations.")
+qori_package(python python3-qori python "image-processing primitives (Python 3)"
+    "This package has a function for each operation, over arrays of NumPy or
+of anything else that has a buffer.")
 
 # Dependencies are stated, not found: scripts/package checks that no symbol is of a later version of glibc.
 configure_file(packaging/shlibs.in ${PROJECT_BINARY_DIR}/packaging/shlibs @ONLY)
@@ -40,7 +46,13 @@ set(CPACK_DEBIAN_RUNTIME_PACKAGE_DEPENDS "libc6 (>= 2.17)")
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_CONTROL_EXTRA ${PROJECT_SOURCE_DIR}/packaging/triggers
     ${PROJECT_BINARY_DIR}/packaging/shlibs)
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_CONTROL_STRICT_PERMISSION ON)
-set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "libqorik5-8 (= ${PROJECT_VERSION}-${CPACK_DEBIAN_PACKAGE_RELEASE})")
+set(this_library "libqorik5-8 (= ${PROJECT_VERSION}-${CPACK_DEBIAN_PACKAGE_RELEASE})")
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS ${this_library})
+set(CPACK_DEBIAN_PYTHON_PACKAGE_DEPENDS "${this_library}, python3 (>= 3.11), libc6 (>= 2.14)")
+set(CPACK_DEBIAN_PYTHON_PACKAGE_RECOMMENDS python3-numpy)
+set(CPACK_DEBIAN_PYTHON_PACKAGE_CONTROL_EXTRA ${PROJECT_SOURCE_DIR}/packaging/python/postinst
+    ${PROJECT_SOURCE_DIR}/packaging/python/prerm)
+set(CPACK_DEBIAN_PYTHON_PACKAGE_CONTROL_STRICT_PERMISSION ON)
 set(CPACK_DEBIAN_DOCUMENTATION_PACKAGE_ARCHITECTURE all)
 
 # Only libraries are installed, and they are there.
