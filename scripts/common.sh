@@ -1,13 +1,18 @@
 # Shared by the scripts beside it, which source it from the repository's root.
 # shellcheck shell=bash
 
-# configure_and_build PRESET [TARGET]: quietly, with a log under build/. Warnings are errors in each of the scripts, so that
-# none of them builds again what another has built.
+# configure_and_build PRESET [TARGET]: quietly, with a log under build/. Warnings are errors in each of the scripts, so
+# that none of them builds again what another has built. What differs from a preset, which sets its variables anew each
+# time, stands in configure_options.
+configure_options=()
 configure_and_build() {
     local -r preset=$1 log=build/$1.log
     mkdir -p build
     echo "${0##*/}: building $preset"
-    if { cmake --preset "$preset" -DQORI_WERROR=ON && cmake --build --preset "$preset" -j"$(nproc)" ${2:+--target "$2"}; } >"$log" 2>&1; then
+    if {
+        cmake --preset "$preset" -DQORI_WERROR=ON "${configure_options[@]}" &&
+            cmake --build --preset "$preset" -j"$(nproc)" ${2:+--target "$2"}
+    } >"$log" 2>&1; then
         return
     fi
     { grep -m 20 -E 'error|Error|FAILED' "$log" || tail -n 20 "$log"; } >&2
