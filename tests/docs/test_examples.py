@@ -1,4 +1,5 @@
 """Every example of the documentation: in Python by the package, in C by one compiled program, and what is refused."""
+import ast
 import ctypes
 import re
 import subprocess
@@ -16,6 +17,7 @@ import examples  # noqa: E402
 import gallery  # noqa: E402
 import recipes  # noqa: E402
 import registry  # noqa: E402
+import render  # noqa: E402
 
 RECIPES = recipes.load()
 PAGES = sorted(p for p in [*(ROOT / "docs").glob("*.md"), *(ROOT / "docs" / "tasks").glob("*.md")])
@@ -103,3 +105,14 @@ def test_every_operation_has_pictures_an_example_and_a_wrong_use():
     operations = {f.name for f in door_python_model.functions(registry.load(ROOT / "api"))}
     assert set(RECIPES) == operations
     assert not [n for n, r in RECIPES.items() if not (r.example and r.wrong and r.rows)]
+
+
+def shows_its_input(row):
+    """By name above the results, or as a part of their pictures."""
+    drawn = {n.id for n in ast.walk(ast.parse(recipes.put(row.picture, row.vary[0]))) if isinstance(n, ast.Name)}
+    return bool(row.input or drawn - {"r", "np"} - vars(render).keys())
+
+
+def test_every_row_of_pictures_has_three_to_five_and_every_page_its_input():
+    assert not [n for n, r in RECIPES.items() if not all(3 <= len(set(row.vary)) <= 5 for row in r.rows)]
+    assert not [n for n, r in RECIPES.items() if not any(map(shows_its_input, r.rows))]
