@@ -1,5 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <iterator>
+
 #include "panels.h"
+#include "recipe_values.h"
 
 namespace demo {
 namespace {
@@ -14,16 +17,17 @@ void saltAndPepper(const Picture& picture) {
         }
 }
 
-/// Four strips: the noise, and what medians of 3 x 3, 5 x 5 and 9 x 9 leave of it.
+/// Strips: the noise, and what medians of larger and larger squares leave of it.
 Picture despeckled(const Picture& photo) {
-    constexpr int kReach = 4, kMasks[4] = {1, 3, 5, 9};
+    constexpr auto& sides = recipes::kMedianSides.values;
+    constexpr int kStrips = 1 + static_cast<int>(std::size(sides)), kReach = sides[std::size(sides) - 1] / 2;
     const Picture around({photo.width() + 2 * kReach, photo.height() + 2 * kReach}, 3), out(photo.size(), 3);
     require(qoriCopyReplicateBorder_8u_C3R(photo.data(), photo.step(), photo.size(), around.data(), around.step(),
                                            around.size(), kReach, kReach));
     saltAndPepper(around);
-    for (int i = 0; i < 4; ++i) {
-        const int x = photo.width() * i / 4, side = kMasks[i];
-        const QorImageSize strip{photo.width() * (i + 1) / 4 - x, photo.height()};
+    for (int i = 0; i < kStrips; ++i) {
+        const int x = photo.width() * i / kStrips, side = i == 0 ? 1 : sides[i - 1];
+        const QorImageSize strip{photo.width() * (i + 1) / kStrips - x, photo.height()};
         require(qoriFilterMedian_8u_C3R(around.at(x + kReach, kReach), around.step(), out.at(x, 0), out.step(), strip,
                                         {side, side}, {side / 2, side / 2}));
     }
@@ -31,7 +35,7 @@ Picture despeckled(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Salt and pepper, medians of 3 x 3, 5 x 5, 9 x 9", "FilterMedian", despeckled, {4, 1}},
+    {recipes::kMedianSides.caption, "FilterMedian", despeckled, {5, 1}},
 };
 
 }  // namespace

@@ -1,12 +1,29 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <array>
+#include <string_view>
 #include <vector>
 
 #include "panels.h"
+#include "recipe_values.h"
 
 namespace demo {
 namespace {
 
 enum class Kind { nearest, linear, cubic, lanczos, super, smoothLanczos };
+
+/// The interpolations that a recipe names; one of another name does not compile.
+template <size_t n>
+consteval std::array<Kind, n> kindsOf(const recipes::Values<const char*, n>& row) {
+    constexpr std::string_view names[] = {"nearest",  "linear", "cubic",
+                                          "lanczos3", "super",  "lanczos3, antialias=True"};
+    std::array<Kind, n> kinds{};
+    for (size_t i = 0; i < n; ++i) {
+        size_t kind = 0;
+        while (names[kind] != row.values[i]) ++kind;
+        kinds[i] = static_cast<Kind>(kind);
+    }
+    return kinds;
+}
 
 /// Plan, initialisation and work buffer of one resize of three channels.
 class Resizer {
@@ -60,7 +77,8 @@ private:
 
 /// Calls draw(kind, dst, dstStep, size) for each field of a picture cut into two rows.
 template <size_t count, class Draw>
-Picture fields(const Picture& photo, const Kind (&kinds)[count], Draw draw) {
+Picture fields(const Picture& photo, const std::array<Kind, count>& kinds, Draw draw) {
+    static_assert(count % 2 == 0);
     constexpr int columns = count / 2;
     Picture out(photo.size(), 3);
     for (int i = 0; i < static_cast<int>(count); ++i) {
@@ -74,37 +92,36 @@ Picture fields(const Picture& photo, const Kind (&kinds)[count], Draw draw) {
 
 /// A detail, enlarged six times by each interpolation.
 Picture enlarged(const Picture& photo) {
-    constexpr Kind kinds[4] = {Kind::nearest, Kind::linear, Kind::cubic, Kind::lanczos};
-    return fields(photo, kinds, [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
-        const QorImageSize from{size.width / 6, size.height / 6};
-        const uint8_t* detail =
-            photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) * 9 / 20);
-        Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
-    });
+    return fields(photo, kindsOf(recipes::kEnlargements),
+                  [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
+                      const QorImageSize from{size.width / 6, size.height / 6};
+                      const uint8_t* detail =
+                          photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) * 9 / 20);
+                      Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
+                  });
 }
 
 /// A detail on a quarter of its width, shown in squares: what aliasing each way leaves.
 Picture reduced(const Picture& photo) {
-    constexpr Kind kinds[6] = {Kind::nearest, Kind::linear, Kind::cubic,
-                               Kind::lanczos, Kind::super,  Kind::smoothLanczos};
-    return fields(photo, kinds, [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
-        const QorImageSize to{size.width / 4, size.height / 4}, from{4 * to.width, 4 * to.height};
-        const Picture small(to, 3);
-        const uint8_t* detail = photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) / 2);
-        Resizer(from, to, kind).run(detail, photo.step(), small.data(), small.step());
-        Resizer(to, size, Kind::nearest).run(small.data(), small.step(), dst, dstStep);
-    });
+    return fields(
+        photo, kindsOf(recipes::kReductions), [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
+            const QorImageSize to{size.width / 4, size.height / 4}, from{4 * to.width, 4 * to.height};
+            const Picture small(to, 3);
+            const uint8_t* detail = photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) / 2);
+            Resizer(from, to, kind).run(detail, photo.step(), small.data(), small.step());
+            Resizer(to, size, Kind::nearest).run(small.data(), small.step(), dst, dstStep);
+        });
 }
 
 constexpr Panel kPanels[] = {
-    {"6 x: nearest, linear, cubic, Lanczos",
+    {recipes::kEnlargements.caption,
      "ResizeNearest, Linear, Cubic, Lanczos C3",
      enlarged,
      {72, 72}},  // Lanczos wants six pixels
-    {"1/4: nearest, linear, cubic, Lanczos, super, antialiased",
-     "Resize, all interpolations, C3",
+    {recipes::kReductions.caption,
+     "ResizeNearest, Linear, Super, Antialiasing C3",
      reduced,
-     {48, 32}},  // four pixels a field
+     {32, 32}},  // four pixels a field
 };
 
 }  // namespace

@@ -1,21 +1,32 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 
 #include "panels.h"
+#include "recipe_values.h"
 
 namespace demo {
 namespace {
 
-/// Four shades a channel: intervals and the constants in their place.
+/// Few shades a channel, other numbers of them in each strip: intervals and the constants in their place.
 Picture posterised(const Picture& photo) {
-    constexpr int32_t kLevels[5] = {0, 64, 128, 192, 256}, kShades[5] = {0, 85, 170, 255, 0};
-    const int32_t *const levels[3] = {kLevels, kLevels, kLevels}, *const shades[3] = {kShades, kShades, kShades};
-    constexpr int32_t nLevels[3] = {5, 5, 5};
+    constexpr int kStrips = std::size(recipes::kShades.values), kMost = 8;
     Picture out(photo.size(), 3);
-    require(qoriLUT_8u_C3R(photo.data(), photo.step(), out.data(), out.step(), photo.size(), shades, levels, nLevels));
+    for (int i = 0; i < kStrips; ++i) {
+        const int count = recipes::kShades.values[i], x = photo.width() * i / kStrips;
+        int32_t ends[kMost + 1], constants[kMost + 1] = {};
+        for (int k = 0; k <= count; ++k) ends[k] = 256 * k / count;
+        for (int k = 0; k < count; ++k) constants[k] = 255 * k / (count - 1);
+        const int32_t *const levels[3] = {ends, ends, ends}, *const shades[3] = {constants, constants, constants};
+        const int32_t nLevels[3] = {count + 1, count + 1, count + 1};
+        const QorImageSize strip{photo.width() * (i + 1) / kStrips - x, photo.height()};
+        require(qoriLUT_8u_C3R(photo.at(x, 0), photo.step(), out.at(x, 0), out.step(), strip, shades, levels, nLevels));
+    }
     return out;
 }
+
+static_assert(*std::max_element(std::begin(recipes::kShades.values), std::end(recipes::kShades.values)) <= 8);
 
 constexpr int kNodes = 5;
 constexpr int32_t kNodeLevels[3][kNodes] = {{0, 48, 128, 208, 256}, {0, 48, 128, 208, 256}, {0, 48, 128, 208, 256}};
@@ -69,7 +80,7 @@ Picture heat(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Posterised: four shades a channel", "LUT C3", posterised},
+    {recipes::kShades.caption, "LUT C3", posterised, {3, 1}},
     {"A tone curve for each channel, and the curves", "LUT_Cubic C3", toneCurves},
     {"False colours from a palette", "LUTPalette 8u24u, Copy C3C1", heat},
 };

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <iterator>
 #include <memory>
 
 #include "panels.h"
+#include "recipe_values.h"
 
 namespace demo {
 namespace {
@@ -40,18 +42,23 @@ Picture zebra(const Picture& photo) {
     return out;
 }
 
-/// Otsu's threshold on the left; on the right, what is not 6 levels below the mean of 31 x 31.
+/// Strips: Otsu's threshold, and what is not 10 levels below the means of larger and larger squares.
 Picture adaptiveBesideOtsu(const Picture& photo) {
-    const QorImageSize size = photo.size(), mask{31, 31}, right{size.width - size.width / 2, size.height};
+    constexpr auto& sides = recipes::kAdaptiveSides.values;
+    constexpr int kStrips = 1 + static_cast<int>(std::size(sides));
+    const QorImageSize size = photo.size();
     const Picture binary = otsuMask(photo);
     Picture grey(size, 1);
     require(qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), grey.data(), grey.step(), size));
-    int32_t bytes;
-    require(qoriThresholdAdaptiveBoxGetBufferSize(right, mask, 1, 1, &bytes));
-    const auto buffer = std::make_unique<uint8_t[]>(static_cast<size_t>(bytes));
-    const ptrdiff_t x = size.width / 2;
-    require(qoriThresholdAdaptiveBox_8u_C1R(grey.data() + x, grey.step(), binary.data() + x, binary.step(), right, mask,
-                                            6, 255, 0, borderReplicate, 0, buffer.get()));
+    for (int i = 1; i < kStrips; ++i) {
+        const int x = size.width * i / kStrips, side = sides[i - 1];
+        const QorImageSize mask{side, side}, strip{size.width * (i + 1) / kStrips - x, size.height};
+        int32_t bytes;
+        require(qoriThresholdAdaptiveBoxGetBufferSize(strip, mask, 1, 1, &bytes));
+        const auto buffer = std::make_unique<uint8_t[]>(static_cast<size_t>(bytes));
+        require(qoriThresholdAdaptiveBox_8u_C1R(grey.at(x, 0), grey.step(), binary.at(x, 0), binary.step(), strip, mask,
+                                                10, 255, 0, borderReplicate, 0, buffer.get()));
+    }
     Picture out(size, 3);
     require(qoriDup_8u_C1C3R(binary.data(), binary.step(), out.data(), out.step(), size));
     return out;
@@ -60,7 +67,7 @@ Picture adaptiveBesideOtsu(const Picture& photo) {
 constexpr Panel kPanels[] = {
     {"Otsu mask, the photograph in its left half", "Otsu C1, Threshold C1, Copy C3M", brightParts},
     {"Channels below 64 and above 192 replaced", "Threshold_LTValGTVal C3", zebra},
-    {"Otsu's threshold beside an adaptive one", "ThresholdAdaptiveBox C1", adaptiveBesideOtsu},
+    {recipes::kAdaptiveSides.caption, "ThresholdAdaptiveBox C1", adaptiveBesideOtsu, {5, 1}},
 };
 
 }  // namespace

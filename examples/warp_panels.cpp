@@ -1,9 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <cmath>
+#include <iterator>
 #include <numbers>
+#include <string_view>
 #include <vector>
 
 #include "panels.h"
+#include "recipe_values.h"
 
 namespace demo {
 namespace {
@@ -45,30 +48,36 @@ void warp(QorInterpolationKind kind, const Map& map, bool isBackward, const Pict
     require(function(from.data(), from.step(), to.data(), to.step(), {0, 0}, to.size(), plan, work.data()));
 }
 
-constexpr QorInterpolationKind kKinds[3] = {interpNearest, interpLinear, interpCubic};
+QorInterpolationKind kindOf(std::string_view name) {
+    return name == "nearest" ? interpNearest : name == "linear" ? interpLinear : interpCubic;
+}
 
 void paste(const Picture& from, QorPoint2D at, const Picture& to, QorPoint2D where, QorImageSize size) {
     require(qoriCopy_8u_C3R(from.at(at.x, at.y), from.step(), to.at(where.x, where.y), to.step(), size));
 }
 
-/// The photograph turned by 15 degrees, a third by each interpolation.
+/// The photograph turned, a strip by each angle.
 Picture turned(const Picture& photo) {
+    constexpr auto& angles = recipes::kTurns.values;
+    constexpr int kStrips = std::size(angles);
     const Picture out(photo.size(), 3), whole(photo.size(), 3);
-    for (int i = 0; i < 3; ++i) {
-        warp(kKinds[i], turn(photo.size(), 15), false, photo, whole);
-        const int x = photo.width() * i / 3;
-        paste(whole, {x, 0}, out, {x, 0}, {photo.width() * (i + 1) / 3 - x, photo.height()});
+    for (int i = 0; i < kStrips; ++i) {
+        warp(interpLinear, turn(photo.size(), angles[i]), false, photo, whole);
+        const int x = photo.width() * i / kStrips;
+        paste(whole, {x, 0}, out, {x, 0}, {photo.width() * (i + 1) / kStrips - x, photo.height()});
     }
     return out;
 }
 
 /// A detail of the photograph turned by 15 degrees by each interpolation, its pixels six times as large.
 Picture magnified(const Picture& photo) {
+    constexpr auto& names = recipes::kWarpInterpolations.values;
+    constexpr int kStrips = std::size(names);
     const Picture out(photo.size(), 3), whole(photo.size(), 3);
-    for (int i = 0; i < 3; ++i) {
-        warp(kKinds[i], turn(photo.size(), 15), false, photo, whole);
-        const int x = photo.width() * i / 3;
-        const Picture field({photo.width() * (i + 1) / 3 - x, photo.height()}, 3);
+    for (int i = 0; i < kStrips; ++i) {
+        warp(kindOf(names[i]), turn(photo.size(), 15), false, photo, whole);
+        const int x = photo.width() * i / kStrips;
+        const Picture field({photo.width() * (i + 1) / kStrips - x, photo.height()}, 3);
         const double left = photo.width() * 0.4, top = photo.height() * 0.45;
         warp(interpNearest, {{1 / 6.0, 0, left, 0, 1 / 6.0, top}}, true, whole, field);
         paste(field, {0, 0}, out, {x, 0}, field.size());
@@ -95,8 +104,8 @@ Picture thereAndBack(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Turned by 15 degrees: nearest, linear, cubic", "WarpAffineNearest, Linear, Cubic C3", turned, {8, 8}},
-    {"A detail of it, magnified: nearest, linear, cubic", "WarpAffineNearest, Linear, Cubic C3", magnified, {8, 8}},
+    {recipes::kTurns.caption, "WarpAffineLinear C3", turned, {8, 8}},
+    {recipes::kWarpInterpolations.caption, "WarpAffineNearest, Linear, Cubic C3", magnified, {8, 8}},
     {"There and back, and 8 x the difference", "WarpAffineCubic C3 by both directions", thereAndBack, {8, 8}},
 };
 

@@ -8,6 +8,7 @@ from pathlib import Path
 ROOT = Path(__file__).resolve().parents[2]
 sys.path[:0] = [str(ROOT / "tools" / "docs"), str(ROOT / "tools")]
 import links  # noqa: E402
+import panel_values  # noqa: E402
 import reference  # noqa: E402
 import registry  # noqa: E402
 import signatures  # noqa: E402
@@ -59,6 +60,29 @@ class Reference(unittest.TestCase):
     def test_what_does_not_exist_is_an_empty_cell(self):
         table = "\n".join(reference.existing(self.pages["filter_median"]))
         self.assertIn("| `64f` | R |  |  |  |", table)
+
+
+class Panels(unittest.TestCase):
+    def header(self, row):
+        with tempfile.TemporaryDirectory() as folder:
+            (Path(folder) / "one.toml").write_text('[[recipe]]\nof = ["blur"]\n[[recipe.row]]\ncall = "blur(@)"\n' + row)
+            return panel_values.header(Path(folder))
+
+    def test_values_of_a_row_become_a_table_with_a_caption(self):
+        text = self.header('vary = ["3", "15"]\npanel = {name = "Sides", caption = "Blurs by @ x @ pixels"}')
+        self.assertIn('Values<int, 2> kSides{\n    "Blurs by 3 x 3, 15 x 15 pixels",\n    {3, 15}};', text)
+        text = self.header("""vary = ["'a', b=1", "'c'"]\npanel = {name = "Kinds", caption = "Kinds: @"}""")
+        self.assertIn('Values<const char*, 2> kKinds{\n    "Kinds: a, b=1, c",\n    {"a, b=1", "c"}};', text)
+        self.assertNotIn("inline", self.header('vary = ["3", "15"]'))
+        with self.assertRaises(ValueError):
+            self.header('vary = ["3", "0.5"]\npanel = {name = "Mixed", caption = "@"}')
+
+    def test_every_such_row_is_a_panel(self):
+        source = "".join(p.read_text() for p in (ROOT / "examples").glob("*_panels.cpp"))
+        names = [name for name, *_ in panel_values.panels(ROOT / "docs" / "recipes")]
+        self.assertGreater(len(names), 5)
+        for name in names:
+            self.assertEqual(source.count(f"recipes::k{name}.caption"), 1, name)
 
 
 class Links(unittest.TestCase):

@@ -7,6 +7,7 @@ import numpy as np
 
 import examples
 import inputs
+import panels
 import recipes
 import render
 
@@ -71,6 +72,9 @@ def pictures(recipe, names, folder):
         if row.setup and not row.varied_setup:
             lines += ["```python", recipes.put(row.setup, "").strip(), "```", ""]
         lines += ['<div class="shots">', *row_figures(recipe, number, row, names, folder), "</div>", ""]
+        if row.panel:
+            sheet = panels.of_recipes()[row.panel["name"]]
+            lines += [f'<p>The same values in C: <a href="../demo.html#panel-{sheet}">panel {sheet} of the demo</a>.</p>', ""]
     return lines
 
 

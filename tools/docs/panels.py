@@ -9,10 +9,11 @@ from pathlib import Path
 from PIL import Image
 
 import inputs
+import panel_values
 import render
 from paths import DEMO, ROOT, TYPEFACE
 
-ENTRY = re.compile(r'\{"([^"]+)",\s*"([^"]+)",\s*(\w+)', re.S)
+ENTRY = re.compile(r'\{(?:"([^"]+)"|recipes::k(\w+)\.caption),\s*"([^"]+)",\s*(\w+)', re.S)
 
 
 class PanelError(Exception):
@@ -24,6 +25,7 @@ class Panel:
     caption: str
     exports: str
     code: str
+    recipe: str     # the name of the row whose values it shows, or nothing
 
 
 def function(name, source):
@@ -36,13 +38,20 @@ def function(name, source):
 
 def load(folder=ROOT / "examples"):
     """{family: panels} in the order of the sheet."""
+    captions = {name: text for name, text, _, _ in panel_values.panels(ROOT / "docs" / "recipes")}
     order = re.findall(r"(\w+)Panels\(\)", (folder / "demo.cpp").read_text())
     found = {}
     for family in order:
         source = (folder / f"{family}_panels.cpp").read_text()
         listed = source[source.index("kPanels[]"):]
-        found[family] = [Panel(c, e, function(f, source)) for c, e, f in ENTRY.findall(listed)]
+        found[family] = [Panel(c or captions[r], e, function(f, source), r) for c, r, e, f in ENTRY.findall(listed)]
     return found
+
+
+def of_recipes():
+    """{name of a row: its panel's number on the sheet}."""
+    panels = [p for family in load().values() for p in family]
+    return {p.recipe: number for number, p in enumerate(panels, 1) if p.recipe}
 
 
 def run(folder):
