@@ -21,7 +21,7 @@ public:
     HalfTile(const ResizePlan& plan, Tile tile, WorkBuffer&) : source_{plan, tile} {}
 
     void run(Image<const T> src, Image<T> dst, Sides) {
-        source_.open(src, {});
+        source_.place(src);
         const Tile& tile = source_.tile;
         const bool isSuper = source_.plan.interpolation == interpSuper;
         for (int32_t y = 0; y < tile.height; ++y) {

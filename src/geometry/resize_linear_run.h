@@ -2,6 +2,7 @@
 // Tiles of linear 8u in fixed point.
 #pragma once
 #include "kernels/resize/linear.h"
+#include "kernels/resize/narrow.h"
 #include "resize_run.h"
 
 namespace qori::geometry {
@@ -20,6 +21,8 @@ public:
 
     void run(Image<const uint8_t> src, Image<uint8_t> dst, Sides open) {
         source_.open(src, open);
+        if constexpr (channels == 1)
+            if (isNarrow()) return runNarrow(dst);
         rows_.open(source_);
         const ResizePlan& plan = source_.plan;
         kernels::Gather gather = kernels::buildPairs(tables_, columnPicks(source_), channels);
@@ -51,6 +54,21 @@ private:
 
         bool operator==(const Between&) const = default;
     };
+
+    bool isNarrow() const {
+        const Range& columns = source_.columns;
+        return source_.tile.width <= kernels::kNarrowTarget && columns.last - columns.first < kernels::kNarrowSource;
+    }
+
+    void runNarrow(Image<uint8_t> dst) const {
+        const ResizePlan& plan = source_.plan;
+        const Tile& tile = source_.tile;
+        const kernels::NarrowRows rows{plan.table<int32_t>(plan.vertical.indexTable) + tile.y,
+                                       plan.table<int32_t>(plan.vertical.weightTable) + tile.y, tile.height,
+                                       source_.rows.first, source_.rows.last};
+        kernels::resizeNarrow8u(columnPicks(source_), plan.table<int32_t>(plan.horizontal.weightTable) + tile.x, rows,
+                                {source_.at(0, source_.columns.first), source_.image.step}, dst);
+    }
 
     /// A row of weight 0 is not needed.
     Between between(int32_t y) const {

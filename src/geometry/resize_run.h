@@ -31,6 +31,10 @@ struct TileSource {
     void open(Image<const T> src, Sides open) {
         columns = tapRange(plan, plan.horizontal, tile.x, tile.width, open.left, open.right);
         rows = tapRange(plan, plan.vertical, tile.y, tile.height, open.top, open.bottom);
+        place(src);
+    }
+    /// For ways that read no pixel but those that the tile's own footprint covers.
+    void place(Image<const T> src) {
         const ptrdiff_t x = sourceOffset(plan.horizontal, tile.x), y = sourceOffset(plan.vertical, tile.y);
         image = {advance(src.data, -(y * src.step + x * ptrdiff_t{channels} * elementBytes<T>)), src.step};
     }

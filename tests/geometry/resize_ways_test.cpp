@@ -180,5 +180,42 @@ TEST(Resize, LinearIsExactAtShortWeights) {
     }
 }
 
+/// Every width about those at which rows are held in registers, in tiles, against guard pages at both ends.
+TEST(Resize, NarrowLinearIsExact) {
+    const Method m{.interpolation = interpLinear};
+    for (int32_t width = 2; width <= 18; ++width)
+        for (int32_t target : {1, 3, 7, 8, 9, 15, 16, 17, 25, 31, 32, 33, 40}) {
+            const QorImageSize from{width, 2 + random().below(6)}, to{target, 1 + random().below(15)};
+            SCOPED_TRACE(describe({m, from, to}));
+            const QorResizePlan* plan = makePlan<uint8_t>(m, from, to);
+            const TestImage src = block(kSrc, from.width * from.height, random().below(2) * 5);
+            auto* const pixels = src.data<uint8_t>();
+            for (int i = 0; i < from.width * from.height; ++i) pixels[i] = drawPixel<uint8_t>();
+            const int32_t cut = random().oneIn(2) ? to.width : 1 + random().below(to.width);
+            const QorImageSize tile{cut, to.height};
+            int32_t bytes = 0;
+            ASSERT_EQ(QOR_OK, call(qoriResizeGetBufferSize_8u, plan, tile, 1, &bytes));
+            const TestImage buffer = block(kBuffer, bytes, 0);
+            const auto fetch = [&](int x, int y) {
+                return pixels[std::clamp(y, 0, from.height - 1) * from.width + std::clamp(x, 0, from.width - 1)];
+            };
+            for (int32_t x0 = 0; x0 < to.width; x0 += cut) {
+                const QorImageSize size{std::min(cut, to.width - x0), to.height};
+                QorPoint2D at{};
+                ASSERT_EQ(QOR_OK, call(qoriResizeGetSrcOffset_8u, plan, QorPoint2D{x0, 0}, &at));
+                const TestImage dst = block(kDst, size.width * size.height, 0);
+                ASSERT_EQ(QOR_OK,
+                          operate<uint8_t>(qoriResizeLinear_8u_C1R, pixels + at.x, from.width, dst.data<uint8_t>(),
+                                           size.width, {x0, 0}, size, borderReplicate, plan, buffer.data<uint8_t>()));
+                for (int y = 0; y < size.height; ++y)
+                    for (int x = 0; x < size.width; ++x)
+                        ASSERT_EQ(reference::linear8u(reference::taps(m, from.width, to.width, x0 + x),
+                                                      reference::taps(m, from.height, to.height, y), fetch),
+                                  dst.data<uint8_t>()[y * size.width + x])
+                            << x0 + x << ", " << y;
+            }
+        }
+}
+
 }  // namespace
 }  // namespace qori::test

@@ -61,15 +61,14 @@ QORI_NOINLINE void halveRowOf(const uint8_t* a, const uint8_t* b, ptrdiff_t late
         prefetchToL2(b + later + 2 * i);
         halveBlock<channels, toEven>(a + 2 * i, b + 2 * i, dst + i);
     }
-    for (; i < bytes; i += kResult) {
-        alignas(kVectorBytes) uint8_t upper[64], lower[64], result[32];
-        const ptrdiff_t rest = bytes - i < kResult ? bytes - i : kResult;
-        for (int part = 0; part < 64; part += 32) {
-            store(upper + part, loadUpTo(a + 2 * i + part, 2 * rest - part));
-            store(lower + part, loadUpTo(b + 2 * i + part, 2 * rest - part));
-        }
-        halveBlock<channels, toEven>(upper, lower, result);
-        storeUpTo(dst + i, load(result), rest);
+    // What is left, by half vectors.
+    for (; i < bytes; i += kStride<channels> / 2) {
+        const ptrdiff_t rest = bytes - i < kStride<channels> / 2 ? bytes - i : kStride<channels> / 2;
+        const auto sums = [=](const uint8_t* row) {
+            return _mm256_maddubs_epi16(pairUp<channels>(loadPartial(row + 2 * i, 2 * rest)).v, _mm256_set1_epi8(1));
+        };
+        const __m256i quarters = quarter<toEven>(_mm256_add_epi16(sums(a), sums(b)));
+        storePartial(dst + i, Bytes{_mm256_packus_epi16(quarters, quarters)}, rest);
     }
 }
 
