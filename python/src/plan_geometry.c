@@ -124,6 +124,7 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
         for (int channels = 1; !status && channels < 5; ++channels)
             if (channels != 2 && buffers[e](plan->memory, r.target, channels, &plan->whole_bytes[channels]))
                 plan->whole_bytes[channels] = 0;
+        for (int channels = 1; channels < 5; ++channels) plan->usual[channels] = usual_form(plan, channels);
         set_border(plan, border);
         set_shapes(plan, r.source, r.target);
         plan->antialias = r.antialias;

@@ -119,45 +119,6 @@ PyObject* plan_address(PyObject* module, PyObject* object) {
     return NULL;
 }
 
-/* Operations by name, looked up once. */
-enum { PLAN_FUNCTIONS = 12 };
-static const char* const function_names[PLAN_FUNCTIONS] = {[RESIZE_PLAN] = "resize",
-                                                           [WARP_PLAN] = "warp_affine",
-                                                           [DCT_PLAN] = "dct_forward",
-                                                           [DFT_PLAN] = "dft_forward",
-                                                           [FFT_PLAN] = "fft_forward",
-                                                           [HISTOGRAM_PLAN] = "histogram",
-                                                           [LINEAR_FILTER_PLAN] = "filter_linear_border",
-                                                           [ADAPTIVE_PLAN] = "threshold_adaptive_gauss",
-                                                           [HOG_PLAN] = "hog",
-                                                           "dct_inverse",
-                                                           "dft_inverse",
-                                                           "fft_inverse"};
-static const Operation* functions[PLAN_FUNCTIONS];
-
-static void find_functions(void) {
-    for (int i = 0; i < PLAN_FUNCTIONS; ++i) {
-        functions[i] = all_operations;
-        while (strcmp(functions[i]->name, function_names[i])) ++functions[i];
-    }
-}
-
-/* The operation with the plan put behind its first argument. */
-static PyObject* with_plan(const Operation* operation, PyObject* self, PyObject* const* arguments, Py_ssize_t count,
-                           PyObject* names) {
-    PyObject* all[MAX_PARAMETERS + 1];
-    const Py_ssize_t keywords = names ? PyTuple_Size(names) : 0;
-    if (count < 1 || count + keywords >= MAX_PARAMETERS) {
-        PyErr_Format(PyExc_TypeError, "%s: %zd positional arguments came; the first is the image", operation->name,
-                     count);
-        return NULL;
-    }
-    all[0] = arguments[0];
-    all[1] = self;
-    memcpy(all + 2, arguments + 1, (size_t)(count + keywords - 1) * sizeof *all);
-    return run(operation, all, count + 1, names);
-}
-
 static int is_transform(int kind) { return kind == DCT_PLAN || kind == DFT_PLAN || kind == FFT_PLAN; }
 
 /* The protocol of calls without a tuple: in the limited API from 3.12 on, with the flag and the member that 3.11 has.
@@ -166,46 +127,10 @@ static int is_transform(int kind) { return kind == DCT_PLAN || kind == DFT_PLAN 
 #define Py_TPFLAGS_HAVE_VECTORCALL (1UL << 11)
 #endif
 
-PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t count, PyObject* names) {
-    return with_plan(functions[((Plan*)self)->kind], self, arguments, (Py_ssize_t)(count & ~((size_t)1 << 63)), names);
-}
-
 static PyMemberDef plan_members[] = {{"__vectorcalloffset__", T_PYSSIZET, offsetof(Plan, vectorcall), READONLY, NULL},
                                      {NULL, 0, 0, 0, NULL}};
 
 static PyMemberDef no_members[] = {{NULL, 0, 0, 0, NULL}};
-
-static PyObject* call_plan(PyObject* self, PyObject* arguments, PyObject* keywords) {
-    PyObject *all[MAX_PARAMETERS], *names = NULL, *result = NULL;
-    const Operation* operation = functions[((Plan*)self)->kind];
-    const Py_ssize_t count = PyTuple_Size(arguments), more = keywords ? PyDict_Size(keywords) : 0;
-    if (count + more >= MAX_PARAMETERS) {
-        PyErr_Format(PyExc_TypeError, "%s: %zd arguments came", operation->name, count + more);
-        return NULL;
-    }
-    for (Py_ssize_t i = 0; i < count; ++i) all[i] = PyTuple_GetItem(arguments, i);
-    if (more) {
-        names = PyTuple_New(more);
-        if (!names) return NULL;
-        Py_ssize_t position = 0, i = 0;
-        PyObject *key, *value;
-        while (PyDict_Next(keywords, &position, &key, &value)) {
-            PyTuple_SetItem(names, i, Py_NewRef(key));
-            all[count + i++] = value;
-        }
-    }
-    result = with_plan(operation, self, all, count, names);
-    Py_XDECREF(names);
-    return result;
-}
-
-static PyObject* forward(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
-    return with_plan(functions[((Plan*)self)->kind], self, arguments, count, names);
-}
-
-static PyObject* inverse(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
-    return with_plan(functions[HOG_PLAN + 1 + ((Plan*)self)->kind - DCT_PLAN], self, arguments, count, names);
-}
 
 static PyObject* get_source_shape(PyObject* self, void* unused) {
     (void)unused;
@@ -251,9 +176,9 @@ static PyGetSetDef histogram_attributes[] = {{"dtype", get_dtype, NULL, "Name of
                                              {NULL, NULL, NULL, NULL, NULL}};
 
 static PyMethodDef transform_methods[] = {
-    {"forward", (PyCFunction)(void (*)(void))forward, METH_FASTCALL | METH_KEYWORDS,
+    {"forward", (PyCFunction)(void (*)(void))plan_forward, METH_FASTCALL | METH_KEYWORDS,
      "forward($self, src, out=None, **keywords)\n--\n\nThe spectrum of an image."},
-    {"inverse", (PyCFunction)(void (*)(void))inverse, METH_FASTCALL | METH_KEYWORDS,
+    {"inverse", (PyCFunction)(void (*)(void))plan_inverse, METH_FASTCALL | METH_KEYWORDS,
      "inverse($self, src, out=None, **keywords)\n--\n\nThe image of a spectrum."},
     {NULL, NULL, 0, NULL}};
 static PyMethodDef resize_methods[] = {
@@ -287,7 +212,7 @@ static const PlanType plan_types[PLAN_TYPES] = {
     [HOG_PLAN] = {"qori.HogPlan", HOG_DOC, make_hog, no_methods, hog_attributes}};
 
 int make_plan_types(PyObject* module) {
-    find_functions();
+    find_plan_functions();
     for (int kind = 0; kind < PLAN_TYPES; ++kind) {
         const PlanType* t = &plan_types[kind];
         PyType_Slot slots[] = {{Py_tp_doc, (void*)t->doc},

@@ -27,6 +27,7 @@ typedef struct Plan {
     int32_t top, left, bottom, right; /* what the operation may read around the source */
     int32_t buffer_bytes;             /* where it does not depend on the call */
     int32_t whole_bytes[5];           /* resize, by channels: of the whole destination; 0: unknown */
+    const Form* usual[5];             /* resize, by channels: what plan(src, out=...) takes; null: nothing */
     int32_t counts[4];                /* histograms: levels of each channel */
     int32_t kernel_height, kernel_width, kernel_type;
     int32_t descriptor; /* elements of one descriptor */
@@ -36,7 +37,15 @@ typedef struct Plan {
     PyObject* text; /* what repr says */
 } Plan;
 
-PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t count, PyObject* names);
+/* plan_calls.c */
+void find_plan_functions(void);
+const Form* usual_form(const Plan* plan, int channels);
+PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t flags, PyObject* names);
+PyObject* call_plan(PyObject* self, PyObject* arguments, PyObject* keywords);
+PyObject* plan_forward(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names);
+PyObject* plan_inverse(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names);
+
+/* plans.c */
 int make_plan_types(PyObject* module);
 /* The plan of an argument, or null with an exception set. */
 const Plan* plan_of(const Call* call, PyObject* object);
