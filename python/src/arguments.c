@@ -225,18 +225,24 @@ int read_word(const Call* call, const char* name, PyObject* object, const Enumer
     return 0;
 }
 
+/* Room for another array of the call, or null with an exception set. */
+Image* next_array(Call* call, const char* name) {
+    if (call->array_count == (int)(sizeof call->arrays / sizeof *call->arrays)) {
+        refuse(PyExc_ValueError, call, name, "more arrays came than a call holds");
+        return NULL;
+    }
+    Image* image = &call->arrays[call->array_count];
+    image->held = 0;
+    return image;
+}
+
 /* A buffer that the call holds to its end; its element type, or -1. */
 static int hold(Call* call, const char* name, PyObject* object, int dimensions, Py_buffer** held) {
-    if (call->view_count == (int)(sizeof call->views / sizeof *call->views))
-        return refuse(PyExc_ValueError, call, name, "more arrays came than a call holds");
-    Image image;
-    image.held = 0;
-    if (acquire(call, object, name, &image, SRC)) {
-        /* Lists of one to three dimensions are no images: what an image would be refused for may be in order here. */
-        return -1;
-    }
-    call->views[call->view_count] = image.view;
-    Py_buffer* view = &call->views[call->view_count++];
+    /* In its place from the first: the shape of a buffer may be a part of the buffer itself. */
+    Image* image = next_array(call, name);
+    if (!image || acquire(call, object, name, image, SRC)) return -1;
+    ++call->array_count;
+    Py_buffer* view = &image->view;
     if (view->ndim > dimensions)
         return refuse(PyExc_ValueError, call, name, "an array of %d dimensions came; accepted are %d", view->ndim,
                       dimensions);
@@ -244,7 +250,7 @@ static int hold(Call* call, const char* name, PyObject* object, int dimensions, 
         return refuse(PyExc_ValueError, call, name,
                       "an array that is not contiguous came; numpy.ascontiguousarray copies it");
     *held = view;
-    return image.element;
+    return image->element;
 }
 
 static int wrong_elements(const Call* call, const char* name, int came, int wanted) {

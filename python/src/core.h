@@ -253,8 +253,8 @@ typedef struct Call {
     int64_t buffer_bytes;
     void* blocks[12]; /* memory of the call, freed at its end */
     int block_count;
-    Py_buffer views[12]; /* buffers of kernels and lists */
-    int view_count;
+    Image arrays[12]; /* of kernels and lists */
+    int array_count;
     int32_t counts[4]; /* entries of lists */
     int32_t list_elements;
     PyObject* made;  /* the destination that the call allocates: a new reference */
@@ -293,6 +293,8 @@ extern const char* const element_names[ELEMENTS];
 int refuse(PyObject* kind, const Call* call, const char* argument, const char* format, ...);
 /* Sets qori.Error, or warns; 0 where the call may go on. */
 int status_result(const Call* call, const char* member, int status);
+/* The C member that a call with a form calls. */
+const char* member_of(const Call* call);
 const char* describe(const Image* image, char text[96]);
 PyObject* no_form(const Call* call);
 
@@ -300,8 +302,12 @@ PyObject* no_form(const Call* call);
 int acquire(const Call* call, PyObject* object, const char* name, Image* image, int which);
 void release(Image* image);
 PyObject* make_array(int element, int height, int width, int channels, int dimensions);
+/* A new array (height, width) whose rows follow each other without gaps. */
+PyObject* make_packed(int element, int height, int width, int dimensions);
 int element_of_type(PyObject* dtype);
 int overlapping(const Image* a, const Image* b);
+/* Whether a block of elements lies among an image's bytes. */
+int among(const void* block, Py_ssize_t bytes, const Image* image);
 extern const uint8_t element_bytes[ELEMENTS];
 
 /* --- arguments.c --- */
@@ -316,6 +322,7 @@ int read_lists(Call* call, const char* name, PyObject* object, int element, int 
                int32_t* counts);
 int read_kernel(Call* call, const char* name, PyObject* object, int* element, int32_t* height, int32_t* width,
                 void** data);
+Image* next_array(Call* call, const char* name);
 int read_points(Call* call, const char* name, PyObject* object, void** data, int32_t* count);
 void* allocate(Call* call, size_t bytes);
 

@@ -61,13 +61,18 @@ static int make_out(Call* call, int height, int width) {
         return refuse(shared.error, call, NULL, "a destination of (%d, %d) pixels came; accepted are sides from 1 on",
                       height, width);
     const Image* source = &call->images[SRC];
-    const int dimensions = channels > 1                                                                  ? 3
+    const int dimensions = channels > 1                 ? 3
+                           : form->extent == EXTENT_ROW ? 1 /* one for each column */
                            : source->held && source->dimensions == 3 && (source->layout & CHANNELS) == 1 ? 3
                                                                                                          : 2;
-    call->made = make_array(form->target, height, width, channels, dimensions);
+    /* Members that take no step write rows without gaps. */
+    call->made = form->contiguous_out && dimensions < 3 ? make_packed(form->target, height, width, dimensions)
+                                                        : make_array(form->target, height, width, channels, dimensions);
     if (!call->made || acquire(call, call->made, "out", &call->images[OUT], OUT)) return -1;
+    const Image* out = &call->images[OUT];
     if (call->plan && call->plan->kind == WARP_PLAN && call->plan->antialias) /* pixels that the border leaves out */
-        memset(call->images[OUT].data, 0, (size_t)call->images[OUT].view.len);
+        for (int32_t y = 0; y < out->height; ++y)
+            memset(out->data + y * out->step, 0, (size_t)(out->width * pixel_bytes(out)));
     return 0;
 }
 

@@ -17,7 +17,7 @@ Call* start_call(Call* call, const Operation* operation) {
     call->top = call->left = call->bottom = call->right = 0;
     call->plan = NULL;
     call->kernel = NULL;
-    call->block_count = call->view_count = call->value_count = call->small_used = 0;
+    call->block_count = call->array_count = call->value_count = call->small_used = 0;
     call->made = call->lists = NULL;
     for (int i = 0; i < IMAGES; ++i) call->images[i].held = 0;
     return call;
@@ -25,7 +25,7 @@ Call* start_call(Call* call, const Operation* operation) {
 
 void free_call(Call* call) {
     for (int i = 0; i < IMAGES; ++i) release(&call->images[i]);
-    while (call->view_count) PyBuffer_Release(&call->views[--call->view_count]);
+    while (call->array_count) release(&call->arrays[--call->array_count]);
     while (call->block_count) free(call->blocks[--call->block_count]);
     Py_CLEAR(call->made);
     Py_CLEAR(call->lists);
@@ -44,13 +44,9 @@ static int prepare(Call* call) {
     if (call->form->extent == EXTENT_BLOCKS && special_outputs(call)) return -1;
     if (call->form->extent == EXTENT_WINDOWS && descriptors(call)) return -1;
     if (call->kernel && call->form->extent != EXTENT_WINDOWS && call->images[OUT].held) {
-        Image list = {.data = call->kernel,
-                      .height = 1,
-                      .width = call->kernel_height * call->kernel_width,
-                      .element = (uint8_t)call->kernel_element,
-                      .layout = 1,
-                      .step = 1};
-        if (overlapping(&list, &call->images[OUT]))
+        const Py_ssize_t bytes =
+            (Py_ssize_t)call->kernel_height * call->kernel_width * element_bytes[call->kernel_element];
+        if (among(call->kernel, bytes, &call->images[OUT]))
             return refuse(PyExc_ValueError, call, "out",
                           "an array that shares memory with the kernel came; pass a copy");
     }
@@ -61,8 +57,7 @@ PyObject* member_for(const Operation* operation, PyObject* const* arguments, Py_
     Call call;
     PyObject* result = NULL;
     start_call(&call, operation);
-    if (!bind(&call, arguments, count, names) && !prepare(&call))
-        result = PyUnicode_FromString(call.in_place ? call.form->in_place_name : call.form->name);
+    if (!bind(&call, arguments, count, names) && !prepare(&call)) result = PyUnicode_FromString(member_of(&call));
     free_call(&call);
     return result;
 }
@@ -80,7 +75,7 @@ int invoke(const Call* call) {
     } else {
         status = trampoline(function, call->slots);
     }
-    return status ? status_result(call, form->name, status) : 0;
+    return status ? status_result(call, member_of(call), status) : 0;
 }
 
 PyObject* run(const Operation* operation, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {

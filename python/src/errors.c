@@ -39,6 +39,8 @@ static void add_steps(const Call* call, char* text, size_t bytes) {
     }
 }
 
+const char* member_of(const Call* call) { return call->in_place ? call->form->in_place_name : call->form->name; }
+
 int status_result(const Call* call, const char* member, int status) {
     if (!status) return 0;
     const Status* found = status_of(status);

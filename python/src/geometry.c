@@ -190,8 +190,10 @@ static int frame_extent(Call* call, int32_t* height, int32_t* width) {
     if (call->given >> after & 1) {
         if (pair_of(call, after, &bottom, &right)) return -1;
     } else if (out->held) {
-        bottom = out->height - src->height - (top > 0 ? top : 0);
-        right = out->width - src->width - (left > 0 ? left : 0);
+        const int64_t below = (int64_t)out->height - src->height - top,
+                      beside = (int64_t)out->width - src->width - left;
+        bottom = below < 0 ? -1 : below > INT32_MAX ? INT32_MAX : (int32_t)below;
+        right = beside < 0 ? -1 : beside > INT32_MAX ? INT32_MAX : (int32_t)beside;
     } else {
         bottom = top;
         right = left;

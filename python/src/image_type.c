@@ -27,8 +27,11 @@ static int get_buffer(PyObject* object, Py_buffer* view, int flags) {
         contiguous &= image->strides[i] == packed || image->shape[i] < 2;
         packed *= image->shape[i];
     }
-    if (!contiguous && (flags & PyBUF_STRIDES) != PyBUF_STRIDES) {
-        PyErr_SetString(PyExc_BufferError, "rows of a qori.Image are padded: strides are needed");
+    /* What asks for an order of its own besides strides takes the elements as one block. */
+    const int ordered = flags & ((PyBUF_C_CONTIGUOUS | PyBUF_ANY_CONTIGUOUS) & ~PyBUF_STRIDES);
+    const int columns_first = (flags & PyBUF_F_CONTIGUOUS) == PyBUF_F_CONTIGUOUS && image->dimensions > 1;
+    if ((!contiguous && (ordered || (flags & PyBUF_STRIDES) != PyBUF_STRIDES)) || columns_first) {
+        PyErr_SetString(PyExc_BufferError, "rows of a qori.Image are padded, and not columns: strides are needed");
         view->obj = NULL;
         return -1;
     }
@@ -99,14 +102,8 @@ static void* allocate_pixels(int element, int channels, int width, int height, i
     }
 }
 
-PyObject* new_image(int element, int height, int width, int channels, int dimensions) {
-    int32_t step = 0;
-    /* The library measures steps and blocks modulo 2^32. */
-    const int64_t row = ((int64_t)width * channels * element_bytes[element] + 63) / 64 * 64;
-    void* data = row > INT32_MAX || row * height > (int64_t)1 << 31
-                     ? NULL
-                     : allocate_pixels(element, channels, width, height, &step);
-    if (!data) return PyErr_NoMemory();
+/* An object that owns the memory, which is released where there is none. */
+static PyObject* image_of(void* data, int step, int element, int height, int width, int channels, int dimensions) {
     ImageObject* image =
         (ImageObject*)((allocfunc)PyType_GetSlot(shared.image_type, Py_tp_alloc))(shared.image_type, 0);
     if (!image) {
@@ -125,6 +122,22 @@ PyObject* new_image(int element, int height, int width, int channels, int dimens
     return (PyObject*)image;
 }
 
+PyObject* new_image(int element, int height, int width, int channels, int dimensions) {
+    int32_t step = 0;
+    /* The library measures steps and blocks modulo 2^32. */
+    const int64_t row = ((int64_t)width * channels * element_bytes[element] + 63) / 64 * 64;
+    void* data = row > INT32_MAX || row * height > (int64_t)1 << 31
+                     ? NULL
+                     : allocate_pixels(element, channels, width, height, &step);
+    return data ? image_of(data, step, element, height, width, channels, dimensions) : PyErr_NoMemory();
+}
+
+PyObject* new_packed_image(int element, int height, int width, int dimensions) {
+    const int64_t row = (int64_t)width * element_bytes[element];
+    void* data =
+        row > INT32_MAX || row * height > INT32_MAX ? NULL : qoriMalloc_8u_C1((int)(row * height), 1, &(int){0});
+    return data ? image_of(data, (int)row, element, height, width, 1, dimensions) : PyErr_NoMemory();
+}
 PyObject* empty_image(PyObject* module, PyObject* arguments, PyObject* keywords) {
     static char* names[] = {"shape", "dtype", NULL};
     PyObject *shape, *dtype = NULL;

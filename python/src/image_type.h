@@ -14,5 +14,7 @@ int make_image_type(PyObject* module);
 PyObject* empty_image(PyObject* module, PyObject* arguments, PyObject* keywords);
 /* dimensions 2 leaves out the channels, 1 the height too. */
 PyObject* new_image(int element, int height, int width, int channels, int dimensions);
+/* One channel, without gaps between the rows. */
+PyObject* new_packed_image(int element, int height, int width, int dimensions);
 
 #endif

@@ -62,11 +62,12 @@ static int refuse_format(const Call* call, PyObject* object, const char* name) {
     } else {
         PyErr_Clear();
     }
-    const char* why = strchr(format, '>') || strchr(format, '!') ? "big-endian elements"
-                      : strchr(format, 'e')                      ? "float16 elements"
-                      : strchr(format, 'O')                      ? "Python objects as elements"
-                      : strchr(format, '?')                      ? "boolean elements"
-                                                                 : "elements of another type";
+    const char* why = !strncmp(format, "T{", 2)                    ? "structures as elements"
+                      : strchr(format, '>') || strchr(format, '!') ? "big-endian elements"
+                      : strchr(format, 'e')                        ? "float16 elements"
+                      : strchr(format, 'O')                        ? "Python objects as elements"
+                      : strchr(format, '?')                        ? "boolean elements"
+                                                                   : "elements of another type";
     return refuse(
         PyExc_TypeError, call, name,
         "an array with %s (format '%s') came; accepted are uint8, int8, uint16, int16, uint32, int32, float32, "
@@ -78,6 +79,8 @@ static int refuse_format(const Call* call, PyObject* object, const char* name) {
 static int lay_out(const Call* call, const char* name, Image* image) {
     const Py_buffer* v = &image->view;
     const Py_ssize_t item = v->itemsize;
+    Py_ssize_t packed[3];
+    const Py_ssize_t* strides = v->strides;
     static const char* const steps =
         "steps of %zd bytes between %s came; accepted are contiguous pixels "
         "(numpy.ascontiguousarray makes a copy)%s";
@@ -87,6 +90,11 @@ static int lay_out(const Call* call, const char* name, Image* image) {
         return refuse(PyExc_ValueError, call, name,
                       "an array of %d dimensions came; accepted are (height, width) and (height, width, channels)",
                       v->ndim);
+    if (!strides) { /* ctypes leaves out those of contiguous arrays */
+        Py_ssize_t bytes = item;
+        for (int i = v->ndim; i-- > 0; bytes *= v->shape[i]) packed[i] = bytes;
+        strides = packed;
+    }
     const int flat = v->ndim == 1;
     const Py_ssize_t height = flat ? 1 : v->shape[0], width = v->shape[flat ? 0 : 1],
                      channels = v->ndim == 3 ? v->shape[2] : 1;
@@ -100,13 +108,13 @@ static int lay_out(const Call* call, const char* name, Image* image) {
     image->width = (int32_t)width;
     image->layout = (uint8_t)channels;
     Py_ssize_t pixel = item * channels;
-    const Py_ssize_t across = v->strides[flat ? 0 : 1];
-    if (channels > 1 && v->strides[2] != item) {
+    const Py_ssize_t across = strides[flat ? 0 : 1];
+    if (channels > 1 && strides[2] != item) {
         if (width > 1 && across != item)
-            return refuse(PyExc_ValueError, call, name, steps, v->strides[2], "channels",
+            return refuse(PyExc_ValueError, call, name, steps, strides[2], "channels",
                           "; planes are taken too: (height, width, channels) views of contiguous rows");
         image->layout |= PLANAR;
-        image->plane = v->strides[2];
+        image->plane = strides[2];
         pixel = item;
     } else if (width > 1 && across != pixel) {
         return refuse(PyExc_ValueError, call, name, steps, across, "pixels",
@@ -115,7 +123,7 @@ static int lay_out(const Call* call, const char* name, Image* image) {
                                                         : "");
     }
     const Py_ssize_t row = width * pixel;
-    image->step = height > 1 ? v->strides[0] : row ? row : 1;
+    image->step = height > 1 ? strides[0] : row ? row : 1;
     if (image->step > INT32_MAX || image->step < INT32_MIN)
         return refuse(
             PyExc_ValueError, call, name,
@@ -169,7 +177,7 @@ int acquire(const Call* call, PyObject* object, const char* name, Image* image, 
             PyBuffer_Release(&image->view);
             return refuse_format(call, object, name);
         }
-        if (!shared.ndarray) find_numpy(0);
+        if (!shared.ndarray && find_numpy(0)) PyErr_Clear(); /* a NumPy that does not load is none */
     }
     image->element = (uint8_t)element;
     if (lay_out(call, name, image)) {
@@ -209,6 +217,22 @@ int overlapping(const Image* a, const Image* b) {
     Py_ssize_t apart = (b->data - a->data) % step;
     if (apart < 0) apart += step;
     return apart < bytes_a || apart + bytes_b > step;
+}
+
+int among(const void* block, Py_ssize_t bytes, const Image* image) {
+    const uint8_t *low, *high, *first = block;
+    if (bytes < 1 || image->height < 1 || image->width < 1) return 0;
+    bounds(image, &low, &high);
+    return first < high && low < first + bytes;
+}
+
+PyObject* make_packed(int element, int height, int width, int dimensions) {
+    if (!shared.empty && find_numpy(1)) {
+        if (!PyErr_ExceptionMatches(PyExc_ImportError)) return NULL;
+        PyErr_Clear();
+        return new_packed_image(element, height, width, dimensions);
+    }
+    return make_array(element, height, width, 1, dimensions);
 }
 
 /* A new array, of NumPy where that is to be had, else a qori.Image; dimensions 2 leaves out the channels. */

@@ -85,11 +85,18 @@ int find_numpy(int import_it) {
 /* --- module ---------------------------------------------------------------------------------------------------------
  */
 
+static int require_features(int avx2, int fma) {
+    if (avx2 && fma) return 0;
+    PyErr_Format(PyExc_ImportError, "qori needs a processor with AVX2 and FMA, and this one has no %s",
+                 avx2  ? "FMA"
+                 : fma ? "AVX2"
+                       : "AVX2 and no FMA");
+    return -1;
+}
+
 static int check_processor(void) {
     __builtin_cpu_init();
-    if (__builtin_cpu_supports("avx2") && __builtin_cpu_supports("fma")) return 0;
-    PyErr_SetString(PyExc_ImportError, "qori needs a processor with AVX2 and FMA, and this one has not both");
-    return -1;
+    return require_features(__builtin_cpu_supports("avx2"), __builtin_cpu_supports("fma"));
 }
 
 /* Interned names and types are of the interpreter that imports first. */
@@ -149,11 +156,21 @@ static PyObject* member(PyObject* module, PyObject* const* arguments, Py_ssize_t
     return NULL;
 }
 
+/* What an import does on a processor with or without the two. */
+static PyObject* require(PyObject* module, PyObject* arguments) {
+    int avx2, fma;
+    (void)module;
+    if (!PyArg_ParseTuple(arguments, "pp:_require", &avx2, &fma) || require_features(avx2, fma)) return NULL;
+    return Py_NewRef(Py_None);
+}
+
 static PyMethodDef more_methods[] = {
     {"version", version, METH_NOARGS, "version()\n--\n\nVersion of the library, as '8.2.0'."},
     {"_members", members, METH_NOARGS, "_members()\n--\n\n(function, C member, in-place C member) of every form."},
     {"_member", (PyCFunction)(void (*)(void))member, METH_FASTCALL | METH_KEYWORDS,
      "_member(function, /, *arguments, **keywords)\n--\n\nThe C member that the function would call."},
+    {"_require", require, METH_VARARGS,
+     "_require(avx2, fma, /)\n--\n\nImportError as on a processor without one of them."},
     {"_address", plan_address, METH_O, "_address(plan, /)\n--\n\nWhere the plan's memory is."},
     {"empty", (PyCFunction)(void (*)(void))empty_image, METH_VARARGS | METH_KEYWORDS, EMPTY_DOC},
     {NULL, NULL, 0, NULL}};

@@ -4,21 +4,31 @@
 
 #include "steps.h"
 
+/* Whether a list to be written lies among what is read or what else is written; with an exception set. */
+static int shares_memory(const Call* call, Image* list) {
+    int shared_with = call->images[SRC].held && overlapping(list, &call->images[SRC]);
+    for (int i = 0; i < call->array_count && !shared_with; ++i) shared_with = overlapping(list, &call->arrays[i]);
+    if (!shared_with) return 0;
+    release(list);
+    return refuse(PyExc_ValueError, call, "out",
+                  "an array that shares memory with another argument came; accepted are arrays apart: pass a copy");
+}
+
 /* An array of the call's own, or the one given, as memory for `count` int32 or elements. */
 static int list_memory(Call* call, PyObject* given, int element, int count, PyObject** array, void** data) {
-    Image image;
-    image.held = 0;
+    Image* image = next_array(call, "out");
+    if (!image) return -1;
     *array = given ? Py_NewRef(given) : make_array(element, 1, count, 1, 1);
     if (!*array) return -1;
-    if (acquire(call, *array, "out", &image, OUT)) return -1;
-    call->views[call->view_count++] = image.view;
-    if (image.view.readonly) return check_writable(call, &image, "out");
-    if (image.element != element || image.dimensions != 1 || image.width != count ||
-        image.view.strides[0] != image.view.itemsize)
+    if (acquire(call, *array, "out", image, OUT)) return -1;
+    if (given && shares_memory(call, image)) return -1;
+    ++call->array_count;
+    if (image->view.readonly) return check_writable(call, image, "out");
+    if (image->element != element || image->dimensions != 1 || image->width != count)
         return refuse(PyExc_ValueError, call, "out",
                       "an array of another type or length came; accepted is %s (%d,), contiguous",
                       element_names[element], count);
-    *data = image.data;
+    *data = image->data;
     return 0;
 }
 
@@ -99,7 +109,7 @@ int descriptors(Call* call) {
     Image* out = &call->images[OUT];
     if (!out->held) {
         if (count < 1) return refuse(PyExc_ValueError, call, "locations", "none came; accepted is one or more");
-        call->made = make_array(F32, count, call->plan->descriptor, 1, 2);
+        call->made = make_packed(F32, count, call->plan->descriptor, 2);
         if (!call->made || acquire(call, call->made, "out", out, OUT)) return -1;
         memset(out->data, 0, (size_t)count * (size_t)call->plan->descriptor * sizeof(float));
         return 0;

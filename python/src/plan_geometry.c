@@ -71,6 +71,25 @@ static int resize_word(const Call* call, PyObject* word, ResizeArguments* r) {
         "%.80R came; accepted are 'nearest', 'linear', 'cubic', 'lanczos', 'lanczos2', 'lanczos3' and 'super'", word);
 }
 
+/* Whether the interpolation can make the target of the source; the library's own words name no interpolation. */
+static int resizes(const Call* call, const ResizeArguments* r) {
+    const QorImageSize s = r->source, t = r->target;
+    if (r->interpolation == interpSuper && (t.height > s.height || t.width > s.width))
+        return refuse(PyExc_ValueError, call, "dst_shape",
+                      "(%d, %d) came; 'super' reduces: accepted are sides up to those of src_shape, (%d, %d), and "
+                      "'linear', 'cubic' and 'lanczos' enlarge",
+                      t.height, t.width, s.height, s.width);
+    const int32_t least = r->interpolation == interpLinear    ? 2
+                          : r->interpolation == interpCubic   ? 4
+                          : r->interpolation == interpLanczos ? (r->lobes == 3 ? 6 : 4)
+                                                              : 1;
+    if (s.height > 0 && s.width > 0 && (s.height < least || s.width < least))
+        return refuse(PyExc_ValueError, call, "src_shape",
+                      "(%d, %d) came; accepted for this interpolation are sides from %d on, and 'nearest' takes any",
+                      s.height, s.width, least);
+    return 0;
+}
+
 PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keywords) {
     static char* names[] = {"src_shape", "dst_shape", "interpolation", "dtype", "antialias", "b", "c", "lobes", NULL};
     static QorResult (*const sizes[])(QorImageSize, QorImageSize, int32_t, int32_t, int32_t*, int32_t*) = {
@@ -88,8 +107,8 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
     Call call;
     int element, lobes = 3;
     named(&call, &operation, "ResizePlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "OO|OO$pddi:ResizePlan", names, &source, &target, &word,
-                                     &dtype, &r.antialias, &r.b, &r.c, &lobes))
+    if (!parse(&call, arguments, keywords, "OO|OO$pddi:ResizePlan", names, &source, &target, &word, &dtype,
+               &r.antialias, &r.b, &r.c, &lobes))
         return NULL;
     r.lobes = (uint32_t)lobes;
     if (shape_of(&call, "src_shape", source, &r.source) || shape_of(&call, "dst_shape", target, &r.target) ||
@@ -103,16 +122,11 @@ PyObject* make_resize(PyTypeObject* type, PyObject* arguments, PyObject* keyword
                "plans without antialias take float64");
         return NULL;
     }
+    if (resizes(&call, &r)) return NULL;
     const int e = slots_of_elements[element];
     int32_t plan_bytes = 0, init_bytes = 0;
     int status = sizes[e](r.source, r.target, r.interpolation, r.antialias, &plan_bytes, &init_bytes);
-    if (status) {
-        if (status > 0)
-            refuse(shared.error, &call, NULL, "shapes without pixels came; accepted are sides from 1 on");
-        else
-            status_result(&call, "qoriResizeGetSize", status);
-        return NULL;
-    }
+    if (sizes_known(&call, "qoriResizeGetSize", status)) return NULL;
     Plan* plan = new_plan(type, RESIZE_PLAN, r.variant, element);
     const char* member = "";
     if (!plan) return NULL;
@@ -164,8 +178,8 @@ PyObject* resize_src_roi(PyObject* self, PyObject* rect) {
     Call call;
     QorImageRect wanted, source, target;
     named(&call, &operation, "src_roi");
-    if (!PyTuple_Check(rect) || !PyArg_ParseTuple(rect, "iiii;rect: accepted is (row, column, height, width)",
-                                                  &wanted.y, &wanted.x, &wanted.height, &wanted.width)) {
+    if (!PyTuple_Check(rect) || !parse(&call, rect, NULL, "iiii;rect: accepted is (row, column, height, width)", NULL,
+                                       &wanted.y, &wanted.x, &wanted.height, &wanted.width)) {
         if (!PyErr_Occurred())
             refuse(PyExc_TypeError, &call, "rect", "%.80R came; accepted is (row, column, height, width)", rect);
         return NULL;
@@ -218,9 +232,8 @@ PyObject* make_warp(PyTypeObject* type, PyObject* arguments, PyObject* keywords)
     Operation operation;
     Call call;
     named(&call, &operation, "WarpAffinePlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "OOO|OOi$pOOdd:WarpAffinePlan", names, &source_shape,
-                                     &target_shape, &matrix, &word, &dtype, &channels, &inverse, &border_word, &value,
-                                     &b, &c))
+    if (!parse(&call, arguments, keywords, "OOO|OOi$pOOdd:WarpAffinePlan", names, &source_shape, &target_shape, &matrix,
+               &word, &dtype, &channels, &inverse, &border_word, &value, &b, &c))
         return NULL;
     if (shape_of(&call, "src_shape", source_shape, &source) || shape_of(&call, "dst_shape", target_shape, &target) ||
         coefficients_of(&call, matrix, coefficients) ||
@@ -237,10 +250,7 @@ PyObject* make_warp(PyTypeObject* type, PyObject* arguments, PyObject* keywords)
     if (value && read_values(&call, "border_value", value, F64, channels, values)) return NULL;
     int status = qoriWarpAffineGetSize(source, target, type_code(element), coefficients, interpolation, inverse, border,
                                        &plan_bytes, &init_bytes);
-    if (status) {
-        status_result(&call, "qoriWarpAffineGetSize", status);
-        return NULL;
-    }
+    if (sizes_known(&call, "qoriWarpAffineGetSize", status)) return NULL;
     Plan* plan = new_plan(type, WARP_PLAN,
                           interpolation == interpNearest  ? PLAN_NEAREST
                           : interpolation == interpLinear ? PLAN_LINEAR

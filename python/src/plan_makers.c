@@ -15,15 +15,12 @@ PyObject* make_dct(PyTypeObject* type, PyObject* arguments, PyObject* keywords) 
     Operation operation;
     Call call;
     named(&call, &operation, "DctPlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "O|$O:DctPlan", names, &shape, &word) ||
+    if (!parse(&call, arguments, keywords, "O|$O:DctPlan", names, &shape, &word) ||
         shape_of(&call, "shape", shape, &size) ||
         (word && read_word(&call, "hint", word, enumeration_named("QorAccuracyHint"), 0, &hint)))
         return NULL;
     int status = qoriDCTFwdGetSize_32f(size, hint, &plan_bytes, &init_bytes, &buffer_bytes);
-    if (status) {
-        status_result(&call, "qoriDCTFwdGetSize_32f", status);
-        return NULL;
-    }
+    if (sizes_known(&call, "qoriDCTFwdGetSize_32f", status)) return NULL;
     Plan* plan = new_plan(type, DCT_PLAN, PLAN_ANY, F32);
     if (!plan) return NULL;
     uint8_t* init = allocate(&call, (size_t)init_bytes);
@@ -79,7 +76,7 @@ static PyObject* make_fourier(PyTypeObject* type, PyObject* arguments, PyObject*
     Operation operation;
     Call call;
     named(&call, &operation, name);
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "O|O$OO", names, &shape, &dtype, &norm, &hint) ||
+    if (!parse(&call, arguments, keywords, "O|O$OO", names, &shape, &dtype, &norm, &hint) ||
         shape_of(&call, "shape", shape, &f.size) ||
         (norm && read_word(&call, "norm", norm, enumeration_named("QorFftNormFlag"), 0, &f.norm)) ||
         (hint && read_word(&call, "hint", hint, enumeration_named("QorAccuracyHint"), 0, &f.hint)))
@@ -132,8 +129,8 @@ PyObject* make_histogram(PyTypeObject* type, PyObject* arguments, PyObject* keyw
     Operation operation;
     Call call;
     named(&call, &operation, "HistogramPlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "O|Oi$OO:HistogramPlan", names, &levels, &dtype, &channels,
-                                     &lower, &upper) ||
+    if (!parse(&call, arguments, keywords, "O|Oi$OO:HistogramPlan", names, &levels, &dtype, &channels, &lower,
+               &upper) ||
         element_from(&call, dtype, "'uint8', 'uint16', 'int16' and 'float32'",
                      1u << U8 | 1u << U16 | 1u << I16 | 1u << F32, &element))
         return NULL;
@@ -141,6 +138,8 @@ PyObject* make_histogram(PyTypeObject* type, PyObject* arguments, PyObject* keyw
         refuse(PyExc_ValueError, &call, "channels", "%d came; accepted are 1, 3 and 4", channels);
         return NULL;
     }
+    if (lower == Py_None) lower = NULL;
+    if (upper == Py_None) upper = NULL;
     const int uniform = lower && upper;
     if (!lower != !upper) {
         refuse(PyExc_TypeError, &call, "lower", "lower and upper come together, with a number of levels");
@@ -156,7 +155,7 @@ PyObject* make_histogram(PyTypeObject* type, PyObject* arguments, PyObject* keyw
         status =
             qoriHistogramGetBufferSize(type_code(element), any, counts, channels, uniform, &plan_bytes, &buffer_bytes);
     if (failed || status) {
-        if (!failed) status_result(&call, "qoriHistogramGetBufferSize", status);
+        if (!failed) sizes_known(&call, "qoriHistogramGetBufferSize", status);
         free_call(&call);
         return NULL;
     }
@@ -202,6 +201,7 @@ PyObject* histogram_levels(PyObject* self, void* unused) {
                 PyTuple_SetItem(result, i, list);
         }
     for (int i = 0; i < 4; ++i) free(lists[i]);
+    if (!result && !PyErr_Occurred()) PyErr_Format(shared.error, "levels: status %d (qoriHistogramGetLevels)", status);
     return result;
 }
 
@@ -217,8 +217,8 @@ PyObject* make_linear_filter(PyTypeObject* type, PyObject* arguments, PyObject* 
     Operation operation;
     Call call;
     named(&call, &operation, "LinearFilterPlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "O|Oi$iO:LinearFilterPlan", names, &kernel, &dtype, &channels,
-                                     &divisor, &word) ||
+    if (!parse(&call, arguments, keywords, "O|Oi$iO:LinearFilterPlan", names, &kernel, &dtype, &channels, &divisor,
+               &word) ||
         (word && read_word(&call, "rounding", word, enumeration_named("QorRoundingMode"), 0, &rounding)) ||
         element_from(&call, dtype, "'uint8', 'uint16', 'int16' and 'float32'",
                      1u << U8 | 1u << U16 | 1u << I16 | 1u << F32, &element))
@@ -265,7 +265,7 @@ PyObject* make_adaptive(PyTypeObject* type, PyObject* arguments, PyObject* keywo
     Operation operation;
     Call call;
     named(&call, &operation, "AdaptiveGaussPlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "O|$d:AdaptiveGaussPlan", names, &object, &sigma) ||
+    if (!parse(&call, arguments, keywords, "O|$d:AdaptiveGaussPlan", names, &object, &sigma) ||
         shape_of(&call, "size", object, &size))
         return NULL;
     int status = qoriThresholdAdaptiveGaussGetBufferSize(any, size, 1, 1, &plan_bytes, &buffer_bytes);
@@ -290,9 +290,8 @@ PyObject* make_hog(PyTypeObject* type, PyObject* arguments, PyObject* keywords) 
     Operation operation;
     Call call;
     named(&call, &operation, "HogPlan");
-    if (!PyArg_ParseTupleAndKeywords(arguments, keywords, "|O$iiiiffp:HogPlan", names, &window, &config.cellSize,
-                                     &config.blockSize, &config.blockStride, &config.nbins, &config.blockWeightParam,
-                                     &config.normParam, &columns) ||
+    if (!parse(&call, arguments, keywords, "|O$iiiiffp:HogPlan", names, &window, &config.cellSize, &config.blockSize,
+               &config.blockStride, &config.nbins, &config.blockWeightParam, &config.normParam, &columns) ||
         (window && shape_of(&call, "window", window, &config.winSize)))
         return NULL;
     if (config.cellSize > 0 && config.cellSize < 1 << 24) {

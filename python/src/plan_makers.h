@@ -64,6 +64,10 @@ int offset_source(Call* call);
 /* plan_parts.c: a call that only names the constructor, for refusals; then what fills a plan. Deallocation returns what
  * a constructor has filled so far. */
 Call* named(Call* call, Operation* operation, const char* name);
+/* PyArg_ParseTupleAndKeywords whose refusals of integers are those of every function. */
+int parse(const Call* call, PyObject* arguments, PyObject* keywords, const char* format, char** names, ...);
+/* The status of a query for a plan's sizes: without sizes there is no plan, whatever the reason. */
+int sizes_known(const Call* call, const char* member, int status);
 int shape_of(const Call* call, const char* name, PyObject* object, QorImageSize* size);
 int element_from(const Call* call, PyObject* dtype, const char* accepted, uint32_t elements, int* element);
 Plan* new_plan(PyTypeObject* type, int kind, int variant, int element);

@@ -1,6 +1,7 @@
 /* What constructors of plans share. */
 #include "plan_makers.h"
 
+#include <stdarg.h>
 #include <stdlib.h>
 #include <string.h>
 
@@ -9,6 +10,28 @@ Call* named(Call* call, Operation* operation, const char* name) {
     memset(operation, 0, sizeof *operation);
     operation->name = name;
     return start_call(call, operation);
+}
+
+/* An integer that does not fit is a wrong value, as everywhere. */
+static void name_overflow(const Call* call) {
+    if (!PyErr_ExceptionMatches(PyExc_OverflowError)) return;
+    PyErr_Clear();
+    refuse(PyExc_ValueError, call, NULL, "an integer came that 32 bits do not hold");
+}
+
+int parse(const Call* call, PyObject* arguments, PyObject* keywords, const char* format, char** names, ...) {
+    va_list list;
+    va_start(list, names);
+    const int parsed = names ? PyArg_VaParseTupleAndKeywords(arguments, keywords, format, names, list)
+                             : PyArg_VaParse(arguments, format, list);
+    va_end(list);
+    if (!parsed) name_overflow(call);
+    return parsed;
+}
+
+int sizes_known(const Call* call, const char* member, int status) {
+    if (status > 0) return refuse(shared.error, call, NULL, "shapes without pixels came; accepted are sides from 1 on");
+    return status_result(call, member, status);
 }
 
 /* The shape of an array of several channels serves as it is: these stand last, and no size depends on them. */

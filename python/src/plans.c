@@ -79,7 +79,7 @@ int64_t work_bytes(Call* call) {
         }
         default: bytes = plan ? plan->buffer_bytes : 0; break;
     }
-    if (status < 0) return status_result(call, form->name, status) ? -1 : 0;
+    if (status < 0) return status_result(call, member_of(call), status);
     return bytes > 0 ? bytes : 1;
 }
 

@@ -61,16 +61,9 @@ static int lists_step(Call* call, const Step* step, Slot* slot) {
     }
     for (int i = n; i < 4; ++i) call->counts[i] = 0;
     for (int i = 0; i < n; ++i) { /* what is read must not be what is written */
-        const uint8_t *low = lists[i],
-                      *high = low + (size_t)counts[i] * element_bytes[step->b] * (step->c == 9 ? 3 : 1);
+        const Py_ssize_t bytes = (Py_ssize_t)counts[i] * element_bytes[step->b] * (step->c == 9 ? 3 : 1);
         const Image* out = &call->images[OUT];
-        Image list = {.data = lists[i],
-                      .height = 1,
-                      .width = (int32_t)(high - low),
-                      .step = high - low,
-                      .element = U8,
-                      .layout = 1};
-        if (out->held && overlapping(&list, out))
+        if (out->held && among(lists[i], bytes, out))
             return refuse(PyExc_ValueError, call, "out", "an array that shares memory with %s came; pass a copy",
                           p->name);
     }

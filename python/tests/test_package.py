@@ -1,6 +1,7 @@
 """The command line, the examples, the stubs, the symbols of the module, and the build's refusal of gaps."""
-import importlib.util
+import os
 import re
+import shutil
 import subprocess
 import sys
 from pathlib import Path
@@ -52,9 +53,22 @@ def test_stubs_are_of_the_functions_and_clean():
     assert checked.returncode == 0, checked.stdout
 
 
+def test_pyright_is_content():
+    """Strictly. QORI_PYRIGHT=required where its absence must not go by."""
+    local = ROOT / "build" / "node" / "node_modules" / ".bin" / "pyright"
+    found = shutil.which("pyright") or (str(local) if local.exists() else None)
+    if not found:
+        assert os.environ.get("QORI_PYRIGHT") != "required", "pyright is missing: npm install --prefix build/node pyright"
+        pytest.skip("pyright is not installed")
+    checked = subprocess.run([found, "-p", str(ROOT / "python" / "pyrightconfig.json"), "--pythonpath", sys.executable],
+                             capture_output=True, text=True)
+    assert checked.returncode == 0 and "0 errors, 0 warnings" in checked.stdout, checked.stdout
+
+
 # Of names with an underscore the stable interface has those of its macros.
 PRIVATE = {"_Py_NoneStruct", "_Py_TrueStruct", "_Py_FalseStruct", "_Py_Dealloc", "_Py_BuildValue_SizeT",
-           "_PyArg_ParseTuple_SizeT", "_PyArg_ParseTupleAndKeywords_SizeT", "_PyObject_CallFunction_SizeT"}
+           "_PyArg_ParseTuple_SizeT", "_PyArg_ParseTupleAndKeywords_SizeT", "_PyArg_VaParse_SizeT",
+           "_PyArg_VaParseTupleAndKeywords_SizeT", "_PyObject_CallFunction_SizeT"}
 
 
 def test_module_takes_symbols_of_the_stable_interface_only():
