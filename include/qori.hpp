@@ -171,8 +171,12 @@ constexpr bool inside(const QorImageRect& r, const QorImageSize& s) noexcept {
  * cannot be a view of the type becomes one without memory, for which operations return QOR_ERR_NULL_PTR. */
 template <class T, class L>
 class View {
+#line 100000
     static_assert(detail::typeDigit<T> != 0, "qori::View: an element is one of the types of qori.h");
+#line 177
+#line 100000
     static_assert(detail::Facts<L>::digit != 0, "qori::View: a layout is one of C1 C2 C3 C4 AC4 P3 P4");
+#line 180
 
 public:
     using Element = T;
@@ -186,7 +190,9 @@ public:
     constexpr View(const View<U, L>& other) noexcept : View(other.data(), other.step(), other.size()) {}
     /** What is const stays so. */
     template <class U, detail::If<std::is_same_v<U, const T>> = 0>
+#line 100000
     View(const View<U, L>& other) = delete;
+#line 196
 
     /** Rows without gaps in a span, an array class or a vector: nothing where it is too short for the size. */
     template <class S, detail::If<detail::isSpan<S, T>> = 0>
@@ -200,7 +206,9 @@ public:
     /** Two extents (rows, columns) are C1; three (rows, columns, channels) any packed layout, channels side by side. */
     template <class S, detail::If<detail::isMdspan<const S&, T>> = 0>
     constexpr explicit View(const S& span) noexcept {
+#line 100000
         static_assert(S::rank() == (stride == 1 ? 2 : 3), "qori::View: rows, columns and, but for C1, channels");
+#line 212
         const uint64_t height = uint64_t(span.extent(0)), width = uint64_t(span.extent(1));
         if constexpr (stride != 1) {
             if (span.extent(2) != stride || span.stride(2) != 1) return;
@@ -246,7 +254,9 @@ public:
     /** One channel, for the operations that take one: copy and set. Nothing where there is no such channel. */
     template <class K = L>
     auto channel(int32_t index) const noexcept {
+#line 100000
         static_assert(stride == 3 || stride == 4, "qori::View::channel: channels of three or four");
+#line 260
         using Channel = std::conditional_t<detail::Facts<K>::stride == 3, ChannelOfC3, ChannelOfC4>;
         const bool exists = data_ && index >= 0 && index < stride;
         return exists ? View<T, Channel>(data_ + index, step_, size_) : View<T, Channel>();
@@ -263,7 +273,9 @@ namespace detail {
 /** Planes of one size and step. */
 template <class T, class L>
 class PlanarView {
+#line 100000
     static_assert(typeDigit<T> != 0, "qori::View: an element is one of the types of qori.h");
+#line 279
 
 public:
     using Element = T;
@@ -856,7 +868,9 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
     if constexpr (detail::found<F0>) {
         return detail::allocate_0<k>()(width, height, step);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 874
         return nullptr;
     }
 }
@@ -1085,7 +1099,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::add_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1105
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1106,7 +1122,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         if (detail::differ(aV, bV, dstV)) return QOR_ERR_SIZE;
         return detail::add_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1128
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1119,7 +1137,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::add_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1143
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1138,7 +1158,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::add_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1164
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1153,7 +1175,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::add_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1181
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1173,7 +1197,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::add_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1203
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1185,7 +1211,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::add_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1217
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1200,14 +1228,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::add_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1234
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult add(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 1243
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1358,7 +1390,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::subtract_0<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(),
             aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1396
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1381,7 +1415,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::subtract_0<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(),
             aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1421
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1394,7 +1430,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::subtract_1<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1436
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1413,7 +1451,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::subtract_1<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1457
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1429,7 +1469,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::subtract_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1475
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1449,7 +1491,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::subtract_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1497
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1461,7 +1505,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::subtract_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1511
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1476,14 +1522,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::subtract_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1528
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult subtract(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 1537
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1633,7 +1683,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1689
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1656,7 +1708,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1714
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1669,7 +1723,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1729
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1688,7 +1744,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1750
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1704,7 +1762,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::multiply_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1768
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1724,7 +1784,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::multiply_4<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1790
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1736,7 +1798,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::multiply_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1804
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1751,14 +1815,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::multiply_5<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1821
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult multiply(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 1830
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1827,7 +1895,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_fraction_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1901
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1840,7 +1910,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_fraction_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1916
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1856,7 +1928,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::multiply_fraction_2<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(),
             aV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1934
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1868,14 +1942,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::multiply_fraction_3<k>()(detail::pass(b), aV.data(), aV.step(), aV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 1948
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult multiply_fraction(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 1957
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2058,7 +2136,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::divide_0<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2142
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2078,7 +2158,9 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(aV, dstV)) return QOR_ERR_SIZE;
         return detail::divide_0<k>()(aV.data(), aV.step(), detail::pass(b), dstV.data(), dstV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2164
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2090,7 +2172,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::divide_1<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2178
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2105,7 +2189,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& aV = detail::view(a);
         return detail::divide_1<k>()(detail::pass(b), aV.data(), aV.step(), aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2195
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2121,7 +2207,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_4<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2213
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2151,7 +2239,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_8<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             roundNearestEven, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2245
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2164,7 +2254,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_5<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2260
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2188,7 +2280,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_9<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), roundNearestEven, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2286
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2204,7 +2298,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_8<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             rounding, scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2304
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2220,7 +2316,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::divide_8<k>()(bV.data(), bV.step(), aV.data(), aV.step(), dstV.data(), dstV.step(), aV.size(),
             rounding, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2322
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2234,7 +2332,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_9<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), rounding, scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2338
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2247,14 +2347,18 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::divide_9<k>()(bV.data(), bV.step(), aV.data(), aV.step(), aV.size(), rounding, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2353
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult divide(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2362
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2296,7 +2400,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::absolute_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2406
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2307,14 +2413,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::absolute_1<k>()(srcV.data(), srcV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2419
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult absolute(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2428
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2379,7 +2489,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::square_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2495
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2398,7 +2510,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::square_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2516
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2409,7 +2523,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::square_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2529
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2423,14 +2539,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::square_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2545
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult square(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2554
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2489,7 +2609,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::sqrt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2615
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2508,7 +2630,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::sqrt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2636
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2519,7 +2643,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::sqrt_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2649
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2533,14 +2659,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::sqrt_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2665
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult sqrt(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2674
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2589,7 +2719,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::exp_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2725
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2608,7 +2740,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::exp_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2746
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2619,7 +2753,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::exp_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2759
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2633,14 +2769,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::exp_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2775
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult exp(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2784
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2690,7 +2830,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::log_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2836
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2709,7 +2851,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::log_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2857
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2720,7 +2864,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::log_1<k>()(srcV.data(), srcV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2870
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2734,14 +2880,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::log_1<k>()(srcV.data(), srcV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2886
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult log(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2895
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2786,14 +2936,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::pad_constant_0<k>()(srcV.data(), srcV.step(), srcV.size(), dstV.data(), dstV.step(),
             dstV.size(), top, left, detail::pass(value));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 2942
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult pad_constant(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 2951
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2861,7 +3015,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::pad_replicate_0<k>()(srcV.data(), srcV.step(), srcV.size(), dstV.data(), dstV.step(),
             dstV.size(), top, left);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3021
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2873,14 +3029,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::pad_replicate_1<k>()(srcV.data(), srcV.step(), srcV.size(), dst_roi_size, top, left);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3035
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3044
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2942,7 +3102,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size.size(),
             size.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3108
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2953,14 +3115,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::filter_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size.size(), size.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3121
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_box(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3130
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3014,7 +3180,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3186
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3035,7 +3203,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3209
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3056,14 +3226,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_box_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3232
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_box_border(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3241
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3216,7 +3390,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::convert_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             roundNearestEven, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3396
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3231,7 +3407,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::convert_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), rounding,
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3413
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3250,7 +3428,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::convert_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), rounding, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3434
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3261,7 +3441,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::convert_3<k>()(srcV.data(), srcV.step(), srcV.size(), rounding, scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3447
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3272,7 +3454,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::convert_3<k>()(srcV.data(), srcV.step(), srcV.size(), rounding, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3460
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3283,14 +3467,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::convert_3<k>()(srcV.data(), srcV.step(), srcV.size(), roundNearestEven, 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3473
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult convert(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3482
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3315,7 +3503,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::unpack_bits_0<k>()(srcV.data(), srcV.step(), bit_offset, dstV.data(), dstV.step(),
             dstV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3509
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3330,14 +3520,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (!detail::holdsBits(srcV.size(), bit_offset, dstV.size())) return QOR_ERR_SIZE;
         return detail::unpack_bits_0<k>()(srcV.data(), srcV.step(), 0, dstV.data(), dstV.step(), dstV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3526
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3535
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3467,7 +3661,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::copy_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3667
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3483,14 +3679,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::copy_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), maskV.data(),
             maskV.step());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3685
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult copy(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3694
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3514,7 +3714,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::copy_managed_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), flags);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3720
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3528,14 +3730,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::copy_managed_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3736
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult copy_managed(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3745
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3560,14 +3766,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::duplicate_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3772
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3781
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3616,7 +3826,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_0<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), algorithm, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3832
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3655,7 +3867,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), 0, algorithm, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3873
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3679,7 +3893,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), scale, algorithm, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3899
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3704,14 +3920,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(), patternV.step(),
             patternV.size(), dstV.data(), dstV.step(), scale, algorithm, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3926
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 3935
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3770,7 +3990,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 3996
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3787,14 +4009,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4015
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_full_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4024
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3851,7 +4077,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4083
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3867,14 +4095,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4101
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_same_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4110
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3933,7 +4165,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4171
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3950,14 +4184,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4190
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_valid_norm(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4199
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4019,7 +4257,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4263
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4036,14 +4276,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_full_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4282
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_full_norm_level(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4291
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4102,7 +4346,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4352
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4118,14 +4364,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_same_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4370
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_same_norm_level(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4379
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4187,7 +4437,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4443
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4204,14 +4456,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_norm_level_1<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4462
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_valid_norm_level(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4471
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4242,14 +4498,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::cross_corr_valid_0<k>()(srcV.data(), srcV.step(), srcV.size(), patternV.data(),
             patternV.step(), patternV.size(), dstV.data(), dstV.step());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4504
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4513
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4338,14 +4598,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::dct_fwd_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4604
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_fwd(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4613
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4372,14 +4636,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::dct_inv_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4642
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_inv(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4651
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4417,7 +4685,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4691
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4427,7 +4697,9 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_forward_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4703
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4439,7 +4711,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (!detail::isSize(srcV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_forward_2<k>()(srcV.data(), srcV.step(), dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4717
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4451,14 +4725,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (!detail::isSize(srcV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_forward_3<k>()(srcV.data(), srcV.step(), dst, shift);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4731
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_forward(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4740
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4496,7 +4774,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4780
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4506,7 +4786,9 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4792
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4518,7 +4800,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         if (!detail::isSize(dstV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_inverse_2<k>()(src, dstV.data(), dstV.step());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4806
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4530,14 +4814,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
         if (!detail::isSize(dstV.size(), 8, 8)) return QOR_ERR_SIZE;
         return detail::dct_8x8_inverse_3<k>()(src, dstV.data(), dstV.step(), shift, low, high);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4820
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_inverse(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4829
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4563,7 +4851,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4857
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4573,14 +4863,18 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_2x2_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4869
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_inverse_2x2(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4878
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4606,7 +4900,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4906
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4616,14 +4912,18 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_4x4_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4918
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_inverse_4x4(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4927
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4649,7 +4949,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4955
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4659,14 +4961,18 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_inverse_10bit_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 4967
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_inverse_10bit(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 4976
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4691,7 +4997,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5003
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4701,14 +5009,18 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_2x2_inverse_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5015
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_to_2x2_inverse(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5024
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4733,7 +5045,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5051
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4743,14 +5057,18 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     if constexpr (detail::found<F0>) {
         return detail::dct_8x8_to_4x4_inverse_1<k>()(src);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5063
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dct_8x8_to_4x4_inverse(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5072
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4770,14 +5088,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_forward_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5094
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult zigzag_8x8_forward(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5103
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4797,14 +5119,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     if constexpr (detail::found<F0>) {
         return detail::zigzag_8x8_inverse_0<k>()(src, dst);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5125
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5134
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4925,7 +5251,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::dft_fwd_r_to_pack_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5257
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4937,7 +5265,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5271
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4952,14 +5282,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::dft_fwd_r_to_pack_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5288
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dft_fwd_r_to_pack(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5297
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5002,7 +5336,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::dft_inv_pack_to_r_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5342
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5014,7 +5350,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::dft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5356
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5029,14 +5367,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::dft_inv_pack_to_r_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5373
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dft_inv_pack_to_r(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5382
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5064,7 +5406,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::dft_fwd_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5412
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5076,14 +5420,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::dft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5426
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5435
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5111,7 +5459,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::dft_inv_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5465
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5123,14 +5473,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::dft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5479
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5488
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5166,14 +5520,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::min_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5526
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult (min)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5535
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5209,14 +5567,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::max_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5573
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult (max)(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5582
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5253,14 +5615,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::min_max_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data, max.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5621
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult min_max(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5630
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5298,14 +5664,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::min_index_0<k>()(srcV.data(), srcV.step(), srcV.size(), min.data, column.data, row.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5670
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult min_index(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5679
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5343,14 +5713,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::max_index_0<k>()(srcV.data(), srcV.step(), srcV.size(), max.data, column.data, row.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5719
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult max_index(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5728
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5381,14 +5755,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::block_min_max_0<k>()(srcV.data(), srcV.step(), srcV.size(), minV.data(), minV.step(),
             maxV.data(), maxV.step(), block, global_min.data, global_max.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5761
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult block_min_max(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5770
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5416,14 +5794,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         return detail::count_in_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), count.data, detail::pass(lower),
             detail::pass(upper));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5800
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult count_in_range(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5809
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5544,7 +5926,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::fft_fwd_r_to_pack_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5932
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5556,7 +5940,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_r_to_pack_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5946
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5571,14 +5957,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::fft_fwd_r_to_pack_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 5963
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult fft_fwd_r_to_pack(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 5972
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5621,7 +6011,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::fft_inv_pack_to_r_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6017
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5633,7 +6025,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::fft_inv_pack_to_r_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6031
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5648,14 +6042,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::fft_inv_pack_to_r_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, scale,
             buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6048
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult fft_inv_pack_to_r(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6057
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5683,7 +6081,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::fft_fwd_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6087
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5695,14 +6095,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::fft_fwd_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6101
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6110
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5730,7 +6134,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         const auto& dstV = detail::view(dst);
         return detail::fft_inv_c_to_c_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6140
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5742,14 +6148,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::fft_inv_c_to_c_1<k>()(srcV.data(), srcV.step(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6154
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6163
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5896,7 +6306,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), divisor, roundNearestEven, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6312
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5940,7 +6352,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), 1, roundNearestEven, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6358
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5960,7 +6374,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), divisor, rounding, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6380
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5981,7 +6397,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), divisor, rounding, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6403
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6001,7 +6419,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_3<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), rounding, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6425
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6022,14 +6442,18 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
         return detail::filter_linear_3<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             kernel.data(), kernel.size(), kernel.anchor(), rounding, buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6448
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_linear(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6457
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6055,7 +6479,9 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size16s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6485
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6090,7 +6516,9 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32f_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6522
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6121,7 +6549,9 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     if constexpr (detail::found<F0>) {
         return detail::filter_round_get_buf_size32s_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6555
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6144,7 +6574,9 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
     if constexpr (detail::found<F0>) {
         return detail::filter_get_buf_size_0<k>()(kernel_size, roi_width, buffer_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6580
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6205,14 +6637,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 6>>(border), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6643
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_border(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6652
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6252,14 +6688,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_min_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size.size(),
             size.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6694
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_min(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6703
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6299,14 +6739,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_max_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size.size(),
             size.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6745
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_max(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6754
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6345,14 +6789,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::filter_gauss_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), mask);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6795
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6804
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6392,14 +6840,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         return detail::histogram_range_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
             detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6846
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult histogram_range(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6855
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6436,14 +6888,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         return detail::histogram_even_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, levels,
             detail::pass(n_levels), detail::pass(lower), detail::pass(upper));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6894
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6903
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6500,14 +6956,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::histogram_0<k>()(srcV.data(), srcV.step(), srcV.size(), hist, plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 6962
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult histogram(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 6971
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6561,14 +7021,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         return detail::hog_0<k>()(srcV.data(), srcV.step(), srcV.size(), locations, n_locations, dst, plan,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7027
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult hog(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7036
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6609,7 +7073,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_3x3_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7079
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6632,7 +7098,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_3x3_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7104
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6648,14 +7116,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_3x3_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), mode,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7122
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lbp_3x3(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7131
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6700,7 +7172,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_5x5_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7178
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6723,7 +7197,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_5x5_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0,
             border.mode(), detail::beyond<detail::Arg<F1, 7>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7203
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6739,14 +7215,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_5x5_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), mode,
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7221
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lbp_5x5(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7230
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6774,7 +7254,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_horizontal_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 6>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7260
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6790,14 +7272,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lbp_horizontal_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 6>>(border));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7278
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7287
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6858,7 +7344,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), values, levels,
             detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7350
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6870,14 +7358,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::lut_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels, detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7364
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lut(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7373
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6939,7 +7431,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_linear_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), values,
             levels, detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7437
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6952,14 +7446,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::lut_linear_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels,
             detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7452
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7461
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7020,7 +7518,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_cubic_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), values,
             levels, detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7524
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7033,14 +7533,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::lut_cubic_1<k>()(srcV.data(), srcV.step(), srcV.size(), values, levels,
             detail::pass(n_levels));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7539
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7548
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7081,14 +7585,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size.size(), size.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7591
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7600
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7138,14 +7646,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_horiz_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7652
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median_horiz(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7661
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7181,14 +7693,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_vert_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7699
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median_vert(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7708
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7222,14 +7738,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_cross_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7744
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median_cross(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7753
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7260,14 +7780,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_color_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             mask);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7786
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median_color(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7795
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7292,14 +7816,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_weighted_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             weight);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7822
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median_weighted(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7831
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7339,7 +7867,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7873
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7360,7 +7890,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7896
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7381,14 +7913,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::filter_median_border_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7919
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult filter_median_border(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 7928
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7457,7 +7993,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             srcV.width())) return QOR_ERR_SIZE;
         return detail::mirror_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), axis);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 7999
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7468,14 +8006,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::mirror_1<k>()(srcV.data(), srcV.step(), srcV.size(), axis);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8012
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult mirror(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8021
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7528,7 +8070,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::erode_3x3_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8076
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7539,14 +8083,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::erode_3x3_1<k>()(srcV.data(), srcV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8089
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8098
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7599,7 +8147,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::dilate_3x3_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8153
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7610,14 +8160,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::dilate_3x3_1<k>()(srcV.data(), srcV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8166
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8175
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7667,7 +8221,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::erode_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), structure.data(),
             structure.size(), structure.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8227
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7679,14 +8235,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::erode_1<k>()(srcV.data(), srcV.step(), srcV.size(), structure.data(), structure.size(),
             structure.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8241
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult erode(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8250
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7736,7 +8296,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::dilate_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             structure.data(), structure.size(), structure.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8302
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7749,14 +8311,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::dilate_1<k>()(srcV.data(), srcV.step(), srcV.size(), structure.data(), structure.size(),
             structure.anchor());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8317
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dilate(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8326
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7800,7 +8366,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::sum_1<k>()(srcV.data(), srcV.step(), srcV.size(), sum.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8372
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7811,14 +8379,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::sum_1<k>()(srcV.data(), srcV.step(), srcV.size(), sum.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8385
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult sum(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8394
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7862,7 +8434,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::mean_1<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8440
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7874,14 +8448,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
         const auto& srcV = detail::view(src);
         return detail::mean_1<k>()(srcV.data(), srcV.step(), srcV.size(), mean.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8454
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult mean(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8463
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7918,14 +8496,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::norm_inf_0<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8502
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_inf(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8511
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7970,7 +8552,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::norm_l1_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8558
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7982,14 +8566,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::norm_l1_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8572
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_l1(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8581
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8034,7 +8622,9 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::norm_l2_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8628
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8046,14 +8636,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::norm_l2_1<k>()(srcV.data(), srcV.step(), srcV.size(), norm.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8642
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_l2(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8651
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8092,14 +8686,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_diff_inf_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8692
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8701
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8149,7 +8747,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return detail::norm_diff_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data,
             hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8753
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8164,14 +8764,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_diff_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8770
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8779
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8221,7 +8825,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         return detail::norm_diff_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data,
             hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8831
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8236,14 +8842,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_diff_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8848
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8857
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8282,14 +8892,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_inf_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8898
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8907
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8338,7 +8952,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8958
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8353,14 +8969,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l1_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 8975
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 8984
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8410,7 +9030,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9036
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8425,14 +9047,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::norm_rel_l2_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), norm.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9053
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9062
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8493,7 +9119,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::dot_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), dot.data, hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9125
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8508,14 +9136,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::dot_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size(), dot.data, hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9142
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9151
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8548,14 +9180,18 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
         const auto& srcV = detail::view(src);
         return detail::otsu_threshold_0<k>()(srcV.data(), srcV.step(), srcV.size(), threshold.data);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9186
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9195
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8600,7 +9236,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_palette_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), table,
             n_bit_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9242
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8616,14 +9254,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_palette_1<k>()(srcV.data(), srcV.step(), alpha, dstV.data(), dstV.step(), srcV.size(),
             table, n_bit_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9260
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lut_palette(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9269
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8651,14 +9293,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::lut_palette_swap_0<k>()(srcV.data(), srcV.step(), alpha, dstV.data(), dstV.step(), srcV.size(),
             table, n_bit_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9299
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult lut_palette_swap(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9308
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8684,7 +9330,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_get_size_0<k>()(src_size, dst_size, interpolation, antialias, plan_size, init_buf_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9336
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8712,7 +9360,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_get_buffer_size_0<k>()(plan, dst_size, num_channels, buf_size);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9366
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8739,7 +9389,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_get_border_size_0<k>()(plan, border);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9395
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8767,7 +9419,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_get_src_offset_0<k>()(plan, dst_offset, src_offset);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9425
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8795,7 +9449,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_get_src_roi_0<k>()(plan, rect, src_rect, dst_rect);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9455
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8822,7 +9478,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_nearest_init_0<k>()(src_size, dst_size, plan);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9484
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8850,7 +9508,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_linear_init_0<k>()(src_size, dst_size, plan);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9514
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8877,7 +9537,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_cubic_init_0<k>()(src_size, dst_size, b, c, plan, init_buf);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9543
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8904,7 +9566,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_lanczos_init_0<k>()(src_size, dst_size, lobes, plan, init_buf);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9572
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8931,7 +9595,9 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     if constexpr (detail::found<F0>) {
         return detail::resize_super_init_0<k>()(src_size, dst_size, plan);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9601
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8990,14 +9656,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_nearest_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9662
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9671
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9034,14 +9704,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_super_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9710
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult resize_super(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9719
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9082,14 +9756,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_linear_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9762
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult resize_linear(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9771
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9127,14 +9805,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_cubic_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9811
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9820
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9172,14 +9854,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_lanczos_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset, dstV.size(),
             border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9860
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9869
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9217,14 +9903,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::resize_antialiasing_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9909
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult resize_antialiasing(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 9918
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9294,7 +9984,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::rescale_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), hintFast);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 9990
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9308,7 +10000,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::rescale_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), low, high);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10006
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9322,14 +10016,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::rescale_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), hint);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10022
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult rescale(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10031
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9405,7 +10103,9 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
         const auto& dstV = detail::view(dst);
         return detail::fill_0<k>()(detail::pass(value), dstV.data(), dstV.step(), dstV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10109
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9420,14 +10120,18 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
         return detail::fill_1<k>()(detail::pass(value), dstV.data(), dstV.step(), dstV.size(), maskV.data(),
             maskV.step());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10126
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult fill(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10135
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9494,7 +10198,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_packed_2<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10204
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9513,7 +10219,9 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_packed_3<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10225
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9529,7 +10237,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_packed_2<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(), dstV.step(),
             aV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10243
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9542,14 +10252,18 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
         if (detail::differ(bV, aV)) return QOR_ERR_SIZE;
         return detail::multiply_packed_3<k>()(aV.data(), aV.step(), bV.data(), bV.step(), bV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10258
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult multiply_packed(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10267
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9587,7 +10301,9 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
         return detail::multiply_packed_conj_0<k>()(aV.data(), aV.step(), bV.data(), bV.step(), dstV.data(),
             dstV.step(), aV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10307
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9600,14 +10316,18 @@ template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, d
         if (detail::differ(aV, bV)) return QOR_ERR_SIZE;
         return detail::multiply_packed_conj_1<k>()(aV.data(), aV.step(), bV.data(), bV.step(), aV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10322
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult multiply_packed_conj(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10331
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9645,7 +10365,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::magnitude_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10371
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9660,14 +10382,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::magnitude_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10388
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult magnitude_packed(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10397
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9705,7 +10431,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::phase_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), 0);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10437
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9719,14 +10447,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::phase_packed_1<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), scale);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10453
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult phase_packed(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10462
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9751,14 +10483,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::unpack_spectrum_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10489
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult unpack_spectrum(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10498
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9787,14 +10523,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         if (detail::differ(srcV, dstV)) return QOR_ERR_SIZE;
         return detail::pack_spectrum_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10529
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10538
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9880,7 +10620,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), op);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10626
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9892,7 +10634,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::threshold_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold), op);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10640
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9908,7 +10652,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), detail::pass(value), op);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10658
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9921,14 +10667,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
             detail::pass(value), op);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10673
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult threshold(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10682
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10021,7 +10771,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_gt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10777
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10033,7 +10785,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::threshold_gt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10791
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10049,7 +10803,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_gt_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), detail::pass(value));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10809
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10063,14 +10819,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_gt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
             detail::pass(value));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10825
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10834
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10163,7 +10923,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_lt_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10929
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10175,7 +10937,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         const auto& srcV = detail::view(src);
         return detail::threshold_lt_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10943
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10191,7 +10955,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_lt_2<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(threshold), detail::pass(value));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10961
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10205,14 +10971,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_lt_3<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(threshold),
             detail::pass(value));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 10977
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 10986
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10268,7 +11038,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_outside_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             detail::pass(below), detail::pass(value_below), detail::pass(above), detail::pass(value_above));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11044
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10283,14 +11055,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_outside_1<k>()(srcV.data(), srcV.step(), srcV.size(), detail::pass(below),
             detail::pass(value_below), detail::pass(above), detail::pass(value_above));
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11061
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult threshold_outside(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11070
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10337,7 +11113,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
             buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11119
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10359,7 +11137,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             size, delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border),
             buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11143
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10380,7 +11160,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, value_above, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11166
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10401,7 +11183,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11189
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10422,7 +11206,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::threshold_adaptive_box_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(),
             size, delta, 255, 0, border.mode(), detail::beyond<detail::Arg<F0, 10>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11212
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10440,7 +11226,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11232
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10458,7 +11246,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11252
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10476,7 +11266,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, value_above,
             0, border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11272
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10494,7 +11286,9 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11292
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10512,14 +11306,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_box_1<k>()(srcV.data(), srcV.step(), srcV.size(), size, delta, 255, 0,
             border.mode(), detail::beyond<detail::Arg<F0, 8>>(border), buffer.data());
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11312
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11321
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10568,7 +11366,9 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
             srcV.size(), delta, value_above, value_below, border.mode(), detail::beyond<detail::Arg<F0, 9>>(border),
             plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11372
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10582,14 +11382,18 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
         return detail::threshold_adaptive_gauss_1<k>()(srcV.data(), srcV.step(), srcV.size(), delta, value_above,
             value_below, border.mode(), detail::beyond<detail::Arg<F0, 7>>(border), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11388
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11397
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10683,14 +11487,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::warp_affine_nearest_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11493
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult warp_affine_nearest(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11502
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10731,14 +11539,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::warp_affine_linear_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11545
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult warp_affine_linear(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11554
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10779,14 +11591,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::warp_affine_cubic_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), offset,
             dstV.size(), plan, buffer);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11597
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult warp_affine_cubic(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11606
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10821,14 +11637,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::sum_window_row_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             anchor);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11643
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11652
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10863,14 +11683,18 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
         return detail::sum_window_column_0<k>()(srcV.data(), srcV.step(), dstV.data(), dstV.step(), srcV.size(), size,
             anchor);
     } else {
+#line 100000
         static_assert(exists, QORI_WORDS);
+#line 11689
         return QOR_ERR_BAD_ARG;
     }
 }
 template <bool exists = false> QorResult sum_window_column(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
+#line 100000
     static_assert(exists, QORI_WORDS);
+#line 11698
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10955,8 +11779,10 @@ private:
 template <class T>
 class ResizePlan : public detail::Plan<QorResizePlan> {
     static constexpr unsigned own = detail::keyOf<T>;
+#line 100000
     static_assert(detail::found<decltype(detail::resize_get_size_0<own>())>,
                   "qori::ResizePlan<T> of 8u 16u 16s 32f 64f");
+#line 11786
 
 public:
     ResizePlan(QorImageSize src, QorImageSize dst, Interpolation how) noexcept : src_(src), dst_(dst), how_(how) {
@@ -10985,8 +11811,10 @@ public:
     template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>>
     [[nodiscard]] QorResult tile(const A& src, B&& dst, QorPoint2D offset, const Border<T, detail::channels(k)>& border,
                                  Buffer& buffer) const noexcept {
+#line 100000
         static_assert(detail::found<decltype(detail::resize_linear_0<k>())> && k >> 12 == detail::typeDigit<T>,
                       "qori::ResizePlan<T>: images of T in C1, C3 or C4, the destination not const");
+#line 11818
         if (!*this) return this->status();
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -11058,8 +11886,10 @@ class WarpAffinePlan : public detail::Plan<QorWarpPlan> {
     static constexpr std::size_t count = detail::Facts<L>::channels;
     static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
+#line 100000
     static_assert(detail::found<decltype(detail::warp_affine_linear_0<k>())>,
                   "qori::WarpAffinePlan<T, L> of 8u 16u 16s 32f 64f: C1 C3 C4");
+#line 11893
 
 public:
     WarpAffinePlan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
@@ -11119,8 +11949,10 @@ template <class T, class L = C1>
 class LinearFilterPlan : public detail::Plan<QorLinearFilterPlan> {
     static constexpr std::size_t count = detail::Facts<L>::channels;
     static constexpr int32_t channels = int32_t(count);
+#line 100000
     static_assert(detail::found<decltype(detail::filter_border_0<detail::keyOf<T, L>>())>,
                   "qori::LinearFilterPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
+#line 11956
 
 public:
     explicit LinearFilterPlan(const Kernel<int16_t>& kernel, int32_t divisor = 1,
@@ -11287,8 +12119,10 @@ private:
 template <template <class> class Maker, class T, bool powers>
 class FourierPlan : public LibraryPlan<Maker<T>, QorFft2DPlan, QorFftNormFlag> {
     static constexpr bool complex = std::is_same_v<T, QorComplex32f>, integers = std::is_same_v<T, int32_t>;
+#line 100000
     static_assert(complex || integers || std::is_same_v<T, float>,
                   "qori::DftPlan and FftPlan of float, of int32_t for 8u images, and of QorComplex32f");
+#line 12126
 
 public:
     explicit FourierPlan(QorImageSize size, QorFftNormFlag norm = fftDivInvByN) noexcept
@@ -11330,7 +12164,9 @@ public:
             else
                 return dft_fwd_r_to_pack(src, this->get(), work);
         };
+#line 100000
         static_assert(!integers, "qori: transforms of 8u images have no form in place");
+#line 12170
         return this->run(buffer, go, src.image);
     }
     template <class E, class L>
@@ -11374,7 +12210,9 @@ public:
             else
                 return dft_inv_pack_to_r(src, this->get(), work);
         };
+#line 100000
         static_assert(!integers, "qori: transforms of 8u images have no form in place");
+#line 12216
         return this->run(buffer, go, src.image);
     }
     template <class E, class L>
@@ -11433,8 +12271,10 @@ class HistogramPlan : public detail::Plan<QorHistogramSpec> {
     static constexpr std::size_t count = detail::Facts<L>::channels;
     static constexpr int32_t channels = int32_t(count);
     static constexpr unsigned k = detail::keyOf<T, L>;
+#line 100000
     static_assert(detail::found<decltype(detail::histogram_0<k>())>,
                   "qori::HistogramPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
+#line 12278
 
 public:
     /** Given levels, a list for each channel. */

@@ -382,6 +382,27 @@ def texts_in(part, template):
     return part[:marker.start()].lstrip() + cases + part[marker.end():].rstrip()
 
 
+# Beyond the end of the header: there is nothing to quote there.
+UNQUOTED = 100_000
+
+
+def unquoted(text):
+    """Static assertions and deleted functions under a line number that the file does not have. GCC quotes the line of an
+    error below it, which for a message that says everything already takes as much room again."""
+    lines, inside = [], False
+    for line in text.splitlines():
+        begins = not inside and (line.lstrip().startswith("static_assert(") or line.endswith("= delete;"))
+        if begins:
+            lines.append(f"#line {UNQUOTED}")
+            inside = True
+        lines.append(line)
+        if inside and line.endswith(";"):
+            lines.append(f"#line {len(lines) + 2}")
+            inside = False
+    assert len(lines) < UNQUOTED
+    return "\n".join(lines) + "\n"
+
+
 def header(families):
     """The whole of include/qori.hpp."""
     template = (API / "header.h.in").read_text()
@@ -402,4 +423,4 @@ def header(families):
     for name, forms in operations.items():
         lines += operation_text(name, forms)
     lines += ["", "#undef QORI_AT", "", part["plans"].strip(), "", part["transforms"].strip(), "", "}   // namespace qori", "", "#endif", ""]
-    return "\n".join(lines)
+    return unquoted("\n".join(lines))
