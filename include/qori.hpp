@@ -29,6 +29,7 @@
 #include "qori.h"
 
 #include <cstddef>
+#include <initializer_list>
 #include <type_traits>
 #if defined(__cpp_exceptions)
 #include <exception>
@@ -146,6 +147,8 @@ inline constexpr bool isMdspan<S, T,
                                     decltype(make<S>().stride(0)), decltype(Bare<S>::rank())>> =
     pointsAt<decltype(make<S>().data_handle()), T>;
 
+constexpr int32_t counted(std::size_t size) noexcept { return size > INT32_MAX ? 0 : int32_t(size); }
+
 /** The depth that a cv::Mat reports for elements of T; -1: none. */
 template <class T>
 constexpr int matrixDepth() noexcept {
@@ -173,10 +176,10 @@ template <class T, class L>
 class View {
 #line 100000
     static_assert(detail::typeDigit<T> != 0, "qori::View: an element is one of the types of qori.h");
-#line 177
+#line 180
 #line 100000
     static_assert(detail::Facts<L>::digit != 0, "qori::View: a layout is one of C1 C2 C3 C4 AC4 P3 P4");
-#line 180
+#line 183
 
 public:
     using Element = T;
@@ -192,7 +195,7 @@ public:
     template <class U, detail::If<std::is_same_v<U, const T>> = 0>
 #line 100000
     View(const View<U, L>& other) = delete;
-#line 196
+#line 199
 
     /** Rows without gaps in a span, an array class or a vector: nothing where it is too short for the size. */
     template <class S, detail::If<detail::isSpan<S, T>> = 0>
@@ -208,7 +211,7 @@ public:
     constexpr explicit View(const S& span) noexcept {
 #line 100000
         static_assert(S::rank() == (stride == 1 ? 2 : 3), "qori::View: rows, columns and, but for C1, channels");
-#line 212
+#line 215
         const uint64_t height = uint64_t(span.extent(0)), width = uint64_t(span.extent(1));
         if constexpr (stride != 1) {
             if (span.extent(2) != stride || span.stride(2) != 1) return;
@@ -256,7 +259,7 @@ public:
     auto channel(int32_t index) const noexcept {
 #line 100000
         static_assert(stride == 3 || stride == 4, "qori::View::channel: channels of three or four");
-#line 260
+#line 263
         using Channel = std::conditional_t<detail::Facts<K>::stride == 3, ChannelOfC3, ChannelOfC4>;
         const bool exists = data_ && index >= 0 && index < stride;
         return exists ? View<T, Channel>(data_ + index, step_, size_) : View<T, Channel>();
@@ -275,7 +278,7 @@ template <class T, class L>
 class PlanarView {
 #line 100000
     static_assert(typeDigit<T> != 0, "qori::View: an element is one of the types of qori.h");
-#line 279
+#line 282
 
 public:
     using Element = T;
@@ -384,7 +387,60 @@ private:
     T values_[N] = {};
 };
 
+/** A list in memory that another owns: pointer and number of elements, from an array, a vector, a span or the like, or
+ *  {pointer, number}; where T is const also from its elements, {0, 128, 256}, for the duration of a call. What is
+ * longer than 32 bits say is empty. */
+template <class T>
+class List {
+public:
+    constexpr List(T* data, int32_t size) noexcept : data_(data), size_(size) {}
+    template <std::size_t n>
+    constexpr List(T (&array)[n]) noexcept : List(array, int32_t(n)) {}
+    template <class S, detail::If<detail::isSpan<S, T>> = 0>
+    constexpr List(S&& span) noexcept : List(span.data(), detail::counted(span.size())) {}
+    template <class U, detail::If<std::is_same_v<const U, T>> = 0>
+    constexpr List(std::initializer_list<U> elements) noexcept
+        : List(elements.begin(), detail::counted(elements.size())) {}
+    constexpr T* data() const noexcept { return data_; }
+    constexpr int32_t size() const noexcept { return size_; }
+    constexpr int32_t counts() const noexcept { return size_; }
+
+private:
+    T* data_;
+    int32_t size_;
+};
+
+/** One for each of three or four channels: {red, green, blue}. */
+template <class T, std::size_t N>
+class Lists {
+public:
+    template <std::size_t M = N, detail::If<M == 3> = 0>
+    constexpr Lists(List<T> a, List<T> b, List<T> c) noexcept
+        : data_{a.data(), b.data(), c.data()}, counts_(a.size(), b.size(), c.size()) {}
+    template <std::size_t M = N, detail::If<M == 4> = 0>
+    constexpr Lists(List<T> a, List<T> b, List<T> c, List<T> d) noexcept
+        : data_{a.data(), b.data(), c.data(), d.data()}, counts_(a.size(), b.size(), c.size(), d.size()) {}
+    constexpr T* const* data() const noexcept { return data_; }
+    constexpr const Pixel<int32_t, N>& counts() const noexcept { return counts_; }
+
+private:
+    T* data_[N];
+    Pixel<int32_t, N> counts_;
+};
+
 namespace detail {
+
+/** Whether lists have as many elements as others, or so many less. */
+template <class A, class B>
+constexpr bool haveCounts(const List<A>& all, const List<B>& lists, int32_t less) noexcept {
+    return lists.size() == all.size() - less;
+}
+template <class A, class B, std::size_t N>
+constexpr bool haveCounts(const Lists<A, N>& all, const Lists<B, N>& lists, int32_t less) noexcept {
+    for (int i = 0; i < int(N); ++i)
+        if (lists.counts()[i] != all.counts()[i] - less) return false;
+    return true;
+}
 
 /** Where an operation puts a result per channel: a variable (of one channel), an array, a Pixel or the like. */
 template <class T, std::size_t N>
@@ -716,6 +772,22 @@ template <class P, unsigned k>
 using Value = typename ValueOf<P, channels(k)>::type;
 
 template <class P, std::size_t N>
+struct ListsOf {
+    using type = Anything;
+};
+template <class T, std::size_t N>
+struct ListsOf<T*, N> {
+    using type = List<T>;
+};
+template <class T, std::size_t N>
+struct ListsOf<T* const*, N> {
+    using type = Lists<T, N>;
+};
+/** Lists that bring their counts, for the member's pointers: T* or T* const*. */
+template <class P, unsigned k>
+using Listed = typename ListsOf<P, channels(k)>::type;
+
+template <class P, std::size_t N>
 struct ResultsOf {
     using type = P;
 };
@@ -870,7 +942,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 874
+#line 946
         return nullptr;
     }
 }
@@ -1101,7 +1173,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1105
+#line 1177
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1124,7 +1196,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1128
+#line 1200
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1139,7 +1211,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1143
+#line 1215
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1160,7 +1232,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1164
+#line 1236
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1177,7 +1249,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1181
+#line 1253
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1199,7 +1271,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1203
+#line 1275
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1213,7 +1285,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1217
+#line 1289
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1230,7 +1302,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1234
+#line 1306
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1239,7 +1311,7 @@ template <bool exists = false> QorResult add(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1243
+#line 1315
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1392,7 +1464,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1396
+#line 1468
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1417,7 +1489,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1421
+#line 1493
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1432,7 +1504,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1436
+#line 1508
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1453,7 +1525,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1457
+#line 1529
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1471,7 +1543,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1475
+#line 1547
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1493,7 +1565,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1497
+#line 1569
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1507,7 +1579,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1511
+#line 1583
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1524,7 +1596,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1528
+#line 1600
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1533,7 +1605,7 @@ template <bool exists = false> QorResult subtract(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1537
+#line 1609
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1685,7 +1757,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1689
+#line 1761
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1710,7 +1782,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1714
+#line 1786
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1725,7 +1797,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1729
+#line 1801
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1746,7 +1818,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1750
+#line 1822
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1764,7 +1836,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1768
+#line 1840
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1786,7 +1858,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1790
+#line 1862
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1800,7 +1872,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1804
+#line 1876
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1817,7 +1889,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1821
+#line 1893
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1826,7 +1898,7 @@ template <bool exists = false> QorResult multiply(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1830
+#line 1902
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1897,7 +1969,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1901
+#line 1973
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1912,7 +1984,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1916
+#line 1988
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1930,7 +2002,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1934
+#line 2006
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1944,7 +2016,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1948
+#line 2020
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1953,7 +2025,7 @@ template <bool exists = false> QorResult multiply_fraction(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1957
+#line 2029
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2138,7 +2210,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2142
+#line 2214
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2160,7 +2232,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2164
+#line 2236
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2174,7 +2246,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2178
+#line 2250
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2191,7 +2263,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2195
+#line 2267
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2209,7 +2281,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2213
+#line 2285
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2241,7 +2313,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2245
+#line 2317
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2256,7 +2328,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2260
+#line 2332
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2282,7 +2354,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2286
+#line 2358
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2300,7 +2372,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2304
+#line 2376
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2318,7 +2390,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2322
+#line 2394
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2334,7 +2406,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2338
+#line 2410
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2349,7 +2421,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2353
+#line 2425
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2358,7 +2430,7 @@ template <bool exists = false> QorResult divide(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2362
+#line 2434
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2402,7 +2474,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2406
+#line 2478
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2415,7 +2487,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2419
+#line 2491
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2424,7 +2496,7 @@ template <bool exists = false> QorResult absolute(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2428
+#line 2500
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2491,7 +2563,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2495
+#line 2567
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2512,7 +2584,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2516
+#line 2588
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2525,7 +2597,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2529
+#line 2601
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2541,7 +2613,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2545
+#line 2617
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2550,7 +2622,7 @@ template <bool exists = false> QorResult square(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2554
+#line 2626
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2611,7 +2683,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2615
+#line 2687
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2632,7 +2704,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2636
+#line 2708
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2645,7 +2717,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2649
+#line 2721
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2661,7 +2733,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2665
+#line 2737
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2670,7 +2742,7 @@ template <bool exists = false> QorResult sqrt(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2674
+#line 2746
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2721,7 +2793,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2725
+#line 2797
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2742,7 +2814,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2746
+#line 2818
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2755,7 +2827,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2759
+#line 2831
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2771,7 +2843,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2775
+#line 2847
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2780,7 +2852,7 @@ template <bool exists = false> QorResult exp(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2784
+#line 2856
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2832,7 +2904,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2836
+#line 2908
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2853,7 +2925,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2857
+#line 2929
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2866,7 +2938,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2870
+#line 2942
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2882,7 +2954,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2886
+#line 2958
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2891,7 +2963,7 @@ template <bool exists = false> QorResult log(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2895
+#line 2967
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2938,7 +3010,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2942
+#line 3014
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2947,7 +3019,7 @@ template <bool exists = false> QorResult pad_constant(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2951
+#line 3023
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3017,7 +3089,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3021
+#line 3093
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3031,7 +3103,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3035
+#line 3107
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3040,7 +3112,7 @@ template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3044
+#line 3116
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3104,7 +3176,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3108
+#line 3180
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3117,7 +3189,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3121
+#line 3193
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3126,7 +3198,7 @@ template <bool exists = false> QorResult filter_box(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3130
+#line 3202
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3182,7 +3254,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3186
+#line 3258
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3205,7 +3277,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3209
+#line 3281
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3228,7 +3300,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3232
+#line 3304
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3237,7 +3309,7 @@ template <bool exists = false> QorResult filter_box_border(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3241
+#line 3313
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3392,7 +3464,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3396
+#line 3468
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3409,7 +3481,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3413
+#line 3485
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3430,7 +3502,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3434
+#line 3506
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3443,7 +3515,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3447
+#line 3519
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3456,7 +3528,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3460
+#line 3532
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3469,7 +3541,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3473
+#line 3545
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3478,7 +3550,7 @@ template <bool exists = false> QorResult convert(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3482
+#line 3554
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3505,7 +3577,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3509
+#line 3581
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3522,7 +3594,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3526
+#line 3598
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3531,7 +3603,7 @@ template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3535
+#line 3607
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3663,7 +3735,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3667
+#line 3739
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3681,7 +3753,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3685
+#line 3757
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3690,7 +3762,7 @@ template <bool exists = false> QorResult copy(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3694
+#line 3766
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3716,7 +3788,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3720
+#line 3792
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3732,7 +3804,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3736
+#line 3808
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3741,7 +3813,7 @@ template <bool exists = false> QorResult copy_managed(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3745
+#line 3817
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3768,7 +3840,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3772
+#line 3844
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3777,7 +3849,7 @@ template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3781
+#line 3853
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3828,7 +3900,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3832
+#line 3904
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3869,7 +3941,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3873
+#line 3945
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3895,7 +3967,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3899
+#line 3971
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3922,7 +3994,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3926
+#line 3998
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3931,7 +4003,7 @@ template <bool exists = false> QorResult cross_corr_norm(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3935
+#line 4007
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3992,7 +4064,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3996
+#line 4068
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4011,7 +4083,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4015
+#line 4087
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4020,7 +4092,7 @@ template <bool exists = false> QorResult cross_corr_full_norm(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4024
+#line 4096
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4079,7 +4151,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4083
+#line 4155
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4097,7 +4169,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4101
+#line 4173
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4106,7 +4178,7 @@ template <bool exists = false> QorResult cross_corr_same_norm(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4110
+#line 4182
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4167,7 +4239,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4171
+#line 4243
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4186,7 +4258,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4190
+#line 4262
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4195,7 +4267,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm(detail::Anything 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4199
+#line 4271
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4259,7 +4331,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4263
+#line 4335
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4278,7 +4350,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4282
+#line 4354
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4287,7 +4359,7 @@ template <bool exists = false> QorResult cross_corr_full_norm_level(detail::Anyt
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4291
+#line 4363
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4348,7 +4420,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4352
+#line 4424
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4366,7 +4438,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4370
+#line 4442
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4375,7 +4447,7 @@ template <bool exists = false> QorResult cross_corr_same_norm_level(detail::Anyt
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4379
+#line 4451
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4439,7 +4511,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4443
+#line 4515
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4458,7 +4530,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4462
+#line 4534
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4467,7 +4539,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm_level(detail::Any
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4471
+#line 4543
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4500,7 +4572,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4504
+#line 4576
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4509,7 +4581,7 @@ template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4513
+#line 4585
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4600,7 +4672,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4604
+#line 4676
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4609,7 +4681,7 @@ template <bool exists = false> QorResult dct_fwd(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4613
+#line 4685
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4638,7 +4710,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4642
+#line 4714
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4647,7 +4719,7 @@ template <bool exists = false> QorResult dct_inv(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4651
+#line 4723
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4687,7 +4759,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4691
+#line 4763
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4699,7 +4771,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4703
+#line 4775
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4713,7 +4785,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4717
+#line 4789
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4727,7 +4799,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4731
+#line 4803
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4736,7 +4808,7 @@ template <bool exists = false> QorResult dct_8x8_forward(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4740
+#line 4812
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4776,7 +4848,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4780
+#line 4852
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4788,7 +4860,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4792
+#line 4864
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4802,7 +4874,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4806
+#line 4878
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4816,7 +4888,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4820
+#line 4892
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4825,7 +4897,7 @@ template <bool exists = false> QorResult dct_8x8_inverse(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4829
+#line 4901
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4853,7 +4925,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4857
+#line 4929
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4865,7 +4937,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4869
+#line 4941
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4874,7 +4946,7 @@ template <bool exists = false> QorResult dct_8x8_inverse_2x2(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4878
+#line 4950
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4902,7 +4974,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4906
+#line 4978
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4914,7 +4986,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4918
+#line 4990
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4923,7 +4995,7 @@ template <bool exists = false> QorResult dct_8x8_inverse_4x4(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4927
+#line 4999
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4951,7 +5023,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4955
+#line 5027
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4963,7 +5035,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4967
+#line 5039
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4972,7 +5044,7 @@ template <bool exists = false> QorResult dct_8x8_inverse_10bit(detail::Anything 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4976
+#line 5048
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4999,7 +5071,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5003
+#line 5075
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5011,7 +5083,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5015
+#line 5087
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5020,7 +5092,7 @@ template <bool exists = false> QorResult dct_8x8_to_2x2_inverse(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5024
+#line 5096
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5047,7 +5119,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5051
+#line 5123
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5059,7 +5131,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5063
+#line 5135
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5068,7 +5140,7 @@ template <bool exists = false> QorResult dct_8x8_to_4x4_inverse(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5072
+#line 5144
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5090,7 +5162,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5094
+#line 5166
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5099,7 +5171,7 @@ template <bool exists = false> QorResult zigzag_8x8_forward(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5103
+#line 5175
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5121,7 +5193,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5125
+#line 5197
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5130,7 +5202,7 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5134
+#line 5206
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5253,7 +5325,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5257
+#line 5329
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5267,7 +5339,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5271
+#line 5343
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5284,7 +5356,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5288
+#line 5360
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5293,7 +5365,7 @@ template <bool exists = false> QorResult dft_fwd_r_to_pack(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5297
+#line 5369
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5338,7 +5410,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5342
+#line 5414
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5352,7 +5424,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5356
+#line 5428
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5369,7 +5441,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5373
+#line 5445
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5378,7 +5450,7 @@ template <bool exists = false> QorResult dft_inv_pack_to_r(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5382
+#line 5454
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5408,7 +5480,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5412
+#line 5484
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5422,7 +5494,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5426
+#line 5498
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5431,7 +5503,7 @@ template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5435
+#line 5507
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5461,7 +5533,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5465
+#line 5537
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5475,7 +5547,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5479
+#line 5551
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5484,7 +5556,7 @@ template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5488
+#line 5560
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5522,7 +5594,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5526
+#line 5598
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5531,7 +5603,7 @@ template <bool exists = false> QorResult (min)(detail::Anything = {}, detail::An
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5535
+#line 5607
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5569,7 +5641,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5573
+#line 5645
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5578,7 +5650,7 @@ template <bool exists = false> QorResult (max)(detail::Anything = {}, detail::An
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5582
+#line 5654
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5617,7 +5689,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5621
+#line 5693
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5626,7 +5698,7 @@ template <bool exists = false> QorResult min_max(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5630
+#line 5702
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5666,7 +5738,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5670
+#line 5742
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5675,7 +5747,7 @@ template <bool exists = false> QorResult min_index(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5679
+#line 5751
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5715,7 +5787,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5719
+#line 5791
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5724,7 +5796,7 @@ template <bool exists = false> QorResult max_index(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5728
+#line 5800
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5757,7 +5829,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5761
+#line 5833
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5766,7 +5838,7 @@ template <bool exists = false> QorResult block_min_max(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5770
+#line 5842
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5796,7 +5868,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5800
+#line 5872
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5805,7 +5877,7 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5809
+#line 5881
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5928,7 +6000,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5932
+#line 6004
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5942,7 +6014,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5946
+#line 6018
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5959,7 +6031,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5963
+#line 6035
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5968,7 +6040,7 @@ template <bool exists = false> QorResult fft_fwd_r_to_pack(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5972
+#line 6044
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6013,7 +6085,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6017
+#line 6089
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6027,7 +6099,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6031
+#line 6103
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6044,7 +6116,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6048
+#line 6120
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6053,7 +6125,7 @@ template <bool exists = false> QorResult fft_inv_pack_to_r(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6057
+#line 6129
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6083,7 +6155,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6087
+#line 6159
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6097,7 +6169,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6101
+#line 6173
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6106,7 +6178,7 @@ template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6110
+#line 6182
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6136,7 +6208,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6140
+#line 6212
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6150,7 +6222,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6154
+#line 6226
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6159,7 +6231,7 @@ template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6163
+#line 6235
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6308,7 +6380,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6312
+#line 6384
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6354,7 +6426,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6358
+#line 6430
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6376,7 +6448,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6380
+#line 6452
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6399,7 +6471,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6403
+#line 6475
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6421,7 +6493,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6425
+#line 6497
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6444,7 +6516,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6448
+#line 6520
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6453,7 +6525,7 @@ template <bool exists = false> QorResult filter_linear(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6457
+#line 6529
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6481,7 +6553,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6485
+#line 6557
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6518,7 +6590,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6522
+#line 6594
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6551,7 +6623,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6555
+#line 6627
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6576,7 +6648,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6580
+#line 6652
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6639,7 +6711,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6643
+#line 6715
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6648,7 +6720,7 @@ template <bool exists = false> QorResult filter_border(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6652
+#line 6724
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6690,7 +6762,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6694
+#line 6766
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6699,7 +6771,7 @@ template <bool exists = false> QorResult filter_min(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6703
+#line 6775
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6741,7 +6813,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6745
+#line 6817
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6750,7 +6822,7 @@ template <bool exists = false> QorResult filter_max(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6754
+#line 6826
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6791,7 +6863,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6795
+#line 6867
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6800,7 +6872,7 @@ template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6804
+#line 6876
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6827,8 +6899,8 @@ template <unsigned k> inline auto histogram_range_0() noexcept {
 }
 }   // namespace detail
 #define QORI_WORDS \
-    "qori::histogram_range: no such call. histogram_range(src, hist, levels, n_levels) of 8u, 16u, 16s, 32f: C1" \
-    " C3 C4 AC4"
+    "qori::histogram_range: no such call. histogram_range(src, hist, levels, [n_levels]) of 8u, 16u, 16s, 32f: " \
+    "C1 C3 C4 AC4"
 /** Counts the pixels between given levels: pHist[k] = number of values v with pLevels[k] <= v < pLevels[k + 1]. C:
  *  qoriHistogramRange. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
@@ -6842,16 +6914,23 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6846
+#line 6918
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_range_0<k>()), detail::If<detail::isImage<A> && detail::found<F0>> = 0>
+[[nodiscard]] QorResult histogram_range(const A& src, const detail::Listed<detail::Arg<F0, 3>, k>& hist,
+    const detail::Listed<detail::Arg<F0, 4>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, hist, 1)) return QOR_ERR_SIZE;
+    return histogram_range(src, hist.data(), levels.data(), levels.counts());
 }
 template <bool exists = false> QorResult histogram_range(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6855
+#line 6934
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6874,8 +6953,8 @@ template <unsigned k> inline auto histogram_even_0() noexcept {
 }
 }   // namespace detail
 #define QORI_WORDS \
-    "qori::histogram_even: no such call. histogram_even(src, hist, levels, n_levels, lower, upper) of 8u, 16u, " \
-    "16s: C1 C3 C4 AC4"
+    "qori::histogram_even: no such call. histogram_even(src, hist, levels, [n_levels], lower, upper) of 8u, " \
+    "16u, 16s: C1 C3 C4 AC4"
 /** Counts the pixels between levels spaced evenly from lowerLevel to upperLevel, and returns the levels. C:
  *  qoriHistogramEven. */
 template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
@@ -6890,16 +6969,24 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6894
+#line 6973
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
+    class F0 = decltype(detail::histogram_even_0<k>()), detail::If<detail::isImage<A> && detail::found<F0>> = 0>
+[[nodiscard]] QorResult histogram_even(const A& src, const detail::Listed<detail::Arg<F0, 3>, k>& hist,
+    const detail::Listed<detail::Arg<F0, 4>, k>& levels, const detail::Value<detail::Arg<F0, 6>, k>& lower,
+    const detail::Value<detail::Arg<F0, 7>, k>& upper) noexcept {
+    if (!detail::haveCounts(levels, hist, 1)) return QOR_ERR_SIZE;
+    return histogram_even(src, hist.data(), levels.data(), levels.counts(), lower, upper);
 }
 template <bool exists = false> QorResult histogram_even(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6903
+#line 6990
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6958,7 +7045,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6962
+#line 7049
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6967,7 +7054,7 @@ template <bool exists = false> QorResult histogram(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6971
+#line 7058
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7023,7 +7110,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7027
+#line 7114
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7032,7 +7119,7 @@ template <bool exists = false> QorResult hog(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7036
+#line 7123
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7075,7 +7162,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7079
+#line 7166
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7100,7 +7187,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7104
+#line 7191
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7118,7 +7205,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7122
+#line 7209
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7127,7 +7214,7 @@ template <bool exists = false> QorResult lbp_3x3(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7131
+#line 7218
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7174,7 +7261,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7178
+#line 7265
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7199,7 +7286,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7203
+#line 7290
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7217,7 +7304,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7221
+#line 7308
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7226,7 +7313,7 @@ template <bool exists = false> QorResult lbp_5x5(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7230
+#line 7317
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7256,7 +7343,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7260
+#line 7347
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7274,7 +7361,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7278
+#line 7365
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7283,7 +7370,7 @@ template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7287
+#line 7374
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7329,8 +7416,8 @@ template <unsigned k> inline auto lut_1() noexcept {
 }
 }   // namespace detail
 #define QORI_WORDS \
-    "qori::lut: no such call. lut(src, dst, values, levels, n_levels) or lut(in_place(src), values, levels, " \
-    "n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
+    "qori::lut: no such call. lut(src, dst, values, levels, [n_levels]) or lut(in_place(src), values, levels, " \
+    "[n_levels]) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to constants: dst = pValues[k] where pLevels[k] <= src < pLevels[k + 1], else src. C: qoriLUT. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
     class F0 = decltype(detail::lut_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
@@ -7346,9 +7433,17 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7350
+#line 7437
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::found<F0>> = 0>
+[[nodiscard]] QorResult lut(const A& src, B&& dst, const detail::Listed<detail::Arg<F0, 5>, k>& values,
+    const detail::Listed<detail::Arg<F0, 6>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, values, 0)) return QOR_ERR_SIZE;
+    return lut(src, dst, values.data(), levels.data(), levels.counts());
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
     class F0 = decltype(detail::lut_1<k>()), bool exists = false>
@@ -7360,16 +7455,23 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7364
+#line 7459
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_1<k>()), detail::If<detail::found<F0>> = 0>
+[[nodiscard]] QorResult lut(const InPlace<TA, LA>& src, const detail::Listed<detail::Arg<F0, 3>, k>& values,
+    const detail::Listed<detail::Arg<F0, 4>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, values, 0)) return QOR_ERR_SIZE;
+    return lut(src, values.data(), levels.data(), levels.counts());
 }
 template <bool exists = false> QorResult lut(detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7373
+#line 7475
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7415,8 +7517,8 @@ template <unsigned k> inline auto lut_linear_1() noexcept {
 }
 }   // namespace detail
 #define QORI_WORDS \
-    "qori::lut_linear: no such call. lut_linear(src, dst, values, levels, n_levels) or " \
-    "lut_linear(in_place(src), values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
+    "qori::lut_linear: no such call. lut_linear(src, dst, values, levels, [n_levels]) or " \
+    "lut_linear(in_place(src), values, levels, [n_levels]) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to straight lines from pValues[k] at pLevels[k] to pValues[k + 1] at pLevels[k + 1]; else dst =
  *  src. C: qoriLUT_Linear. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
@@ -7433,9 +7535,17 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7437
+#line 7539
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_linear_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::found<F0>> = 0>
+[[nodiscard]] QorResult lut_linear(const A& src, B&& dst, const detail::Listed<detail::Arg<F0, 5>, k>& values,
+    const detail::Listed<detail::Arg<F0, 6>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, values, 0)) return QOR_ERR_SIZE;
+    return lut_linear(src, dst, values.data(), levels.data(), levels.counts());
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
     class F0 = decltype(detail::lut_linear_1<k>()), bool exists = false>
@@ -7448,16 +7558,23 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7452
+#line 7562
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_linear_1<k>()), detail::If<detail::found<F0>> = 0>
+[[nodiscard]] QorResult lut_linear(const InPlace<TA, LA>& src, const detail::Listed<detail::Arg<F0, 3>, k>& values,
+    const detail::Listed<detail::Arg<F0, 4>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, values, 0)) return QOR_ERR_SIZE;
+    return lut_linear(src, values.data(), levels.data(), levels.counts());
 }
 template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7461
+#line 7578
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7503,8 +7620,8 @@ template <unsigned k> inline auto lut_cubic_1() noexcept {
 }
 }   // namespace detail
 #define QORI_WORDS \
-    "qori::lut_cubic: no such call. lut_cubic(src, dst, values, levels, n_levels) or lut_cubic(in_place(src), " \
-    "values, levels, n_levels) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
+    "qori::lut_cubic: no such call. lut_cubic(src, dst, values, levels, [n_levels]) or lut_cubic(in_place(src)," \
+    " values, levels, [n_levels]) of 8u, 16u, 16s, 32f: C1 C3 C4 AC4"
 /** Maps intervals to cubics through the nodes (pLevels, pValues) around them; else dst = src. C: qoriLUT_Cubic. */
 template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
     class F0 = decltype(detail::lut_cubic_0<k>()), detail::If<detail::isImage<A> && detail::isImage<B>> = 0,
@@ -7520,9 +7637,17 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7524
+#line 7641
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<B>>,
+    class F0 = decltype(detail::lut_cubic_0<k>()),
+    detail::If<detail::isImage<A> && detail::isImage<B> && detail::found<F0>> = 0>
+[[nodiscard]] QorResult lut_cubic(const A& src, B&& dst, const detail::Listed<detail::Arg<F0, 5>, k>& values,
+    const detail::Listed<detail::Arg<F0, 6>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, values, 0)) return QOR_ERR_SIZE;
+    return lut_cubic(src, dst, values.data(), levels.data(), levels.counts());
 }
 template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
     class F0 = decltype(detail::lut_cubic_1<k>()), bool exists = false>
@@ -7535,16 +7660,23 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7539
+#line 7664
         return QOR_ERR_BAD_ARG;
     }
+}
+template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out<InPlace<TA, LA>>>,
+    class F0 = decltype(detail::lut_cubic_1<k>()), detail::If<detail::found<F0>> = 0>
+[[nodiscard]] QorResult lut_cubic(const InPlace<TA, LA>& src, const detail::Listed<detail::Arg<F0, 3>, k>& values,
+    const detail::Listed<detail::Arg<F0, 4>, k>& levels) noexcept {
+    if (!detail::haveCounts(levels, values, 0)) return QOR_ERR_SIZE;
+    return lut_cubic(src, values.data(), levels.data(), levels.counts());
 }
 template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {}, detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7548
+#line 7680
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7587,7 +7719,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7591
+#line 7723
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7596,7 +7728,7 @@ template <bool exists = false> QorResult filter_median(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7600
+#line 7732
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7648,7 +7780,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7652
+#line 7784
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7657,7 +7789,7 @@ template <bool exists = false> QorResult filter_median_horiz(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7661
+#line 7793
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7695,7 +7827,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7699
+#line 7831
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7704,7 +7836,7 @@ template <bool exists = false> QorResult filter_median_vert(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7708
+#line 7840
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7740,7 +7872,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7744
+#line 7876
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7749,7 +7881,7 @@ template <bool exists = false> QorResult filter_median_cross(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7753
+#line 7885
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7782,7 +7914,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7786
+#line 7918
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7791,7 +7923,7 @@ template <bool exists = false> QorResult filter_median_color(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7795
+#line 7927
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7818,7 +7950,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7822
+#line 7954
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7827,7 +7959,7 @@ template <bool exists = false> QorResult filter_median_weighted(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7831
+#line 7963
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7869,7 +8001,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7873
+#line 8005
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7892,7 +8024,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7896
+#line 8028
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7915,7 +8047,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7919
+#line 8051
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7924,7 +8056,7 @@ template <bool exists = false> QorResult filter_median_border(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7928
+#line 8060
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7995,7 +8127,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7999
+#line 8131
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8008,7 +8140,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8012
+#line 8144
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8017,7 +8149,7 @@ template <bool exists = false> QorResult mirror(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8021
+#line 8153
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8072,7 +8204,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8076
+#line 8208
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8085,7 +8217,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8089
+#line 8221
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8094,7 +8226,7 @@ template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8098
+#line 8230
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8149,7 +8281,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8153
+#line 8285
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8162,7 +8294,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8166
+#line 8298
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8171,7 +8303,7 @@ template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8175
+#line 8307
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8223,7 +8355,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8227
+#line 8359
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8237,7 +8369,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8241
+#line 8373
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8246,7 +8378,7 @@ template <bool exists = false> QorResult erode(detail::Anything = {}, detail::An
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8250
+#line 8382
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8298,7 +8430,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8302
+#line 8434
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8313,7 +8445,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8317
+#line 8449
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8322,7 +8454,7 @@ template <bool exists = false> QorResult dilate(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8326
+#line 8458
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8368,7 +8500,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8372
+#line 8504
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8381,7 +8513,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8385
+#line 8517
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8390,7 +8522,7 @@ template <bool exists = false> QorResult sum(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8394
+#line 8526
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8436,7 +8568,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8440
+#line 8572
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8450,7 +8582,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8454
+#line 8586
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8459,7 +8591,7 @@ template <bool exists = false> QorResult mean(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8463
+#line 8595
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8498,7 +8630,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8502
+#line 8634
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8507,7 +8639,7 @@ template <bool exists = false> QorResult norm_inf(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8511
+#line 8643
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8554,7 +8686,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8558
+#line 8690
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8568,7 +8700,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8572
+#line 8704
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8577,7 +8709,7 @@ template <bool exists = false> QorResult norm_l1(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8581
+#line 8713
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8624,7 +8756,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8628
+#line 8760
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8638,7 +8770,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8642
+#line 8774
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8647,7 +8779,7 @@ template <bool exists = false> QorResult norm_l2(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8651
+#line 8783
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8688,7 +8820,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8692
+#line 8824
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8697,7 +8829,7 @@ template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8701
+#line 8833
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8749,7 +8881,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8753
+#line 8885
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8766,7 +8898,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8770
+#line 8902
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8775,7 +8907,7 @@ template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8779
+#line 8911
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8827,7 +8959,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8831
+#line 8963
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8844,7 +8976,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8848
+#line 8980
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8853,7 +8985,7 @@ template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8857
+#line 8989
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8894,7 +9026,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8898
+#line 9030
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8903,7 +9035,7 @@ template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8907
+#line 9039
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8954,7 +9086,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8958
+#line 9090
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8971,7 +9103,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8975
+#line 9107
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8980,7 +9112,7 @@ template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8984
+#line 9116
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9032,7 +9164,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9036
+#line 9168
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9049,7 +9181,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9053
+#line 9185
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9058,7 +9190,7 @@ template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9062
+#line 9194
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9121,7 +9253,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9125
+#line 9257
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9138,7 +9270,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9142
+#line 9274
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9147,7 +9279,7 @@ template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9151
+#line 9283
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9182,7 +9314,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9186
+#line 9318
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9191,7 +9323,7 @@ template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9195
+#line 9327
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9238,7 +9370,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9242
+#line 9374
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9256,7 +9388,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9260
+#line 9392
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9265,7 +9397,7 @@ template <bool exists = false> QorResult lut_palette(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9269
+#line 9401
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9295,7 +9427,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9299
+#line 9431
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9304,7 +9436,7 @@ template <bool exists = false> QorResult lut_palette_swap(detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9308
+#line 9440
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9332,7 +9464,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9336
+#line 9468
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9362,7 +9494,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9366
+#line 9498
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9391,7 +9523,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9395
+#line 9527
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9421,7 +9553,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9425
+#line 9557
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9451,7 +9583,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9455
+#line 9587
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9480,7 +9612,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9484
+#line 9616
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9510,7 +9642,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9514
+#line 9646
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9539,7 +9671,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9543
+#line 9675
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9568,7 +9700,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9572
+#line 9704
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9597,7 +9729,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9601
+#line 9733
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9658,7 +9790,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9662
+#line 9794
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9667,7 +9799,7 @@ template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9671
+#line 9803
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9706,7 +9838,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9710
+#line 9842
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9715,7 +9847,7 @@ template <bool exists = false> QorResult resize_super(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9719
+#line 9851
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9758,7 +9890,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9762
+#line 9894
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9767,7 +9899,7 @@ template <bool exists = false> QorResult resize_linear(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9771
+#line 9903
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9807,7 +9939,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9811
+#line 9943
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9816,7 +9948,7 @@ template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9820
+#line 9952
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9856,7 +9988,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9860
+#line 9992
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9865,7 +9997,7 @@ template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9869
+#line 10001
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9905,7 +10037,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9909
+#line 10041
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9914,7 +10046,7 @@ template <bool exists = false> QorResult resize_antialiasing(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9918
+#line 10050
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9986,7 +10118,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9990
+#line 10122
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10002,7 +10134,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10006
+#line 10138
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10018,7 +10150,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10022
+#line 10154
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10027,7 +10159,7 @@ template <bool exists = false> QorResult rescale(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10031
+#line 10163
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10105,7 +10237,7 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10109
+#line 10241
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10122,7 +10254,7 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10126
+#line 10258
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10131,7 +10263,7 @@ template <bool exists = false> QorResult fill(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10135
+#line 10267
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10200,7 +10332,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10204
+#line 10336
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10221,7 +10353,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10225
+#line 10357
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10239,7 +10371,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10243
+#line 10375
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10254,7 +10386,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10258
+#line 10390
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10263,7 +10395,7 @@ template <bool exists = false> QorResult multiply_packed(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10267
+#line 10399
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10303,7 +10435,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10307
+#line 10439
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10318,7 +10450,7 @@ template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10322
+#line 10454
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10327,7 +10459,7 @@ template <bool exists = false> QorResult multiply_packed_conj(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10331
+#line 10463
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10367,7 +10499,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10371
+#line 10503
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10384,7 +10516,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10388
+#line 10520
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10393,7 +10525,7 @@ template <bool exists = false> QorResult magnitude_packed(detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10397
+#line 10529
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10433,7 +10565,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10437
+#line 10569
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10449,7 +10581,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10453
+#line 10585
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10458,7 +10590,7 @@ template <bool exists = false> QorResult phase_packed(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10462
+#line 10594
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10485,7 +10617,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10489
+#line 10621
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10494,7 +10626,7 @@ template <bool exists = false> QorResult unpack_spectrum(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10498
+#line 10630
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10525,7 +10657,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10529
+#line 10661
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10534,7 +10666,7 @@ template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10538
+#line 10670
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10622,7 +10754,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10626
+#line 10758
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10636,7 +10768,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10640
+#line 10772
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10654,7 +10786,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10658
+#line 10790
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10669,7 +10801,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10673
+#line 10805
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10678,7 +10810,7 @@ template <bool exists = false> QorResult threshold(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10682
+#line 10814
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10773,7 +10905,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10777
+#line 10909
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10787,7 +10919,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10791
+#line 10923
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10805,7 +10937,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10809
+#line 10941
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10821,7 +10953,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10825
+#line 10957
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10830,7 +10962,7 @@ template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10834
+#line 10966
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10925,7 +11057,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10929
+#line 11061
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10939,7 +11071,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10943
+#line 11075
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10957,7 +11089,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10961
+#line 11093
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10973,7 +11105,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10977
+#line 11109
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10982,7 +11114,7 @@ template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10986
+#line 11118
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11040,7 +11172,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11044
+#line 11176
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11057,7 +11189,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11061
+#line 11193
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11066,7 +11198,7 @@ template <bool exists = false> QorResult threshold_outside(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11070
+#line 11202
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11115,7 +11247,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11119
+#line 11251
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11139,7 +11271,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11143
+#line 11275
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11162,7 +11294,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11166
+#line 11298
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11185,7 +11317,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11189
+#line 11321
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11208,7 +11340,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11212
+#line 11344
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11228,7 +11360,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11232
+#line 11364
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11248,7 +11380,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11252
+#line 11384
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11268,7 +11400,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11272
+#line 11404
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11288,7 +11420,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11292
+#line 11424
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11308,7 +11440,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11312
+#line 11444
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11317,7 +11449,7 @@ template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11321
+#line 11453
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11368,7 +11500,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11372
+#line 11504
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11384,7 +11516,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11388
+#line 11520
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11393,7 +11525,7 @@ template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anythi
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11397
+#line 11529
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11489,7 +11621,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11493
+#line 11625
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11498,7 +11630,7 @@ template <bool exists = false> QorResult warp_affine_nearest(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11502
+#line 11634
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11541,7 +11673,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11545
+#line 11677
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11550,7 +11682,7 @@ template <bool exists = false> QorResult warp_affine_linear(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11554
+#line 11686
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11593,7 +11725,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11597
+#line 11729
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11602,7 +11734,7 @@ template <bool exists = false> QorResult warp_affine_cubic(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11606
+#line 11738
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11639,7 +11771,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11643
+#line 11775
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11648,7 +11780,7 @@ template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11652
+#line 11784
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11685,7 +11817,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11689
+#line 11821
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11694,7 +11826,7 @@ template <bool exists = false> QorResult sum_window_column(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11698
+#line 11830
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11782,7 +11914,7 @@ class ResizePlan : public detail::Plan<QorResizePlan> {
 #line 100000
     static_assert(detail::found<decltype(detail::resize_get_size_0<own>())>,
                   "qori::ResizePlan<T> of 8u 16u 16s 32f 64f");
-#line 11786
+#line 11918
 
 public:
     ResizePlan(QorImageSize src, QorImageSize dst, Interpolation how) noexcept : src_(src), dst_(dst), how_(how) {
@@ -11814,7 +11946,7 @@ public:
 #line 100000
         static_assert(detail::found<decltype(detail::resize_linear_0<k>())> && k >> 12 == detail::typeDigit<T>,
                       "qori::ResizePlan<T>: images of T in C1, C3 or C4, the destination not const");
-#line 11818
+#line 11950
         if (!*this) return this->status();
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -11889,7 +12021,7 @@ class WarpAffinePlan : public detail::Plan<QorWarpPlan> {
 #line 100000
     static_assert(detail::found<decltype(detail::warp_affine_linear_0<k>())>,
                   "qori::WarpAffinePlan<T, L> of 8u 16u 16s 32f 64f: C1 C3 C4");
-#line 11893
+#line 12025
 
 public:
     WarpAffinePlan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
@@ -11952,7 +12084,7 @@ class LinearFilterPlan : public detail::Plan<QorLinearFilterPlan> {
 #line 100000
     static_assert(detail::found<decltype(detail::filter_border_0<detail::keyOf<T, L>>())>,
                   "qori::LinearFilterPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
-#line 11956
+#line 12088
 
 public:
     explicit LinearFilterPlan(const Kernel<int16_t>& kernel, int32_t divisor = 1,
@@ -12122,7 +12254,7 @@ class FourierPlan : public LibraryPlan<Maker<T>, QorFft2DPlan, QorFftNormFlag> {
 #line 100000
     static_assert(complex || integers || std::is_same_v<T, float>,
                   "qori::DftPlan and FftPlan of float, of int32_t for 8u images, and of QorComplex32f");
-#line 12126
+#line 12258
 
 public:
     explicit FourierPlan(QorImageSize size, QorFftNormFlag norm = fftDivInvByN) noexcept
@@ -12166,7 +12298,7 @@ public:
         };
 #line 100000
         static_assert(!integers, "qori: transforms of 8u images have no form in place");
-#line 12170
+#line 12302
         return this->run(buffer, go, src.image);
     }
     template <class E, class L>
@@ -12212,7 +12344,7 @@ public:
         };
 #line 100000
         static_assert(!integers, "qori: transforms of 8u images have no form in place");
-#line 12216
+#line 12348
         return this->run(buffer, go, src.image);
     }
     template <class E, class L>
@@ -12274,7 +12406,7 @@ class HistogramPlan : public detail::Plan<QorHistogramSpec> {
 #line 100000
     static_assert(detail::found<decltype(detail::histogram_0<k>())>,
                   "qori::HistogramPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
-#line 12278
+#line 12410
 
 public:
     /** Given levels, a list for each channel. */

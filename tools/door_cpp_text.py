@@ -59,7 +59,8 @@ def words(operation, forms):
         shown = []
         for a in door_cpp.in_order(form.arguments, operation):
             text = f"in_place({a.name})" if a.kind == "inout" else "value" if a.kind == "value" and len(a.name) == 1 else a.name
-            shown.append(f"[{text}]" if a.default is not None or a.kind == "buffer" else text)
+            left_out = a.default is not None or a.kind == "buffer" or is_count(form.anyone().arguments[a.places[0]])
+            shown.append(f"[{text}]" if left_out else text)
         calls.setdefault(table(form), []).append(f"{operation}({', '.join(shown)})")
     return f"qori::{operation}: no such call. " + ". ".join(f"{' or '.join(c)} of {t}" for t, c in calls.items())
 
@@ -70,6 +71,11 @@ def define(name, text):
 
 
 # --- parameters -----------------------------------------------------------------------------------------------------
+
+def is_count(c):
+    """Whether a C argument says how long lists are, which a List says itself."""
+    return c.kind == "count" and c.detail == "levels"
+
 
 def c_argument(choice, argument, place=0):
     return choice.form.anyone().arguments[choice.arguments[argument.name].places[place]]
@@ -291,6 +297,42 @@ def by_images(signature):
     return lines + alternatives(signature)
 
 
+def by_lists(signature):
+    """The call with lists that bring their counts, where a member takes pointers and counts: it calls the other."""
+    form = signature.choices[0].form
+    kinds = {a.name: form.anyone().arguments[a.places[0]] for a in signature.arguments}
+    if len(signature.choices) > 1 or not any(is_count(c) for c in kinds.values()):
+        return []
+    own, ins, outs, conditions, parameters, passed_on, lists = [], [], [], [], [], [], []
+    for letter, a in zip("ABCDEGHIJKMN", signature.arguments):
+        if is_count(kinds[a.name]):
+            passed_on.append("levels.counts()")
+            continue
+        if kinds[a.name].kind.startswith("lists_"):
+            parameters.append(f"const detail::Listed<detail::Arg<F0, {a.places[0]}>, k>& {a.name}")
+            passed_on.append(f"{a.name}.data()")
+            lists.append(a.name)
+            continue
+        text, added = parameter(signature, a, letter)
+        parameters.append(text)
+        own += added
+        passed_on.append(a.name)
+        if a.kind == "inout":
+            outs.append(f"InPlace<T{letter}, L{letter}>")
+        elif a.image:
+            (ins if a.kind == "in" else outs).append(letter)
+            conditions.append(f"detail::isImage<{letter}>")
+    key = f"detail::key<detail::In<{', '.join(ins)}>, detail::Out<{', '.join(outs)}>>"
+    found = " && ".join([*conditions, "detail::found<F0>"])
+    lines = wrapped(f"template <{', '.join(own)}, unsigned k = {key}, class F0 = decltype(detail::{form.name}<k>()), "
+                    f"detail::If<{found}> = 0>")
+    lines += wrapped(f"[[nodiscard]] QorResult {signature.operation}({', '.join(parameters)}) noexcept {{")
+    for name in lists:
+        if name != "levels":
+            lines.append(f"    if (!detail::haveCounts(levels, {name}, {int(name == 'hist')})) return QOR_ERR_SIZE;")
+    return lines + wrapped(f"return {signature.operation}({', '.join(passed_on)});", "    ") + ["}"]
+
+
 def alternatives(signature, result="QOR_ERR_BAD_ARG"):
     lines = []
     for number, choice in enumerate(signature.choices):
@@ -354,6 +396,8 @@ def operation_text(operation, forms):
     lines += documentation(forms)
     for signature in signatures:
         lines += {"images": by_images, "types": by_types, "nothing": plain}[signature.keyed](signature)
+        if signature.keyed == "images":
+            lines += by_lists(signature)
     if any(s.keyed == "images" for s in keyed):
         lines += otherwise(operation)
     return lines + (["#undef QORI_WORDS"] if keyed else [])

@@ -123,6 +123,22 @@ template <class P, unsigned k>
 using Value = typename ValueOf<P, channels(k)>::type;
 
 template <class P, std::size_t N>
+struct ListsOf {
+    using type = Anything;
+};
+template <class T, std::size_t N>
+struct ListsOf<T*, N> {
+    using type = List<T>;
+};
+template <class T, std::size_t N>
+struct ListsOf<T* const*, N> {
+    using type = Lists<T, N>;
+};
+/** Lists that bring their counts, for the member's pointers: T* or T* const*. */
+template <class P, unsigned k>
+using Listed = typename ListsOf<P, channels(k)>::type;
+
+template <class P, std::size_t N>
 struct ResultsOf {
     using type = P;
 };

@@ -19,7 +19,60 @@ private:
     T values_[N] = {};
 };
 
+/** A list in memory that another owns: pointer and number of elements, from an array, a vector, a span or the like, or
+ *  {pointer, number}; where T is const also from its elements, {0, 128, 256}, for the duration of a call. What is
+ * longer than 32 bits say is empty. */
+template <class T>
+class List {
+public:
+    constexpr List(T* data, int32_t size) noexcept : data_(data), size_(size) {}
+    template <std::size_t n>
+    constexpr List(T (&array)[n]) noexcept : List(array, int32_t(n)) {}
+    template <class S, detail::If<detail::isSpan<S, T>> = 0>
+    constexpr List(S&& span) noexcept : List(span.data(), detail::counted(span.size())) {}
+    template <class U, detail::If<std::is_same_v<const U, T>> = 0>
+    constexpr List(std::initializer_list<U> elements) noexcept
+        : List(elements.begin(), detail::counted(elements.size())) {}
+    constexpr T* data() const noexcept { return data_; }
+    constexpr int32_t size() const noexcept { return size_; }
+    constexpr int32_t counts() const noexcept { return size_; }
+
+private:
+    T* data_;
+    int32_t size_;
+};
+
+/** One for each of three or four channels: {red, green, blue}. */
+template <class T, std::size_t N>
+class Lists {
+public:
+    template <std::size_t M = N, detail::If<M == 3> = 0>
+    constexpr Lists(List<T> a, List<T> b, List<T> c) noexcept
+        : data_{a.data(), b.data(), c.data()}, counts_(a.size(), b.size(), c.size()) {}
+    template <std::size_t M = N, detail::If<M == 4> = 0>
+    constexpr Lists(List<T> a, List<T> b, List<T> c, List<T> d) noexcept
+        : data_{a.data(), b.data(), c.data(), d.data()}, counts_(a.size(), b.size(), c.size(), d.size()) {}
+    constexpr T* const* data() const noexcept { return data_; }
+    constexpr const Pixel<int32_t, N>& counts() const noexcept { return counts_; }
+
+private:
+    T* data_[N];
+    Pixel<int32_t, N> counts_;
+};
+
 namespace detail {
+
+/** Whether lists have as many elements as others, or so many less. */
+template <class A, class B>
+constexpr bool haveCounts(const List<A>& all, const List<B>& lists, int32_t less) noexcept {
+    return lists.size() == all.size() - less;
+}
+template <class A, class B, std::size_t N>
+constexpr bool haveCounts(const Lists<A, N>& all, const Lists<B, N>& lists, int32_t less) noexcept {
+    for (int i = 0; i < int(N); ++i)
+        if (lists.counts()[i] != all.counts()[i] - less) return false;
+    return true;
+}
 
 /** Where an operation puts a result per channel: a variable (of one channel), an array, a Pixel or the like. */
 template <class T, std::size_t N>

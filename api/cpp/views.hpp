@@ -29,6 +29,7 @@
 #include "qori.h"
 
 #include <cstddef>
+#include <initializer_list>
 #include <type_traits>
 #if defined(__cpp_exceptions)
 #include <exception>
@@ -145,6 +146,8 @@ inline constexpr bool isMdspan<S, T,
                                Void<decltype(make<S>().data_handle()), decltype(make<S>().extent(0)),
                                     decltype(make<S>().stride(0)), decltype(Bare<S>::rank())>> =
     pointsAt<decltype(make<S>().data_handle()), T>;
+
+constexpr int32_t counted(std::size_t size) noexcept { return size > INT32_MAX ? 0 : int32_t(size); }
 
 /** The depth that a cv::Mat reports for elements of T; -1: none. */
 template <class T>

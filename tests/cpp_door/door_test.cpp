@@ -273,6 +273,44 @@ TEST(Operations, KernelsChooseTheirMembers) {
     EXPECT_EQ(*padded.at(4, 5), *out.at(4, 4));
 }
 
+/// Lists in arrays, vectors, spans and braces are what pointers and counts are.
+TEST(Operations, ListsBringTheirCounts) {
+    const auto pixels = counted<uint8_t>(12);
+    const View<const uint8_t, C1> grey(pixels, {4, 3});
+    const std::vector<int32_t> levels{0, 4, 10};
+    int32_t expected[2], bins[2] = {};
+    check(histogram_range(grey, expected, levels.data(), 3));
+    check(histogram_range(grey, bins, levels));
+    EXPECT_EQ(4, bins[0]);
+    EXPECT_EQ(6, bins[1]);
+    EXPECT_TRUE(std::equal(bins, bins + 2, expected));
+    std::array<int32_t, 3> even{};
+    std::array<int32_t, 2> halves{};
+    check(histogram_even(grey, halves, even, 0, 12));
+    EXPECT_EQ((std::array<int32_t, 2>{6, 6}), halves);
+    EXPECT_EQ((std::array<int32_t, 3>{0, 6, 12}), even);
+    EXPECT_EQ(QOR_ERR_SIZE, histogram_range(grey, even, levels)) << "bins are one less than levels";
+
+    Image<uint8_t, C1> mapped({4, 3});
+    check(lut(grey, mapped, {5, 7, 9}, std::span(levels)));
+    EXPECT_EQ(5, mapped.at(3, 0)[0]);
+    EXPECT_EQ(7, mapped.at(0, 1)[0]);
+    EXPECT_EQ(QOR_ERR_SIZE, lut(grey, mapped, {5, 7}, levels));
+    check(lut(in_place(mapped), {1, 2, 3}, {0, 6, 8}));
+    EXPECT_EQ(1, mapped.at(0, 0)[0]);
+    EXPECT_EQ(2, mapped.at(0, 1)[0]);
+
+    const View<const uint8_t, C3> colours(pixels, {2, 2});
+    std::array<int32_t, 1> red{};
+    int32_t green[2] = {}, blue[1] = {};
+    check(histogram_range(colours, {red, green, blue}, {{0, 256}, levels, {2, 6}}));
+    EXPECT_EQ(4, red[0]);
+    EXPECT_EQ(1, green[0]);  // of 1, 4, 7, 10
+    EXPECT_EQ(2, green[1]);
+    EXPECT_EQ(2, blue[0]);  // of 2, 5, 8, 11
+    EXPECT_EQ(QOR_ERR_SIZE, histogram_range(colours, {red, green, blue}, {{0, 256}, {0, 256}, {2, 6}}));
+}
+
 TEST(Memory, OwnersMove) {
     Image<float, C3> a({5, 4});
     float* const pixels = a.at(0, 0);
