@@ -38,13 +38,25 @@ def refresh():
             shutil.copyfile(new, copy)
 
 
-def build(target):
+def build(test):
+    target = "qori_python" if test.endswith(".py") else test
     return run("cmake", "--build", str(WORK / "build"), "--target", target, "-j", "2")
+
+
+def command(test):
+    """A test program, or pytest with a file of the Python package."""
+    folder = WORK / "build"
+    if not test.endswith(".py"):
+        return [str(folder / "tests" / "bin" / test), "--gtest_brief=1"]
+    cache = (folder / "CMakeCache.txt").read_text()
+    python = next(line.partition("=")[2] for line in cache.splitlines() if line.startswith("QORI_PYTHON:"))
+    environment = f"PYTHONPATH={folder / 'python'}"
+    return ["env", environment, python, "-m", "pytest", "-q", "-x", "-p", "no:cacheprovider", test]
 
 
 def passes(test):
     try:
-        return run(str(WORK / "build" / "tests" / "bin" / test), "--gtest_brief=1", timeout=1800).returncode == 0
+        return run(*command(test), timeout=1800).returncode == 0
     except subprocess.TimeoutExpired:
         return False   # a loop that does not end
 
@@ -78,7 +90,8 @@ def main():
     refresh()
     # Faults of logic show without much optimisation, which takes most of a build's time.
     configure = run("cmake", "-S", ".", "-B", str(WORK / "build"), "-G", "Ninja", "-DCMAKE_BUILD_TYPE=Release",
-                    "-DCMAKE_CXX_FLAGS_RELEASE=-O1 -DNDEBUG", "-DQORI_BUILD_EXAMPLES=OFF")
+                    "-DCMAKE_CXX_FLAGS_RELEASE=-O1 -DNDEBUG", "-DQORI_BUILD_EXAMPLES=OFF",
+                    "-DQORI_BUILD_PYTHON=ON")
     if configure.returncode:
         sys.exit(configure.stderr)
     for test in sorted({fault["test"] for fault in faults}):
