@@ -19,37 +19,6 @@ namespace {
 
 QORI_INLINE ComplexLine exchanged(ComplexLine a) { return {a.im, a.re}; }
 
-/// A stage back: blocks of radix * part points.
-template <int radix>
-QORI_NOINLINE void passBack(float* lines, ptrdiff_t blocks, ptrdiff_t part, const float* turns, const float* twiddles) {
-    const ptrdiff_t apart = part * kLineFloats;
-    for (ptrdiff_t block = 0; block < blocks; ++block, lines += radix * apart) {
-        const float* w = twiddles;
-        for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
-            float* const x = lines + j * kLineFloats;
-            ComplexLine a[radix];
-            a[0] = line::loadLine(x);
-            for (int p = 1; p < radix; ++p) a[p] = line::times(line::loadLine(x + p * apart), w + 2 * p - 2);
-            line::butterflyOf<radix>(a, turns);
-            for (int q = 0; q < radix; ++q) line::storeLine(x + q * apart, a[q]);
-        }
-    }
-}
-
-void stageBack(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks) {
-    const float* const turns = table.at<float>(stage.turns);
-    const float* const twiddles = table.at<float>(stage.twiddles);
-    const ptrdiff_t part = stage.length / stage.radix;
-    switch (stage.radix) {
-        case 3: return passBack<3>(lines, blocks, part, turns, twiddles);
-        case 4: return passBack<4>(lines, blocks, part, turns, twiddles);
-        case 5: return passBack<5>(lines, blocks, part, turns, twiddles);
-        case 7: return passBack<7>(lines, blocks, part, turns, twiddles);
-        case 8: return passBack<8>(lines, blocks, part, turns, twiddles);
-        default: return line::passBackPrime(table, stage, lines, blocks);
-    }
-}
-
 /// The last stage, the product with the spectrum, which is in the order of the lines, and the first stage back. With
 /// `first` the lines begin with frequency 0, the sum of the points: it is added to the first point, which was not among
 /// them, and that to all sums.
@@ -114,42 +83,60 @@ template <int radix>
 struct OuterStage {
     ptrdiff_t part;
     const float *turns, *twiddles;
+    line::Rotation<radix> rotation;  ///< In points.
 
     explicit OuterStage(const FourierTable& inner)
-        : part(inner.stages[0].length / radix),
+        : part(inner.stages[0].part()),
           turns(inner.at<float>(inner.stages[0].turns)),
-          twiddles(inner.at<float>(inner.stages[0].twiddles)) {}
+          twiddles(inner.at<float>(inner.stages[0].twiddles)),
+          rotation(inner.stages[0].rotation, part) {}
 };
 
 /// Reads the block's points through the first stage.
-template <int radix, class Order>
+template <int radix, bool isRotated, class Order>
 QORI_NOINLINE void enter(const Convolution& c, Order order, float* lines) {
-    const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
+    auto [part, turns, twiddles, rotation] = OuterStage<radix>(c.inner);
     const float* w = twiddles;
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
-        for (int q = 0; q < radix; ++q)
-            a[q] = q < Order::filled(radix) ? order.load(c.block, j + q * part)
-                                            : ComplexLine{zero<float>(), zero<float>()};
+        if constexpr (isRotated) {
+            ptrdiff_t around[radix];
+            rotation.offsets(around);
+            rotation.advance();
+            for (int q = 0; q < radix; ++q) a[q] = order.load(c.block, j + around[q]);
+        } else {
+            for (int q = 0; q < radix; ++q)
+                a[q] = q < Order::filled(radix) ? order.load(c.block, j + q * part)
+                                                : ComplexLine{zero<float>(), zero<float>()};
+        }
         line::butterflyOf<radix>(a, turns);
         line::storeLine(lines + j * kLineFloats, a[0]);
         for (int p = 1; p < radix; ++p)
-            line::storeLine(lines + (j + p * part) * kLineFloats, line::times(a[p], w + 2 * p - 2));
+            line::storeLine(lines + (j + p * part) * kLineFloats, isRotated ? a[p] : line::times(a[p], w + 2 * p - 2));
     }
 }
 
 /// The last stage back, of as many points as the block has.
-template <int radix, class Order>
+template <int radix, bool isRotated, class Order>
 QORI_NOINLINE void leave(const Convolution& c, Order order, const float* lines) {
-    const auto [part, turns, twiddles] = OuterStage<radix>(c.inner);
+    auto [part, turns, twiddles, rotation] = OuterStage<radix>(c.inner);
     const float* w = twiddles;
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
         a[0] = line::loadLine(lines + j * kLineFloats);
-        for (int p = 1; p < radix; ++p)
-            a[p] = line::times(line::loadLine(lines + (j + p * part) * kLineFloats), w + 2 * p - 2);
+        for (int p = 1; p < radix; ++p) {
+            const ComplexLine x = line::loadLine(lines + (j + p * part) * kLineFloats);
+            a[p] = isRotated ? x : line::times(x, w + 2 * p - 2);
+        }
         line::butterflyOf<radix>(a, turns);
-        for (int q = 0; q < Order::filled(radix); ++q) order.store(c.block, j + q * part, exchanged(a[q]));
+        if constexpr (isRotated) {
+            ptrdiff_t around[radix];
+            rotation.offsets(around);
+            rotation.advance();
+            for (int q = 0; q < radix; ++q) order.store(c.block, j + around[q], exchanged(a[q]));
+        } else {
+            for (int q = 0; q < Order::filled(radix); ++q) order.store(c.block, j + q * part, exchanged(a[q]));
+        }
     }
 }
 
@@ -173,24 +160,31 @@ void convolveBlock(const FourierTable& inner, int32_t stage, float* lines, ptrdi
         for (ptrdiff_t i = 0; i < divided.radix; ++i)
             convolveBlock(inner, stage + 1, lines + i * part * kLineFloats, part, spectrum + 2 * i * part,
                           i == 0 ? first : nullptr);
-        return stageBack(inner, divided, lines, 1);
+        return line::runStageBack(inner, divided, lines, 1);
     }
     for (int32_t i = stage; i < last; ++i)
         line::runStage(inner, inner.stages[i], lines, points / inner.stages[i].length);
     turnBackBy(inner.stages[last].radix, lines, points, spectrum, first);
     for (int32_t i = last - 1; i >= stage; --i)
-        stageBack(inner, inner.stages[i], lines, points / inner.stages[i].length);
+        line::runStageBack(inner, inner.stages[i], lines, points / inner.stages[i].length);
 }
 
 /// first: the block's first point, where it is not among the convolution's.
-template <int radix, class Order>
+template <int radix, bool isRotated, class Order>
 void convolveFrom(const Convolution& c, Order order, float* work, float* first) {
-    enter<radix>(c, order, work);
+    enter<radix, isRotated>(c, order, work);
     const ptrdiff_t part = c.inner.points / radix;
     for (ptrdiff_t i = 0; i < radix; ++i)
         convolveBlock(c.inner, 1, work + i * part * kLineFloats, part, c.spectrum + 2 * i * part,
                       i == 0 ? first : nullptr);
-    leave<radix>(c, order, work);
+    leave<radix, isRotated>(c, order, work);
+}
+
+template <int radix, class Order>
+void convolveFrom(const Convolution& c, Order order, float* work, float* first) {
+    if constexpr (line::isOdd<radix>)
+        if (c.inner.stages[0].rotation != 0) return convolveFrom<radix, true>(c, order, work, first);
+    convolveFrom<radix, false>(c, order, work, first);
 }
 
 /// Where the first radix has no kernel of its own, points are put in order before and behind all stages.

@@ -38,7 +38,16 @@ struct FourierTable {
     struct Stage {
         int32_t radix, length;
         int32_t turns;  ///< Where cosines and sines of 2 pi m q / radix are, of an odd radix, for q and m to its half.
-        int32_t twiddles;  ///< Where (radix - 1) complex factors for each of length / radix points are.
+        int32_t twiddles;  ///< Where (radix - 1) complex factors for each of length / radix points are, or 0.
+        /// Of an odd radix r that has no factor in common with the part m = length / r, instead of twiddles: the
+        /// inverse of m modulo r. With 1 = r s + m t a twiddle e^(-2 pi i p j / length) is e^(-2 pi i p j t / r), which
+        /// moves point q of the butterfly to q + j t, times e^(-2 pi i p j s / m), which moves frequency k of the part
+        /// to k + p s (Good: The interaction algorithm and practical Fourier analysis, 1958).
+        int32_t rotation;
+
+        int32_t part() const { return length / radix; }
+        /// s of the above, where there is a rotation.
+        int32_t shift() const { return static_cast<int32_t>((1 + int64_t{part()} * (radix - rotation)) / radix); }
     };
 
     int32_t points, stageCount;
@@ -67,8 +76,10 @@ int64_t fourierWorkBytes(int64_t n);
 void makeFourierTable(FourierTable* table, int32_t n, void* init);
 void transformLines(const FourierTable* table, float* lines, float* work);
 
-/// Factors that splitHalves and joinHalves take for n / 2 points: n / 4 + 1 complex numbers.
-constexpr int64_t halfRootsBytes(int64_t n) { return (n / 4 + 1) * 8; }
+/// Factors that splitHalves and joinHalves take for n / 2 points, for each k to n / 4: the parts of e^(-2 pi i k / n) /
+/// 2, and 1/2 plus and minus the imaginary one.
+inline constexpr int kHalfRootFloats = 4;
+constexpr int64_t halfRootsBytes(int64_t n) { return (n / 4 + 1) * kHalfRootFloats * 4; }
 /// init: memory of halfRootsInitBytes(n), or none, and each root takes longer.
 int64_t halfRootsInitBytes(int64_t n);
 void makeHalfRoots(float* roots, int32_t n, void* init = nullptr);

@@ -66,19 +66,26 @@ struct Factors {
     }
 };
 
-/// The shortest cyclic convolution of small factors that holds a chirp's linear one; powers of two are worth a tenth.
-/// Its twos are 5 or more, so that there are several stages, the last of radix 8 and none of radix 2.
+/// The shortest cyclic convolution of small factors that holds a chirp's linear one; powers of two, of few stages, are
+/// worth a twentieth. Its twos are 3 or more: the last stage is not of radix 2.
 int64_t convolutionPoints(int64_t chirp) {
     const int64_t least = 2 * chirp - 1;
     const auto from = [=](int64_t n) {
         while (n < least) n *= 2;
         return n;
     };
-    int64_t best = from(32 * 3);
-    for (int64_t odd : {5, 9, 15})
-        if (from(32 * odd) < best) best = from(32 * odd);
-    if (from(32) - from(32) / 10 <= best) best = from(32);
+    int64_t best = from(8);
+    int64_t mostOdd = best - best / 20;
+    for (int64_t odd : {3, 5, 9, 15, 25, 27, 45, 75})
+        if (from(8 * odd) <= mostOdd) best = mostOdd = from(8 * odd);
     return best;
+}
+
+/// b of a b = 1 modulo a prime.
+int32_t inverseOf(int64_t a, int32_t prime) {
+    int32_t b = 1;
+    while (a * b % prime != 1) ++b;
+    return b;
 }
 
 /// The record's fields and its bytes. Offsets count only where the bytes are below 2^31.
@@ -100,7 +107,11 @@ struct FourierLayout {
             stage.radix = radix;
             stage.length = static_cast<int32_t>(length);
             stage.turns = radix % 2 == 1 ? add((radix / 2) * (radix / 2) * 8) : 0;
-            stage.twiddles = length > radix ? add(length / radix * (radix - 1) * 8) : 0;
+            const int64_t part = length / radix;
+            if (part > 1 && radix % 2 == 1 && part % radix != 0)
+                stage.rotation = inverseOf(part % radix, radix);
+            else if (part > 1)
+                stage.twiddles = add(part * (radix - 1) * 8);
             length /= radix;
         }
         table.positionsAt = add(4 * n);
@@ -127,12 +138,18 @@ void storeRoot(float* p, Root root) {
 /// Frequencies that start alike are apart by the radices so far; their lines lie together.
 void fillPositions(FourierTable* table) {
     auto* const positions = table->at<int32_t>(table->positionsAt);
+    int32_t parts[FourierTable::kMostStages], shifts[FourierTable::kMostStages];
+    for (int32_t i = 0; i < table->stageCount; ++i) {
+        parts[i] = table->stages[i].part();
+        shifts[i] = table->stages[i].rotation == 0 ? 0 : table->stages[i].shift();
+    }
     for (int32_t k = 0; k < table->points; ++k) {
         int32_t rest = k, position = 0;
         for (int32_t i = 0; i < table->stageCount; ++i) {
-            const FourierTable::Stage& stage = table->stages[i];
-            position += rest % stage.radix * (stage.length / stage.radix);
-            rest /= stage.radix;
+            const int32_t remainder = rest % table->stages[i].radix;
+            position += remainder * parts[i];
+            rest /= table->stages[i].radix;
+            if (shifts[i] != 0) rest = (rest + remainder * shifts[i]) % parts[i];  // below radix * part before
         }
         positions[k] = position + rest;
     }
@@ -277,9 +294,10 @@ int64_t halfRootsInitBytes(int64_t n) { return n > kMostWithoutMemory ? Roots::b
 
 void makeHalfRoots(float* roots, int32_t n, void* init) {
     const Roots ofTurn(n, n > kMostWithoutMemory ? init : nullptr);
-    for (int32_t k = 0; k <= n / 4; ++k) {
+    for (int32_t k = 0; k <= n / 4; ++k, roots += kHalfRootFloats) {
         const Root root = ofTurn(k);
-        storeRoot(roots + 2 * k, {root.re / 2, root.im / 2});
+        storeRoot(roots, {root.re / 2, root.im / 2});
+        storeRoot(roots + 2, {(1 + root.im) / 2, (1 - root.im) / 2});
     }
 }
 

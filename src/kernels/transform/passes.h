@@ -40,11 +40,32 @@ QORI_NOINLINE void passBlocks(T* lines, ptrdiff_t blocks, ptrdiff_t part, const 
     }
 }
 
-/// One stage of so many blocks.
-void runStage(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
+/// Where the butterflies of a rotated stage begin among their lines, and how they go around.
+template <int radix>
+class Rotation {
+public:
+    /// Lines of a butterfly are `apart` from each other; the next one begins `rotation` of them earlier.
+    QORI_INLINE Rotation(ptrdiff_t rotation, ptrdiff_t apart)
+        : step_(rotation * apart), apart_(apart), end_(radix * apart) {}
 
-/// A stage on the way back of a convolution, of a prime radix that has no kernel of its own: twiddles first.
-void passBackPrime(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
+    QORI_INLINE void offsets(ptrdiff_t (&around)[radix]) const {
+        ptrdiff_t at = start_;
+        for (ptrdiff_t& offset : around) {
+            offset = at;
+            at = at + apart_ == end_ ? 0 : at + apart_;
+        }
+    }
+    QORI_INLINE void advance() { start_ -= start_ < step_ ? step_ - end_ : step_; }
+
+private:
+    ptrdiff_t step_, apart_, end_, start_ = 0;
+};
+
+enum class Way { forth, back };
+
+/// One stage of so many blocks; back, the way of a convolution, between exchanged parts.
+void runStage(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
+void runStageBack(const FourierTable& table, const FourierTable::Stage& stage, float* lines, ptrdiff_t blocks);
 
 /// The convolvedPoints points of a block. work: the lines of the inner transform.
 void transformByConvolution(const FourierTable& table, float* block, float* work);

@@ -36,7 +36,7 @@ void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float
     const line::EightRows out(rows);
     const ptrdiff_t points = n / 2;
     const auto at = [=](ptrdiff_t k) { return line::loadLine(lines + ptrdiff_t{positions[k]} * kLineFloats); };
-    const auto split = [=](ptrdiff_t k) { return line::splitHalf(at(k), at(points - k), roots + 2 * k); };
+    const auto split = [=](ptrdiff_t k) { return line::splitHalf(at(k), at(points - k), roots + kHalfRootFloats * k); };
     line::Halves second = split(1);
     storeTwo(out, 0, line::sumAndDifference(at(0)), second.at);
     ptrdiff_t k = 2;
@@ -59,7 +59,7 @@ void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roo
     const Vec<float> factor = splat(scale);
     const ptrdiff_t points = n / 2;
     const auto join = [=](ptrdiff_t k, ComplexLine x, ComplexLine y) {
-        const line::Halves z = line::joinHalf(x, y, roots + 2 * k);
+        const line::Halves z = line::joinHalf(x, y, roots + kHalfRootFloats * k);
         line::storeLine(lines + (points - k) * kLineFloats, z.mirror);
         line::storeLine(lines + k * kLineFloats, z.at);
     };
