@@ -88,26 +88,23 @@ QorResult withFourierPlan(Src src, Dst dst, const QorFft2DPlan* block, uint8_t* 
     return callers == nullptr ? runWith(WorkMemory(int64_t{plan.bufferBytes})) : runWith(WorkMemory(callers));
 }
 
-inline Channel channelOf(Image<const float> src, Image<float> dst, int c, int channels) {
-    return {src.data + c, src.step, dst.data + c, dst.step, channels};
+template <Layout layout>
+Images imagesOf(Image<const float> src, Image<float> dst) {
+    return {src.data, src.step, dst.data, dst.step, channels(layout), processedChannels(layout)};
 }
 
 template <Family family, Layout layout>
 QorResult forwardToPack(Image<const float> src, Image<float> dst, const QorFft2DPlan* block, uint8_t* buffer) {
     return withFourierPlan<family, Elements::real>(
-        src, dst, block, buffer, [=](const FourierPlan& plan, uint8_t* memory) {
-            for (int c = 0; c < processedChannels(layout); ++c)
-                forwardReal(plan, channelOf(src, dst, c, channels(layout)), memory);
-        });
+        src, dst, block, buffer,
+        [=](const FourierPlan& plan, uint8_t* memory) { forwardReal(plan, imagesOf<layout>(src, dst), memory); });
 }
 
 template <Family family, Layout layout>
 QorResult inverseFromPack(Image<const float> src, Image<float> dst, const QorFft2DPlan* block, uint8_t* buffer) {
     return withFourierPlan<family, Elements::real>(
-        src, dst, block, buffer, [=](const FourierPlan& plan, uint8_t* memory) {
-            for (int c = 0; c < processedChannels(layout); ++c)
-                inverseReal(plan, channelOf(src, dst, c, channels(layout)), memory);
-        });
+        src, dst, block, buffer,
+        [=](const FourierPlan& plan, uint8_t* memory) { inverseReal(plan, imagesOf<layout>(src, dst), memory); });
 }
 
 template <Family family>
@@ -115,7 +112,7 @@ QorResult complexTransform(Image<const QorComplex32f> src, Image<QorComplex32f> 
                            uint8_t* buffer, Direction direction) {
     return withFourierPlan<family, Elements::complex>(
         src, dst, block, buffer, [=](const FourierPlan& plan, uint8_t* memory) {
-            transformComplex(plan, {&src.data->re, src.step, &dst.data->re, dst.step, 1}, memory, direction);
+            transformComplex(plan, {&src.data->re, src.step, &dst.data->re, dst.step, 1, 1}, memory, direction);
         });
 }
 
@@ -144,7 +141,7 @@ QorResult integerTransform(Image<const S> src, Image<D> dst, const QorFft2DPlan*
             for (int c = 0; c < processedChannels(layout); ++c) {
                 for (int32_t y = 0; y < plan.size.height; ++y)
                     kernels::channelToFloats(src.row(y) + c, apart, floats + ptrdiff_t{y} * width, width);
-                transform(plan, Channel{floats, step, floats, step, 1}, memory);
+                transform(plan, Images{floats, step, floats, step, 1, 1}, memory);
                 for (int32_t y = 0; y < plan.size.height; ++y)
                     kernels::floatsToChannel(floats + ptrdiff_t{y} * width, factor, dst.row(y) + c, apart, width);
             }

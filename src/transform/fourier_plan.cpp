@@ -48,9 +48,12 @@ FourierSizes::FourierSizes(QorImageSize size, Elements elements) {
     if (isHalved(size.width, elements)) initBytes = std::max(initBytes, kernels::halfRootsInitBytes(size.width));
     if (initBytes > 0) initBytes += kBlockAlignment;
 
-    buffer.add(kLineBytes * std::max<int64_t>(points, size.height));
+    // Rows are turned with all of their channels, columns eight at a time whichever they are.
+    const int channels = elements == Elements::real ? 4 : 1;
+    buffer.add(kLineBytes * std::max<int64_t>(int64_t{points} * channels, size.height));
     plan.workAt = place(buffer, std::max(kernels::fourierWorkBytes(points), kernels::fourierWorkBytes(size.height)));
-    plan.savedAt = place(buffer, elements == Elements::complex ? 0 : int64_t{size.height} * elementBytes<float>);
+    plan.savedAt =
+        place(buffer, elements == Elements::complex ? 0 : channels * int64_t{size.height} * elementBytes<float>);
     if (elements == Elements::integers)
         plan.imageAt = place(buffer, std::min(int64_t{size.width} * size.height, kTooMany) * elementBytes<float>);
     bufferBytes = buffer.bytes() + kBlockAlignment;

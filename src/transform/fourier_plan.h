@@ -26,7 +26,7 @@ struct FourierPlan {
     /// Of one row or column: 1, 1 / n or 1 / sqrt(n).
     float rowForward, rowInverse, columnForward, columnInverse;
     int32_t rowTable, columnTable, halfRoots;
-    /// Where a transform's work memory and the saved column are in the buffer, behind the lines.
+    /// Where a transform's work memory and the saved columns are in the buffer, behind the lines.
     int32_t workAt, savedAt;
     int32_t imageAt;  ///< Integer plans: of the image as floats.
 

@@ -19,7 +19,8 @@ constexpr int kColumns = kernels::kLineColumns;
 
 /// The buffer's pieces.
 struct Work {
-    float *lines, *work, *saved;
+    float *lines, *work;
+    float* saved;  ///< The last column of each channel.
 
     Work(const FourierPlan& plan, uint8_t* buffer)
         : lines(reinterpret_cast<float*>(buffer)),
@@ -27,97 +28,167 @@ struct Work {
           saved(tableOf<float>(buffer, plan.savedAt)) {}
 };
 
-LineRows rowsOf(const float* image, int32_t step, int channels, int32_t y, int count) {
+LineRows rowsOf(const float* image, int32_t step, const Images& images, int32_t y, int count) {
     // Kernels that read take the same description as those that write.
-    return {asBytes(const_cast<float*>(image)) + ptrdiff_t{y} * step, step, count, channels};
+    return {asBytes(const_cast<float*>(image)) + ptrdiff_t{y} * step, step, count, images.channels, images.processed};
 }
 
 /// Calls each(source rows, destination rows) for so many rows at a time.
 template <class Each>
-void forEachRows(const FourierPlan& plan, const Channel& c, int most, Each each) {
+void forEachRows(const FourierPlan& plan, const Images& images, int most, Each each) {
     for (int32_t y = 0; y < plan.size.height; y += most) {
         const int count = std::min(most, plan.size.height - y);
-        each(rowsOf(c.src, c.srcStep, c.channels, y, count), rowsOf(c.dst, c.dstStep, c.channels, y, count));
+        each(rowsOf(images.src, images.srcStep, images, y, count),
+             rowsOf(images.dst, images.dstStep, images, y, count));
     }
 }
 
-/// Complex columns of a real image's spectra, the real ones being one of them.
+/// Complex columns of a real image's spectra, the real ones being one of them, of each channel.
 class SpectrumColumns {
 public:
-    SpectrumColumns(const FourierPlan& plan, const float* image, int32_t step, int channels)
-        : width_(plan.size.width), rows_(rowsOf(image, step, channels, 0, plan.size.height)) {}
+    SpectrumColumns(const FourierPlan& plan, const float* image, int32_t step, const Images& images)
+        : width_(plan.size.width), rows_(rowsOf(image, step, images, 0, plan.size.height)) {}
 
-    int32_t blocks() const { return (width_ / 2 + width_ % 2 + kColumns - 1) / kColumns; }
-    /// Lanes of block b. In the packed order the first lane of block 0 is no pair.
-    LineColumns packed(int32_t b) const { return {rows_, ptrdiff_t{b} * 2 * kColumns - 1, b == 0 ? 1 : 0, end(b)}; }
-    LineColumns between(int32_t b) const {
-        if (width_ % 2 == 1) return packed(b);
-        return {rows_, ptrdiff_t{b} * 2 * kColumns, 0, end(b)};
-    }
+    int32_t blocks() const { return (all() + kColumns - 1) / kColumns; }
+    /// Lanes of block b. In the packed order the first columns of block 0 are no pairs.
+    LineColumns packed(int32_t b) const { return columns(b, -rows_.channels, b == 0 ? rows_.channels : 0); }
+    LineColumns between(int32_t b) const { return width_ % 2 == 1 ? packed(b) : columns(b, 0, 0); }
     bool hasLastColumn() const { return width_ % 2 == 0; }
-    LineRows column(int32_t x) const {
+    LineRows column(int32_t x, int channel) const {
         LineRows rows = rows_;
-        rows.first = asBytes(rows.row(0) + ptrdiff_t{x} * rows.channels);
+        rows.first = asBytes(rows.row(0) + ptrdiff_t{x} * rows.channels + channel);
         return rows;
     }
+    /// Calls each(channel) for those that are processed.
+    template <class Each>
+    void forEachChannel(Each each) const {
+        for (int c = 0; c < rows_.processed; ++c) each(c);
+    }
+
+    /// Where the only block has lanes left for one more column of each channel, the first of them, else 0.
+    int freeLane() const { return all() + rows_.channels <= kColumns ? kColumns - rows_.channels : 0; }
 
 private:
-    int end(int32_t b) const { return std::min(kColumns, width_ / 2 + width_ % 2 - b * kColumns); }
+    int32_t all() const { return (width_ / 2 + width_ % 2) * rows_.channels; }
+    LineColumns columns(int32_t b, ptrdiff_t first, int begin) const {
+        const int32_t column = b * kColumns, channel = column % rows_.channels;
+        return {rows_, first + 2 * ptrdiff_t{column - channel} + channel, begin, std::min(kColumns, all() - column),
+                channel};
+    }
 
     int32_t width_;
     LineRows rows_;
 };
 
-void forwardRealRows(const FourierPlan& plan, const Channel& c, const Work& w) {
+/// The saved column of a channel, and the same as one of an image.
+float* savedOf(const FourierPlan& plan, const Work& w, int channel) {
+    return w.saved + ptrdiff_t{channel} * plan.size.height;
+}
+LineRows savedColumn(const FourierPlan& plan, const Work& w, int channel) {
+    return {asBytes(savedOf(plan, w, channel)), elementBytes<float>, plan.size.height, 1, 1};
+}
+
+/// Calls each(lines) for those of every channel that is processed.
+template <class Each>
+void forEachLines(const FourierPlan& plan, const Images& images, float* lines, Each each) {
+    const ptrdiff_t floats = ptrdiff_t{plan.rows()->points} * kernels::kLineFloats;
+    for (int c = 0; c < images.processed; ++c) each(lines + c * floats);
+}
+
+/// Odd rows go in pairs, as the parts of complex ones, which costs half and has a rounding more. Where there are no
+/// more rows than lanes, or where that is a larger part of the errors and rows are short, they go alone.
+bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 15; }
+
+void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
     if (plan.halfRoots != 0)
-        forEachRows(plan, c, kColumns, [&](const LineRows& src, const LineRows& dst) {
+        forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
             kernels::rowsToLines(src, width, plan.rowForward, Parts::inOrder, w.lines);
-            kernels::transformLines(table, w.lines, w.work);
+            forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
             kernels::halvesToRows(w.lines, width, table->positions(), plan.roots(), dst);
         });
-    else
-        forEachRows(plan, c, 2 * kColumns, [&](const LineRows& src, const LineRows& dst) {
-            kernels::rowsToPairs(src, width, plan.rowForward, w.lines);
-            kernels::transformLines(table, w.lines, w.work);
-            kernels::splitPairs(w.lines, width, table->positions());
+    else {
+        const bool alone = areAlone(plan.size);
+        forEachRows(plan, images, alone ? kColumns : 2 * kColumns, [&](const LineRows& src, const LineRows& dst) {
+            kernels::rowsToPairs(src, width, plan.rowForward, alone, w.lines);
+            forEachLines(plan, images, w.lines, [&](float* lines) {
+                kernels::transformLines(table, lines, w.work);
+                if (!alone) kernels::splitPairs(lines, width, table->positions());
+            });
             kernels::pairsToSpectra(w.lines, table->positions(), width, dst);
         });
+    }
 }
 
 /// From the order between rows and columns, in place.
-void inverseRealRows(const FourierPlan& plan, const Channel& c, const Work& w) {
+void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
     if (plan.halfRoots != 0)
-        forEachRows(plan, c, kColumns, [&](const LineRows&, const LineRows& dst) {
+        forEachRows(plan, images, kColumns, [&](const LineRows&, const LineRows& dst) {
             kernels::rowsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
-            kernels::transformLines(table, w.lines, w.work);
+            forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
             kernels::linesToRows(w.lines, table->positions(), width, Parts::exchanged, dst);
         });
     else
-        forEachRows(plan, c, 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
+        forEachRows(plan, images, 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
             kernels::spectraToPairs(dst, width, plan.rowInverse, w.lines);
-            kernels::joinPairs(w.lines, width);
-            kernels::transformLines(table, w.lines, w.work);
+            forEachLines(plan, images, w.lines, [&](float* lines) {
+                kernels::joinPairs(lines, width);
+                kernels::transformLines(table, lines, w.work);
+            });
             kernels::pairsToRows(w.lines, table->positions(), width, dst);
         });
 }
 
-}  // namespace
-
-void forwardReal(const FourierPlan& plan, const Channel& c, uint8_t* buffer) {
-    const Work w(plan, buffer);
-    forwardRealRows(plan, c, w);
-    const SpectrumColumns columns(plan, c.dst, c.dstStep, c.channels);
+/// The first block of columns, in lines, with both real columns of a channel in a lane; the last one's frequencies go
+/// to the saved columns.
+void transformJoined(const FourierPlan& plan, const SpectrumColumns& columns, const Work& w) {
     const kernels::FourierTable* const table = plan.columns();
-    kernels::columnsToLines(columns.between(0), plan.columnForward, Parts::inOrder, w.lines);
-    if (!columns.hasLastColumn()) kernels::joinRealColumn(columns.column(0), plan.columnForward, w.lines);
     kernels::transformLines(table, w.lines, w.work);
     kernels::linesToColumns(w.lines, table->positions(), Parts::inOrder, columns.packed(0));
-    kernels::splitRealColumns(w.lines, table->positions(), columns.column(0),
-                              columns.hasLastColumn() ? w.saved : nullptr);
+    columns.forEachChannel([&](int c) {
+        kernels::splitRealColumns(w.lines + c, table->positions(), columns.column(0, c), savedOf(plan, w, c));
+    });
+}
+
+/// The same with each real column in a lane of its own, which spares it a rounding. No last column, or lanes free for
+/// it.
+void transformApart(const FourierPlan& plan, const SpectrumColumns& columns, const Work& w) {
+    const kernels::FourierTable* const table = plan.columns();
+    float* const free = w.lines + columns.freeLane();
+    columns.forEachChannel([&](int c) {
+        if (columns.hasLastColumn()) {
+            kernels::copyImaginary(w.lines + c, savedColumn(plan, w, c));
+            kernels::joinRealColumn(savedColumn(plan, w, c), 1, free + c);
+        }
+        kernels::joinRealColumn(columns.column(0, c), plan.columnForward, w.lines + c);
+    });
+    kernels::transformLines(table, w.lines, w.work);
+    kernels::linesToColumns(w.lines, table->positions(), Parts::inOrder, columns.packed(0));
+    columns.forEachChannel([&](int c) {
+        kernels::packRealColumn(w.lines + c, table->positions(), columns.column(0, c));
+        if (columns.hasLastColumn()) kernels::packRealColumn(free + c, table->positions(), savedColumn(plan, w, c));
+    });
+}
+
+}  // namespace
+
+void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer) {
+    const Work w(plan, buffer);
+    forwardRealRows(plan, images, w);
+    const SpectrumColumns columns(plan, images.dst, images.dstStep, images);
+    const kernels::FourierTable* const table = plan.columns();
+    kernels::columnsToLines(columns.between(0), plan.columnForward, Parts::inOrder, w.lines);
+    if (columns.hasLastColumn() && columns.freeLane() == 0)
+        transformJoined(plan, columns, w);
+    else
+        transformApart(plan, columns, w);
+    const auto storeSaved = [&](int32_t x) {
+        if (columns.hasLastColumn())
+            columns.forEachChannel([&](int c) { kernels::floatsToColumn(savedOf(plan, w, c), columns.column(x, c)); });
+    };
     // From the right, where whole blocks write what they have read and pass a column on, the last one at first; the
     // first block takes what is left.
     int32_t b = columns.blocks() - 1;
@@ -126,44 +197,44 @@ void forwardReal(const FourierPlan& plan, const Channel& c, uint8_t* buffer) {
                kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
     };
     while (b > 0 && isShifted()) --b;
-    if (b == 0) {
-        if (columns.hasLastColumn())
-            kernels::floatsToColumn(w.saved, columns.column(std::min(plan.size.width, 2 * kColumns) - 1));
-        return;
-    }
+    if (b == 0) return storeSaved(std::min(plan.size.width, 2 * kColumns) - 1);
     // Else from the left: packed pairs begin an element before those between, which have been read by then. The last
     // column waits until the last block has been read.
     for (b = 1; b < columns.blocks(); ++b)
         kernels::transformColumns(table, columns.between(b), columns.packed(b), plan.columnForward, Parts::inOrder,
                                   w.lines, w.work);
-    if (columns.hasLastColumn()) kernels::floatsToColumn(w.saved, columns.column(plan.size.width - 1));
+    storeSaved(plan.size.width - 1);
 }
 
-void inverseReal(const FourierPlan& plan, const Channel& c, uint8_t* buffer) {
+void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer) {
     const Work w(plan, buffer);
-    const SpectrumColumns from(plan, c.src, c.srcStep, c.channels), to(plan, c.dst, c.dstStep, c.channels);
+    const SpectrumColumns from(plan, images.src, images.srcStep, images);
+    const SpectrumColumns to(plan, images.dst, images.dstStep, images);
     const kernels::FourierTable* const table = plan.columns();
     // From the right, and the last column before all: what is written is where the source's pairs have been read.
-    const float* const saved = from.hasLastColumn() ? w.saved : nullptr;
-    if (from.hasLastColumn()) kernels::columnToFloats(from.column(plan.size.width - 1), w.saved);
+    const auto last = [&](int c) { return from.hasLastColumn() ? savedOf(plan, w, c) : nullptr; };
+    if (from.hasLastColumn())
+        from.forEachChannel([&](int c) { kernels::columnToFloats(from.column(plan.size.width - 1, c), last(c)); });
     for (int32_t b = from.blocks() - 1; b > 0; --b)
         kernels::transformColumns(table, from.packed(b), to.between(b), plan.columnInverse, Parts::exchanged, w.lines,
                                   w.work);
     kernels::columnsToLines(from.packed(0), plan.columnInverse, Parts::exchanged, w.lines);
-    kernels::joinRealColumns(from.column(0), saved, plan.columnInverse, w.lines);
+    from.forEachChannel(
+        [&](int c) { kernels::joinRealColumns(from.column(0, c), last(c), plan.columnInverse, w.lines + c); });
     kernels::transformLines(table, w.lines, w.work);
     kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(0));
-    if (!to.hasLastColumn()) kernels::storeRealColumn(w.lines, table->positions(), to.column(0));
-    inverseRealRows(plan, c, w);
+    if (!to.hasLastColumn())
+        to.forEachChannel([&](int c) { kernels::storeRealColumn(w.lines + c, table->positions(), to.column(0, c)); });
+    inverseRealRows(plan, images, w);
 }
 
-void transformComplex(const FourierPlan& plan, const Channel& c, uint8_t* buffer, Direction direction) {
+void transformComplex(const FourierPlan& plan, const Images& images, uint8_t* buffer, Direction direction) {
     const Work w(plan, buffer);
     const bool isForward = direction == Direction::forward;
     const Parts parts = isForward ? Parts::inOrder : Parts::exchanged;
     const kernels::FourierTable* const ofRows = plan.rows();
     const ptrdiff_t elements = ptrdiff_t{plan.size.width} * 2;
-    forEachRows(plan, c, kColumns, [&](const LineRows& src, const LineRows& dst) {
+    forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
         kernels::rowsToLines(src, elements, isForward ? plan.rowForward : plan.rowInverse, parts, w.lines);
         kernels::transformLines(ofRows, w.lines, w.work);
         kernels::linesToRows(w.lines, ofRows->positions(), elements, parts, dst);
@@ -171,7 +242,7 @@ void transformComplex(const FourierPlan& plan, const Channel& c, uint8_t* buffer
     const kernels::FourierTable* const ofColumns = plan.columns();
     const float scale = isForward ? plan.columnForward : plan.columnInverse;
     for (int32_t x = 0; x < plan.size.width; x += kColumns) {
-        const LineColumns columns{rowsOf(c.dst, c.dstStep, 1, 0, plan.size.height), ptrdiff_t{x} * 2, 0,
+        const LineColumns columns{rowsOf(images.dst, images.dstStep, images, 0, plan.size.height), ptrdiff_t{x} * 2, 0,
                                   std::min(kColumns, plan.size.width - x)};
         kernels::transformColumns(ofColumns, columns, columns, scale, parts, w.lines, w.work);
     }

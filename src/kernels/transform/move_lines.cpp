@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "move_lines.h"
 
+#include "channel_lanes.h"
 #include "turned_rows.h"
 
 namespace qori::kernels {
@@ -24,32 +25,27 @@ QORI_INLINE void turn(Vec<float> (&v)[kRows]) {
     }
 }
 
-/// Indices of eight elements of a channel.
-QORI_INLINE __m256i indices(int apart) {
-    return _mm256_mullo_epi32(_mm256_setr_epi32(0, 1, 2, 3, 4, 5, 6, 7), _mm256_set1_epi32(apart));
-}
-
-/// The first n of eight elements `apart` floats from each other, zeros behind them.
-QORI_INLINE Vec<float> loadApart(const float* p, int apart, ptrdiff_t n) {
-    if (apart == 1) return loadUpTo(p, n);
-    const __m256 mask = _mm256_castsi256_ps(firstLanes<float>(n < kRows ? n : kRows).v);
-    return {_mm256_mask_i32gather_ps(_mm256_setzero_ps(), p, indices(apart), mask, 4)};
-}
-
-QORI_INLINE void storeApart(float* p, int apart, Vec<float> a, ptrdiff_t n) {
-    if (apart == 1) return storeUpTo(p, a, n);
-    float elements[kRows];
-    store(elements, a);
-    for (ptrdiff_t i = 0; i < n && i < kRows; ++i) p[i * apart] = elements[i];
+/// Elements of all channels in their order: place(e) is where element e of the first channel belongs, other channels
+/// are `apart` floats behind the one before. Called once for each.
+template <class Place>
+QORI_INLINE auto ofChannels(int channels, ptrdiff_t apart, Place place) {
+    return [=, channel = 0, element = ptrdiff_t{0}](ptrdiff_t) mutable {
+        const auto at = place(element) + channel * apart;
+        if (++channel == channels) {
+            channel = 0;
+            ++element;
+        }
+        return at;
+    };
 }
 
 /// Where rows end, the last one stands in for those that are not there: their lanes hold no junk.
 template <class Place>
-QORI_INLINE void turnRowsIn(const LineRows& rows, ptrdiff_t elements, float scale, Place place) {
+QORI_INLINE void turnElementsIn(const LineRows& rows, ptrdiff_t elements, float scale, Place place) {
     const Vec<float> factor = splat(scale);
     ptrdiff_t e = 0;
     const line::EightRows eight(rows);
-    if (line::isPlain(rows))
+    if (rows.count >= kRows)
         for (; e + 4 <= elements; e += 4) {
             Vec<float> v[4];
             line::loadTurned(eight, e, v);
@@ -58,16 +54,19 @@ QORI_INLINE void turnRowsIn(const LineRows& rows, ptrdiff_t elements, float scal
     for (; e < elements; e += kRows) {
         Vec<float> v[kRows];
         for (int y = 0; y < kRows; ++y)
-            v[y] = loadApart(rows.row(y < rows.count ? y : rows.count - 1) + e * rows.channels, rows.channels,
-                             elements - e) *
-                   factor;
+            v[y] = loadUpTo(rows.row(y < rows.count ? y : rows.count - 1) + e, elements - e) * factor;
         turn(v);
         for (int i = 0; i < kRows && e + i < elements; ++i) store(place(e + i), v[i]);
     }
 }
 
+/// Of 4 channels the first three.
+QORI_INLINE __m256i withoutFourth(__m256i lanes) {
+    return _mm256_and_si256(lanes, _mm256_setr_epi32(-1, -1, -1, 0, -1, -1, -1, 0));
+}
+
 template <class Place>
-QORI_INLINE void turnRowsOut(const LineRows& rows, ptrdiff_t elements, Place place) {
+QORI_INLINE void turnElementsOut(const LineRows& rows, ptrdiff_t elements, Place place) {
     ptrdiff_t e = 0;
     const line::EightRows eight(rows);
     if (line::isPlain(rows))
@@ -80,9 +79,24 @@ QORI_INLINE void turnRowsOut(const LineRows& rows, ptrdiff_t elements, Place pla
         Vec<float> v[kRows];
         for (int i = 0; i < kRows; ++i) v[i] = e + i < elements ? load(place(e + i)) : zero<float>();
         turn(v);
-        for (int y = 0; y < kRows && y < rows.count; ++y)
-            storeApart(rows.row(y) + e * rows.channels, rows.channels, v[y], elements - e);
+        const ptrdiff_t left = elements - e;
+        const __m256i there = firstLanes<float>(left < kRows ? left : kRows).v;
+        const __m256i lanes = rows.channels == rows.processed ? there : withoutFourth(there);
+        for (int y = 0; y < kRows && y < rows.count; ++y) _mm256_maskstore_ps(rows.row(y) + e, lanes, v[y].v);
     }
+}
+
+/// Of n elements of each channel; of a channel's lines there are `floats`.
+template <class Place>
+QORI_INLINE void turnRowsIn(const LineRows& rows, ptrdiff_t n, float scale, ptrdiff_t floats, Place place) {
+    if (rows.channels == 1) return turnElementsIn(rows, n, scale, place);
+    turnElementsIn(rows, n * rows.channels, scale, ofChannels(rows.channels, floats, place));
+}
+
+template <class Place>
+QORI_INLINE void turnRowsOut(const LineRows& rows, ptrdiff_t n, ptrdiff_t floats, Place place) {
+    if (rows.channels == 1) return turnElementsOut(rows, n, place);
+    turnElementsOut(rows, n * rows.channels, ofChannels(rows.channels, floats, place));
 }
 
 /// The eight rows of each part of a pair; the second may have none, and repeats the first's last then.
@@ -146,7 +160,7 @@ struct LaneMasks {
 
 template <class Each>
 QORI_INLINE void forEachRowOf(const LineColumns& columns, Each each) {
-    uint8_t* p = reinterpret_cast<uint8_t*>(columns.rows.row(0) + columns.element * columns.rows.channels);
+    uint8_t* p = reinterpret_cast<uint8_t*>(columns.rows.row(0) + columns.element);
     for (ptrdiff_t y = 0; y < columns.rows.count; ++y, p += columns.rows.step) each(reinterpret_cast<float*>(p), y);
 }
 
@@ -154,22 +168,24 @@ QORI_INLINE void forEachRowOf(const LineColumns& columns, Each each) {
 
 void rowsToLines(const LineRows& rows, ptrdiff_t elements, float scale, Parts parts, float* lines) {
     if (parts == Parts::inOrder)
-        turnRowsIn(rows, elements, scale, [=](ptrdiff_t e) { return lines + e * kRows; });
+        turnRowsIn(rows, elements, scale, elements * kRows, [=](ptrdiff_t e) { return lines + e * kRows; });
     else
-        turnRowsIn(rows, elements, scale, [=](ptrdiff_t e) { return lines + (e ^ 1) * kRows; });
+        turnRowsIn(rows, elements, scale, elements * kRows, [=](ptrdiff_t e) { return lines + (e ^ 1) * kRows; });
 }
 
 void linesToRows(const float* lines, const int32_t* positions, ptrdiff_t elements, Parts parts, const LineRows& rows) {
     const int first = offsetOf(parts, 0);
-    turnRowsOut(rows, elements, [=](ptrdiff_t e) {
+    turnRowsOut(rows, elements, elements * kRows, [=](ptrdiff_t e) {
         return lines + ptrdiff_t{positions[e / 2]} * kLineFloats + (e % 2 == 0 ? first : kLineColumns - first);
     });
 }
 
-void rowsToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines) {
+void rowsToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines) {
     const RowPair pair(rows);
-    turnRowsIn(pair.first, n, scale, [=](ptrdiff_t e) { return lines + e * kLineFloats; });
-    turnRowsIn(pair.secondOrLast(), n, scale, [=](ptrdiff_t e) { return lines + e * kLineFloats + kLineColumns; });
+    const auto to = [=](int offset) { return [=](ptrdiff_t e) { return lines + e * kLineFloats + offset; }; };
+    turnRowsIn(pair.first, n, scale, n * kLineFloats, to(0));
+    if (!areAlone) return turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(kLineColumns));
+    for (ptrdiff_t e = 0; e < n * rows.channels; ++e) store(to(kLineColumns)(e), zero<float>());
 }
 
 void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
@@ -180,8 +196,8 @@ void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, c
             return lines + ptrdiff_t{positions[place.line]} * kLineFloats + place.part * kLineColumns;
         };
     };
-    turnRowsOut(pair.first, n, from(false));
-    if (pair.second.count > 0) turnRowsOut(pair.second, n, from(true));
+    turnRowsOut(pair.first, n, n * kLineFloats, from(false));
+    if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(true));
 }
 
 void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines) {
@@ -192,8 +208,8 @@ void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines
             return lines + ptrdiff_t{place.line} * kLineFloats + place.part * kLineColumns;
         };
     };
-    turnRowsIn(pair.first, n, scale, to(false));
-    turnRowsIn(pair.secondOrLast(), n, scale, to(true));
+    turnRowsIn(pair.first, n, scale, n * kLineFloats, to(false));
+    turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
 }
 
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
@@ -201,8 +217,8 @@ void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, cons
     const auto from = [=](int offset) {
         return [=](ptrdiff_t e) { return lines + ptrdiff_t{positions[e]} * kLineFloats + offset; };
     };
-    turnRowsOut(pair.first, n, from(kLineColumns));
-    if (pair.second.count > 0) turnRowsOut(pair.second, n, from(0));
+    turnRowsOut(pair.first, n, n * kLineFloats, from(kLineColumns));
+    if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(0));
 }
 
 void columnsToLines(const LineColumns& columns, float scale, Parts parts, float* lines) {
@@ -220,13 +236,10 @@ void columnsToLines(const LineColumns& columns, float scale, Parts parts, float*
             line::storeLine(lines + y * kLineFloats, scaled(line::separate(a, b), factor, parts));
         });
     }
-    const __m256i places = indices(2 * channels);
-    const __m256 mask =
-        _mm256_castsi256_ps(_mm256_andnot_si256(firstLanes<float>(columns.begin).v, firstLanes<float>(columns.end).v));
-    forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
-        const Vec<float> re{_mm256_mask_i32gather_ps(_mm256_setzero_ps(), p, places, mask, 4)};
-        const Vec<float> im{_mm256_mask_i32gather_ps(_mm256_setzero_ps(), p + channels, places, mask, 4)};
-        line::storeLine(lines + y * kLineFloats, scaled({re, im}, factor, parts));
+    line::withChannelLanes(columns, [&](auto lanes) {
+        forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
+            line::storeLine(lines + y * kLineFloats, scaled(lanes.read(p), factor, parts));
+        });
     });
 }
 
@@ -251,14 +264,8 @@ void linesToColumns(const float* lines, const int32_t* positions, Parts parts, c
             _mm256_maskstore_ps(p + kRows, masks.high, b.v);
         });
     }
-    forEachRowOf(columns, [=](float* p, ptrdiff_t y) {
-        float elements[kLineFloats];
-        line::storeLine(elements, lineOf(y));
-        for (int lane = columns.begin; lane < columns.end; ++lane) {
-            p[2 * lane * channels] = elements[lane];
-            p[(2 * lane + 1) * channels] = elements[lane + kLineColumns];
-        }
-    });
+    line::withChannelLanes(
+        columns, [&](auto lanes) { forEachRowOf(columns, [=](float* p, ptrdiff_t y) { lanes.write(p, lineOf(y)); }); });
 }
 
 void splitRealColumns(const float* lines, const int32_t* positions, const LineRows& column, float* second) {
@@ -266,7 +273,7 @@ void splitRealColumns(const float* lines, const int32_t* positions, const LineRo
     const auto at = [=](int32_t k) { return lines + ptrdiff_t{positions[k]} * kLineFloats; };
     const auto put = [&](int32_t row, float first, float other) {
         *column.row(row) = first;
-        if (second != nullptr) second[row] = other;
+        second[row] = other;
     };
     put(0, at(0)[0], at(0)[kLineColumns]);
     for (int32_t k = 1; k < n - k; ++k) {
@@ -276,6 +283,17 @@ void splitRealColumns(const float* lines, const int32_t* positions, const LineRo
         put(2 * k, (im - mirroredIm) * 0.5f, (mirroredRe - re) * 0.5f);
     }
     if (n % 2 == 0) put(n - 1, at(n / 2)[0], at(n / 2)[kLineColumns]);
+}
+
+void packRealColumn(const float* lines, const int32_t* positions, const LineRows& column) {
+    const int32_t n = column.count;
+    const auto at = [=](int32_t k) { return lines + ptrdiff_t{positions[k]} * kLineFloats; };
+    *column.row(0) = at(0)[0];
+    for (int32_t k = 1; k < n - k; ++k) {
+        *column.row(2 * k - 1) = at(k)[0];
+        *column.row(2 * k) = at(k)[kLineColumns];
+    }
+    if (n % 2 == 0) *column.row(n - 1) = at(n / 2)[0];
 }
 
 void joinRealColumns(const LineRows& column, const float* second, float scale, float* lines) {
@@ -305,6 +323,10 @@ void joinRealColumn(const LineRows& column, float scale, float* lines) {
 void storeRealColumn(const float* lines, const int32_t* positions, const LineRows& column) {
     for (ptrdiff_t y = 0; y < column.count; ++y)
         *column.row(y) = lines[ptrdiff_t{positions[y]} * kLineFloats + kLineColumns];
+}
+
+void copyImaginary(const float* lines, const LineRows& column) {
+    for (ptrdiff_t y = 0; y < column.count; ++y) *column.row(y) = lines[y * kLineFloats + kLineColumns];
 }
 
 void columnToFloats(const LineRows& column, float* out) {

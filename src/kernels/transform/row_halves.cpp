@@ -24,13 +24,14 @@ QORI_INLINE TwoLines loadTwo(line::EightRows rows, ptrdiff_t k, Vec<float> scale
 }
 
 /// Two halves of the points and whole rows let frequencies and mirrors go by two.
-bool goByTwo(const LineRows& rows, ptrdiff_t n) { return line::isPlain(rows) && n % 8 == 0; }
+bool goByTwo(const LineRows& rows, ptrdiff_t n) { return line::isPlain(rows) && rows.channels == 1 && n % 8 == 0; }
 
 }  // namespace
 
 void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float* roots, const LineRows& rows) {
     if (!goByTwo(rows, n)) {
-        splitHalves(lines, n, positions, roots);
+        const ptrdiff_t apart = ptrdiff_t{n} * kLineColumns;
+        for (int c = 0; c < rows.processed; ++c) splitHalves(lines + c * apart, n, positions, roots);
         return linesToRows(lines, positions, n, Parts::inOrder, rows);
     }
     const line::EightRows out(rows);
@@ -52,8 +53,10 @@ void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float
 
 void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roots, float* lines) {
     if (!goByTwo(rows, n)) {
+        const ptrdiff_t apart = ptrdiff_t{n} * kLineColumns;
         rowsToLines(rows, n, scale, Parts::inOrder, lines);
-        return joinHalves(lines, n, roots);
+        for (int c = 0; c < rows.processed; ++c) joinHalves(lines + c * apart, n, roots);
+        return;
     }
     const line::EightRows in(rows);
     const Vec<float> factor = splat(scale);

@@ -40,7 +40,7 @@ QORI_INLINE void storeTurned(EightRows rows, ptrdiff_t e, Vec<float> (&v)[4]) {
     }
 }
 
-/// Whether eight rows lie there whose elements are neighbours.
-inline bool isPlain(const LineRows& rows) { return rows.count >= kLineColumns && rows.channels == 1; }
+/// Whether eight rows lie there of which everything is read and written.
+inline bool isPlain(const LineRows& rows) { return rows.count >= kLineColumns && rows.channels == rows.processed; }
 
 }  // namespace qori::kernels::line
