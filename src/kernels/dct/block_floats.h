@@ -115,14 +115,45 @@ QORI_INLINE void forwardFloats(const float* src, float* dst) {
     storeFloatRows(x, dst);
 }
 
+/// What pairs of a row's coefficients become: for 2 k and 2 k + 1 their cosines at pixels 0 to 3 in turn, halved, the
+/// first one's by cos(pi / 4), and times what the pass down columns takes for its weight: weightOf(v) / 2.
+struct PairTable {
+    alignas(kVectorBytes) float at[4][4][8];  ///< Of v from 0 to 3, then k.
+
+    constexpr PairTable() : at() {
+        for (int v = 0; v < 4; ++v)
+            for (int k = 0; k < 4; ++k)
+                for (int i = 0; i < 8; ++i) {
+                    const int u = 2 * k + i % 2;
+                    const double cosine = cosineOf((2 * (i / 2) + 1) * u);
+                    at[v][k][i] = static_cast<float>((u == 0 ? kCosine[4] : cosine) * weightOf(v) / 4);
+                }
+    }
+};
+inline constexpr PairTable kPairs;
+
+/// Row v of coefficients to sums of the even ones and of the odd ones in turn, at pixels 0 to 3. Pairs come from memory
+/// to all lanes, so that nothing is turned.
+QORI_INLINE __m256 inverseFloatRow(const float* row, const float (&pairs)[4][8]) {
+    __m256 sum = _mm256_setzero_ps();
+    for (int k = 0; k < 4; ++k) {
+        double coefficients;
+        __builtin_memcpy(&coefficients, row + 2 * k, sizeof(coefficients));
+        const __m256 pair = _mm256_castpd_ps(_mm256_set1_pd(coefficients));
+        const __m256 cosines = _mm256_load_ps(pairs[k]);
+        sum = k == 0 ? _mm256_mul_ps(pair, cosines) : _mm256_fmadd_ps(pair, cosines, sum);
+    }
+    return sum;
+}
+
 /// dst may be src.
 QORI_INLINE void inverseFloats(const float* src, float* dst) {
     FloatRows x;
-    loadTurned(src, x);
-    scaleRows(x);  // the table is symmetric
+    for (int v = 0; v < 8; ++v) x[v] = inverseFloatRow(src + 8 * v, kPairs.at[v < 4 ? v : (8 - v) % 4]);
     inverseFloatColumns(x);
-    turnRows(x);
-    inverseFloatColumns(x);
+    // Differences, of pixels 7 to 4, then sums.
+    const __m256i order = _mm256_setr_epi32(1, 3, 5, 7, 6, 4, 2, 0);
+    for (__m256& row : x) row = _mm256_permutevar8x32_ps(_mm256_addsub_ps(row, _mm256_permute_ps(row, 0xB1)), order);
     storeFloatRows(x, dst);
 }
 
