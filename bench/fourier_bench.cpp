@@ -40,8 +40,18 @@ std::function<void()> peerOf(Kind kind, Size size) {
 }
 #endif
 
+/// The real transform of so many channels.
+auto realTransform(Kind kind, int channels) {
+    const bool isForward = kind == Kind::forward;
+    switch (channels) {
+        case 3: return isForward ? qoriDFTFwd_RToPack_32f_C3R : qoriDFTInv_PackToR_32f_C3R;
+        case 4: return isForward ? qoriDFTFwd_RToPack_32f_C4R : qoriDFTInv_PackToR_32f_C4R;
+        default: return isForward ? qoriDFTFwd_RToPack_32f_C1R : qoriDFTInv_PackToR_32f_C1R;
+    }
+}
+
 /// A plan, its buffer and the call.
-std::function<void()> jobOf(Kind kind, Size size) {
+std::function<void()> jobOf(Kind kind, Size size, int channels = 1) {
     int32_t planBytes = 0, initBytes = 0, bufferBytes = 0;
     const auto sizes = kind == Kind::complex ? qoriDFTGetSize_C_32fc : qoriDFTGetSize_R_32f;
     const auto prepare = kind == Kind::complex ? qoriDFTInit_C_32fc : qoriDFTInit_R_32f;
@@ -49,7 +59,7 @@ std::function<void()> jobOf(Kind kind, Size size) {
     const Block block = allocate(static_cast<size_t>(planBytes)), buffer = allocate(static_cast<size_t>(bufferBytes));
     const Block init = allocate(static_cast<size_t>(initBytes) + 1);
     must(prepare(size.roi(), fftNoDiv, hintFast, reinterpret_cast<QorFft2DPlan*>(block.get()), init.get()));
-    const int parts = kind == Kind::complex ? 2 : 1;
+    const int parts = kind == Kind::complex ? 2 : channels;
     const Image<float> src(size, parts), dst(size, parts);
     return [=] {
         const auto* const plan = reinterpret_cast<const QorFft2DPlan*>(block.get());
@@ -58,8 +68,7 @@ std::function<void()> jobOf(Kind kind, Size size) {
                                           reinterpret_cast<QorComplex32f*>(dst.data()), dst.step(), plan,
                                           buffer.get()));
         else
-            must((kind == Kind::forward ? qoriDFTFwd_RToPack_32f_C1R : qoriDFTInv_PackToR_32f_C1R)(
-                src.data(), src.step(), dst.data(), dst.step(), plan, buffer.get()));
+            must(realTransform(kind, channels)(src.data(), src.step(), dst.data(), dst.step(), plan, buffer.get()));
     };
 }
 
@@ -80,6 +89,24 @@ Row row(Kind kind, Size size, double best = 0) {
             .best = best};
 }
 
+/// Several channels beside as many planes of one.
+Row channelRow(Kind kind, Size size, int channels) {
+    const auto make = [=](Size) {
+        std::vector<std::function<void()>> planes;
+        for (int c = 0; c < channels; ++c) planes.push_back(jobOf(kind, size));
+        const auto all = [=] {
+            for (const auto& plane : planes) plane();
+        };
+        return Contenders{jobOf(kind, size, channels), {}, all};
+    };
+    const std::string direction = kind == Kind::forward ? " real forward" : " real inverse";
+    return {.operation = "FFT 2D 32f C" + std::to_string(channels) + direction,
+            .bytesPerPixel = 8.0 * channels,
+            .sizes = {size},
+            .make = make,
+            .peerName = "planes"};
+}
+
 const Rows forward{{row(Kind::forward, {64, 64}), row(Kind::forward, {128, 128}), row(Kind::forward, {256, 256}, 802),
                     row(Kind::forward, {512, 512}, 693), row(Kind::forward, {1024, 1024}, 474),
                     row(Kind::forward, {2048, 2048}, 359), row(Kind::forward, {4096, 4096}, 201)}};
@@ -90,6 +117,9 @@ const Rows complex{{row(Kind::complex, {64, 64}), row(Kind::complex, {256, 256},
                     row(Kind::complex, {2048, 2048}, 192), row(Kind::complex, {4096, 4096}, 107)}};
 const Rows anySize{{row(Kind::forward, {640, 360}), row(Kind::forward, {1920, 1080}), row(Kind::forward, {1000, 1000}),
                     row(Kind::forward, {509, 509}), row(Kind::complex, {1000, 1000}), row(Kind::complex, {509, 509})}};
+const Rows severalChannels{{channelRow(Kind::forward, {64, 64}, 3), channelRow(Kind::forward, {512, 512}, 3),
+                            channelRow(Kind::inverse, {512, 512}, 3), channelRow(Kind::forward, {512, 512}, 4),
+                            channelRow(Kind::inverse, {512, 512}, 4), channelRow(Kind::forward, {1000, 1000}, 3)}};
 
 /// Squares whose work is n log n.
 std::vector<Step> squares(const std::vector<int>& sides) {
@@ -106,10 +136,10 @@ const Ladders ladders{{
     {.operation = "DFT 32f forward, sides by factors",
      .make =
          [] {
-             return squares({64,  67,  70,  81,   83,   96,   101,  107,  113,  121,  127, 128, 131, 144,
-                             169, 180, 191, 193,  199,  200,  211,  227,  243,  251,  256, 257, 289, 300,
-                             331, 343, 361, 384,  409,  500,  509,  512,  521,  529,  600, 625, 720, 841,
-                             900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
+             return squares({64,  67,  70,  81,  83,   96,   101,  107,  113,  121,  127,  128, 131, 144, 167,
+                             169, 179, 180, 191, 193,  199,  200,  211,  227,  243,  251,  256, 257, 263, 289,
+                             293, 300, 331, 343, 361,  384,  409,  500,  509,  512,  521,  529, 600, 625, 720,
+                             841, 900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
          },
      .reason = "primes are convolved, and with a chirp in more than twice their length where p - 1 has large factors"},
 }};

@@ -68,6 +68,9 @@ public:
     /// Where the only block has lanes left for one more column of each channel, the first of them, else 0.
     int freeLane() const { return all() + rows_.channels <= kColumns ? kColumns - rows_.channels : 0; }
 
+    /// Whether the two real columns of a channel share a lane.
+    bool areJoined() const { return hasLastColumn() && freeLane() == 0; }
+
 private:
     int32_t all() const { return (width_ / 2 + width_ % 2) * rows_.channels; }
     LineColumns columns(int32_t b, ptrdiff_t first, int begin) const {
@@ -181,7 +184,7 @@ void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     const SpectrumColumns columns(plan, images.dst, images.dstStep, images);
     const kernels::FourierTable* const table = plan.columns();
     kernels::columnsToLines(columns.between(0), plan.columnForward, Parts::inOrder, w.lines);
-    if (columns.hasLastColumn() && columns.freeLane() == 0)
+    if (columns.areJoined())
         transformJoined(plan, columns, w);
     else
         transformApart(plan, columns, w);
