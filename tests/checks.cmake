@@ -81,12 +81,8 @@ if(NOT WIN32)
         string(APPEND together "#include \"${header}\"\n")
     endforeach()
     file(CONFIGURE OUTPUT ${headers_folder}/together.cpp CONTENT "${together}")
-    add_library(headers_alone OBJECT ${header_sources} ${headers_folder}/together.cpp)
-    target_include_directories(headers_alone PRIVATE ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR}/core
-        ${PROJECT_SOURCE_DIR}/src)
-    target_link_libraries(headers_alone PRIVATE qori_warnings qori_target qori_freestanding)
-    # Nothing of the objects is used.
-    target_compile_options(headers_alone PRIVATE -O0 -Wno-unused-function)
+    qori_compiles(headers_alone FOLDERS ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR}/core ${PROJECT_SOURCE_DIR}/src
+        OPTIONS -fno-exceptions -fno-rtti SOURCES ${header_sources} ${headers_folder}/together.cpp)
 endif()
 
 # The demo ends with a sheet, however small the picture, or with the reason why not.

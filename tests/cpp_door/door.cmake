@@ -29,7 +29,6 @@ endif()
 if(WIN32)
     return()
 endif()
-find_program(QORI_CLANG NAMES clang++-14 clang++)
 set(door_compilers ${CMAKE_CXX_COMPILER} $<$<BOOL:${QORI_CLANG}>:${QORI_CLANG}>)
 
 # Every member, over a library that only remembers.
