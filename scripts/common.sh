@@ -8,11 +8,13 @@ configure_options=()
 configure_and_build() {
     local -r preset=$1 log=build/$1.log
     mkdir -p build
+    local -r began=$SECONDS
     echo "${0##*/}: building $preset"
     if {
         cmake --preset "$preset" -DQORI_WERROR=ON "${configure_options[@]}" &&
             cmake --build --preset "$preset" -j"$(nproc)" ${2:+--target "$2"}
     } >"$log" 2>&1; then
+        echo "${0##*/}: built $preset in $((SECONDS - began)) s"
         return
     fi
     { grep -m 20 -E 'error|Error|FAILED' "$log" || tail -n 20 "$log"; } >&2
