@@ -2,11 +2,16 @@
 set(python ${Python3_EXECUTABLE})
 set(checks ${CMAKE_CURRENT_SOURCE_DIR}/checks)
 
-add_test(NAME apigen COMMAND ${python} ${checks}/apigen_test.py)
-add_test(NAME interface COMMAND ${python} ${checks}/interface_test.py)
-add_test(NAME docs_generator COMMAND ${python} ${checks}/docs_test.py)
-add_test(NAME layers COMMAND ${python} ${checks}/layers.py ${PROJECT_SOURCE_DIR})
-add_test(NAME header_is_current COMMAND ${python} ${checks}/header_is_current.py ${PROJECT_SOURCE_DIR})
+# What reads the repository's files finds the same for every system.
+if(NOT WIN32)
+    add_test(NAME apigen COMMAND ${python} ${checks}/apigen_test.py)
+    add_test(NAME interface COMMAND ${python} ${checks}/interface_test.py)
+    add_test(NAME docs_generator COMMAND ${python} ${checks}/docs_test.py)
+    add_test(NAME layers COMMAND ${python} ${checks}/layers.py ${PROJECT_SOURCE_DIR})
+    add_test(NAME header_is_current COMMAND ${python} ${checks}/header_is_current.py ${PROJECT_SOURCE_DIR})
+    add_test(NAME readme_is_current COMMAND ${python} ${checks}/readme_is_current.py ${PROJECT_SOURCE_DIR}/README.md
+        ${PROJECT_SOURCE_DIR}/examples/python/first_steps.py ${PROJECT_SOURCE_DIR}/examples/cpp/first.cpp)
+endif()
 if(WIN32)
     add_test(NAME dll_tables COMMAND ${python} ${checks}/dll_tables.py ${CMAKE_OBJDUMP} $<TARGET_FILE:qorik5>
         ${PROJECT_BINARY_DIR}/generated/exports.txt)
@@ -64,9 +69,6 @@ target_link_libraries(readme_example PRIVATE qorik5_link)
 set_target_properties(readme_example PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
 add_test(NAME readme_example COMMAND readme_example)
 set_tests_properties(readme_example PROPERTIES PASS_REGULAR_EXPRESSION "green of pixel \\(9, 9\\): 128")
-
-add_test(NAME readme_is_current COMMAND ${python} ${checks}/readme_is_current.py ${readme}
-    ${PROJECT_SOURCE_DIR}/examples/python/first_steps.py ${PROJECT_SOURCE_DIR}/examples/cpp/first.cpp)
 
 # Every header of the library compiles alone, and all of them in one source: names that mean two things show there.
 if(NOT WIN32)
