@@ -50,15 +50,19 @@ QorResult callBinary(Function function, const TestImage& a, const TestImage& b, 
 
 /// Every shape, with the scale factors in turn where the export has one. Exports that check their steps see no negative
 /// ones.
-template <class T, bool anyStep, class Check>
-void forShapesAndScales(Check check) {
+inline void forShapesAndScales(bool scaled, bool anyStep, FunctionRef<void(const Shape&, int32_t)> check) {
     size_t turn = 0;
     forShapes(smallShapes(), [&](Shape shape) {
         shape.flipped = shape.flipped && anyStep;
-        const int32_t scale = reference::isFloat<T> ? 0 : scaleFactors()[turn++ % scaleFactors().size()];
+        const int32_t scale = scaled ? scaleFactors()[turn++ % scaleFactors().size()] : 0;
         SCOPED_TRACE("scale factor " + std::to_string(scale));
         check(shape, scale);
     });
+}
+
+template <class T, bool anyStep>
+void forShapesAndScales(FunctionRef<void(const Shape&, int32_t)> check) {
+    forShapesAndScales(!reference::isFloat<T>, anyStep, check);
 }
 
 /// Calls f with the scale factor where the element type has one.
@@ -70,7 +74,20 @@ auto withScale(int32_t scale, F f) {
         return f(scale);
 }
 
-/// Which faults a two-image export reports, and which of two it reports first.
+/// Which faults a two-image export reports, and which of two it reports first. statusOf(null, step, roi, which) calls
+/// it with image `which` faulty.
+inline void checkStatuses(const TestImage& d, Kind kind, bool checksSteps, bool stepsFirst,
+                          FunctionRef<QorResult(bool, int, QorImageSize, int)> statusOf) {
+    for (int which : kind == Kind::IR ? std::vector<int>{0, 2} : std::vector<int>{0, 1, 2}) {
+        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, d, statusOf(true, 0, {0, 0}, which));
+        for (QorImageSize bad : {QorImageSize{0, 2}, QorImageSize{4, 0}, QorImageSize{INT32_MIN, -1}})
+            QORI_EXPECT_STATUS(stepsFirst ? QOR_ERR_STEP : QOR_ERR_SIZE, d, statusOf(false, 0, bad, which));
+        if (!checksSteps) continue;
+        for (int bad : {0, -32, INT32_MIN}) QORI_EXPECT_STATUS(QOR_ERR_STEP, d, statusOf(false, bad, {1, 1}, which));
+    }
+    QORI_EXPECT_STATUS(QOR_ERR_SIZE, d, statusOf(false, 0, {0, 1}, 3));
+}
+
 template <class T, Kind kind, bool checksSteps, bool stepsFirst, class Function, class... Parameters>
 void checkStatuses(Function function, Parameters... parameters) {
     const Shape shape{.width = 4, .height = 2};
@@ -84,14 +101,7 @@ void checkStatuses(Function function, Parameters... parameters) {
             return call(function, pointer(a, 0), stepOf(a, 0), pointer(b, 1), stepOf(b, 1), pointer(d, 2), stepOf(d, 2),
                         roi, parameters...);
     };
-    for (int which : kind == Kind::IR ? std::vector<int>{0, 2} : std::vector<int>{0, 1, 2}) {
-        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, d, statusOf(true, 0, {0, 0}, which));
-        for (QorImageSize bad : {QorImageSize{0, 2}, QorImageSize{4, 0}, QorImageSize{INT32_MIN, -1}})
-            QORI_EXPECT_STATUS(stepsFirst ? QOR_ERR_STEP : QOR_ERR_SIZE, d, statusOf(false, 0, bad, which));
-        if (!checksSteps) continue;
-        for (int bad : {0, -32, INT32_MIN}) QORI_EXPECT_STATUS(QOR_ERR_STEP, d, statusOf(false, bad, {1, 1}, which));
-    }
-    QORI_EXPECT_STATUS(QOR_ERR_SIZE, d, statusOf(false, 0, {0, 1}, 3));
+    checkStatuses(d, kind, checksSteps, stepsFirst, statusOf);
 }
 
 }  // namespace qori::test

@@ -13,18 +13,26 @@ template <class T>
 constexpr bool anyStep_add = std::is_same_v<T, uint8_t> || std::is_same_v<T, int16_t> || std::is_same_v<T, float>;
 
 /// reference(a, b, scale) gives one element.
-template <class T, Layout layout, Kind kind, bool anyStep, class Function, class Reference>
-void sweep(const char* name, Function function, Reference reference) {
-    forShapesAndScales<T, anyStep>([&](const Shape& shape, int32_t scale) {
-        checkBinary<T, T, layout, kind>(
-            shape,
-            [&](const auto&... images) {
-                const auto scaled = [&](auto... s) { return callBinary<T, kind>(function, images..., s...); };
-                EXPECT_EQ(QOR_OK, withScale<T>(scale, scaled));
-            },
+template <class T>
+__attribute__((noinline)) void sweep(
+    const char* name, Layout layout, Kind kind, bool anyStep,
+    FunctionRef<QorResult(const TestImage&, const TestImage&, const TestImage&, QorImageSize, int32_t)> invoke,
+    FunctionRef<T(T, T, int32_t)> reference) {
+    forShapesAndScales(!reference::isFloat<T>, anyStep, [&](const Shape& shape, int32_t scale) {
+        checkBinary<T, T>(
+            shape, layout, kind, [&](const auto&... images) { EXPECT_EQ(QOR_OK, invoke(images..., scale)); },
             [&](T a, T b, int) { return reference(a, b, scale); }, NearPowers<T>{});
     });
     markSwept(name);
+}
+
+template <class T, Layout layout, Kind kind, bool anyStep, class Function, class Reference>
+void sweep(const char* name, Function function, Reference reference) {
+    const auto invoke = [=](const TestImage& a, const TestImage& b, const TestImage& d, QorImageSize roi,
+                            int32_t scale) {
+        return withScale<T>(scale, [&](auto... s) { return callBinary<T, kind>(function, a, b, d, roi, s...); });
+    };
+    sweep<T>(name, layout, kind, anyStep, invoke, reference);
 }
 
 #define QORI_SCALED_SWEEP(operation)                                                             \

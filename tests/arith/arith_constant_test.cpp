@@ -34,9 +34,12 @@ constexpr bool anyStep_divideConstant = false;
 
 /// reference(value, src, scale) gives one element. `nonZero` constants are divisors; else all channels get one small
 /// value now and then, which opens the shortcuts.
-template <class T, Layout layout, Kind kind, bool anyStep, bool nonZero, class Invoke, class Reference>
-void sweep(const char* name, Invoke invoke, Reference reference) {
-    forShapesAndScales<T, anyStep>([&](const Shape& shape, int32_t scale) {
+template <class T>
+__attribute__((noinline)) void sweep(
+    const char* name, Layout layout, Kind kind, bool anyStep, bool nonZero,
+    FunctionRef<QorResult(const T*, const TestImage&, const TestImage&, QorImageSize, int32_t)> invoke,
+    FunctionRef<T(T, T, int32_t)> reference) {
+    forShapesAndScales(!reference::isFloat<T>, anyStep, [&](const Shape& shape, int32_t scale) {
         T value[4];
         const bool small = random().oneIn(6);
         const int part = random().below(2);
@@ -45,8 +48,8 @@ void sweep(const char* name, Invoke invoke, Reference reference) {
                 v = small ? common : NearPowers<T>{}();
             while (nonZero && reference::isZero(v) && !small);
         if (nonZero && reference::isZero(value[0])) return;
-        checkUnary<T, T, layout, kind>(
-            shape,
+        checkUnary<T, T>(
+            shape, layout, kind,
             [&](const TestImage& src, const TestImage& dst, QorImageSize roi) {
                 EXPECT_EQ(QOR_OK, invoke(value, src, dst, roi, scale));
             },
@@ -56,14 +59,16 @@ void sweep(const char* name, Invoke invoke, Reference reference) {
 }
 
 /// Sweep and statuses of the operation `operation`; `reference_` gets (value, src, scale).
-#define QORI_SCALED_SWEEP(operation, divides, reference_)                                                         \
-    template <class T, Layout layout, Kind kind, class Function>                                                  \
-    void operation(const char* name, Function function) {                                                         \
-        constexpr bool anyStep = anyStep_##operation<T, layout, kind>;                                            \
-        sweep<T, layout, kind, anyStep, divides>(                                                                 \
-            name,                                                                                                 \
-            [=](const T* value, auto&... rest) { return callScaled<T, layout, kind>(function, value, rest...); }, \
-            reference_);                                                                                          \
+#define QORI_SCALED_SWEEP(operation, divides, reference_)                             \
+    template <class T, Layout layout, Kind kind, class Function>                      \
+    void operation(const char* name, Function function) {                             \
+        constexpr bool anyStep = anyStep_##operation<T, layout, kind>;                \
+        sweep<T>(                                                                     \
+            name, layout, kind, anyStep, divides,                                     \
+            [=](const T* value, const auto&... rest) {                                \
+                return callScaled<T, layout, kind>(function, value, rest...);         \
+            },                                                                        \
+            [](T value, T a, int32_t scale) { return reference_(value, a, scale); }); \
     }
 
 template <class T, Layout layout, Kind kind, class Function>
@@ -89,9 +94,9 @@ QORI_SCALED_SWEEP(divideConstant, true, divideByConstant<T>)
 
 template <class T, Layout layout, Kind kind, class Function>
 void multiplyConstantFraction(const char* name, Function function) {
-    sweep<T, layout, kind, false, false>(
-        name,
-        [=](const T* value, auto& src, auto& dst, QorImageSize roi, int32_t) {
+    sweep<T>(
+        name, layout, kind, false, false,
+        [=](const T* value, const auto& src, const auto& dst, QorImageSize roi, int32_t) {
             return callConstant<T, layout, kind>(function, value, src, dst, roi);
         },
         [](T value, T a, int32_t) { return reference::multiplyFractions(value, a); });
@@ -120,13 +125,38 @@ TEST(ConstantArithmetic, AllBytesAndConstantsAtEveryScaleFactor) {
     check(qoriDivC_8u_C1RSfs, divideByConstant<uint8_t>, 1);
 }
 
-/// Faults and their order. `checked` is the status of a step below 1.
+/// How a call with faults is made: which pointers are null, the constants, the steps and the region.
+template <class T>
+using FaultyCall = FunctionRef<QorResult(bool noSrc, bool noDst, const T*, int srcStep, int dstStep, QorImageSize)>;
+
+/// Faults and their order. Without `anyStep` a step below 1 is one.
+template <class T>
+__attribute__((noinline)) void checkStatuses(const TestImage& dst, bool severalChannels, bool readsSource, bool anyStep,
+                                             bool divides, FaultyCall<T> statusOf) {
+    const T one = reference::byPart(T{}, T{}, [](auto x, auto) { return static_cast<decltype(x)>(1); });
+    const T good[4] = {one, one, one, one};
+    const T zero[4] = {one, one, T{}, one}, *anyZero = severalChannels ? zero : zero + 2;
+    const QorImageSize none{0, 1}, ok{1, 1};
+    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(true, true, anyZero, 0, 0, none));
+    if (severalChannels) {
+        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(false, false, nullptr, 32, 32, ok));
+        QORI_EXPECT_STATUS(anyStep ? QOR_ERR_NULL_PTR : QOR_ERR_STEP, dst, statusOf(false, false, nullptr, 0, 0, ok));
+        QORI_EXPECT_STATUS(QOR_ERR_SIZE, dst, statusOf(false, false, nullptr, 0, 0, none));
+    }
+    if (readsSource) QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(true, false, good, 32, 32, ok));
+    for (QorImageSize bad : {none, QorImageSize{4, 0}, QorImageSize{-4, INT32_MIN}})
+        QORI_EXPECT_STATUS(QOR_ERR_SIZE, dst, statusOf(false, false, anyZero, 0, 0, bad));
+    if (!anyStep) {
+        QORI_EXPECT_STATUS(QOR_ERR_STEP, dst, statusOf(false, false, anyZero, 32, 0, ok));
+        if (readsSource) QORI_EXPECT_STATUS(QOR_ERR_STEP, dst, statusOf(false, false, anyZero, -1, 32, ok));
+    }
+    if (divides) QORI_EXPECT_STATUS(QOR_ERR_DIV_BY_ZERO, dst, statusOf(false, false, anyZero, 32, 32, ok));
+}
+
 template <class T, Layout layout, Kind kind, bool anyStep, bool divides, class Function, class... Parameters>
 void checkStatuses(Function function, Parameters... parameters) {
     const Shape shape{.width = 4, .height = 2};
     TestImage src(1, shape, 32), dst(0, shape, 32);
-    const T one = reference::byPart(T{}, T{}, [](auto x, auto) { return static_cast<decltype(x)>(1); });
-    const T good[4] = {one, one, one, one};
     const auto statusOf = [&](bool noSrc, bool noDst, const T* value, int srcStep, int dstStep, QorImageSize roi) {
         const auto constants = [&] {
             if constexpr (layout == Layout::C1)
@@ -140,23 +170,7 @@ void checkStatuses(Function function, Parameters... parameters) {
         else
             return call(function, noSrc ? nullptr : src.data<T>(), srcStep, constants, d, dstStep, roi, parameters...);
     };
-    const T zero[4] = {one, one, T{}, one}, *anyZero = layout == Layout::C1 ? zero + 2 : zero;
-    const QorImageSize none{0, 1}, ok{1, 1};
-    QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(true, true, anyZero, 0, 0, none));
-    if (layout != Layout::C1) {
-        const T* missing = layout == Layout::C1 ? good : nullptr;
-        QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(false, false, missing, 32, 32, ok));
-        QORI_EXPECT_STATUS(anyStep ? QOR_ERR_NULL_PTR : QOR_ERR_STEP, dst, statusOf(false, false, missing, 0, 0, ok));
-        QORI_EXPECT_STATUS(QOR_ERR_SIZE, dst, statusOf(false, false, missing, 0, 0, none));
-    }
-    if (kind == Kind::R) QORI_EXPECT_STATUS(QOR_ERR_NULL_PTR, dst, statusOf(true, false, good, 32, 32, ok));
-    for (QorImageSize bad : {none, QorImageSize{4, 0}, QorImageSize{-4, INT32_MIN}})
-        QORI_EXPECT_STATUS(QOR_ERR_SIZE, dst, statusOf(false, false, anyZero, 0, 0, bad));
-    if (!anyStep) {
-        QORI_EXPECT_STATUS(QOR_ERR_STEP, dst, statusOf(false, false, anyZero, 32, 0, ok));
-        if (kind == Kind::R) QORI_EXPECT_STATUS(QOR_ERR_STEP, dst, statusOf(false, false, anyZero, -1, 32, ok));
-    }
-    if (divides) QORI_EXPECT_STATUS(QOR_ERR_DIV_BY_ZERO, dst, statusOf(false, false, anyZero, 32, 32, ok));
+    checkStatuses<T>(dst, layout != Layout::C1, kind == Kind::R, anyStep, divides, statusOf);
 }
 
 #define QORI_SCALED_STATUS(operation, divides)                                                      \

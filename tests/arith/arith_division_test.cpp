@@ -5,8 +5,9 @@ namespace qori::test {
 namespace {
 
 /// No zeros but in fourth channels, where they must not be noticed when alpha is kept.
-template <class T, Layout layout>
+template <class T>
 struct ZeroInAlphaOnly {
+    Layout layout;
     mutable int drawn = 0;
 
     T operator()() const {
@@ -16,48 +17,52 @@ struct ZeroInAlphaOnly {
     }
 };
 
-/// invoke(a, b, d, roi, scale, mode) calls the export.
-template <class T, Layout layout, class Sweep>
-void sweep(const char* name, Sweep check) {
-    int turn = 0;
-    forShapesAndScales<T, false>([&](const Shape& shape, int32_t scale) {
-        const int mode = turn / 2 % 3;
-        if (turn++ % 2 == 0)
-            check(shape, scale, mode, NearPowers<T>{});
-        else
-            check(shape, scale, mode, ZeroInAlphaOnly<T, layout>{});
-    });
-    markSwept(name);
-}
-
-template <class T, Layout layout, Kind kind, class Invoke, class Draw>
-void checkDivision(const Shape& shape, int32_t scale, int mode, Draw draw, Invoke invoke) {
+template <class T>
+void checkDivision(const Shape& shape, Layout layout, Kind kind, int32_t scale, int mode, FunctionRef<T()> draw,
+                   FunctionRef<QorResult(const TestImage&, const TestImage&, const TestImage&, QorImageSize)> invoke) {
     bool zeroMet = false;
-    checkBinary<T, T, layout, kind>(
-        shape, [&](const auto&... images) { EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(images...)); },
-        [&](T a, T b, int) __attribute__((always_inline)) {
+    checkBinary<T, T>(
+        shape, layout, kind,
+        [&](const auto&... images) { EXPECT_EQ(zeroMet ? QOR_WARN_DIV_BY_ZERO : QOR_OK, invoke(images...)); },
+        [&](T a, T b, int) {
             zeroMet = zeroMet || reference::isZero(a);
             return reference::divide(a, b, scale, mode);
         },
         draw);
 }
 
+/// In the modes of rounding in turn, or to the nearest always; invoke(a, b, d, roi, scale, mode) calls the export.
+template <class T>
+__attribute__((noinline)) void sweep(
+    const char* name, Layout layout, Kind kind, bool anyMode,
+    FunctionRef<QorResult(const TestImage&, const TestImage&, const TestImage&, QorImageSize, int32_t, int)> invoke) {
+    int turn = 0;
+    forShapesAndScales(!reference::isFloat<T>, false, [&](const Shape& shape, int32_t scale) {
+        const int mode = anyMode ? turn / 2 % 3 : int{roundNearestEven};
+        const auto invokeScaled = [&](const auto&... arguments) { return invoke(arguments..., scale, mode); };
+        if (turn++ % 2 == 0)
+            checkDivision<T>(shape, layout, kind, scale, mode, NearPowers<T>{}, invokeScaled);
+        else
+            checkDivision<T>(shape, layout, kind, scale, mode, ZeroInAlphaOnly<T>{layout}, invokeScaled);
+    });
+    markSwept(name);
+}
+
 template <class T, Layout layout, Kind kind, class Function>
 void divide(const char* name, Function function) {
-    sweep<T, layout>(name, [&](const Shape& shape, int32_t scale, int, auto draw) {
-        checkDivision<T, layout, kind>(shape, scale, roundNearestEven, draw, [&](const auto&... arguments) {
-            return withScale<T>(scale, [&](auto... s) { return callBinary<T, kind>(function, arguments..., s...); });
-        });
-    });
+    sweep<T>(name, layout, kind, false,
+             [=](const auto& a, const auto& b, const auto& d, QorImageSize roi, int32_t scale, int) {
+                 return withScale<T>(scale,
+                                     [&](auto... s) { return callBinary<T, kind>(function, a, b, d, roi, s...); });
+             });
 }
 
 template <class T, Layout layout, Kind kind, class Function>
 void divideRounded(const char* name, Function function) {
-    sweep<T, layout>(name, [&](const Shape& shape, int32_t scale, int mode, auto draw) {
-        checkDivision<T, layout, kind>(shape, scale, mode, draw, [&](const auto&... arguments) {
-            return callBinary<T, kind>(function, arguments..., mode, scale);
-        });
-    });
+    sweep<T>(name, layout, kind, true,
+             [=](const auto& a, const auto& b, const auto& d, QorImageSize roi, int32_t scale, int mode) {
+                 return callBinary<T, kind>(function, a, b, d, roi, mode, scale);
+             });
 }
 
 #define QORI_MEMBER(name, operation, S, D, SL, DL, kind, suffix) \
@@ -117,7 +122,7 @@ TEST(Division, AllNumeratorsOf16Bits) {
 
 TEST(Division, Streaming) {
     forStreamingChoices(12, 1 << 20, [](const Shape& shape) {
-        checkDivision<float, Layout::C1, Kind::R>(shape, 0, 0, NearPowers<float>{}, [](const auto&... arguments) {
+        checkDivision<float>(shape, Layout::C1, Kind::R, 0, 0, NearPowers<float>{}, [](const auto&... arguments) {
             return callBinary<float, Kind::R>(qoriDiv_32f_C1R, arguments...);
         });
     });

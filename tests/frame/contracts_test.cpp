@@ -61,7 +61,7 @@ Contract contractOf(const char* name, const char* parameters, const char* checks
                     QorResult(QORI_CALL* function)(T...)) {
     const auto invoke = [](Function f, const Argument* arguments) {
         return [&]<size_t... i>(std::index_sequence<i...>) {
-            return call(reinterpret_cast<QorResult(QORI_CALL*)(T...)>(f), arguments[i].template as<T>()...);
+            return reinterpret_cast<QorResult(QORI_CALL*)(T...)>(f)(arguments[i].template as<T>()...);
         }
         (std::index_sequence_for<T...>{});
     };
@@ -244,7 +244,7 @@ private:
                 case Flaw::zeroStep: argument.scalar = 0; break;
             }
         }
-        const QorResult result = contract_.invoke(contract_.function, arguments);
+        const QorResult result = call(contract_.invoke, contract_.function, static_cast<const Argument*>(arguments));
         if (result == QOR_OK && std::strstr(contract_.name, "InitAlloc") != nullptr)
             qorFree(*reinterpret_cast<void**>(arguments[0].pointer));
         return result;

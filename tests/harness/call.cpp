@@ -79,7 +79,21 @@ __attribute__((noinline)) void onStack(unsigned offset, void (*body)(void*), voi
 void onStack(unsigned, void (*body)(void*), void* context) { body(context); }
 #endif
 
+class BodyTest : public testing::Test {
+public:
+    explicit BodyTest(void (*body)()) : body_(body) {}
+    void TestBody() override { body_(); }
+
+private:
+    void (*body_)();
+};
+
 }  // namespace
+
+const testing::TestInfo* registerTest(const char* suite, const char* name, const char* file, int line, void (*body)()) {
+    return testing::RegisterTest(suite, name, nullptr, nullptr, file, line,
+                                 [body]() -> testing::Test* { return new BodyTest(body); });
+}
 
 void callAwkwardly(void (*body)(void*), void* context) {
     static unsigned calls;
@@ -91,6 +105,24 @@ void callAwkwardly(void (*body)(void*), void* context) {
     const unsigned after = _mm_getcsr();
     _mm_setcsr(before);
     EXPECT_EQ(during & ~kFlags, after & ~kFlags) << "the control register was left changed";
+}
+
+void forShapes(const std::vector<Shape>& shapes, FunctionRef<void(const Shape&)> check) {
+    for (const Shape& shape : shapes) {
+        SCOPED_TRACE(describe(shape));
+        check(shape);
+        if (testing::Test::HasFailure()) return;
+    }
+}
+
+void forStreamingChoices(int bytesPerPixel, int trafficBytes, FunctionRef<void(const Shape&)> check) {
+    const std::vector<Shape> shapes = largeShapes(bytesPerPixel, trafficBytes);
+    qorTestSetCacheSize(1);
+    forShapes(shapes, check);
+    for (int32_t cache : {1 << 28, -1}) {
+        qorTestSetCacheSize(cache);
+        forShapes({shapes.front()}, check);
+    }
 }
 
 void expectUnchanged(const TestImage& image, const Snapshot& expected, const char* file, int line) {

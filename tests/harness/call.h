@@ -5,7 +5,21 @@
 #pragma once
 #include <gtest/gtest.h>
 
+/// GoogleTest's, without a class for each: a program has some hundreds of tests, and a class takes a compiler 12 ms.
+#undef TEST
+#define TEST(suite, name)                                                                   \
+    static void suite##_##name##_body();                                                    \
+    [[maybe_unused]] static const testing::TestInfo* const suite##_##name##_info =          \
+        qori::test::registerTest(#suite, #name, __FILE__, __LINE__, suite##_##name##_body); \
+    static void suite##_##name##_body()
+
 namespace qori::test {
+
+const testing::TestInfo* registerTest(const char* suite, const char* name, const char* file, int line, void (*body)());
+
+/// What bodies of tests name without a class.
+inline bool HasFailure() { return testing::Test::HasFailure(); }
+inline bool HasFatalFailure() { return testing::Test::HasFatalFailure(); }
 
 /// Notes that an export has been compared with its reference; what was never noted fails the run's last check.
 void markSwept(const char* exportName);

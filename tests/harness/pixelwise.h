@@ -17,9 +17,12 @@ struct AnyValue {
 };
 
 /// invoke(src, dst, roi) calls the export; reference(a, channel) gives one element.
-template <class S, class D, Layout layout, Kind kind, class Invoke, class Reference, class Draw = AnyValue<S>>
-void checkUnary(const Shape& shape, Invoke invoke, Reference reference, Draw draw = {}) {
-    constexpr int n = channels(layout);
+using UnaryCall = FunctionRef<void(const TestImage&, const TestImage&, QorImageSize)>;
+
+template <class S, class D>
+__attribute__((noinline)) void checkUnary(const Shape& shape, Layout layout, Kind kind, UnaryCall invoke,
+                                          FunctionRef<D(S, int)> reference, FunctionRef<S()> draw) {
+    const int n = channels(layout);
     TestImage dst(0, shape, n * static_cast<int>(sizeof(D)));
     TestImage src = kind == Kind::IR ? dst : TestImage(1, shape, n * static_cast<int>(sizeof(S)));
     dst.fill<D>(n, AnyValue<D>{});
@@ -38,10 +41,19 @@ void checkUnary(const Shape& shape, Invoke invoke, Reference reference, Draw dra
     }
 }
 
+template <class S, class D, Layout layout, Kind kind>
+void checkUnary(const Shape& shape, UnaryCall invoke, FunctionRef<D(S, int)> reference,
+                FunctionRef<S()> draw = AnyValue<S>{}) {
+    checkUnary<S, D>(shape, layout, kind, invoke, reference, draw);
+}
+
 /// invoke(src1, src2, dst, roi); reference(a, b, channel) with a of src1 and b of src2 (in place: of the destination).
-template <class S, class D, Layout layout, Kind kind, class Invoke, class Reference, class Draw = AnyValue<S>>
-void checkBinary(const Shape& shape, Invoke invoke, Reference reference, Draw draw = {}) {
-    constexpr int n = channels(layout);
+using BinaryCall = FunctionRef<void(const TestImage&, const TestImage&, const TestImage&, QorImageSize)>;
+
+template <class S, class D>
+__attribute__((noinline)) void checkBinary(const Shape& shape, Layout layout, Kind kind, BinaryCall invoke,
+                                           FunctionRef<D(S, S, int)> reference, FunctionRef<S()> draw) {
+    const int n = channels(layout);
     TestImage dst(0, shape, n * static_cast<int>(sizeof(D))), src1(1, shape, n * static_cast<int>(sizeof(S)));
     TestImage src2 = kind == Kind::IR ? dst : TestImage(2, shape, n * static_cast<int>(sizeof(S)));
     dst.fill<D>(n, AnyValue<D>{});
@@ -61,6 +73,12 @@ void checkBinary(const Shape& shape, Invoke invoke, Reference reference, Draw dr
     if (kind != Kind::IR) {
         QORI_EXPECT_UNCHANGED(src2, src2Before);
     }
+}
+
+template <class S, class D, Layout layout, Kind kind>
+void checkBinary(const Shape& shape, BinaryCall invoke, FunctionRef<D(S, S, int)> reference,
+                 FunctionRef<S()> draw = AnyValue<S>{}) {
+    checkBinary<S, D>(shape, layout, kind, invoke, reference, draw);
 }
 
 }  // namespace qori::test

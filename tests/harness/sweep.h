@@ -3,31 +3,16 @@
 #pragma once
 #include "call.h"
 #include "companion/qorcore_instrumented.h"
+#include "function_ref.h"
 #include "image.h"
 
 namespace qori::test {
 
 /// What a sweep does with each shape; stops a member's sweep at its first failure, which is the one worth reading.
-template <class Check>
-void forShapes(const std::vector<Shape>& shapes, Check check) {
-    for (const Shape& shape : shapes) {
-        SCOPED_TRACE(describe(shape));
-        check(shape);
-        if (testing::Test::HasFailure()) return;
-    }
-}
+void forShapes(const std::vector<Shape>& shapes, FunctionRef<void(const Shape&)> check);
 
 /// Regions above a streaming bound, with a cache that makes the call stream, one that does not, and none that answers.
-template <class Check>
-void forStreamingChoices(int bytesPerPixel, int trafficBytes, Check check) {
-    const std::vector<Shape> shapes = largeShapes(bytesPerPixel, trafficBytes);
-    qorTestSetCacheSize(1);
-    forShapes(shapes, check);
-    for (int32_t cache : {1 << 28, -1}) {
-        qorTestSetCacheSize(cache);
-        forShapes({shapes.front()}, check);
-    }
-}
+void forStreamingChoices(int bytesPerPixel, int trafficBytes, FunctionRef<void(const Shape&)> check);
 
 void expectUnchanged(const TestImage& image, const Snapshot& expected, const char* file, int line);
 void expectStatus(QorResult expected, QorResult status, const char* text, const char* file, int line);

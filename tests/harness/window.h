@@ -46,13 +46,28 @@ inline Shape withAround(Shape shape, Around around) {
     return shape;
 }
 
+/// What a window sees around its pixel, of the pixel's own channel.
+template <class S>
+struct Neighbours {
+    const View<S>& pixels;
+    int x, y, channel;
+
+    S operator()(int dx, int dy) const { return pixels.get(x + dx, y + dy, channel); }
+};
+
+template <class S, class D>
+using WindowCall = FunctionRef<QorResult(const S*, int32_t, D*, int32_t, QorImageSize)>;
+template <class S, class D>
+using WindowReference = FunctionRef<D(const Neighbours<S>&)>;
+
 /// invoke(source, sourceStep, destination, destinationStep, roi) calls the export with pointers to the region's first
 /// pixel; reference(pixel) makes an element of pixel(dx, dy), of its own channel. draw() makes source elements.
-template <class S, class D, Layout layout, Kind kind, class Invoke, class Reference, class Draw = AnyValue<S>>
-void checkWindow(const Shape& shape, Around around, Invoke invoke, Reference reference, Draw draw = {}) {
-    constexpr int n = channels(layout);
-    constexpr int pixelBytes = n * static_cast<int>(sizeof(S));
-    static_assert(kind == Kind::R || sizeof(S) == sizeof(D));
+template <class S, class D>
+__attribute__((noinline)) void checkWindow(const Shape& shape, Layout layout, Kind kind, Around around,
+                                           WindowCall<S, D> invoke, WindowReference<S, D> reference,
+                                           FunctionRef<S()> draw) {
+    const int n = channels(layout);
+    const int pixelBytes = n * static_cast<int>(sizeof(S));
     const Shape seen = withAround(shape, around);
     const TestImage src(0, seen, pixelBytes);
     const TestImage dst = kind == Kind::IR ? src : TestImage(1, shape, n * static_cast<int>(sizeof(D)));
@@ -66,9 +81,7 @@ void checkWindow(const Shape& shape, Around around, Invoke invoke, Reference ref
     for (int y = 0; y < shape.height; ++y)
         for (int x = 0; x < shape.width; ++x)
             for (int c = 0; c < processedChannels(layout); ++c)
-                to.set(x, y, c, reference([&](int dx, int dy) {
-                           return from.get(x + around.left + dx, y + around.top + dy, c);
-                       }));
+                to.set(x, y, c, reference(Neighbours<S>{from, x + around.left, y + around.top, c}));
     auto* const source = src.data<uint8_t>() + inside;
     auto* const target = kind == Kind::IR ? source : dst.data<uint8_t>();
     EXPECT_EQ(QOR_OK, invoke(reinterpret_cast<const S*>(source), src.step(), reinterpret_cast<D*>(target), dst.step(),
@@ -77,6 +90,13 @@ void checkWindow(const Shape& shape, Around around, Invoke invoke, Reference ref
     if (kind != Kind::IR) {
         QORI_EXPECT_UNCHANGED(src, before);
     }
+}
+
+template <class S, class D, Layout layout, Kind kind>
+void checkWindow(const Shape& shape, Around around, WindowCall<S, D> invoke, WindowReference<S, D> reference,
+                 FunctionRef<S()> draw = AnyValue<S>{}) {
+    static_assert(kind == Kind::R || sizeof(S) == sizeof(D));
+    checkWindow<S, D>(shape, layout, kind, around, invoke, reference, draw);
 }
 
 }  // namespace qori::test

@@ -82,21 +82,24 @@ constexpr bool isBinary =
     std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*> ||
     std::is_invocable_v<Function, const T*, int32_t, const T*, int32_t, QorImageSize, double*, int32_t>;
 
-template <class T, Layout layout, class Function, class Check>
-void runMember(Function function, const Shape& shape, int32_t hint, Check check) {
-    constexpr int n = channels(layout);
-    constexpr bool binary = isBinary<Function, T>;
+/// A member with or without a second image and a hint.
+template <class T>
+using MemberCall = FunctionRef<QorResult(const T*, int32_t, const T*, int32_t, QorImageSize, double*, int32_t)>;
+template <class T>
+using ChannelCheck = FunctionRef<void(const Channel<T>&)>;
+
+template <class T>
+void runMember(MemberCall<T> invoke, Layout layout, bool binary, const Shape& shape, int32_t hint,
+               ChannelCheck<T> check) {
+    const int n = channels(layout);
     TestImage src1(0, shape, n * static_cast<int>(sizeof(T))), src2(1, shape, n * static_cast<int>(sizeof(T)));
     src1.fill<T>(n, drawPixel<T>);
     src2.fill<T>(n, drawPixel<T>);
     const Snapshot before1 = src1.snapshot(), before2 = src2.snapshot();
     double results[5] = {-7, -7, -7, -7, -7};
-    QorResult status, expectedStatus = QOR_OK;
-    if constexpr (binary)
-        status =
-            callWith(hint, function, src1.data<T>(), src1.step(), src2.data<T>(), src2.step(), shape.roi(), results);
-    else
-        status = callWith(hint, function, src1.data<T>(), src1.step(), shape.roi(), results);
+    QorResult expectedStatus = QOR_OK;
+    const QorResult status =
+        invoke(src1.data<T>(), src1.step(), src2.data<T>(), src2.step(), shape.roi(), results, hint);
     const double relative = relativeError(shape, n, hint == hintAccurate);
     for (int c = 0; c < resultsOf(layout); ++c) {
         SCOPED_TRACE("channel " + std::to_string(c));
@@ -121,22 +124,17 @@ const std::vector<T>& extremeElements(bool largest) {
 }
 
 /// Regions of extreme pixels that fill every lane: rows beyond 32,768 pixels, merged into one and not.
-template <class T, Layout layout, class Function, class Check>
-void runExtremes(Function function, Check check) {
-    constexpr int n = channels(layout), width = kExtremeWidth, height = kExtremeElements / width / n;
+template <class T>
+void runExtremes(MemberCall<T> invoke, Layout layout, bool binary, ChannelCheck<T> check) {
+    const int n = channels(layout), width = kExtremeWidth, height = kExtremeElements / width / n;
     for (int choice = 0; choice < 4; ++choice) {
         const auto &src1 = extremeElements<T>(choice % 2), &src2 = extremeElements<T>(choice / 2);
         const QorImageSize roi{choice % 3 == 0 ? width : width - 1, height};
         const int32_t step = width * n * static_cast<int>(sizeof(T));
         double results[4];
-        QorResult status, expectedStatus = QOR_OK;
-        std::vector<T> second;
-        if constexpr (isBinary<Function, T>) {
-            status = call(function, src1.data(), step, src2.data(), step, roi, results);
-            second.push_back(src2[0]);
-        } else {
-            status = call(function, src1.data(), step, roi, results);
-        }
+        QorResult expectedStatus = QOR_OK;
+        const QorResult status = invoke(src1.data(), step, src2.data(), step, roi, results, hintFast);
+        const std::vector<T> second = binary ? std::vector<T>{src2[0]} : std::vector<T>{};
         for (int c = 0; c < resultsOf(layout); ++c)
             check(Channel<T>{{src1[0]}, second, roi.width * roi.height, results[c], 0, &expectedStatus});
         EXPECT_EQ(expectedStatus, status);
@@ -144,50 +142,72 @@ void runExtremes(Function function, Check check) {
 }
 
 /// Rows that follow upwards are left out where steps must be positive.
-template <class T, Layout layout, class Function, class Check>
-void sweepMember(const char* name, Function function, bool anyStep, Check check) {
+template <class T>
+__attribute__((noinline)) void sweepMember(const char* name, Layout layout, bool binary, bool anyStep,
+                                           MemberCall<T> invoke, ChannelCheck<T> check) {
     for (int32_t hint : {int32_t{hintFast}, int32_t{hintAccurate}, -1}) {
         forShapes(smallShapes(), [&](const Shape& shape) {
-            if (!shape.flipped || anyStep) runMember<T, layout>(function, shape, hint, check);
+            if (!shape.flipped || anyStep) runMember<T>(invoke, layout, binary, shape, hint, check);
         });
         if (std::is_integral_v<T>) break;
     }
-    forShapes(narrowShapes(), [&](const Shape& shape) { runMember<T, layout>(function, shape, hintFast, check); });
-    if constexpr (std::is_integral_v<T>) runExtremes<T, layout>(function, check);
+    forShapes(narrowShapes(),
+              [&](const Shape& shape) { runMember<T>(invoke, layout, binary, shape, hintFast, check); });
+    if constexpr (std::is_integral_v<T>) runExtremes<T>(invoke, layout, binary, check);
     markSwept(name);
 }
 
+template <class T, Layout layout, class Function>
+void sweepMember(const char* name, Function function, bool anyStep, ChannelCheck<T> check) {
+    constexpr bool binary = isBinary<Function, T>;
+    sweepMember<T>(
+        name, layout, binary, anyStep,
+        [=](const T* a, int32_t aStep, const T* b, int32_t bStep, QorImageSize roi, double* results, int32_t hint) {
+            if constexpr (binary)
+                return callWith(hint, function, a, aStep, b, bStep, roi, results);
+            else
+                return callWith(hint, function, a, aStep, roi, results);
+        },
+        check);
+}
+
 /// Integers are exact, roots and quotients of them correctly rounded.
+template <Measure measure, class T>
+void checkNorm(const Channel<T>& channel) {
+    const auto expected = expectedTotal<measure>(channel, channel.a, channel.b);
+    const auto total = static_cast<double>(expected.total);
+    if (std::is_integral_v<T> || measure == Measure::largest) {
+        EXPECT_EQ(rooted<measure>(total), channel.result);
+    } else {  // the root halves a relative error, and squaring its result doubles it again
+        const double result = measure == Measure::squares ? channel.result * channel.result : channel.result;
+        EXPECT_NEAR(total, result, channel.relativeError * static_cast<double>(expected.magnitude));
+    }
+}
+
+template <Measure measure, class T>
+void checkRelative(const Channel<T>& channel) {
+    auto expected = static_cast<double>(expectedTotal<measure>(channel, channel.a, channel.b).total);
+    const auto denominator = static_cast<double>(expectedTotal<measure, T>(channel, channel.b, {}).total);
+    if (denominator == 0)
+        *channel.expectedStatus = QOR_WARN_DIV_BY_ZERO;
+    else
+        expected /= denominator;
+    if (std::is_integral_v<T> || measure == Measure::largest) {
+        EXPECT_EQ(rooted<measure>(expected), channel.result);
+    } else {  // numerator and denominator may err in opposite directions
+        const double result = measure == Measure::squares ? channel.result * channel.result : channel.result;
+        EXPECT_NEAR(expected, result, 2 * channel.relativeError / (1 - channel.relativeError) * expected);
+    }
+}
+
 template <Measure measure, class T, Layout layout, class Function>
 void sweepNorm(const char* name, Function function, bool anyStep) {
-    sweepMember<T, layout>(name, function, anyStep, [](const Channel<T>& channel) {
-        const auto expected = expectedTotal<measure>(channel, channel.a, channel.b);
-        const auto total = static_cast<double>(expected.total);
-        if (std::is_integral_v<T> || measure == Measure::largest) {
-            EXPECT_EQ(rooted<measure>(total), channel.result);
-        } else {  // the root halves a relative error, and squaring its result doubles it again
-            const double result = measure == Measure::squares ? channel.result * channel.result : channel.result;
-            EXPECT_NEAR(total, result, channel.relativeError * static_cast<double>(expected.magnitude));
-        }
-    });
+    sweepMember<T, layout>(name, function, anyStep, [](const Channel<T>& channel) { checkNorm<measure>(channel); });
 }
 
 template <Measure measure, class T, Layout layout, class Function>
 void sweepRelative(const char* name, Function function) {
-    sweepMember<T, layout>(name, function, false, [](const Channel<T>& channel) {
-        auto expected = static_cast<double>(expectedTotal<measure>(channel, channel.a, channel.b).total);
-        const auto denominator = static_cast<double>(expectedTotal<measure, T>(channel, channel.b, {}).total);
-        if (denominator == 0)
-            *channel.expectedStatus = QOR_WARN_DIV_BY_ZERO;
-        else
-            expected /= denominator;
-        if (std::is_integral_v<T> || measure == Measure::largest) {
-            EXPECT_EQ(rooted<measure>(expected), channel.result);
-        } else {  // numerator and denominator may err in opposite directions
-            const double result = measure == Measure::squares ? channel.result * channel.result : channel.result;
-            EXPECT_NEAR(expected, result, 2 * channel.relativeError / (1 - channel.relativeError) * expected);
-        }
-    });
+    sweepMember<T, layout>(name, function, false, [](const Channel<T>& channel) { checkRelative<measure>(channel); });
 }
 
 #define QORI_SWEEP(operation, ...)                        \
@@ -206,33 +226,40 @@ QORI_SWEEP(normRelInf, sweepRelative<Measure::largest, T, layout>(name, function
 QORI_SWEEP(normRelL1, sweepRelative<Measure::magnitudes, T, layout>(name, function))
 QORI_SWEEP(normRelL2, sweepRelative<Measure::squares, T, layout>(name, function))
 
-template <class T, Layout layout, class Function>
-void mean(const char* name, Function function) {
-    sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) {
-        const auto sum = expectedTotal<Measure::values, T>(channel, channel.a, {});
-        const auto pixels = static_cast<double>(channel.a.size()) * channel.times;
-        const auto total = static_cast<double>(sum.total);
-        if (std::is_integral_v<T>)
-            EXPECT_EQ(layout == Layout::C1 ? total / pixels : total * (1 / pixels), channel.result);
-        else
-            EXPECT_NEAR(total / pixels, channel.result,
-                        channel.relativeError * static_cast<double>(sum.magnitude) / pixels);
-    });
+template <class T>
+void checkMean(const Channel<T>& channel, bool oneChannel) {
+    const auto sum = expectedTotal<Measure::values, T>(channel, channel.a, {});
+    const auto pixels = static_cast<double>(channel.a.size()) * channel.times;
+    const auto total = static_cast<double>(sum.total);
+    if (std::is_integral_v<T>)
+        EXPECT_EQ(oneChannel ? total / pixels : total * (1 / pixels), channel.result);
+    else
+        EXPECT_NEAR(total / pixels, channel.result,
+                    channel.relativeError * static_cast<double>(sum.magnitude) / pixels);
 }
 
-/// Integers: doubles added from left to right, which shows beyond 2^53.
+template <class T, Layout layout, class Function>
+void mean(const char* name, Function function) {
+    sweepMember<T, layout>(name, function, true,
+                           [](const Channel<T>& channel) { checkMean(channel, layout == Layout::C1); });
+}
+
+/// Doubles added from left to right, which shows beyond 2^53.
+template <class T>
+void checkOrderedProduct(const Channel<T>& channel) {
+    double expected = 0;
+    for (int time = 0; time < channel.times; ++time)
+        for (size_t i = 0; i < channel.a.size(); ++i)
+            expected += static_cast<double>(channel.a[i]) * static_cast<double>(channel.b[i]);
+    EXPECT_EQ(expected, channel.result);
+}
+
 template <class T, Layout layout, class Function>
 void dotProduct(const char* name, Function function) {
     if constexpr (std::is_floating_point_v<T>)
         sweepNorm<Measure::products, T, layout>(name, function, true);
     else
-        sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) {
-            double expected = 0;
-            for (int time = 0; time < channel.times; ++time)
-                for (size_t i = 0; i < channel.a.size(); ++i)
-                    expected += static_cast<double>(channel.a[i]) * static_cast<double>(channel.b[i]);
-            EXPECT_EQ(expected, channel.result);
-        });
+        sweepMember<T, layout>(name, function, true, [](const Channel<T>& channel) { checkOrderedProduct(channel); });
 }
 
 template <class T>
