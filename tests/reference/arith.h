@@ -64,15 +64,18 @@ inline uint64_t scaledQuotient(uint64_t numerator, uint64_t denominator, int sca
         r2IsAbove = 2 * (n % d) > d;
         r2IsEqual = 2 * (n % d) == d;
     } else {
+        const int width = numerator == 0 ? 0 : static_cast<int>(std::bit_width(numerator)) + up;
+        if (width + 2 <= static_cast<int>(std::bit_width(denominator)) + down) return 0;  // less than a half
         Big n{numerator}, d{denominator}, rest;
         for (int i = 0; i < up; ++i) n = n.doubled();
         for (int i = 0; i < down; ++i) d = d.doubled();
         q = 0;
-        for (size_t bit = 0; bit < 192; ++bit) {
+        for (auto bit = static_cast<size_t>(192 - width); bit < 192; ++bit) {
             rest = rest.doubled(n.limb[bit / 32] >> (31 - bit % 32) & 1);
             const bool one = rest >= d;
             if (one) rest = rest.minus(d);
-            q = std::min(q, uint64_t{1} << 40) * 2 + one;
+            q = q * 2 + one;
+            if (q >> 40 != 0) return q;
         }
         r2IsAbove = rest.doubled() > d;
         r2IsEqual = rest.doubled() == d;
