@@ -329,7 +329,7 @@ TEST(Median, EveryCountOfOnesInTheRowsOf5x5) {
     std::vector<int> ones(size_t{kRows} * kCount);
     for (int p = 0; p < kCount; ++p)
         for (int y = 0, left = p; y < kRows; ++y, left /= 6) {
-            ones[static_cast<size_t>(p * kRows + y)] = left % 6;
+            ones.data()[p * kRows + y] = left % 6;
             const int turn = random().below(5);
             for (int x = 0; x < 5; ++x) patterns.set(p, (x + turn) % 5, y, x < left % 6);
         }
@@ -337,7 +337,7 @@ TEST(Median, EveryCountOfOnesInTheRowsOf5x5) {
     for (int p = 0; p < kCount; ++p)
         for (int y = 0; y < kRows - 4; ++y) {
             int sum = 0;
-            for (int k = 0; k < 5; ++k) sum += ones[static_cast<size_t>(p * kRows + y + k)];
+            for (int k = 0; k < 5; ++k) sum += ones.data()[p * kRows + y + k];
             ASSERT_EQ(sum > 12 ? 255 : 0, patterns.result(p, y)) << "pattern " << p << ", row " << y;
         }
 }
@@ -347,27 +347,28 @@ TEST(Median, EveryCountOfOnesInTheRowsOf5x5) {
 template <class T, class Function>
 void expectMajorities(Function function, QorImageSize mask, T zero, T one) {
     const int width = 530, height = 45, columns = width + mask.width - 1, rows = height + mask.height - 1;
-    const auto at = [=](int x, int y) { return static_cast<size_t>(y * columns + x); };
-    std::vector<T> pixels(at(0, rows)), result(static_cast<size_t>(width * height));
+    std::vector<T> pixels(static_cast<size_t>(columns) * static_cast<size_t>(rows));
+    std::vector<T> result(static_cast<size_t>(width) * size_t{height});
+    const auto at = [&](int x, int y) { return pixels.data() + ptrdiff_t{y} * columns + x; };
     const int kind = random().below(3), dx = random().below(9) - 4, dy = random().below(9) - 4;
     const int period = std::max(1, (mask.width + mask.height) / 2);
     for (int y = 0; y < rows; ++y)
         for (int x = 0; x < columns; ++x) {
             const int wave = (dx * x + dy * y + 100'000) / period % 2;
-            pixels[at(x, y)] = (kind == 0 || random().oneIn(9) ? random().oneIn(2) : wave == 0) ? one : zero;
+            *at(x, y) = (kind == 0 || random().oneIn(9) ? random().oneIn(2) : wave == 0) ? one : zero;
         }
     ASSERT_EQ(QOR_OK, function(pixels.data(), columns * int{sizeof(T)}, result.data(), width * int{sizeof(T)},
                                QorImageSize{width, height}, mask, QorPoint2D{0, 0}));
     for (int x = 0; x < width; ++x)
         for (int y = 0, ones = 0; y < height; ++y) {
             const auto row = [&](int line) {
-                return static_cast<int>(std::count(&pixels[at(x, line)], &pixels[at(x, line)] + mask.width, one));
+                return static_cast<int>(std::count(at(x, line), at(x, line) + mask.width, one));
             };
             if (y == 0)
                 for (int k = 0; k < mask.height; ++k) ones += row(k);
             else
                 ones += row(y + mask.height - 1) - row(y - 1);
-            ASSERT_EQ(ones > mask.width * mask.height / 2 ? one : zero, result[static_cast<size_t>(y * width + x)])
+            ASSERT_EQ(ones > mask.width * mask.height / 2 ? one : zero, result.data()[y * width + x])
                 << mask.width << " x " << mask.height << " at " << x << ", " << y << " of kind " << kind;
         }
 }
@@ -389,15 +390,16 @@ TEST(Median, MajoritiesInTiles) {
 TEST(Median, EveryPatternOfCrosses) {
     for (int reach : {1, 2}) {
         const int n = 4 * reach + 1, side = 2 * reach + 1, count = 1 << n, width = side * count;
-        std::vector<uint8_t> pixels(static_cast<size_t>(width * side)), result(static_cast<size_t>(width));
+        std::vector<uint8_t> pixels(static_cast<size_t>(width) * static_cast<size_t>(side));
+        std::vector<uint8_t> result(static_cast<size_t>(width));
         for (int p = 0; p < count; ++p)
             for (int i = 0, bit = 0; i < side * side; ++i)
                 if (i / side == reach || i % side == reach)
-                    pixels[static_cast<size_t>(i / side * width + p * side + i % side)] = (p >> bit++ & 1) != 0;
+                    pixels.data()[i / side * width + p * side + i % side] = (p >> bit++ & 1) != 0;
         ASSERT_EQ(QOR_OK, qoriFilterMedianCross_8u_C1R(pixels.data() + reach * width + reach, width, result.data(),
                                                        width, {width - 2 * reach, 1}, 11 + 22 * reach));
         for (int p = 0; p < count; ++p)
-            ASSERT_EQ(std::popcount(static_cast<unsigned>(p)) > n / 2, result[static_cast<size_t>(p * side)] == 1)
+            ASSERT_EQ(std::popcount(static_cast<unsigned>(p)) > n / 2, result.data()[p * side] == 1)
                 << "pattern " << p << " of " << n;
     }
 }
