@@ -162,11 +162,35 @@ Ladder sides(const char* operation, Function function, double power) {
             }
             return steps;
         },
-        "3 x 3 and 5 x 5 are networks, up to 15 x 15 tiles of pixels whose cost grows with the mask, above histograms"};
+        "3 x 3 and 5 x 5 are networks, up to 15 x 15 tiles of pixels whose cost grows with the mask, above counts of "
+        "columns"};
 }
+
+/// What a row's medians are like decides how those of large masks are counted.
+Ladder contents(int side) {
+    const auto make = [side](const char* name, auto value) -> Step {
+        const Size size{512, 512};
+        const Image<uint8_t> src({size.width + side, size.height + side}, 1), dst(size, 1);
+        for (int y = 0; y < src.height(); ++y)
+            for (int x = 0; x < src.elements(); ++x) src.row(y)[x] = static_cast<uint8_t>(value(x, y));
+        return {name, 1.0, [=] {
+                    must(qoriFilterMedian_8u_C1R(src.data(), src.step(), dst.data(), dst.step(), size.roi(),
+                                                 {side, side}, {0, 0}));
+                }};
+    };
+    return {"median 8u " + std::to_string(side) + "x" + std::to_string(side) + ", flat to steep images",
+            [=] {
+                return std::vector<Step>{make("flat", [](int, int) { return 77; }),
+                                         make("gentle slope", [](int x, int y) { return 60 + (x + y) / 16; }),
+                                         make("chequers", [](int x, int y) { return (x / 90 + y / 70) % 2 * 170; }),
+                                         make("steep slope", [](int x, int y) { return x + y / 2; })};
+            },
+            "rows whose medians take more than 64 values need whole histograms"};
+}
+
 const Ladders ladders{{sides<uint8_t>("median 8u, mask side", qoriFilterMedian_8u_C1R, 0),
                        sides<uint16_t>("median 16u, mask side", qoriFilterMedian_16u_C1R, 1),
-                       sides<float>("median 32f, mask side", qoriFilterMedian_32f_C1R, 1)}};
+                       sides<float>("median 32f, mask side", qoriFilterMedian_32f_C1R, 1), contents(17), contents(61)}};
 
 }  // namespace
 }  // namespace qori::bench

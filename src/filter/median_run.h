@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Medians of rectangles over rows that exist: which way a mask goes, and in which pieces.
 #pragma once
-#include "kernels/median/histograms.h"
 #include "kernels/median/ordinals.h"
 #include "kernels/median/search.h"
 #include "kernels/median/square5.h"
 #include "kernels/median/windows.h"
+#include "median_bytes.h"
 #include "median_tiles.h"
 
 namespace qori::filter {
@@ -47,68 +47,68 @@ void medianByNetwork(QorImageSize mask, Source source, T* const* dst, int32_t ro
     for (int32_t k = 0; k < rows; ++k) kernels::medianSquare3<1, keepAlpha>(src + k, dst + k, elements, apart);
 }
 
-/// Bytes by histograms, in strips of columns from top to bottom.
+/// Bytes, in strips of columns from top to bottom.
 template <class Bins>
 class ByteMedians {
-    using Histograms = kernels::ColumnHistograms<Bins>;
+    using Windows = ByteWindows<Bins>;
 
 public:
-    /// Columns whose counts stay in the first-level cache, unless the mask alone takes more.
-    static int32_t columnsOf(QorImageSize size, QorImageSize mask) {
-        const int64_t most = std::max(2 * int64_t{mask.width}, int64_t{kCache / Histograms::kColumnBytes});
-        return static_cast<int32_t>(std::min({int64_t{size.width} + mask.width - 1, most, int64_t{INT32_MAX}}));
-    }
     template <class T>
     ByteMedians(WorkBuffer& memory, const MedianJob<T>& job)
-        : columns_(columnsOf(job.size, job.mask)),
-          histograms_(memory.take<uint8_t>(int64_t{columns_} * Histograms::kColumnBytes)) {}
+        : columns_(Windows::columnsOf(job.size, job.mask)),
+          windows_(memory, columns_, job.mask),
+          row_(memory.take<uint8_t>(columns_)) {}
 
-    void run(const MedianJob<uint8_t>& job) const {
+    void run(const MedianJob<uint8_t>& job) {
+        const int32_t width = columns_ - job.mask.width + 1;
         for (int c = 0; c < job.channels; ++c)
-            for (int64_t x = 0; x < job.size.width; x += columns_ - job.mask.width + 1)
-                strip(job, static_cast<ptrdiff_t>(x * job.apart + c), static_cast<int32_t>(job.size.width - x));
+            for (int64_t x = 0; x < job.size.width; x += width)
+                strip(job, static_cast<ptrdiff_t>(x * job.apart + c),
+                      static_cast<int32_t>(std::min(int64_t{width}, job.size.width - x)));
     }
 
 private:
-    static constexpr int kCache = 44 << 10;
-
-    void strip(const MedianJob<uint8_t>& job, ptrdiff_t at, int32_t width) const {
-        const auto columns = static_cast<int32_t>(std::min(int64_t{columns_}, int64_t{width} + job.mask.width - 1));
-        Histograms histograms(histograms_, columns, job.mask.width);
-        for (int32_t y = 0; y < job.mask.height; ++y) histograms.enter(job.windows.row(y) + at, job.apart);
+    void strip(const MedianJob<uint8_t>& job, ptrdiff_t at, int32_t width) {
+        windows_.begin({job.windows.data + at, job.windows.step, job.apart}, width + job.mask.width - 1);
         for (int32_t y = 0; y < job.size.height; ++y) {
-            if (y > 0)
-                histograms.advance(job.windows.row(y + job.mask.height - 1) + at, job.windows.row(y - 1) + at,
-                                   job.apart);
             uint8_t* const to = job.dst.row(y) + at;
-            histograms.medians(
-                job.below(), [ =, apart = job.apart ](int32_t x, int byte, int32_t) __attribute__((always_inline)) {
-                    to[ptrdiff_t{x} * apart] = static_cast<uint8_t>(byte);
-                });
+            if (job.apart == 1) {
+                windows_.makeRow(to, nullptr);
+            } else {
+                windows_.makeRow(row_, nullptr);
+                for (int32_t x = 0; x < width; ++x) to[ptrdiff_t{x} * job.apart] = row_[x];
+            }
         }
     }
 
     int32_t columns_;
-    uint8_t* histograms_;
+    Windows windows_;
+    uint8_t* row_;
 };
 
 /// Other elements by their ordinals, in tiles.
 template <class T, class Bins, class Coordinate>
 class OrdinalMedians {
-    using Histograms = kernels::ColumnHistograms<Bins>;
     using Ordinals = kernels::Ordinals<T, Coordinate>;
 
 public:
     /// Sides of the pieces of which tiles are made, surroundings included.
     static int32_t sideOf(int32_t size, int32_t mask) {
-        const int64_t wanted = (sizeof(Coordinate) == 1 ? 3 : 2) * int64_t{mask};
-        const int64_t most = std::min(std::max(int64_t{kSide}, wanted), Ordinals::kMostSide);
+        constexpr int64_t kFull[] = {90, 128, 156, 181, 202, 221, 239, 256};  // 256 bins of n vectors of elements
+        int64_t wanted = (sizeof(Coordinate) == 1 ? 3 : 2) * int64_t{mask};
+        if constexpr (sizeof(Coordinate) == 1) {
+            constexpr int kMargin = 4;
+            const int64_t* full = kFull;
+            while (*full + kMargin < wanted && full != std::end(kFull) - 1) ++full;
+            wanted = *full;
+        }
+        const int64_t most = std::min(std::max(int64_t{kFull[0]}, wanted), Ordinals::kMostSide);
         return static_cast<int32_t>(std::min(int64_t{size} + mask - 1, std::max(most, int64_t{mask})));
     }
     OrdinalMedians(WorkBuffer& memory, const MedianJob<T>& job)
         : columns_(sideOf(job.size.width, job.mask.width)),
           rows_(sideOf(job.size.height, job.mask.height)),
-          histograms_(memory.take<uint8_t>(int64_t{columns_} * Histograms::kColumnBytes)),
+          windows_(memory, columns_, job.mask),
           rests_(memory.take<Rest>(columns_)),
           bytes_(memory.take<uint8_t>(columns_)),
           ordinals_(memory, columns_, rows_) {}
@@ -125,21 +125,13 @@ public:
 
 private:
     using Rest = typename Bins::Rest;
-    static constexpr int kSide = 90;  // bins of 32 elements, which one comparison of vectors looks through
 
     void tile(const MedianJob<T>& job, ptrdiff_t at, int32_t y0, QorImageSize size) {
         const int32_t columns = size.width + job.mask.width - 1, rows = size.height + job.mask.height - 1;
         ordinals_.read(job.windows.row(y0) + at, job.windows.step, job.apart, columns, rows);
-        Histograms histograms(histograms_, columns, job.mask.width);
-        for (int32_t y = 0; y < job.mask.height; ++y) histograms.enter(ordinals_.row(y), 1);
+        windows_.begin(ordinals_.bins(), columns);
         for (int32_t y = 0; y < size.height; ++y) {
-            if (y > 0) histograms.advance(ordinals_.row(y + job.mask.height - 1), ordinals_.row(y - 1), 1);
-            histograms.medians(
-                job.below(),
-                [ bins = bytes_, rests = rests_ ](int32_t x, int bin, int32_t rest) __attribute__((always_inline)) {
-                    bins[x] = static_cast<uint8_t>(bin);
-                    rests[x] = static_cast<Rest>(rest);
-                });
+            windows_.makeRow(bytes_, rests_);
             T* const to = job.dst.row(y0 + y) + at;
             for (int32_t x = 0; x < size.width; ++x)
                 kernels::put(to + ptrdiff_t{x} * job.apart,
@@ -148,7 +140,7 @@ private:
     }
 
     int32_t columns_, rows_;
-    uint8_t* histograms_;
+    ByteWindows<Bins> windows_;
     Rest* rests_;
     uint8_t* bytes_;
     Ordinals ordinals_;

@@ -5,6 +5,8 @@
 // not in it, so that a comparison with the rank finds the bin. The window's coarse counts follow it from pixel to
 // pixel; its fine ones are brought up to date for the bin in question alone.
 #pragma once
+#include "byte_rows.h"
+#include "image/image.h"
 #include "kernels/simd.h"
 
 namespace qori::kernels {
@@ -87,17 +89,16 @@ public:
     static constexpr int kBins = 16, kColumnBytes = (kBins + kBins * kBins) * int{sizeof(Column)};
 
     /// Memory of kColumnBytes for each column, on a 32-byte boundary.
-    ColumnHistograms(uint8_t* memory, int32_t columns, int32_t windowWidth)
-        : coarse_(reinterpret_cast<Column*>(memory)),
-          fine_(coarse_ + ptrdiff_t{columns} * kBins),
-          columns_(columns),
-          width_(windowWidth) {
-        __builtin_memset(memory, 0, static_cast<size_t>(columns) * kColumnBytes);
-    }
+    explicit ColumnHistograms(uint8_t* memory) : memory_(memory) {}
 
-    /// A row of bytes, `apart` from each other, comes into sight.
-    void enter(const uint8_t* row, ptrdiff_t apart) {
-        for (int32_t x = 0; x < columns_; ++x) countAt(x, row[x * apart], true);
+    /// The windows of row y of so many columns come into sight.
+    void begin(const ByteRows& rows, int32_t y, int32_t columns, QorImageSize window) {
+        coarse_ = reinterpret_cast<Column*>(memory_);
+        fine_ = coarse_ + ptrdiff_t{columns} * kBins;
+        columns_ = columns;
+        width_ = window.width;
+        __builtin_memset(memory_, 0, static_cast<size_t>(columns) * kColumnBytes);
+        for (int32_t k = 0; k < window.height; ++k) enter(rows.row(ptrdiff_t{y} + k), rows.apart);
     }
     /// The lowest row, and the one that went out of sight.
     void advance(const uint8_t* entering, const uint8_t* leaving, ptrdiff_t apart) {
@@ -138,6 +139,9 @@ public:
     }
 
 private:
+    void enter(const uint8_t* row, ptrdiff_t apart) {
+        for (int32_t x = 0; x < columns_; ++x) countAt(x, row[x * apart], true);
+    }
     Column* fineAt(int32_t x, int high) const { return fine_ + (ptrdiff_t{x} * kBins + high) * kBins; }
     void countAt(int32_t x, int value, bool enters) {
         Bins::count(coarse_ + ptrdiff_t{x} * kBins, detail::kSteps.from[value >> 4], enters);
@@ -159,8 +163,9 @@ private:
         return now;
     }
 
-    Column *coarse_, *fine_;
-    int32_t columns_, width_;
+    uint8_t* memory_;
+    Column *coarse_ = nullptr, *fine_ = nullptr;
+    int32_t columns_ = 0, width_ = 0;
 };
 
 }  // namespace qori::kernels

@@ -7,17 +7,25 @@
 #include <algorithm>
 #include <utility>
 
+#include "byte_rows.h"
 #include "image/image.h"
 #include "order.h"
 
 namespace qori::kernels {
 namespace detail {
 
-/// The place of the bit that has n set ones below it; it is there. Few are: a bin of 32 elements has one or two in a
-/// small window.
+/// The place of the bit that has n set ones below it; it is there. Halves are skipped without branches: how many of a
+/// bin's elements come before a median follows no pattern.
 QORI_INLINE int placeOfBit(uint32_t bits, int n) {
-    for (; n > 0; --n) bits &= bits - 1;
-    return __builtin_ctz(bits);
+    int place = 0;
+    for (int half = 16; half > 0; half /= 2) {
+        const int below = __builtin_popcount(bits & ((1u << half) - 1));
+        const int isAbove = -static_cast<int>(n >= below);
+        n -= below & isAbove;
+        place += half & isAbove;
+        bits >>= half & isAbove;
+    }
+    return place;
 }
 
 }  // namespace detail
@@ -71,8 +79,8 @@ public:
         number(count);
     }
 
-    /// The bin of each element of a row of the piece.
-    const uint8_t* row(int32_t y) const { return bytes_ + ptrdiff_t{y} * stride_; }
+    /// The bin of each element of the piece.
+    ByteRows bins() const { return {bytes_, stride_, 1}; }
 
     /// Of the bin's elements in the window at (x, y), the one that `rest` others come before.
     QORI_INLINE T element(int bin, int32_t rest, int32_t x, int32_t y, QorImageSize window) const {
