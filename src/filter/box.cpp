@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Means of rectangular windows around an anchor; neighbours are read from memory.
-#include "box_run.h"
+#include "box_job.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "square_run.h"

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Means of centred rectangular windows with a border, in the caller's buffer.
-#include "box_run.h"
+#include "box_job.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "square_run.h"

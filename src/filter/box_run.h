@@ -1,31 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
-// Means of rectangular windows, whatever the border and wherever the memory comes from: which sums hold them, which
-// kernels make them, and how much memory that takes.
+// How means of rectangular windows are made: which sums hold them, which kernels make them, and how much memory that
+// takes. Only the files that instantiate it include this.
 #pragma once
 #include "box_chain.h"
+#include "box_job.h"
 #include "box_sums.h"
 #include "kernels/box/across.h"
 #include "kernels/box/halves.h"
 #include "strips.h"
 
 namespace qori::filter {
-
-/// A box laid over an image and where it goes.
-template <class T, Layout layout>
-struct BoxJob {
-    BorderedImage src;
-    Image<T> dst;
-    QorImageSize mask;
-    Reach reach;  ///< mask.width - 1 columns and mask.height - 1 rows.
-
-    bool inPlace() const { return src.origin == asBytes(dst.data); }
-    int64_t area() const { return int64_t{mask.width} * mask.height; }
-};
-
-template <class T, Layout layout>
-BorderedImage imageOf(Image<const T> src, QorImageSize roi, BorderRule rule) {
-    return {asBytes(src.data), src.step, roi, pixelSize<T, layout>, rule};
-}
 
 /// Column sums of type S, then windows along them. Memory begins with what the RowWindow takes.
 template <class S, class T, Layout layout, class Rule>
@@ -161,12 +145,6 @@ private:
     bool isChained_;
     uint8_t* memory_;
     int64_t chainRow_[32];
-};
-
-/// Where a run's memory comes from: a caller's buffer of so many bytes, or the allocator for the duration of the call.
-struct BoxBuffer {
-    uint8_t* memory;
-    int64_t bytes;
 };
 
 /// Runs in the roomiest of its forms that the memory holds: pieces aligned or not, with the chain's rows or without.
