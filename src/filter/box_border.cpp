@@ -3,6 +3,7 @@
 #include "box_job.h"
 #include "frame/checks.h"
 #include "frame/float_control.h"
+#include "sizes.h"
 #include "square_run.h"
 
 namespace qori::filter {
@@ -20,8 +21,8 @@ int64_t bufferBytes(QorImageSize roi, QorImageSize mask, int32_t n) {
     const Reach reach = reachOf(mask);
     const int64_t columns = int64_t{roi.width} + mask.width - 1, rows = int64_t{roi.height} + mask.height - 1;
     const int64_t above = 2 * int64_t{mask.height} - 2 - reach.top, beside = 2 * int64_t{mask.width} - 2 - reach.left;
-    return 8 * n * (above * columns + beside * rows) + (columns + 2) * (n == 1 ? 4 : 16) + 4 * n * columns * rows +
-           4 * int64_t{reach.top} + 4;
+    return 8 * n * (product(above, columns) + product(beside, rows)) + (columns + 2) * (n == 1 ? 4 : 16) +
+           4 * n * product(columns, rows) + 4 * int64_t{reach.top} + 4;
 }
 
 QorResult filterBoxBorderGetBufferSize(QorImageSize roi, QorImageSize mask, int32_t dataType, int32_t numChannels,

@@ -4,6 +4,7 @@
 #include "frame/row_window.h"
 #include "kernels/copy_rows.h"
 #include "median_run.h"
+#include "sizes.h"
 
 namespace qori::filter {
 namespace {
@@ -21,12 +22,6 @@ int64_t maskBytes(QorImageSize mask, int32_t dataType, int64_t e) {
     if (isLine) return a32(4 * area);
     if (area >= 625) return a32(128 * ((area + 15) / 16) + 12'288);
     return a32(12 * roundUp(area, 16) + 64 * ((std::max(mask.width, mask.height) + 15) / 16));
-}
-
-/// Saturates far above every size that is reported.
-int64_t product(int64_t a, int64_t b) {
-    constexpr int64_t kTooMuch = int64_t{1} << 40;
-    return b > kTooMuch / a ? kTooMuch : a * b;
 }
 
 int64_t bufferBytes(QorImageSize roi, QorImageSize mask, int32_t dataType, int64_t e) {

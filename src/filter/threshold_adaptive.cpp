@@ -5,6 +5,7 @@
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "kernels/box/compare.h"
+#include "sizes.h"
 
 namespace qori::filter {
 namespace {
@@ -36,10 +37,10 @@ QorResult queryCheck(QorImageSize roi, QorImageSize mask, int32_t dataType, int3
 int64_t bufferBytes(QorImageSize roi, int64_t mask) {
     const auto align = [](int64_t bytes) { return roundUp(bytes, 32); };
     const int64_t w = roi.width, h = roi.height, reach = mask / 2;
-    const int64_t base = align((align(w + mask - 1) + 4) * mask + align(4 * w) * (mask + 1));
-    if (mask > w || mask > h) return align((w + mask - 1) * (mask + h - 1)) + base;
-    const auto beside = [=](int64_t side) { return 64 * ((reach * side + 31) / 32); };
-    return align((std::max(w, h) + mask - 1) * 3 * reach) + beside(w) + beside(h) + base;
+    const int64_t base = align(product(align(w + mask - 1) + 4, mask) + product(align(4 * w), mask + 1));
+    if (mask > w || mask > h) return align(product(w + mask - 1, mask + h - 1)) + base;
+    const auto beside = [=](int64_t side) { return 64 * ((product(reach, side) + 31) / 32); };
+    return align(product(std::max(w, h) + mask - 1, 3 * reach)) + beside(w) + beside(h) + base;
 }
 
 QorResult adaptiveBoxBufferSize(QorImageSize roi, QorImageSize mask, int32_t dataType, int32_t numChannels,

@@ -146,6 +146,12 @@ TEST(BoxBorder, ReportsTheSumOfItsAreas) {
     for (int32_t type : {0, 2, 6, 19}) EXPECT_EQ(QOR_ERR_DATA_TYPE, size({1, 1}, {1, 1}, type, 2));
     for (int32_t n : {0, 2, 5}) EXPECT_EQ(QOR_ERR_CHANNELS_UNSUPPORTED, size({1, 1}, {1, 1}, 1, n));
     EXPECT_EQ(QOR_ERR_SIZE, size({1 << 20, 1 << 12}, {3, 3}, 1, 1));
+    // Areas of more bytes than 64 bits count.
+    constexpr int32_t kLong[] = {1 << 29, 1 << 30, INT32_MAX};
+    for (int32_t side : {1, 1 << 20, 1 << 30, INT32_MAX})
+        for (int32_t width : kLong)
+            for (int32_t height : kLong)
+                for (int32_t n : {1, 3, 4}) EXPECT_EQ(QOR_ERR_SIZE, size({side, side}, {width, height}, 1, n));
     EXPECT_EQ(-1, bytes);
 }
 

@@ -309,6 +309,10 @@ TEST(ThresholdAdaptive, ReportsItsSizes) {
     EXPECT_EQ((11 * 56 + 31) / 32 * 32 + ((32 + 4) * 7 + 32 * 8 + 31) / 32 * 32, bytes);
     bytes = -1;
     EXPECT_EQ(QOR_ERR_SIZE, box({1 << 20, 1 << 20}, (1 << 20) + 1));
+    // Areas of more bytes than 64 bits count.
+    for (int32_t side : {1, 1 << 20, 1 << 30, INT32_MAX})
+        for (int32_t mask : {(1 << 29) + 1, (1 << 30) + 1, INT32_MAX})
+            EXPECT_EQ(QOR_ERR_SIZE, box({side, side}, mask)) << side << " by " << mask;
     EXPECT_EQ(QOR_ERR_SIZE,
               qoriThresholdAdaptiveGaussGetBufferSize({1, 1}, {INT32_MAX, INT32_MAX}, 1, 1, &specBytes, &bytes));
     for (const QorImageSize mask : {QorImageSize{3, 5}, QorImageSize{4, 4}, QorImageSize{0, 0}, QorImageSize{-1, -1}}) {
