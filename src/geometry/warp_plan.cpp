@@ -112,6 +112,19 @@ WarpSpan spanAlong(double along, double inverse, double start, double low, doubl
     return span;
 }
 
+/// In units of 2^-48, modulo 2^64, to the nearest. Of a size that no position inside a source comes from it is 0.
+uint64_t fixedPosition(double v) {
+    constexpr double kMost = 0x1p40, kWord = 0x1p32;
+    if (!(__builtin_fabs(v) <= kMost)) return 0;
+    // Two words, each by a conversion to 32 bits, which every processor has.
+    const auto word = [](double w) { return static_cast<uint32_t>(static_cast<int32_t>(w - kWord / 2)) + (1u << 31); };
+    const double scaled = v * 0x1p16, high = __builtin_floor(scaled);
+    const double low = __builtin_rint((scaled - high) * kWord);  // one too many becomes a word of the high part
+    const double wrapped = high - __builtin_floor(high / kWord) * kWord;
+    const uint64_t carried = low >= kWord;
+    return ((uint64_t{word(wrapped)} + carried) << 32) + (carried != 0 ? 0 : word(low));
+}
+
 }  // namespace
 
 Affine Affine::inverse() const {
@@ -168,12 +181,36 @@ WarpGeometry::WarpGeometry(const WarpPlan& plan, bool isNearest)
                                                                                             : kernels::kCoarseBias),
       shift_(isNearest ? 0.5 : 0),
       inverseX_(1 / plan.backward.xx),
-      inverseY_(1 / plan.backward.yx) {}
+      inverseY_(1 / plan.backward.yx) {
+    const double x = plan.backward.xx, y = plan.backward.yx;
+    isFixed_ = plan.src.width < kernels::kFixedLength && plan.src.height < kernels::kFixedLength &&
+               plan.dst.width <= kernels::kFixedWidth && __builtin_fabs(x) < kernels::kFixedLength &&
+               __builtin_fabs(y) < kernels::kFixedLength;
+    if (!isFixed_) return;
+    fixedAlongX_ = fixedPosition(x);
+    fixedAlongY_ = fixedPosition(y);
+}
 
 kernels::WarpLine WarpGeometry::line(int32_t y) const {
     const Affine& b = plan_.backward;
     const double exactX = __builtin_fma(b.xy, y, b.x0), exactY = __builtin_fma(b.yy, y, b.y0);
-    return {b.xx, b.yx, exactX + (bias_ + shift_), exactY + (bias_ + shift_), exactX, exactY, bias_};
+    kernels::WarpLine line{b.xx,
+                           b.yx,
+                           exactX + (bias_ + shift_),
+                           exactY + (bias_ + shift_),
+                           exactX,
+                           exactY,
+                           bias_,
+                           fixedAlongX_,
+                           fixedAlongY_,
+                           0,
+                           0};
+    if (isFixed_) {
+        // Of the rounded starts, so that the positions are those of the biased sums.
+        line.fixedX = fixedPosition(line.startX - bias_);
+        line.fixedY = fixedPosition(line.startY - bias_);
+    }
+    return line;
 }
 
 kernels::WarpBox WarpGeometry::rectangle() const {

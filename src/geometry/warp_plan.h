@@ -82,14 +82,17 @@ public:
     WarpSpan within(const kernels::WarpLine& line, const kernels::WarpBox& box, WarpSpan columns) const;
 
     double bias() const { return bias_; }
+    /// Whether lines have fixed positions.
+    bool isFixed() const { return isFixed_; }
     bool isNearest() const { return isNearest_; }
     /// Positions inside the source rectangle.
     kernels::WarpBox rectangle() const;
 
 private:
     const WarpPlan& plan_;
-    bool isNearest_;
+    bool isNearest_, isFixed_;
     double bias_, shift_, inverseX_, inverseY_;
+    uint64_t fixedAlongX_ = 0, fixedAlongY_ = 0;
 };
 
 }  // namespace qori::geometry

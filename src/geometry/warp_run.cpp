@@ -13,7 +13,12 @@ class TileRun {
 public:
     TileRun(const WarpPlan& plan, bool isNearest, const kernels::WarpKernels& kernels, const WarpImages& images,
             Tile tile)
-        : plan_(plan), geometry_(plan, isNearest), kernels_(kernels), images_(images), tile_(tile) {
+        : plan_(plan),
+          geometry_(plan, isNearest),
+          kernels_(kernels),
+          images_(images),
+          tile_(tile),
+          inside_(kernels.inside) {
         const int32_t width = plan.src.width, height = plan.src.height;
         const bool isCubic = !isNearest && plan.interpolation == interpCubic;
         const bool readsAround = isCubic && plan.border == WarpBorder::none;
@@ -28,6 +33,14 @@ public:
         }
         isNear_ = geometry_.bias() == kernels::kFineBias &&
                   int64_t{width} * images.pixelBytes >= kernels::kNearRowBytes && isWithin32Bits();
+        if (geometry_.isFixed() && isNear_ && kernels.fixed != nullptr && -kernels::kFixedLength < images.srcStep &&
+            images.srcStep < kernels::kFixedLength) {
+            inside_ = kernels.fixed;
+            fast_.left += kernels::kFixedMargin;
+            fast_.top += kernels::kFixedMargin;
+            fast_.right -= kernels::kFixedMargin;
+            fast_.bottom -= kernels::kFixedMargin;
+        }
         if (isCubic)
             any_ = {-3, -3, width + 2.0, height + 2.0};
         else if (isNearest)
@@ -89,7 +102,7 @@ private:
         const WarpSpan columns{tile_.x, tile_.x + tile_.width};
         row.line = geometry_.line(tile_.y + y);
         row.written = plan_.border == WarpBorder::replicate ? columns : geometry_.within(row.line, rectangle_, columns);
-        const bool hasFast = isNear_ && kernels_.inside != kernels_.anywhere;
+        const bool hasFast = isNear_ && inside_ != kernels_.anywhere;
         row.fast = hasFast ? geometry_.within(row.line, fast_, row.written) : WarpSpan{columns.first, columns.first};
         row.dst = images_.dst + ptrdiff_t{y} * images_.dstStep - ptrdiff_t{tile_.x} * images_.pixelBytes;
         if (plan_.border != WarpBorder::constant) return;
@@ -118,7 +131,7 @@ private:
         const kernels::WarpKernel anywhere = isNear_ ? kernels_.anywhere : kernels_.far;
         if (fast.isEmpty()) return run(anywhere, any_, written);
         run(anywhere, any_, {written.first, fast.first});
-        run(kernels_.inside, fast_, fast);
+        run(inside_, fast_, fast);
         run(anywhere, any_, {fast.end, written.end});
     }
 
@@ -130,6 +143,7 @@ private:
     kernels::WarpSource source_;
     WarpBox rectangle_, fast_, any_;
     bool isNear_;
+    kernels::WarpKernel inside_;
     Row rows_[kBandRows];
 };
 

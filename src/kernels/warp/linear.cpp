@@ -236,9 +236,17 @@ WarpKernels linearKernels() {
     if constexpr (std::is_same_v<T, double>) {
         constexpr WarpKernel any = linearDoubles<channels>;
         return {any, any, any, 0, 0, 1, 1};
-    } else if constexpr (sizeof(T) == 1) {  // words of 4 bytes are read, or blocks of 16
+    } else if constexpr (sizeof(T) == 1) {  // words of 4 bytes are read, or blocks of 16 from 8 before
+        constexpr int32_t left = channels == 1 ? 0 : channels == 3 ? 3 : 2;
         constexpr int32_t right = channels == 1 ? 3 : channels == 3 ? 5 : 3;
-        return {linearBytes<channels, false>, linearBytes<channels, true>, linearFar<T, channels>, 0, 0, right, 1};
+        return {linearBytes<channels, ByteReads::inside>,
+                linearBytes<channels, ByteReads::anywhere>,
+                linearFar<T, channels>,
+                left,
+                0,
+                right,
+                1,
+                linearBytes<channels, ByteReads::fixed>};
     } else if constexpr (channels == 1) {
         return {linearGray<T, false>, linearGray<T, true>, linearFar<T, 1>, 0, 0, 1, 1};
     } else {  // of three channels eight elements are read, six of which are the pair

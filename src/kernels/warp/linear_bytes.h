@@ -1,14 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
-// Linear interpolation of bytes: one sum of four pixels in integers. Fractions are odd multiples of 2^-15, off by 2^-15
-// at most; weights are rounded to 2^-15 such that the two of a column sum to the column's and all four to 1. A result
-// is therefore off its rounding by 255 * 3 * 2^-15 < 0.024 at most. Sums are at most 255 * 2^15 + 2^14 < 2^23.
+// Linear interpolation of bytes in words of 2^-7, which hold what two neighbours mix to with a rounding of 2^-8. Along
+// rows neighbours a and b are mixed about their middle, 64 (a + b) + 64 (b - a) (2 f - 1), as then f keeps 16 bits in a
+// signed word; down columns it keeps 15. Fractions are rounded down: with both roundings a result is off its own by
+// 255 * (2^-16 + 2^-15) + 2^-7 < 0.0196 at most. Sums are at most 128 * 255 < 2^15.
 #pragma once
 #include "places.h"
 
 namespace qori::kernels {
 
+enum class ByteReads {
+    fixed,    ///< Inside the source, by fixed positions.
+    inside,   ///< Inside the source.
+    anywhere  ///< Moved into the source.
+};
+
 /// As WarpKernel, for 1, 3 and 4 channels.
-template <int channels, bool anywhere>
+template <int channels, ByteReads reads>
 void linearBytes(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
                  uint8_t* dst);
 

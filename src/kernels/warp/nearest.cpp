@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "nearest.h"
 
+#include "fixed_places.h"
 #include "kernels/copy_rows.h"
 
 namespace qori::kernels {
@@ -32,48 +33,29 @@ QORI_INLINE Bytes packPixels(__m256i words) {
     return {_mm256_permutevar8x32_epi32(packed, order)};
 }
 
-template <int bytes>
-QORI_INLINE void storeFirst(uint8_t* dst, Bytes a) {
-    if constexpr (bytes == 32) return store(dst, a);
-    if constexpr (bytes >= 16) _mm_storeu_si128(reinterpret_cast<__m128i*>(dst), _mm256_castsi256_si128(a.v));
-    const __m128i rest = bytes >= 16 ? _mm256_extracti128_si256(a.v, 1) : _mm256_castsi256_si128(a.v);
-    if constexpr (bytes % 16 != 0) _mm_storel_epi64(reinterpret_cast<__m128i*>(dst + bytes / 16 * 16), rest);
-}
-
-/// Words that would end behind their row are read from further ahead, and shifted.
 template <int pixelBytes, bool anywhere>
 struct Gather {
     const uint8_t* origin;
-    int32_t step, lastWord;
     ptrdiff_t ahead;
 
-    QORI_INLINE explicit Gather(const WarpSource& source)
-        : origin(source.origin),
-          step(static_cast<int32_t>(source.step)),
-          lastWord((source.right + 1) * pixelBytes - kWord<pixelBytes>),
-          ahead(source.ahead) {}
+    QORI_INLINE explicit Gather(const WarpSource& source) : origin(source.origin), ahead(source.ahead) {}
 
-    QORI_INLINE void operator()(__m256i columns, __m256i rows, int n, uint8_t* dst) const {
-        __m256i offsets = offsetsOf<pixelBytes>(columns, rows, step), shifts = _mm256_setzero_si256();
-        if constexpr (anywhere && pixelBytes != kWord<pixelBytes>) {
-            const __m256i across = offsetsOf<pixelBytes>(columns, _mm256_setzero_si256(), 0);
-            const __m256i surplus = _mm256_max_epi32(_mm256_sub_epi32(across, _mm256_set1_epi32(lastWord)), shifts);
-            offsets = _mm256_sub_epi32(offsets, surplus);
-            shifts = _mm256_slli_epi32(surplus, 3);
-        }
-        if constexpr (!anywhere) prefetchAhead(origin, offsets, ahead);
+    QORI_INLINE void operator()(const Block& block, int n, uint8_t* dst) const {
+        if constexpr (!anywhere)
+            prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(block.offsets)), ahead);
+        constexpr bool shifts = anywhere && pixelBytes != kWord<pixelBytes>;
         if constexpr (kWord<pixelBytes> == 4) {
-            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), offsets, 1);
-            write<8>(_mm256_srlv_epi32(words, shifts), n, dst);
+            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), block.offsets, 1);
+            write<8>(shifts ? _mm256_srlv_epi32(words, block.shifts) : words, n, dst);
         } else {
-            const auto half = [&](__m128i o, __m128i s) {
+            const auto half = [&](__m128i o, __m128i s) __attribute__((always_inline)) {
                 const __m256i words = _mm256_i32gather_epi64(reinterpret_cast<const long long*>(origin), o, 1);
-                return _mm256_srlv_epi64(words, _mm256_cvtepu32_epi64(s));
+                return shifts ? _mm256_srlv_epi64(words, _mm256_cvtepu32_epi64(s)) : words;
             };
-            write<4>(half(_mm256_castsi256_si128(offsets), _mm256_castsi256_si128(shifts)), n, dst);
+            write<4>(half(_mm256_castsi256_si128(block.offsets), _mm256_castsi256_si128(block.shifts)), n, dst);
             if (n > 4)
-                write<4>(half(_mm256_extracti128_si256(offsets, 1), _mm256_extracti128_si256(shifts, 1)), n - 4,
-                         dst + 4 * pixelBytes);
+                write<4>(half(_mm256_extracti128_si256(block.offsets, 1), _mm256_extracti128_si256(block.shifts, 1)),
+                         n - 4, dst + 4 * pixelBytes);
         }
     }
 
@@ -92,15 +74,13 @@ private:
 template <int pixelBytes>
 struct Moves {
     const uint8_t* origin;
-    int32_t step;
     ptrdiff_t ahead;
 
-    QORI_INLINE explicit Moves(const WarpSource& source)
-        : origin(source.origin), step(static_cast<int32_t>(source.step)), ahead(source.ahead) {}
+    QORI_INLINE explicit Moves(const WarpSource& source) : origin(source.origin), ahead(source.ahead) {}
 
-    QORI_INLINE void operator()(__m256i columns, __m256i rows, int n, uint8_t* dst) const {
+    QORI_INLINE void operator()(const Block& block, int n, uint8_t* dst) const {
         alignas(kVectorBytes) int32_t offsets[8];
-        store(offsets, Vec<int32_t>{offsetsOf<pixelBytes>(columns, rows, step)});
+        store(offsets, Vec<int32_t>{block.offsets});
         __asm__("" : "+m"(offsets));  // to be loaded, not moved out of the vector
         prefetchAhead(origin + offsets[0], ahead);
         prefetchAhead(origin + offsets[4], ahead);
@@ -108,23 +88,27 @@ struct Moves {
     }
 };
 
-template <int pixelBytes, bool anywhere>
+enum class Reads { fixed, inside, anywhere };
+
+template <int pixelBytes, Reads reads>
 void nearestRun(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
                 uint8_t* dst) {
+    constexpr bool anywhere = reads == Reads::anywhere;
     if (!anywhere && line.alongX == 1 && line.alongY == 0) {
         const auto x = static_cast<int32_t>(__builtin_floor(first + line.startX - kFineBias));
         const auto y = static_cast<int32_t>(__builtin_floor(line.startY - kFineBias));
         return copyRow(dst, source.origin + y * source.step + x * ptrdiff_t{pixelBytes}, count * ptrdiff_t{pixelBytes});
     }
-    const auto across = horizontal<anywhere>(line, box);
-    const auto down = vertical<anywhere>(line, box);
+    constexpr int kPixels = 8;
     using Way = std::conditional_t<pixelBytes <= 8, Gather<pixelBytes, anywhere>, Moves<pixelBytes>>;
     const Way way(source);
-    forEights(
-        first, count, [&](Columns columns, int n) __attribute__((always_inline)) {
-            way(across.at(columns).whole, down.at(columns).whole, n, dst);
-            dst += n * pixelBytes;
-        });
+    const auto body = [&](const auto& blocks, int n, int32_t at) __attribute__((always_inline)) {
+        way(blocks.at(0), n, dst + ptrdiff_t{at} * pixelBytes);
+    };
+    if constexpr (reads == Reads::fixed)
+        forFixedBlocks<kPixels, pixelBytes>(source, line, first, count, body);
+    else
+        forDoubleBlocks<kPixels, pixelBytes, anywhere, kWord<pixelBytes>>(source, line, box, first, count, body);
 }
 
 template <int pixelBytes>
@@ -148,7 +132,14 @@ void nearestFar(const WarpSource& source, const WarpLine& line, const WarpBox& b
 template <int pixelBytes>
 WarpKernels nearestKernels() {
     constexpr int32_t behind = pixelBytes <= 8 ? (kWord<pixelBytes> - 1) / pixelBytes : 0;
-    return {nearestRun<pixelBytes, false>, nearestRun<pixelBytes, true>, nearestFar<pixelBytes>, 0, 0, behind, 0};
+    return {nearestRun<pixelBytes, Reads::inside>,
+            nearestRun<pixelBytes, Reads::anywhere>,
+            nearestFar<pixelBytes>,
+            0,
+            0,
+            behind,
+            0,
+            nearestRun<pixelBytes, Reads::fixed>};
 }
 
 template WarpKernels nearestKernels<1>();

@@ -14,6 +14,11 @@ namespace qori::kernels {
 inline constexpr double kFineBias = 0x1.8p20;           ///< 32 bits below the point.
 inline constexpr double kCoarseBias = 0x1.8p32;         ///< 20 bits, for whole parts to 2^31.
 inline constexpr int32_t kFineLength = (1 << 19) - 16;  ///< Sides of images that the fine bias serves are below it.
+
+/// Fixed positions (fixed_places.h) serve sources whose sides and step are below a word's limit, and destinations as
+/// wide; coefficients of columns up to the first of these. They differ from the others' by 2^-31 at most.
+inline constexpr int32_t kFixedLength = 1 << 15, kFixedWidth = 1 << 16;
+inline constexpr double kFixedMargin = 0x1p-24;
 constexpr double unitOfBias(double bias) { return bias == kFineBias ? 0x1p-32 : 0x1p-20; }
 
 /// The positions of one destination row: that of column x is x * along + start, in either direction.
@@ -22,6 +27,8 @@ struct WarpLine {
     double startX, startY;  ///< With the bias.
     double exactX, exactY;  ///< Without it, for elements of double precision.
     double bias;
+    uint64_t fixedAlongX, fixedAlongY;  ///< In units of 2^-48, modulo 2^64, for kernels of fixed positions.
+    uint64_t fixedX, fixedY;
 };
 
 /// Positions without bias, ends included.
@@ -59,6 +66,8 @@ struct WarpKernels {
     /// kNearRowBytes.
     WarpKernel far;
     int32_t left, top, right, bottom;
+    /// As `inside`, by fixed positions; null if there is none.
+    WarpKernel fixed = nullptr;
 };
 
 inline constexpr int kNearRowBytes = 8;
@@ -197,6 +206,15 @@ QORI_INLINE void prefetchAhead(const uint8_t* at, ptrdiff_t ahead) {
 QORI_INLINE void prefetchAhead(const uint8_t* origin, __m256i offsets, ptrdiff_t ahead) {
     prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(offsets)), ahead);
     prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_extracti128_si256(offsets, 1)), ahead);
+}
+
+/// The first bytes of a vector: 8, or 16 to 32 in eights.
+template <int bytes>
+QORI_INLINE void storeFirst(uint8_t* dst, Bytes a) {
+    if constexpr (bytes == 32) return store(dst, a);
+    if constexpr (bytes >= 16) _mm_storeu_si128(reinterpret_cast<__m128i*>(dst), _mm256_castsi256_si128(a.v));
+    const __m128i rest = bytes >= 16 ? _mm256_extracti128_si256(a.v, 1) : _mm256_castsi256_si128(a.v);
+    if constexpr (bytes % 16 != 0) _mm_storel_epi64(reinterpret_cast<__m128i*>(dst + bytes / 16 * 16), rest);
 }
 
 /// A pixel of fixed size, read before it is written: images may overlap where the caller does not mind what comes out.
