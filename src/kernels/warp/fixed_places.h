@@ -146,36 +146,52 @@ private:
     __m256d at_[kVectors];
 };
 
-/// Calls body(blocks, n, at) for blocks of columns, of which the last begins early enough to end with them; n is a
-/// block, or all of fewer columns, behind which the last is repeated. `blocksFrom` is given a column and n.
-template <class Blocks, class From, class Body>
-QORI_INLINE void forBlocks(From blocksFrom, int32_t first, int32_t count, Body body) {
-    constexpr int n = Blocks::kPixels;
-    if (count < n) return body(blocksFrom(first, count), count, 0);
-    Blocks blocks = blocksFrom(first, n);
-    int32_t at = 0;
-    for (; count - at >= n; at += n, blocks.next()) body(blocks, n, at);
-    if (at < count) body(blocksFrom(first + count - n, n), n, count - n);
-}
-
-template <int pixels, int pixelBytes, class Body>
-QORI_INLINE void forFixedBlocks(const WarpSource& source, const WarpLine& line, int32_t first, int32_t count,
-                                Body body) {
-    using Blocks = FixedBlocks<pixels, pixelBytes>;
-    const auto from = [&](int32_t column, int n) __attribute__((always_inline)) {
-        return n < pixels ? Blocks(line, source, column, n) : Blocks(line, source, column);
+/// Makes pixels block by block, of which the last begins early enough to end with them; of fewer the last is repeated.
+/// Way::prepare takes positions to what Way::make reads pixels by. Where kPreparesAhead, it runs a block ahead: offsets
+/// that go through memory would be waited for. `blocksFrom` is given a column and how many there are.
+template <class Way, class From>
+QORI_INLINE void makeBlocks(const Way& way, From blocksFrom, int32_t first, int32_t count, uint8_t* dst) {
+    constexpr int n = Way::kPixels, pixelBytes = Way::kPixelBytes;
+    const auto makeAt = [&](const auto& blocks, int at, int pixels) __attribute__((always_inline)) {
+        typename Way::Prepared prepared;
+        way.prepare(blocks, prepared);
+        way.make(prepared, dst + ptrdiff_t{at} * pixelBytes, pixels);
     };
-    forBlocks<Blocks>(from, first, count, body);
+    if (count < n) return makeAt(blocksFrom(first, count), 0, count);
+    auto blocks = blocksFrom(first, n);
+    int at = 0;
+    if constexpr (Way::kPreparesAhead) {
+        typename Way::Prepared ring[2];
+        way.prepare(blocks, ring[0]);
+        for (int k = 0; count - at >= n; at += n, k ^= 1) {
+            blocks.next();
+            way.prepare(blocks, ring[k ^ 1]);
+            way.make(ring[k], dst + ptrdiff_t{at} * pixelBytes, n);
+        }
+    } else {
+        for (; count - at >= n; at += n, blocks.next()) makeAt(blocks, at, n);
+    }
+    if (at < count) makeAt(blocksFrom(first + count - n, n), count - n, n);
 }
 
-template <int pixels, int pixelBytes, bool clamps, int wordBytes, class Body>
-QORI_INLINE void forDoubleBlocks(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first,
-                                 int32_t count, Body body) {
-    using Blocks = DoubleBlocks<pixels, pixelBytes, clamps, wordBytes>;
+template <class Way>
+QORI_INLINE void makeFixedBlocks(const Way& way, const WarpSource& source, const WarpLine& line, int32_t first,
+                                 int32_t count, uint8_t* dst) {
+    using Blocks = FixedBlocks<Way::kPixels, Way::kPixelBytes>;
+    const auto from = [&](int32_t column, int n) __attribute__((always_inline)) {
+        return n < Way::kPixels ? Blocks(line, source, column, n) : Blocks(line, source, column);
+    };
+    makeBlocks(way, from, first, count, dst);
+}
+
+template <bool clamps, class Way>
+QORI_INLINE void makeDoubleBlocks(const Way& way, const WarpSource& source, const WarpLine& line, const WarpBox& box,
+                                  int32_t first, int32_t count, uint8_t* dst) {
+    using Blocks = DoubleBlocks<Way::kPixels, Way::kPixelBytes, clamps, Way::kWord>;
     const auto from = [&](int32_t column, int n) __attribute__((always_inline)) {
         return Blocks(line, box, source, column, n);
     };
-    forBlocks<Blocks>(from, first, count, body);
+    makeBlocks(way, from, first, count, dst);
 }
 
 }  // namespace qori::kernels::warp

@@ -172,7 +172,11 @@ QORI_INLINE void mixDoubles(const uint8_t* top, const uint8_t* bottom, double x,
         __m256d right = mix(_mm256_loadu_pd(a + second), _mm256_loadu_pd(b + second), fy);
         if constexpr (channels == 3) right = _mm256_permute4x64_pd(right, 0xF9);
         const Vec<double> mixed{mix(left, right, _mm256_set1_pd(x))};
-        storeUpTo(reinterpret_cast<double*>(dst), mixed, isLast ? channels : 4);
+        auto* to = reinterpret_cast<double*>(dst);
+        if constexpr (channels == 3) {
+            if (isLast) return storePartial(to, mixed, channels);
+        }
+        store(to, mixed);
     }
 }
 

@@ -41,41 +41,76 @@ QORI_INLINE __m256i inBothBlocks(__m128i table) { return _mm256_broadcastsi128_s
 /// the low and the high words of one vector.
 template <bool anywhere>
 struct Gray {
-    static constexpr int kPixels = 16, kWord = 4;
+    static constexpr int kPixels = 16, kPixelBytes = 1, kWord = 4;
+    static constexpr bool kPreparesAhead = false;
+
+    Rows rows;
 
     QORI_INLINE static __m256i join(__m256i low, __m256i high) {
         return _mm256_blend_epi16(low, _mm256_slli_epi32(high, 16), 0xAA);
     }
 
-    QORI_INLINE static __m256i pairs(const uint8_t* row, const Block& a, const Block& b) {
-        const auto at = [=](const Block& block) __attribute__((always_inline)) {
-            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(row), block.offsets, 1);
-            return anywhere ? _mm256_srlv_epi32(words, block.shifts) : words;
-        };
-        return join(at(a), at(b));
-    }
+    struct Prepared {
+        __m256i offsets[2], shifts[2], across, down;
+    };
 
     template <class Blocks>
-    QORI_INLINE static Bytes make(const Rows& rows, const Blocks& blocks) {
+    QORI_INLINE void prepare(const Blocks& blocks, Prepared& to) const {
         const Block a = blocks.at(0), b = blocks.at(1);
-        if constexpr (!anywhere)
-            prefetchAhead(rows.above + _mm_cvtsi128_si32(_mm256_castsi256_si128(a.offsets)), rows.ahead);
-        const __m256i across = acrossOf(join(a.x, b.x)), down = downOf(join(a.y, b.y));
-        const __m256i mixed = mix(pairs(rows.above, a, b), pairs(rows.below, a, b), across, down);
-        constexpr char x = -1;
-        const __m256i order = inBothBlocks(_mm_setr_epi8(0, 4, 8, 12, 2, 6, 10, 14, x, x, x, x, x, x, x, x));
-        return {_mm256_permute4x64_epi64(_mm256_shuffle_epi8(mixed, order), 0x08)};
+        to.offsets[0] = a.offsets;
+        to.offsets[1] = b.offsets;
+        if constexpr (anywhere) {
+            to.shifts[0] = a.shifts;
+            to.shifts[1] = b.shifts;
+        }
+        to.across = acrossOf(join(a.x, b.x));
+        to.down = downOf(join(a.y, b.y));
     }
 
-    QORI_INLINE static void write(uint8_t* dst, Bytes pixels) { storeFirst<kPixels>(dst, pixels); }
-    QORI_INLINE static void write(uint8_t* dst, Bytes pixels, int n) { storePartial(dst, pixels, n); }
+    QORI_INLINE static __m256i pairs(const uint8_t* row, const Prepared& from) {
+        const auto at = [&](int k) __attribute__((always_inline)) {
+            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(row), from.offsets[k], 1);
+            return anywhere ? _mm256_srlv_epi32(words, from.shifts[k]) : words;
+        };
+        return join(at(0), at(1));
+    }
+
+    QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
+        if constexpr (!anywhere)
+            prefetchAhead(rows.above + _mm_cvtsi128_si32(_mm256_castsi256_si128(from.offsets[0])), rows.ahead);
+        const __m256i mixed = mix(pairs(rows.above, from), pairs(rows.below, from), from.across, from.down);
+        constexpr char x = -1;
+        const __m256i order = inBothBlocks(_mm_setr_epi8(0, 4, 8, 12, 2, 6, 10, 14, x, x, x, x, x, x, x, x));
+        const Bytes pixels{_mm256_permute4x64_epi64(_mm256_shuffle_epi8(mixed, order), 0x08)};
+        if (n == kPixels)
+            storeFirst<kPixels>(dst, pixels);
+        else
+            storePartial(dst, pixels, n);
+    }
 };
 
 /// Three or four channels: eight bytes hold two neighbours; with three, the last two are not used. Four pixels are in a
 /// vector: 0, 1, 4, 5 and 2, 3, 6, 7.
 template <int channels, bool anywhere>
 struct Packed {
-    static constexpr int kPixels = 8, kWord = 8;
+    static constexpr int kPixels = 8, kPixelBytes = channels, kWord = 8;
+    static constexpr bool kPreparesAhead = true;
+
+    Rows rows;
+
+    struct Prepared {
+        alignas(kVectorBytes) int32_t offsets[8], shifts[8];
+        __m256i x, y;
+    };
+
+    template <class Blocks>
+    QORI_INLINE void prepare(const Blocks& blocks, Prepared& to) const {
+        const Block block = blocks.at(0);
+        qori::store(to.offsets, Vec<int32_t>{block.offsets});
+        if constexpr (anywhere) qori::store(to.shifts, Vec<int32_t>{block.shifts});
+        to.x = acrossOf(block.x);
+        to.y = downOf(block.y);
+    }
 
     /// Blocks of 16 bytes, of which one half is taken, cost less than words that are gathered or put together.
     QORI_INLINE static __m256i readBlocks(const uint8_t* row, const int32_t* offsets) {
@@ -84,48 +119,40 @@ struct Packed {
         return _mm256_blend_epi32(first.v, second.v, 0xCC);
     }
 
-    QORI_INLINE static __m256i gather(const uint8_t* row, __m128i offsets, __m128i shifts) {
-        const __m256i words = _mm256_i32gather_epi64(reinterpret_cast<const long long*>(row), offsets, 1);
-        return channels == 4 ? words : _mm256_srlv_epi64(words, _mm256_cvtepu32_epi64(shifts));
+    /// Pixels k, k + 1, k + 4 and k + 5.
+    QORI_INLINE static __m256i gather(const uint8_t* row, const Prepared& from, int k) {
+        const auto four = [=](const int32_t* p) __attribute__((always_inline)) {
+            return _mm_unpacklo_epi64(_mm_loadl_epi64(reinterpret_cast<const __m128i*>(p + k)),
+                                      _mm_loadl_epi64(reinterpret_cast<const __m128i*>(p + k + 4)));
+        };
+        const auto* words = reinterpret_cast<const long long*>(row);
+        const __m256i gathered = _mm256_i32gather_epi64(words, four(from.offsets), 1);
+        return channels == 4 ? gathered : _mm256_srlv_epi64(gathered, _mm256_cvtepu32_epi64(four(from.shifts)));
     }
 
-    /// `fractions` says which words of x and y belong to the pixels.
-    QORI_INLINE static __m256i mixFour(__m256i above, __m256i below, __m256i x, __m256i y, __m256i fractions) {
+    /// Pixels k, k + 1, k + 4 and k + 5, as words.
+    template <int k>
+    QORI_INLINE __m256i four(const Prepared& from) const {
+        const auto read = [&](const uint8_t* row) __attribute__((always_inline)) {
+            return anywhere ? gather(row, from, k) : readBlocks(row, from.offsets + k);
+        };
         constexpr char c = channels, f = c == 4 ? 7 : 3;  // the fourth of three is anything
         const __m256i pairs =
             inBothBlocks(_mm_setr_epi8(0, c, 1, c + 1, 2, c + 2, 3, f, 8, c + 8, 9, c + 9, 10, c + 10, 11, f + 8));
-        return mix(_mm256_shuffle_epi8(above, pairs), _mm256_shuffle_epi8(below, pairs),
-                   _mm256_shuffle_epi8(x, fractions), _mm256_shuffle_epi8(y, fractions));
+        constexpr char a = 4 * k, b = a + 1, d = a + 4, e = a + 5;
+        const __m256i own = inBothBlocks(_mm_setr_epi8(a, b, a, b, a, b, a, b, d, e, d, e, d, e, d, e));
+        return mix(_mm256_shuffle_epi8(read(rows.above), pairs), _mm256_shuffle_epi8(read(rows.below), pairs),
+                   _mm256_shuffle_epi8(from.x, own), _mm256_shuffle_epi8(from.y, own));
     }
 
-    /// Four bytes a pixel.
-    template <class Blocks>
-    QORI_INLINE static Bytes make(const Rows& rows, const Blocks& blocks) {
-        const Block block = blocks.at(0);
-        const __m256i x = acrossOf(block.x), y = downOf(block.y);
-        const __m256i firstTwo = inBothBlocks(_mm_setr_epi8(0, 1, 0, 1, 0, 1, 0, 1, 4, 5, 4, 5, 4, 5, 4, 5));
-        const __m256i lastTwo = inBothBlocks(_mm_setr_epi8(8, 9, 8, 9, 8, 9, 8, 9, 12, 13, 12, 13, 12, 13, 12, 13));
-        if constexpr (anywhere) {
-            const __m256i at = _mm256_permute4x64_epi64(block.offsets, 0xD8),
-                          by = _mm256_permute4x64_epi64(block.shifts, 0xD8);
-            const auto four = [&](__m128i offsets, __m128i shifts, __m256i fractions) __attribute__((always_inline)) {
-                return mixFour(gather(rows.above, offsets, shifts), gather(rows.below, offsets, shifts), x, y,
-                               fractions);
-            };
-            const __m256i first = four(_mm256_castsi256_si128(at), _mm256_castsi256_si128(by), firstTwo);
-            const __m256i second = four(_mm256_extracti128_si256(at, 1), _mm256_extracti128_si256(by, 1), lastTwo);
-            return {_mm256_packus_epi16(first, second)};
-        } else {
-            alignas(kVectorBytes) int32_t at[8];
-            qori::store(at, Vec<int32_t>{block.offsets});
-            __asm__("" : "+m"(at));  // to be loaded: moves out of the vector would take the shuffles' ports
-            prefetchAhead(rows.above + at[0], rows.ahead);
-            const auto four = [&](const int32_t* offsets, __m256i fractions) __attribute__((always_inline)) {
-                return mixFour(readBlocks(rows.above, offsets), readBlocks(rows.below, offsets), x, y, fractions);
-            };
-            const __m256i first = four(at, firstTwo);
-            return {_mm256_packus_epi16(first, four(at + 2, lastTwo))};
-        }
+    QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
+        if constexpr (!anywhere) prefetchAhead(rows.above + from.offsets[0], rows.ahead);
+        const __m256i first = four<0>(from);
+        const Bytes pixels{_mm256_packus_epi16(first, four<2>(from))};
+        if (n == kPixels)
+            write(dst, pixels);
+        else
+            write(dst, pixels, n);
     }
 
     /// Of three bytes a pixel, those of the last four pixels are put at the end of their block: one store writes them
@@ -158,19 +185,11 @@ void linearBytes(const WarpSource& source, const WarpLine& line, const WarpBox& 
                  uint8_t* dst) {
     constexpr bool anywhere = reads == ByteReads::anywhere;
     using Way = std::conditional_t<channels == 1, Gray<anywhere>, Packed<channels, anywhere>>;
-    constexpr int kPixels = Way::kPixels;
-    const Rows rows(source);
-    const auto body = [&](const auto& blocks, int n, int32_t at) __attribute__((always_inline)) {
-        const Bytes pixels = Way::make(rows, blocks);
-        if (n == kPixels)
-            Way::write(dst + at * channels, pixels);
-        else
-            Way::write(dst + at * channels, pixels, n);
-    };
+    const Way way{Rows(source)};
     if constexpr (reads == ByteReads::fixed)
-        forFixedBlocks<kPixels, channels>(source, line, first, count, body);
+        makeFixedBlocks(way, source, line, first, count, dst);
     else
-        forDoubleBlocks<kPixels, channels, anywhere, Way::kWord>(source, line, box, first, count, body);
+        makeDoubleBlocks<anywhere>(way, source, line, box, first, count, dst);
 }
 
 #define QORI_LINEAR_BYTES(n, reads)                                                                             \

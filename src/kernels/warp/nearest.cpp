@@ -11,7 +11,7 @@ using namespace warp;
 
 /// Pixels of up to 8 bytes are gathered as words of 4 or 8, whose first bytes they are.
 template <int pixelBytes>
-constexpr int kWord = pixelBytes <= 4 ? 4 : 8;
+constexpr int kWordOf = pixelBytes <= 4 ? 4 : 8;
 
 constexpr __m256i shufflePattern(auto byteAt) {
     alignas(kVectorBytes) struct { uint8_t at[kVectorBytes]; } table{};
@@ -22,7 +22,7 @@ constexpr __m256i shufflePattern(auto byteAt) {
 /// Brings the first bytes of the words together, at the vector's beginning.
 template <int pixelBytes>
 QORI_INLINE Bytes packPixels(__m256i words) {
-    constexpr int word = kWord<pixelBytes>, inBlock = kBlockBytes / word * pixelBytes;
+    constexpr int word = kWordOf<pixelBytes>, inBlock = kBlockBytes / word * pixelBytes;
     if constexpr (pixelBytes == word) return {words};
     constexpr auto byteAt = [](int i) { return i < inBlock ? i / pixelBytes * word + i % pixelBytes : 0x80; };
     const __m256i packed = _mm256_shuffle_epi8(words, shufflePattern(byteAt));
@@ -35,26 +35,36 @@ QORI_INLINE Bytes packPixels(__m256i words) {
 
 template <int pixelBytes, bool anywhere>
 struct Gather {
+    static constexpr int kPixels = 8, kPixelBytes = pixelBytes, kWord = kWordOf<pixelBytes>;
+    static constexpr bool kPreparesAhead = false;
+
     const uint8_t* origin;
     ptrdiff_t ahead;
 
-    QORI_INLINE explicit Gather(const WarpSource& source) : origin(source.origin), ahead(source.ahead) {}
+    struct Prepared {
+        __m256i offsets, shifts;
+    };
 
-    QORI_INLINE void operator()(const Block& block, int n, uint8_t* dst) const {
-        if constexpr (!anywhere)
-            prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(block.offsets)), ahead);
-        constexpr bool shifts = anywhere && pixelBytes != kWord<pixelBytes>;
-        if constexpr (kWord<pixelBytes> == 4) {
-            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), block.offsets, 1);
-            write<8>(shifts ? _mm256_srlv_epi32(words, block.shifts) : words, n, dst);
+    template <class Blocks>
+    QORI_INLINE void prepare(const Blocks& blocks, Prepared& to) const {
+        const Block block = blocks.at(0);
+        to = {block.offsets, block.shifts};
+    }
+
+    QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
+        if constexpr (!anywhere) prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(from.offsets)), ahead);
+        constexpr bool shifts = anywhere && pixelBytes != kWord;
+        if constexpr (kWord == 4) {
+            const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), from.offsets, 1);
+            write<8>(shifts ? _mm256_srlv_epi32(words, from.shifts) : words, n, dst);
         } else {
             const auto half = [&](__m128i o, __m128i s) __attribute__((always_inline)) {
                 const __m256i words = _mm256_i32gather_epi64(reinterpret_cast<const long long*>(origin), o, 1);
                 return shifts ? _mm256_srlv_epi64(words, _mm256_cvtepu32_epi64(s)) : words;
             };
-            write<4>(half(_mm256_castsi256_si128(block.offsets), _mm256_castsi256_si128(block.shifts)), n, dst);
+            write<4>(half(_mm256_castsi256_si128(from.offsets), _mm256_castsi256_si128(from.shifts)), n, dst);
             if (n > 4)
-                write<4>(half(_mm256_extracti128_si256(block.offsets, 1), _mm256_extracti128_si256(block.shifts, 1)),
+                write<4>(half(_mm256_extracti128_si256(from.offsets, 1), _mm256_extracti128_si256(from.shifts, 1)),
                          n - 4, dst + 4 * pixelBytes);
         }
     }
@@ -73,18 +83,26 @@ private:
 /// Larger pixels one by one.
 template <int pixelBytes>
 struct Moves {
+    static constexpr int kPixels = 8, kPixelBytes = pixelBytes, kWord = pixelBytes;
+    static constexpr bool kPreparesAhead = false;
+
     const uint8_t* origin;
     ptrdiff_t ahead;
 
-    QORI_INLINE explicit Moves(const WarpSource& source) : origin(source.origin), ahead(source.ahead) {}
-
-    QORI_INLINE void operator()(const Block& block, int n, uint8_t* dst) const {
+    struct Prepared {
         alignas(kVectorBytes) int32_t offsets[8];
-        store(offsets, Vec<int32_t>{block.offsets});
-        __asm__("" : "+m"(offsets));  // to be loaded, not moved out of the vector
-        prefetchAhead(origin + offsets[0], ahead);
-        prefetchAhead(origin + offsets[4], ahead);
-        for (int i = 0; i < n; ++i) movePixel<pixelBytes>(dst + i * pixelBytes, origin + offsets[i]);
+    };
+
+    template <class Blocks>
+    QORI_INLINE void prepare(const Blocks& blocks, Prepared& to) const {
+        store(to.offsets, Vec<int32_t>{blocks.at(0).offsets});
+        __asm__("" : "+m"(to.offsets));  // to be loaded, not moved out of the vector
+    }
+
+    QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
+        prefetchAhead(origin + from.offsets[0], ahead);
+        prefetchAhead(origin + from.offsets[4], ahead);
+        for (int i = 0; i < n; ++i) movePixel<pixelBytes>(dst + i * pixelBytes, origin + from.offsets[i]);
     }
 };
 
@@ -99,16 +117,12 @@ void nearestRun(const WarpSource& source, const WarpLine& line, const WarpBox& b
         const auto y = static_cast<int32_t>(__builtin_floor(line.startY - kFineBias));
         return copyRow(dst, source.origin + y * source.step + x * ptrdiff_t{pixelBytes}, count * ptrdiff_t{pixelBytes});
     }
-    constexpr int kPixels = 8;
     using Way = std::conditional_t<pixelBytes <= 8, Gather<pixelBytes, anywhere>, Moves<pixelBytes>>;
-    const Way way(source);
-    const auto body = [&](const auto& blocks, int n, int32_t at) __attribute__((always_inline)) {
-        way(blocks.at(0), n, dst + ptrdiff_t{at} * pixelBytes);
-    };
+    const Way way{source.origin, source.ahead};
     if constexpr (reads == Reads::fixed)
-        forFixedBlocks<kPixels, pixelBytes>(source, line, first, count, body);
+        makeFixedBlocks(way, source, line, first, count, dst);
     else
-        forDoubleBlocks<kPixels, pixelBytes, anywhere, kWord<pixelBytes>>(source, line, box, first, count, body);
+        makeDoubleBlocks<anywhere>(way, source, line, box, first, count, dst);
 }
 
 template <int pixelBytes>
@@ -131,7 +145,7 @@ void nearestFar(const WarpSource& source, const WarpLine& line, const WarpBox& b
 
 template <int pixelBytes>
 WarpKernels nearestKernels() {
-    constexpr int32_t behind = pixelBytes <= 8 ? (kWord<pixelBytes> - 1) / pixelBytes : 0;
+    constexpr int32_t behind = pixelBytes <= 8 ? (kWordOf<pixelBytes> - 1) / pixelBytes : 0;
     return {nearestRun<pixelBytes, Reads::inside>,
             nearestRun<pixelBytes, Reads::anywhere>,
             nearestFar<pixelBytes>,
