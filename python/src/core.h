@@ -251,9 +251,7 @@ typedef struct Call {
     const struct Plan* plan;
     int32_t size_height, size_width; /* the neighbourhood's, for queries */
     int64_t buffer_bytes;
-    void* blocks[12]; /* memory of the call, freed at its end */
     int block_count;
-    Image arrays[12]; /* of kernels and lists */
     int array_count;
     int32_t counts[4]; /* entries of lists */
     int32_t list_elements;
@@ -262,13 +260,16 @@ typedef struct Call {
     PyObject* arguments[MAX_PARAMETERS];
     int32_t pairs[MAX_PARAMETERS][2];
     Image images[IMAGES];
+    int value_count;
+    Slot slots[MAX_SLOTS];
+    int small_used;
+    /* What most calls do without stands last, so that the rest lies together. */
     union {
         uint8_t bytes[64];
         double alignment;
     } values[8], results[6];
-    int value_count;
-    Slot slots[MAX_SLOTS];
-    int small_used;
+    void* blocks[12];                 /* memory of the call, freed at its end */
+    Image arrays[12];                 /* of kernels and lists */
     _Alignas(64) uint8_t small[2048]; /* for what a small call needs, without malloc */
 } Call;
 

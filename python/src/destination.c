@@ -24,13 +24,16 @@ int check_writable(const Call* call, const Image* image, const char* name) {
 /* Whether an input is the destination itself: 1 exactly, 0 apart, -1 refused. */
 int meets(const Call* call, int which, const char* name) {
     const Image *in = &call->images[which], *out = &call->images[OUT];
-    Image around = *in;
-    if (which == SRC) {
+    Image around;
+    const Image* read = in;
+    if (which == SRC && (call->top | call->left | call->bottom | call->right)) {
+        around = *in;
+        read = &around;
         around.data = in->data - (Py_ssize_t)call->top * in->step - (Py_ssize_t)call->left * pixel_bytes(in);
         around.height = in->height + call->top + call->bottom;
         around.width = in->width + call->left + call->right;
     }
-    if (!overlapping(&around, out)) return 0;
+    if (!overlapping(read, out)) return 0;
     const int exact = in->data == out->data && (in->step == out->step || in->height < 2) && in->height == out->height &&
                       in->width == out->width && element_bytes[in->element] == element_bytes[out->element] &&
                       in->layout == out->layout && (!(in->layout & PLANAR) || in->plane == out->plane);

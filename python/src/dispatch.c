@@ -62,30 +62,27 @@ PyObject* member_for(const Operation* operation, PyObject* const* arguments, Py_
     return result;
 }
 
-int invoke(const Call* call) {
-    const Form* form = call->form;
-    const Function function = call->in_place ? form->in_place : form->function;
-    const Trampoline trampoline = all_trampolines[call->in_place ? form->in_place_signature : form->signature];
-    int status;
-    const int heavy = form->reach | form->plan | form->extent;
-    if (traffic(call) >= (heavy ? RELEASE_BYTES_FILTER : RELEASE_BYTES)) {
-        PyThreadState* thread = PyEval_SaveThread();
-        status = trampoline(function, call->slots);
-        PyEval_RestoreThread(thread);
-    } else {
-        status = trampoline(function, call->slots);
-    }
-    return status ? status_result(call, member_of(call), status) : 0;
-}
-
 PyObject* run(const Operation* operation, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
     Call call;
     PyObject* result = NULL;
     start_call(&call, operation);
-    if (!bind(&call, arguments, count, names) && !prepare(&call) &&
-        !execute(&call, all_programs[call.in_place ? call.form->in_place_program : call.form->program]) &&
-        !invoke(&call))
-        result = result_of(&call);
+    const int ready = operation->has[HAS_PLAN] == 1 ? prepare_straight(&call, arguments, count, names) : 0;
+    if (ready < 0 || (!ready && (bind(&call, arguments, count, names) || prepare(&call)))) goto end;
+    const Form* form = call.form;
+    const Function function = call.in_place ? form->in_place : form->function;
+    if (execute(&call, all_programs[call.in_place ? form->in_place_program : form->program])) goto end;
+    const Trampoline trampoline = all_trampolines[call.in_place ? form->in_place_signature : form->signature];
+    int status;
+    const int heavy = form->reach | form->plan | form->extent;
+    if (traffic(&call) >= (heavy ? RELEASE_BYTES_FILTER : RELEASE_BYTES)) {
+        PyThreadState* thread = PyEval_SaveThread();
+        status = trampoline(function, call.slots);
+        PyEval_RestoreThread(thread);
+    } else {
+        status = trampoline(function, call.slots);
+    }
+    if (!status || !status_result(&call, member_of(&call), status)) result = result_of(&call);
+end:
     free_call(&call);
     return result;
 }

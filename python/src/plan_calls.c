@@ -97,40 +97,35 @@ static int goes_straight(const Plan* plan, const Form* form, const Image* in, co
            (out->height < 2 || out->step >= out->width * pixel_bytes(out)) && !overlapping(in, out);
 }
 
-/* plan(src, out=array) by its usual form; Py_None where the call is another and takes the general way, which finds the
- * same form and tells what is wrong. */
-static PyObject* run_straight(const Plan* plan, PyObject* source, PyObject* target) {
-    Call call;
-    PyObject* result = NULL;
-    const Operation* operation = start_call(&call, functions[plan->kind])->operation;
-    Image *in = &call.images[SRC], *out = &call.images[OUT];
-    if (acquire(&call, source, operation->parameters[0].name, in, SRC) ||
-        acquire(&call, target, operation->parameters[(int)operation->has[HAS_OUT]].name, out, OUT))
-        goto end;
-    call.plan = plan;
-    call.form = in->layout < PLANAR ? plan->usual[in->layout] : NULL;
-    if (!goes_straight(plan, call.form, in, out)) {
-        result = Py_None;
-        goto end;
+/* An operation with a plan of resizes, called as (src, plan, out) or (src, plan, out=...): 1 where the call is ready by
+ * the plan's usual form, -1 with an exception set, 0 where it takes the general way, which finds the same form and
+ * tells what is wrong. */
+int prepare_straight(Call* call, PyObject* const* arguments, Py_ssize_t count, PyObject* names) {
+    const Operation* operation = call->operation;
+    const int target = operation->has[HAS_OUT];
+    if (count + (names ? PyTuple_Size(names) : 0) != 3 || count < 2 || arguments[2] == Py_None ||
+        Py_TYPE(arguments[1]) != shared.plan_types[RESIZE_PLAN] ||
+        (count == 2 && PyTuple_GetItem(names, 0) != parameter_names[operation->parameters - all_parameters + target]))
+        return 0;
+    const Plan* plan = (const Plan*)arguments[1];
+    Image *in = &call->images[SRC], *out = &call->images[OUT];
+    if (acquire(call, arguments[0], operation->parameters[0].name, in, SRC) ||
+        acquire(call, arguments[2], operation->parameters[target].name, out, OUT))
+        return -1;
+    const Form* form = in->layout < PLANAR ? plan->usual[in->layout] : NULL;
+    if (!goes_straight(plan, form, in, out)) {
+        release(in);
+        release(out);
+        return 0;
     }
-    call.height = in->height;
-    call.width = in->width;
-    if (!execute(&call, all_programs[call.form->program]) && !invoke(&call)) result = Py_NewRef(target);
-end:
-    free_call(&call);
-    return result;
+    call->plan = plan;
+    call->form = form;
+    call->height = in->height;
+    call->width = in->width;
+    call->arguments[target] = arguments[2];
+    return 1;
 }
 
 PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t flags, PyObject* names) {
-    const Plan* plan = (const Plan*)self;
-    const Operation* operation = functions[plan->kind];
-    const Py_ssize_t count = (Py_ssize_t)(flags & ~((size_t)1 << 63));
-    if (plan->kind == RESIZE_PLAN && count + (names ? PyTuple_Size(names) : 0) == 2 && count > 0 &&
-        arguments[1] != Py_None &&
-        (count == 2 || PyTuple_GetItem(names, 0) ==
-                           parameter_names[operation->parameters - all_parameters + operation->has[HAS_OUT]])) {
-        PyObject* result = run_straight(plan, arguments[0], arguments[1]);
-        if (result != Py_None) return result;
-    }
-    return with_plan(operation, self, arguments, count, names);
+    return with_plan(functions[((Plan*)self)->kind], self, arguments, (Py_ssize_t)(flags & ~((size_t)1 << 63)), names);
 }

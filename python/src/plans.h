@@ -40,6 +40,7 @@ typedef struct Plan {
 /* plan_calls.c */
 void find_plan_functions(void);
 const Form* usual_form(const Plan* plan, int channels);
+int prepare_straight(Call* call, PyObject* const* arguments, Py_ssize_t count, PyObject* names);
 PyObject* call_plan_directly(PyObject* self, PyObject* const* arguments, size_t flags, PyObject* names);
 PyObject* call_plan(PyObject* self, PyObject* arguments, PyObject* keywords);
 PyObject* plan_forward(PyObject* self, PyObject* const* arguments, Py_ssize_t count, PyObject* names);

@@ -29,9 +29,6 @@ int lists_out(Call* call, int which, int channels, Slot* slot);
 /* program.c: fills the slots of the C call. */
 int execute(Call* call, const Step* step);
 
-/* dispatch.c: calls the member whose slots are filled; 0, or -1 with an exception set. */
-int invoke(const Call* call);
-
 /* results.c */
 PyObject* result_of(Call* call);
 
