@@ -77,10 +77,8 @@ struct ResizePlan {
     }
 };
 
-/// Where a tile's pSrc lies in the source. Most tiles begin where the image does, and a division of 64 bits costs as much
-/// as a small resize's row.
+/// Where a tile's pSrc lies in the source.
 inline int32_t sourceOffset(const Axis& axis, int32_t position) {
-    if (position == 0) return 0;
     return static_cast<int32_t>(int64_t{position} * axis.sourceReduced / axis.targetReduced);
 }
 

@@ -35,7 +35,9 @@ struct TileSource {
     }
     /// For ways that read no pixel but those that the tile's own footprint covers.
     void place(Image<const T> src) {
-        const ptrdiff_t x = sourceOffset(plan.horizontal, tile.x), y = sourceOffset(plan.vertical, tile.y);
+        // Most tiles begin where the image does, and a division of 64 bits takes as long as a row of a small one.
+        const ptrdiff_t x = tile.x == 0 ? 0 : sourceOffset(plan.horizontal, tile.x);
+        const ptrdiff_t y = tile.y == 0 ? 0 : sourceOffset(plan.vertical, tile.y);
         image = {advance(src.data, -(y * src.step + x * ptrdiff_t{channels} * elementBytes<T>)), src.step};
     }
     /// The row's pixel at a column.
