@@ -20,6 +20,8 @@ Source: TypeAlias = "Array | memoryview | Image"
 class Error(ValueError):
     code: int
 
+class OutOfMemoryError(Error, MemoryError): ...
+
 class Warning(UserWarning): ...
 
 @final

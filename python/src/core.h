@@ -275,7 +275,8 @@ typedef struct Call {
 
 /* --- module.c: what is imported once; one interpreter --- */
 typedef struct Shared {
-    PyObject* error; /* qori.Error */
+    PyObject* error;     /* qori.Error */
+    PyObject* no_memory; /* an Error that is a MemoryError too */
     PyObject* warning;
     PyObject* name_dtype;
     PyTypeObject* ndarray; /* null until NumPy has been seen */

@@ -49,13 +49,10 @@ int status_result(const Call* call, const char* member, int status) {
              status, found ? found->text : "", member);
     if (status > 0) return PyErr_WarnEx(shared.warning, text, 1);
     if (status == -14) add_steps(call, text, sizeof text);
-    if (status == -9) {
-        PyErr_SetString(PyExc_MemoryError, text);
-        return -1;
-    }
-    PyObject* error = PyObject_CallFunction(shared.error, "s", text);
+    PyObject* type = status == -9 ? shared.no_memory : shared.error;
+    PyObject* error = PyObject_CallFunction(type, "s", text);
     PyObject* code = error ? PyLong_FromLong(status) : NULL;
-    if (code && !PyObject_SetAttr(error, shared.code, code)) PyErr_SetObject(shared.error, error);
+    if (code && !PyObject_SetAttr(error, shared.code, code)) PyErr_SetObject(type, error);
     Py_XDECREF(code);
     Py_XDECREF(error);
     return -1;

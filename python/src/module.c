@@ -116,8 +116,14 @@ static int add_exceptions(PyObject* module) {
                                              PyExc_ValueError, NULL);
     shared.warning =
         PyErr_NewExceptionWithDoc("qori.Warning", "A call that was done with a remark.", PyExc_UserWarning, NULL);
-    if (!shared.error || !shared.warning) return -1;
+    PyObject* both = shared.error ? PyTuple_Pack(2, shared.error, PyExc_MemoryError) : NULL;
+    if (both)
+        shared.no_memory =
+            PyErr_NewExceptionWithDoc("qori.OutOfMemoryError", "No memory for what a call works with.", both, NULL);
+    Py_XDECREF(both);
+    if (!shared.no_memory || !shared.warning) return -1;
     return PyModule_AddObjectRef(module, "Error", shared.error) ||
+                   PyModule_AddObjectRef(module, "OutOfMemoryError", shared.no_memory) ||
                    PyModule_AddObjectRef(module, "Warning", shared.warning)
                ? -1
                : 0;

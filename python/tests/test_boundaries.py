@@ -163,6 +163,17 @@ def test_an_error_names_the_member_that_was_called():
         qori.divide(image, 0, out=image)
 
 
+def test_a_lack_of_memory_is_an_error_of_both_kinds():
+    code = """import resource, qori
+resource.setrlimit(resource.RLIMIT_AS, (400 << 20, 400 << 20))
+try:
+    qori.DftPlan((104729, 104729), 'uint8')
+except qori.Error as error:
+    print(error.code, isinstance(error, MemoryError))"""
+    done = subprocess.run([sys.executable, "-c", code], capture_output=True, text=True)
+    assert done.stdout == "-9 True\n", done
+
+
 def test_bounds_of_a_plan_may_be_none():
     assert repr(qori.HistogramPlan([0, 1, 2], lower=None, upper=None)) == repr(qori.HistogramPlan([0, 1, 2]))
 
