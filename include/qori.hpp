@@ -5,8 +5,8 @@
  *
  *     #include "qori.hpp"
  *     qori::Image<uint8_t, qori::C3> a({640, 480}), b({640, 480}), mean({640, 480});
- *     qori::check(qori::set({255, 128, 0}, a));
- *     qori::check(qori::set({0, 0, 255}, b));
+ *     qori::check(qori::fill({255, 128, 0}, a));
+ *     qori::check(qori::fill({0, 0, 255}, b));
  *     qori::check(qori::add(a, b, mean, 1));                               // (a + b) / 2
  *     qori::check(qori::subtract(qori::in_place(mean), a.view()));         // mean -= a
  *
@@ -16,6 +16,9 @@
  * qori.h. Steps may be negative where the function of qori.h takes such ones.
  *
  * In place. in_place(image) in front stands for an image that is read and written: add(in_place(a), b) is a += b.
+ *
+ * Lists. Where a function of qori.h takes lists and their lengths, arrays, vectors, spans and braces bring both:
+ * histogram_range(grey, bins, {0, 128, 256}), or {red, green, blue} of three channels.
  *
  * Statuses. No operation throws; each returns the status of its function. check(status) throws qori::Error where it is
  * negative; in programs compiled without exceptions it ends the program by std::abort.
@@ -176,10 +179,10 @@ template <class T, class L>
 class View {
 #line 100000
     static_assert(detail::typeDigit<T> != 0, "qori::View: an element is one of the types of qori.h");
-#line 180
+#line 183
 #line 100000
     static_assert(detail::Facts<L>::digit != 0, "qori::View: a layout is one of C1 C2 C3 C4 AC4 P3 P4");
-#line 183
+#line 186
 
 public:
     using Element = T;
@@ -195,7 +198,7 @@ public:
     template <class U, detail::If<std::is_same_v<U, const T>> = 0>
 #line 100000
     View(const View<U, L>& other) = delete;
-#line 199
+#line 202
 
     /** Rows without gaps in a span, an array class or a vector: nothing where it is too short for the size. */
     template <class S, detail::If<detail::isSpan<S, T>> = 0>
@@ -211,7 +214,7 @@ public:
     constexpr explicit View(const S& span) noexcept {
 #line 100000
         static_assert(S::rank() == (stride == 1 ? 2 : 3), "qori::View: rows, columns and, but for C1, channels");
-#line 215
+#line 218
         const uint64_t height = uint64_t(span.extent(0)), width = uint64_t(span.extent(1));
         if constexpr (stride != 1) {
             if (span.extent(2) != stride || span.stride(2) != 1) return;
@@ -259,7 +262,7 @@ public:
     auto channel(int32_t index) const noexcept {
 #line 100000
         static_assert(stride == 3 || stride == 4, "qori::View::channel: channels of three or four");
-#line 263
+#line 266
         using Channel = std::conditional_t<detail::Facts<K>::stride == 3, ChannelOfC3, ChannelOfC4>;
         const bool exists = data_ && index >= 0 && index < stride;
         return exists ? View<T, Channel>(data_ + index, step_, size_) : View<T, Channel>();
@@ -278,7 +281,7 @@ template <class T, class L>
 class PlanarView {
 #line 100000
     static_assert(typeDigit<T> != 0, "qori::View: an element is one of the types of qori.h");
-#line 282
+#line 285
 
 public:
     using Element = T;
@@ -942,7 +945,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 946
+#line 949
         return nullptr;
     }
 }
@@ -1173,7 +1176,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1177
+#line 1180
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1196,7 +1199,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1200
+#line 1203
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1211,7 +1214,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1215
+#line 1218
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1232,7 +1235,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1236
+#line 1239
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1249,7 +1252,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1253
+#line 1256
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1271,7 +1274,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1275
+#line 1278
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1285,7 +1288,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1289
+#line 1292
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1302,7 +1305,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1306
+#line 1309
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1311,7 +1314,7 @@ template <bool exists = false> QorResult add(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1315
+#line 1318
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1464,7 +1467,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1468
+#line 1471
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1489,7 +1492,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1493
+#line 1496
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1504,7 +1507,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1508
+#line 1511
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1525,7 +1528,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1529
+#line 1532
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1543,7 +1546,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1547
+#line 1550
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1565,7 +1568,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1569
+#line 1572
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1579,7 +1582,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1583
+#line 1586
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1596,7 +1599,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1600
+#line 1603
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1605,7 +1608,7 @@ template <bool exists = false> QorResult subtract(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1609
+#line 1612
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1757,7 +1760,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1761
+#line 1764
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1782,7 +1785,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1786
+#line 1789
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1797,7 +1800,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1801
+#line 1804
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1818,7 +1821,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1822
+#line 1825
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1836,7 +1839,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1840
+#line 1843
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1858,7 +1861,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1862
+#line 1865
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1872,7 +1875,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1876
+#line 1879
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1889,7 +1892,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1893
+#line 1896
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1898,7 +1901,7 @@ template <bool exists = false> QorResult multiply(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 1902
+#line 1905
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -1969,7 +1972,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1973
+#line 1976
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -1984,7 +1987,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 1988
+#line 1991
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2002,7 +2005,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2006
+#line 2009
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2016,7 +2019,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2020
+#line 2023
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2025,7 +2028,7 @@ template <bool exists = false> QorResult multiply_fraction(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2029
+#line 2032
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2210,7 +2213,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2214
+#line 2217
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2232,7 +2235,7 @@ template <class A, class C, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2236
+#line 2239
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2246,7 +2249,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2250
+#line 2253
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2263,7 +2266,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2267
+#line 2270
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2281,7 +2284,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2285
+#line 2288
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2313,7 +2316,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2317
+#line 2320
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2328,7 +2331,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2332
+#line 2335
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2354,7 +2357,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2358
+#line 2361
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2372,7 +2375,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2376
+#line 2379
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2390,7 +2393,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2394
+#line 2397
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2406,7 +2409,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2410
+#line 2413
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2421,7 +2424,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2425
+#line 2428
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2430,7 +2433,7 @@ template <bool exists = false> QorResult divide(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2434
+#line 2437
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2474,7 +2477,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2478
+#line 2481
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2487,7 +2490,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2491
+#line 2494
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2496,7 +2499,7 @@ template <bool exists = false> QorResult absolute(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2500
+#line 2503
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2563,7 +2566,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2567
+#line 2570
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2584,7 +2587,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2588
+#line 2591
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2597,7 +2600,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2601
+#line 2604
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2613,7 +2616,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2617
+#line 2620
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2622,7 +2625,7 @@ template <bool exists = false> QorResult square(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2626
+#line 2629
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2683,7 +2686,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2687
+#line 2690
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2704,7 +2707,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2708
+#line 2711
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2717,7 +2720,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2721
+#line 2724
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2733,7 +2736,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2737
+#line 2740
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2742,7 +2745,7 @@ template <bool exists = false> QorResult sqrt(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2746
+#line 2749
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2793,7 +2796,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2797
+#line 2800
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2814,7 +2817,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2818
+#line 2821
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2827,7 +2830,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2831
+#line 2834
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2843,7 +2846,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2847
+#line 2850
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2852,7 +2855,7 @@ template <bool exists = false> QorResult exp(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2856
+#line 2859
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -2904,7 +2907,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2908
+#line 2911
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2925,7 +2928,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2929
+#line 2932
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2938,7 +2941,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2942
+#line 2945
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2954,7 +2957,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 2958
+#line 2961
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -2963,7 +2966,7 @@ template <bool exists = false> QorResult log(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 2967
+#line 2970
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3010,7 +3013,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3014
+#line 3017
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3019,7 +3022,7 @@ template <bool exists = false> QorResult pad_constant(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3023
+#line 3026
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3089,7 +3092,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3093
+#line 3096
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3103,7 +3106,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3107
+#line 3110
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3112,7 +3115,7 @@ template <bool exists = false> QorResult pad_replicate(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3116
+#line 3119
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3176,7 +3179,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3180
+#line 3183
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3189,7 +3192,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3193
+#line 3196
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3198,7 +3201,7 @@ template <bool exists = false> QorResult filter_box(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3202
+#line 3205
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3254,7 +3257,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3258
+#line 3261
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3277,7 +3280,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3281
+#line 3284
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3300,7 +3303,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3304
+#line 3307
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3309,7 +3312,7 @@ template <bool exists = false> QorResult filter_box_border(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3313
+#line 3316
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3464,7 +3467,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3468
+#line 3471
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3481,7 +3484,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3485
+#line 3488
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3502,7 +3505,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3506
+#line 3509
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3515,7 +3518,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3519
+#line 3522
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3528,7 +3531,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3532
+#line 3535
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3541,7 +3544,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3545
+#line 3548
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3550,7 +3553,7 @@ template <bool exists = false> QorResult convert(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3554
+#line 3557
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3577,7 +3580,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3581
+#line 3584
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3594,7 +3597,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3598
+#line 3601
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3603,7 +3606,7 @@ template <bool exists = false> QorResult unpack_bits(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3607
+#line 3610
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3735,7 +3738,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3739
+#line 3742
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3753,7 +3756,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3757
+#line 3760
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3762,7 +3765,7 @@ template <bool exists = false> QorResult copy(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3766
+#line 3769
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3788,7 +3791,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3792
+#line 3795
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3804,7 +3807,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3808
+#line 3811
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3813,7 +3816,7 @@ template <bool exists = false> QorResult copy_managed(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3817
+#line 3820
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3840,7 +3843,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3844
+#line 3847
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3849,7 +3852,7 @@ template <bool exists = false> QorResult duplicate(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 3853
+#line 3856
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -3900,7 +3903,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3904
+#line 3907
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3941,7 +3944,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3945
+#line 3948
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3967,7 +3970,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3971
+#line 3974
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -3994,7 +3997,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 3998
+#line 4001
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4003,7 +4006,7 @@ template <bool exists = false> QorResult cross_corr_norm(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4007
+#line 4010
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4064,7 +4067,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4068
+#line 4071
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4083,7 +4086,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4087
+#line 4090
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4092,7 +4095,7 @@ template <bool exists = false> QorResult cross_corr_full_norm(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4096
+#line 4099
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4151,7 +4154,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4155
+#line 4158
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4169,7 +4172,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4173
+#line 4176
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4178,7 +4181,7 @@ template <bool exists = false> QorResult cross_corr_same_norm(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4182
+#line 4185
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4239,7 +4242,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4243
+#line 4246
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4258,7 +4261,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4262
+#line 4265
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4267,7 +4270,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm(detail::Anything 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4271
+#line 4274
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4331,7 +4334,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4335
+#line 4338
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4350,7 +4353,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4354
+#line 4357
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4359,7 +4362,7 @@ template <bool exists = false> QorResult cross_corr_full_norm_level(detail::Anyt
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4363
+#line 4366
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4420,7 +4423,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4424
+#line 4427
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4438,7 +4441,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4442
+#line 4445
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4447,7 +4450,7 @@ template <bool exists = false> QorResult cross_corr_same_norm_level(detail::Anyt
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4451
+#line 4454
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4511,7 +4514,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4515
+#line 4518
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4530,7 +4533,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4534
+#line 4537
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4539,7 +4542,7 @@ template <bool exists = false> QorResult cross_corr_valid_norm_level(detail::Any
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4543
+#line 4546
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4572,7 +4575,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4576
+#line 4579
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4581,7 +4584,7 @@ template <bool exists = false> QorResult cross_corr_valid(detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4585
+#line 4588
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4672,7 +4675,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4676
+#line 4679
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4681,7 +4684,7 @@ template <bool exists = false> QorResult dct_fwd(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4685
+#line 4688
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4710,7 +4713,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4714
+#line 4717
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4719,7 +4722,7 @@ template <bool exists = false> QorResult dct_inv(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4723
+#line 4726
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4759,7 +4762,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4763
+#line 4766
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4771,7 +4774,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4775
+#line 4778
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4785,7 +4788,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4789
+#line 4792
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4799,7 +4802,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4803
+#line 4806
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4808,7 +4811,7 @@ template <bool exists = false> QorResult dct_8x8_forward(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4812
+#line 4815
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4848,7 +4851,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4852
+#line 4855
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4860,7 +4863,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4864
+#line 4867
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4874,7 +4877,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4878
+#line 4881
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4888,7 +4891,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4892
+#line 4895
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4897,7 +4900,7 @@ template <bool exists = false> QorResult dct_8x8_inverse(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4901
+#line 4904
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4925,7 +4928,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4929
+#line 4932
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4937,7 +4940,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4941
+#line 4944
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4946,7 +4949,7 @@ template <bool exists = false> QorResult dct_8x8_inverse_2x2(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4950
+#line 4953
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -4974,7 +4977,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4978
+#line 4981
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4986,7 +4989,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 4990
+#line 4993
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -4995,7 +4998,7 @@ template <bool exists = false> QorResult dct_8x8_inverse_4x4(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 4999
+#line 5002
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5023,7 +5026,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5027
+#line 5030
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5035,7 +5038,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5039
+#line 5042
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5044,7 +5047,7 @@ template <bool exists = false> QorResult dct_8x8_inverse_10bit(detail::Anything 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5048
+#line 5051
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5071,7 +5074,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5075
+#line 5078
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5083,7 +5086,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5087
+#line 5090
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5092,7 +5095,7 @@ template <bool exists = false> QorResult dct_8x8_to_2x2_inverse(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5096
+#line 5099
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5119,7 +5122,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5123
+#line 5126
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5131,7 +5134,7 @@ template <class A, unsigned k = detail::key<detail::In<>, detail::Out<A*>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5135
+#line 5138
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5140,7 +5143,7 @@ template <bool exists = false> QorResult dct_8x8_to_4x4_inverse(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5144
+#line 5147
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5162,7 +5165,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5166
+#line 5169
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5171,7 +5174,7 @@ template <bool exists = false> QorResult zigzag_8x8_forward(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5175
+#line 5178
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5193,7 +5196,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<const A*>, detai
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5197
+#line 5200
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5202,7 +5205,7 @@ template <bool exists = false> QorResult zigzag_8x8_inverse(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5206
+#line 5209
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5325,7 +5328,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5329
+#line 5332
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5339,7 +5342,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5343
+#line 5346
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5356,7 +5359,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5360
+#line 5363
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5365,7 +5368,7 @@ template <bool exists = false> QorResult dft_fwd_r_to_pack(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5369
+#line 5372
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5410,7 +5413,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5414
+#line 5417
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5424,7 +5427,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5428
+#line 5431
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5441,7 +5444,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5445
+#line 5448
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5450,7 +5453,7 @@ template <bool exists = false> QorResult dft_inv_pack_to_r(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5454
+#line 5457
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5480,7 +5483,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5484
+#line 5487
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5494,7 +5497,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5498
+#line 5501
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5503,7 +5506,7 @@ template <bool exists = false> QorResult dft_fwd_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5507
+#line 5510
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5533,7 +5536,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5537
+#line 5540
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5547,7 +5550,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5551
+#line 5554
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5556,7 +5559,7 @@ template <bool exists = false> QorResult dft_inv_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5560
+#line 5563
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5594,7 +5597,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5598
+#line 5601
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5603,7 +5606,7 @@ template <bool exists = false> QorResult (min)(detail::Anything = {}, detail::An
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5607
+#line 5610
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5641,7 +5644,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5645
+#line 5648
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5650,7 +5653,7 @@ template <bool exists = false> QorResult (max)(detail::Anything = {}, detail::An
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5654
+#line 5657
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5689,7 +5692,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5693
+#line 5696
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5698,7 +5701,7 @@ template <bool exists = false> QorResult min_max(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5702
+#line 5705
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5738,7 +5741,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5742
+#line 5745
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5747,7 +5750,7 @@ template <bool exists = false> QorResult min_index(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5751
+#line 5754
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5787,7 +5790,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5791
+#line 5794
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5796,7 +5799,7 @@ template <bool exists = false> QorResult max_index(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5800
+#line 5803
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5829,7 +5832,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5833
+#line 5836
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5838,7 +5841,7 @@ template <bool exists = false> QorResult block_min_max(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5842
+#line 5845
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -5868,7 +5871,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 5872
+#line 5875
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -5877,7 +5880,7 @@ template <bool exists = false> QorResult count_in_range(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 5881
+#line 5884
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6000,7 +6003,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6004
+#line 6007
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6014,7 +6017,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6018
+#line 6021
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6031,7 +6034,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6035
+#line 6038
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6040,7 +6043,7 @@ template <bool exists = false> QorResult fft_fwd_r_to_pack(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6044
+#line 6047
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6085,7 +6088,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6089
+#line 6092
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6099,7 +6102,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6103
+#line 6106
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6116,7 +6119,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6120
+#line 6123
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6125,7 +6128,7 @@ template <bool exists = false> QorResult fft_inv_pack_to_r(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6129
+#line 6132
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6155,7 +6158,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6159
+#line 6162
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6169,7 +6172,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6173
+#line 6176
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6178,7 +6181,7 @@ template <bool exists = false> QorResult fft_fwd_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6182
+#line 6185
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6208,7 +6211,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6212
+#line 6215
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6222,7 +6225,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6226
+#line 6229
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6231,7 +6234,7 @@ template <bool exists = false> QorResult fft_inv_c_to_c(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6235
+#line 6238
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6380,7 +6383,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6384
+#line 6387
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6426,7 +6429,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6430
+#line 6433
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6448,7 +6451,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6452
+#line 6455
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6471,7 +6474,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6475
+#line 6478
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6493,7 +6496,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6497
+#line 6500
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6516,7 +6519,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A>, det
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6520
+#line 6523
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6525,7 +6528,7 @@ template <bool exists = false> QorResult filter_linear(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6529
+#line 6532
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6553,7 +6556,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6557
+#line 6560
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6590,7 +6593,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6594
+#line 6597
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6623,7 +6626,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6627
+#line 6630
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6648,7 +6651,7 @@ template <class T, class L, unsigned k = detail::keyOf<T, L>, class F0 = decltyp
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6652
+#line 6655
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6711,7 +6714,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6715
+#line 6718
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6720,7 +6723,7 @@ template <bool exists = false> QorResult filter_border(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6724
+#line 6727
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6762,7 +6765,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6766
+#line 6769
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6771,7 +6774,7 @@ template <bool exists = false> QorResult filter_min(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6775
+#line 6778
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6813,7 +6816,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6817
+#line 6820
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6822,7 +6825,7 @@ template <bool exists = false> QorResult filter_max(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6826
+#line 6829
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6863,7 +6866,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6867
+#line 6870
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6872,7 +6875,7 @@ template <bool exists = false> QorResult filter_gauss(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6876
+#line 6879
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6914,7 +6917,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6918
+#line 6921
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6930,7 +6933,7 @@ template <bool exists = false> QorResult histogram_range(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6934
+#line 6937
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -6969,7 +6972,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 6973
+#line 6976
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -6986,7 +6989,7 @@ template <bool exists = false> QorResult histogram_even(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 6990
+#line 6993
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7045,7 +7048,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7049
+#line 7052
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7054,7 +7057,7 @@ template <bool exists = false> QorResult histogram(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7058
+#line 7061
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7110,7 +7113,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7114
+#line 7117
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7119,7 +7122,7 @@ template <bool exists = false> QorResult hog(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7123
+#line 7126
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7162,7 +7165,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7166
+#line 7169
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7187,7 +7190,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7191
+#line 7194
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7205,7 +7208,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7209
+#line 7212
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7214,7 +7217,7 @@ template <bool exists = false> QorResult lbp_3x3(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7218
+#line 7221
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7261,7 +7264,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7265
+#line 7268
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7286,7 +7289,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7290
+#line 7293
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7304,7 +7307,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7308
+#line 7311
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7313,7 +7316,7 @@ template <bool exists = false> QorResult lbp_5x5(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7317
+#line 7320
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7343,7 +7346,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7347
+#line 7350
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7361,7 +7364,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7365
+#line 7368
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7370,7 +7373,7 @@ template <bool exists = false> QorResult lbp_horizontal(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7374
+#line 7377
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7433,7 +7436,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7437
+#line 7440
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7455,7 +7458,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7459
+#line 7462
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7471,7 +7474,7 @@ template <bool exists = false> QorResult lut(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7475
+#line 7478
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7535,7 +7538,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7539
+#line 7542
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7558,7 +7561,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7562
+#line 7565
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7574,7 +7577,7 @@ template <bool exists = false> QorResult lut_linear(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7578
+#line 7581
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7637,7 +7640,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7641
+#line 7644
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7660,7 +7663,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7664
+#line 7667
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7676,7 +7679,7 @@ template <bool exists = false> QorResult lut_cubic(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7680
+#line 7683
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7719,7 +7722,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7723
+#line 7726
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7728,7 +7731,7 @@ template <bool exists = false> QorResult filter_median(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7732
+#line 7735
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7780,7 +7783,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7784
+#line 7787
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7789,7 +7792,7 @@ template <bool exists = false> QorResult filter_median_horiz(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7793
+#line 7796
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7827,7 +7830,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7831
+#line 7834
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7836,7 +7839,7 @@ template <bool exists = false> QorResult filter_median_vert(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7840
+#line 7843
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7872,7 +7875,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7876
+#line 7879
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7881,7 +7884,7 @@ template <bool exists = false> QorResult filter_median_cross(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7885
+#line 7888
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7914,7 +7917,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7918
+#line 7921
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7923,7 +7926,7 @@ template <bool exists = false> QorResult filter_median_color(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7927
+#line 7930
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -7950,7 +7953,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 7954
+#line 7957
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -7959,7 +7962,7 @@ template <bool exists = false> QorResult filter_median_weighted(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 7963
+#line 7966
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8001,7 +8004,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8005
+#line 8008
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8024,7 +8027,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8028
+#line 8031
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8047,7 +8050,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8051
+#line 8054
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8056,7 +8059,7 @@ template <bool exists = false> QorResult filter_median_border(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8060
+#line 8063
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8127,7 +8130,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8131
+#line 8134
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8140,7 +8143,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8144
+#line 8147
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8149,7 +8152,7 @@ template <bool exists = false> QorResult mirror(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8153
+#line 8156
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8204,7 +8207,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8208
+#line 8211
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8217,7 +8220,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8221
+#line 8224
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8226,7 +8229,7 @@ template <bool exists = false> QorResult erode_3x3(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8230
+#line 8233
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8281,7 +8284,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8285
+#line 8288
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8294,7 +8297,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8298
+#line 8301
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8303,7 +8306,7 @@ template <bool exists = false> QorResult dilate_3x3(detail::Anything = {}, detai
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8307
+#line 8310
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8355,7 +8358,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8359
+#line 8362
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8369,7 +8372,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8373
+#line 8376
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8378,7 +8381,7 @@ template <bool exists = false> QorResult erode(detail::Anything = {}, detail::An
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8382
+#line 8385
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8430,7 +8433,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8434
+#line 8437
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8445,7 +8448,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8449
+#line 8452
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8454,7 +8457,7 @@ template <bool exists = false> QorResult dilate(detail::Anything = {}, detail::A
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8458
+#line 8461
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8500,7 +8503,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8504
+#line 8507
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8513,7 +8516,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8517
+#line 8520
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8522,7 +8525,7 @@ template <bool exists = false> QorResult sum(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8526
+#line 8529
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8568,7 +8571,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8572
+#line 8575
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8582,7 +8585,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8586
+#line 8589
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8591,7 +8594,7 @@ template <bool exists = false> QorResult mean(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8595
+#line 8598
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8630,7 +8633,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8634
+#line 8637
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8639,7 +8642,7 @@ template <bool exists = false> QorResult norm_inf(detail::Anything = {}, detail:
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8643
+#line 8646
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8686,7 +8689,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8690
+#line 8693
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8700,7 +8703,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8704
+#line 8707
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8709,7 +8712,7 @@ template <bool exists = false> QorResult norm_l1(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8713
+#line 8716
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8756,7 +8759,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8760
+#line 8763
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8770,7 +8773,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8774
+#line 8777
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8779,7 +8782,7 @@ template <bool exists = false> QorResult norm_l2(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8783
+#line 8786
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8820,7 +8823,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8824
+#line 8827
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8829,7 +8832,7 @@ template <bool exists = false> QorResult norm_diff_inf(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8833
+#line 8836
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8881,7 +8884,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8885
+#line 8888
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8898,7 +8901,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8902
+#line 8905
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8907,7 +8910,7 @@ template <bool exists = false> QorResult norm_diff_l1(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8911
+#line 8914
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -8959,7 +8962,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8963
+#line 8966
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8976,7 +8979,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 8980
+#line 8983
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -8985,7 +8988,7 @@ template <bool exists = false> QorResult norm_diff_l2(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 8989
+#line 8992
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9026,7 +9029,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9030
+#line 9033
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9035,7 +9038,7 @@ template <bool exists = false> QorResult norm_rel_inf(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9039
+#line 9042
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9086,7 +9089,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9090
+#line 9093
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9103,7 +9106,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9107
+#line 9110
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9112,7 +9115,7 @@ template <bool exists = false> QorResult norm_rel_l1(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9116
+#line 9119
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9164,7 +9167,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9168
+#line 9171
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9181,7 +9184,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9185
+#line 9188
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9190,7 +9193,7 @@ template <bool exists = false> QorResult norm_rel_l2(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9194
+#line 9197
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9253,7 +9256,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9257
+#line 9260
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9270,7 +9273,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A, B>, detail::O
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9274
+#line 9277
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9279,7 +9282,7 @@ template <bool exists = false> QorResult dot(detail::Anything = {}, detail::Anyt
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9283
+#line 9286
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9314,7 +9317,7 @@ template <class A, unsigned k = detail::key<detail::In<A>, detail::Out<>>,
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9318
+#line 9321
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9323,7 +9326,7 @@ template <bool exists = false> QorResult otsu_threshold(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9327
+#line 9330
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9370,7 +9373,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9374
+#line 9377
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9388,7 +9391,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9392
+#line 9395
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9397,7 +9400,7 @@ template <bool exists = false> QorResult lut_palette(detail::Anything = {}, deta
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9401
+#line 9404
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9427,7 +9430,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9431
+#line 9434
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9436,7 +9439,7 @@ template <bool exists = false> QorResult lut_palette_swap(detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9440
+#line 9443
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9464,7 +9467,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9468
+#line 9471
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9494,7 +9497,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9498
+#line 9501
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9523,7 +9526,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9527
+#line 9530
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9553,7 +9556,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9557
+#line 9560
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9583,7 +9586,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9587
+#line 9590
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9612,7 +9615,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9616
+#line 9619
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9642,7 +9645,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9646
+#line 9649
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9671,7 +9674,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9675
+#line 9678
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9700,7 +9703,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9704
+#line 9707
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9729,7 +9732,7 @@ template <class T, unsigned k = detail::keyOf<T>, class F0 = decltype(detail::re
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9733
+#line 9736
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9790,7 +9793,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9794
+#line 9797
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9799,7 +9802,7 @@ template <bool exists = false> QorResult resize_nearest(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9803
+#line 9806
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9838,7 +9841,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9842
+#line 9845
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9847,7 +9850,7 @@ template <bool exists = false> QorResult resize_super(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9851
+#line 9854
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9890,7 +9893,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9894
+#line 9897
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9899,7 +9902,7 @@ template <bool exists = false> QorResult resize_linear(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9903
+#line 9906
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9939,7 +9942,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9943
+#line 9946
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9948,7 +9951,7 @@ template <bool exists = false> QorResult resize_cubic(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 9952
+#line 9955
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -9988,7 +9991,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 9992
+#line 9995
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -9997,7 +10000,7 @@ template <bool exists = false> QorResult resize_lanczos(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10001
+#line 10004
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10037,7 +10040,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10041
+#line 10044
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10046,7 +10049,7 @@ template <bool exists = false> QorResult resize_antialiasing(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10050
+#line 10053
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10118,7 +10121,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10122
+#line 10125
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10134,7 +10137,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10138
+#line 10141
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10150,7 +10153,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10154
+#line 10157
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10159,7 +10162,7 @@ template <bool exists = false> QorResult rescale(detail::Anything = {}, detail::
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10163
+#line 10166
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10237,7 +10240,7 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10241
+#line 10244
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10254,7 +10257,7 @@ template <class B, unsigned k = detail::key<detail::In<>, detail::Out<B>>, class
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10258
+#line 10261
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10263,7 +10266,7 @@ template <bool exists = false> QorResult fill(detail::Anything = {}, detail::Any
     detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10267
+#line 10270
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10332,7 +10335,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10336
+#line 10339
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10353,7 +10356,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10357
+#line 10360
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10371,7 +10374,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10375
+#line 10378
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10386,7 +10389,7 @@ template <class TA, class LA, class B, unsigned k = detail::key<detail::In<B>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10390
+#line 10393
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10395,7 +10398,7 @@ template <bool exists = false> QorResult multiply_packed(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10399
+#line 10402
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10435,7 +10438,7 @@ template <class A, class B, class C, unsigned k = detail::key<detail::In<A, B>, 
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10439
+#line 10442
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10450,7 +10453,7 @@ template <class A, class TB, class LB, unsigned k = detail::key<detail::In<A>, d
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10454
+#line 10457
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10459,7 +10462,7 @@ template <bool exists = false> QorResult multiply_packed_conj(detail::Anything =
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10463
+#line 10466
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10499,7 +10502,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10503
+#line 10506
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10516,7 +10519,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10520
+#line 10523
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10525,7 +10528,7 @@ template <bool exists = false> QorResult magnitude_packed(detail::Anything = {},
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10529
+#line 10532
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10565,7 +10568,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10569
+#line 10572
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10581,7 +10584,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10585
+#line 10588
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10590,7 +10593,7 @@ template <bool exists = false> QorResult phase_packed(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10594
+#line 10597
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10617,7 +10620,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10621
+#line 10624
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10626,7 +10629,7 @@ template <bool exists = false> QorResult unpack_spectrum(detail::Anything = {}, 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10630
+#line 10633
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10657,7 +10660,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10661
+#line 10664
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10666,7 +10669,7 @@ template <bool exists = false> QorResult pack_spectrum(detail::Anything = {}, de
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10670
+#line 10673
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10754,7 +10757,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10758
+#line 10761
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10768,7 +10771,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10772
+#line 10775
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10786,7 +10789,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10790
+#line 10793
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10801,7 +10804,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10805
+#line 10808
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10810,7 +10813,7 @@ template <bool exists = false> QorResult threshold(detail::Anything = {}, detail
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10814
+#line 10817
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -10905,7 +10908,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10909
+#line 10912
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10919,7 +10922,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10923
+#line 10926
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10937,7 +10940,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10941
+#line 10944
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10953,7 +10956,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 10957
+#line 10960
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -10962,7 +10965,7 @@ template <bool exists = false> QorResult threshold_gt(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 10966
+#line 10969
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11057,7 +11060,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11061
+#line 11064
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11071,7 +11074,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11075
+#line 11078
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11089,7 +11092,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11093
+#line 11096
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11105,7 +11108,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11109
+#line 11112
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11114,7 +11117,7 @@ template <bool exists = false> QorResult threshold_lt(detail::Anything = {}, det
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11118
+#line 11121
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11172,7 +11175,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11176
+#line 11179
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11189,7 +11192,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11193
+#line 11196
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11198,7 +11201,7 @@ template <bool exists = false> QorResult threshold_outside(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11202
+#line 11205
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11247,7 +11250,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11251
+#line 11254
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11271,7 +11274,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11275
+#line 11278
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11294,7 +11297,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11298
+#line 11301
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11317,7 +11320,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11321
+#line 11324
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11340,7 +11343,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11344
+#line 11347
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11360,7 +11363,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11364
+#line 11367
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11380,7 +11383,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11384
+#line 11387
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11400,7 +11403,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11404
+#line 11407
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11420,7 +11423,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11424
+#line 11427
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11440,7 +11443,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11444
+#line 11447
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11449,7 +11452,7 @@ template <bool exists = false> QorResult threshold_adaptive_box(detail::Anything
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11453
+#line 11456
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11500,7 +11503,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11504
+#line 11507
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11516,7 +11519,7 @@ template <class TA, class LA, unsigned k = detail::key<detail::In<>, detail::Out
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11520
+#line 11523
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11525,7 +11528,7 @@ template <bool exists = false> QorResult threshold_adaptive_gauss(detail::Anythi
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11529
+#line 11532
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11621,7 +11624,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11625
+#line 11628
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11630,7 +11633,7 @@ template <bool exists = false> QorResult warp_affine_nearest(detail::Anything = 
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11634
+#line 11637
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11673,7 +11676,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11677
+#line 11680
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11682,7 +11685,7 @@ template <bool exists = false> QorResult warp_affine_linear(detail::Anything = {
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11686
+#line 11689
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11725,7 +11728,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11729
+#line 11732
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11734,7 +11737,7 @@ template <bool exists = false> QorResult warp_affine_cubic(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11738
+#line 11741
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11771,7 +11774,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11775
+#line 11778
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11780,7 +11783,7 @@ template <bool exists = false> QorResult sum_window_row(detail::Anything = {}, d
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11784
+#line 11787
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11817,7 +11820,7 @@ template <class A, class B, unsigned k = detail::key<detail::In<A>, detail::Out<
     } else {
 #line 100000
         static_assert(exists, QORI_WORDS);
-#line 11821
+#line 11824
         return QOR_ERR_BAD_ARG;
     }
 }
@@ -11826,7 +11829,7 @@ template <bool exists = false> QorResult sum_window_column(detail::Anything = {}
     detail::Anything = {}, detail::Anything = {}, detail::Anything = {}) noexcept {
 #line 100000
     static_assert(exists, QORI_WORDS);
-#line 11830
+#line 11833
     return QOR_ERR_BAD_ARG;
 }
 #undef QORI_WORDS
@@ -11914,7 +11917,7 @@ class ResizePlan : public detail::Plan<QorResizePlan> {
 #line 100000
     static_assert(detail::found<decltype(detail::resize_get_size_0<own>())>,
                   "qori::ResizePlan<T> of 8u 16u 16s 32f 64f");
-#line 11918
+#line 11921
 
 public:
     ResizePlan(QorImageSize src, QorImageSize dst, Interpolation how) noexcept : src_(src), dst_(dst), how_(how) {
@@ -11946,7 +11949,7 @@ public:
 #line 100000
         static_assert(detail::found<decltype(detail::resize_linear_0<k>())> && k >> 12 == detail::typeDigit<T>,
                       "qori::ResizePlan<T>: images of T in C1, C3 or C4, the destination not const");
-#line 11950
+#line 11953
         if (!*this) return this->status();
         const auto& srcV = detail::view(src);
         const auto& dstV = detail::view(dst);
@@ -12021,7 +12024,7 @@ class WarpAffinePlan : public detail::Plan<QorWarpPlan> {
 #line 100000
     static_assert(detail::found<decltype(detail::warp_affine_linear_0<k>())>,
                   "qori::WarpAffinePlan<T, L> of 8u 16u 16s 32f 64f: C1 C3 C4");
-#line 12025
+#line 12028
 
 public:
     WarpAffinePlan(QorImageSize src, QorImageSize dst, const double (&matrix)[6], Interpolation how,
@@ -12084,7 +12087,7 @@ class LinearFilterPlan : public detail::Plan<QorLinearFilterPlan> {
 #line 100000
     static_assert(detail::found<decltype(detail::filter_border_0<detail::keyOf<T, L>>())>,
                   "qori::LinearFilterPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
-#line 12088
+#line 12091
 
 public:
     explicit LinearFilterPlan(const Kernel<int16_t>& kernel, int32_t divisor = 1,
@@ -12254,7 +12257,7 @@ class FourierPlan : public LibraryPlan<Maker<T>, QorFft2DPlan, QorFftNormFlag> {
 #line 100000
     static_assert(complex || integers || std::is_same_v<T, float>,
                   "qori::DftPlan and FftPlan of float, of int32_t for 8u images, and of QorComplex32f");
-#line 12258
+#line 12261
 
 public:
     explicit FourierPlan(QorImageSize size, QorFftNormFlag norm = fftDivInvByN) noexcept
@@ -12298,7 +12301,7 @@ public:
         };
 #line 100000
         static_assert(!integers, "qori: transforms of 8u images have no form in place");
-#line 12302
+#line 12305
         return this->run(buffer, go, src.image);
     }
     template <class E, class L>
@@ -12344,7 +12347,7 @@ public:
         };
 #line 100000
         static_assert(!integers, "qori: transforms of 8u images have no form in place");
-#line 12348
+#line 12351
         return this->run(buffer, go, src.image);
     }
     template <class E, class L>
@@ -12406,7 +12409,7 @@ class HistogramPlan : public detail::Plan<QorHistogramSpec> {
 #line 100000
     static_assert(detail::found<decltype(detail::histogram_0<k>())>,
                   "qori::HistogramPlan<T, L> of 8u 16u 16s 32f: C1 C3 C4");
-#line 12410
+#line 12413
 
 public:
     /** Given levels, a list for each channel. */

@@ -5,8 +5,8 @@
  *
  *     #include "qori.hpp"
  *     qori::Image<uint8_t, qori::C3> a({640, 480}), b({640, 480}), mean({640, 480});
- *     qori::check(qori::set({255, 128, 0}, a));
- *     qori::check(qori::set({0, 0, 255}, b));
+ *     qori::check(qori::fill({255, 128, 0}, a));
+ *     qori::check(qori::fill({0, 0, 255}, b));
  *     qori::check(qori::add(a, b, mean, 1));                               // (a + b) / 2
  *     qori::check(qori::subtract(qori::in_place(mean), a.view()));         // mean -= a
  *
@@ -16,6 +16,9 @@
  * qori.h. Steps may be negative where the function of qori.h takes such ones.
  *
  * In place. in_place(image) in front stands for an image that is read and written: add(in_place(a), b) is a += b.
+ *
+ * Lists. Where a function of qori.h takes lists and their lengths, arrays, vectors, spans and braces bring both:
+ * histogram_range(grey, bins, {0, 128, 256}), or {red, green, blue} of three channels.
  *
  * Statuses. No operation throws; each returns the status of its function. check(status) throws qori::Error where it is
  * negative; in programs compiled without exceptions it ends the program by std::abort.
