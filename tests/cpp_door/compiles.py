@@ -33,9 +33,18 @@ def compiles(compiler, include, standard, source):
     return subprocess.run([*command, "-I", Path(source).parent, "-I", Path(__file__).parent, source]).returncode == 0
 
 
+def example(include):
+    """The example that the header begins with, as a program."""
+    comment = (Path(include) / "qori.hpp").read_text().partition("*/")[0]
+    first, *rest = [line[7:] for line in comment.splitlines() if line.startswith(" *     ")]
+    return "\n".join([first, "int main() {", *rest, "}"]) + "\n"
+
+
 def main(include, sources, long, *compilers):
     wrong = 0
     for compiler in compilers:
+        command = [compiler, "-fsyntax-only", "-std=c++17", *WARNINGS, "-I", include, "-x", "c++", "-"]
+        wrong += subprocess.run(command, input=example(include), text=True).returncode != 0
         wrong += sum(not compiles(compiler, include, standard, source)
                      for standard in STANDARDS for source in sources.split(":"))
         first = [compiler, "-fsyntax-only", "-std=c++17", "-I", include, "-x", "c++", "-"]
