@@ -199,12 +199,13 @@ ptrdiff_t periodicEnd(const Gather& gather) {
     return 2 * twos;
 }
 
-/// By as many windows as the first groups take, or more where a later one needs them.
+/// By as many windows as the first groups take, or more where a later one needs them. Of few groups one window is tried
+/// at once, which mostly is what they take.
 template <Kind kind, int pixelBytes>
 Gather build(uint8_t* memory, const Picks& picks, ptrdiff_t groups) {
     constexpr ptrdiff_t kProbed = 16;
     auto* const bases = reinterpret_cast<int32_t*>(memory + 2 * groups * kLane * Gather::kMostWindows);
-    Gather gather{picks, pixelBytes, 0, groups, bases, memory};
+    Gather gather{picks, pixelBytes, groups <= kProbed ? 1 : 0, groups, bases, memory};
     int32_t span = makeLanes<kind, pixelBytes>(gather, 0, groups < kProbed ? groups : kProbed);
     if constexpr (kind == Kind::pairs) {
         const ptrdiff_t end = span <= kLane ? periodicEnd(gather) : 0;
