@@ -58,7 +58,7 @@ def test_pyright_is_content():
     local = ROOT / "build" / "node" / "node_modules" / ".bin" / "pyright"
     found = shutil.which("pyright") or (str(local) if local.exists() else None)
     if not found:
-        assert os.environ.get("QORI_PYRIGHT") != "required", "pyright is missing: npm install --prefix build/node pyright"
+        assert os.environ.get("QORI_PYRIGHT") != "required", "pyright is missing: scripts/setup pyright"
         pytest.skip("pyright is not installed")
     checked = subprocess.run([found, "-p", str(ROOT / "python" / "pyrightconfig.json"), "--pythonpath", sys.executable],
                              capture_output=True, text=True)
