@@ -8856,7 +8856,8 @@ QORI_API QorResult QORI_CALL qoriSumWindowRow_16s32f_C4R(const int16_t* pSrc, in
  *  Elements  Exact sums, rounded once to 32-bit float: to nearest, ties to even. Up to 2^24 they are exact.
  *  Units     Steps in bytes, of any sign and alignment; roiSize, maskSize and anchor in pixels.
  *  Aliasing  The source, with the neighbours that are read, must not overlap the destination.
- *  Notes     Takes a row of memory from qorMalloc for the duration of the call.
+ *  Notes     Takes a row of memory from qorMalloc for the duration of the call; of bytes only for windows of
+ *            more than 257 rows or a destination whose address or step is no multiple of 16.
  *  Returns   QOR_OK; in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_MASK_SIZE (maskSize below 1),
  *            QOR_ERR_ANCHOR (anchor negative or not below maskSize), QOR_OK (width or height below 1: nothing
  *            is written), QOR_ERR_NO_MEMORY (no work memory); then nothing is written.

@@ -1,5 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Sums of windows along rows or down columns, as floats.
+#include <algorithm>
+
 #include "frame/checks.h"
 #include "frame/float_control.h"
 #include "frame/plan.h"
@@ -61,13 +63,10 @@ QorResult sumWindowRow(Image<const S> src, Image<float> dst, QorImageSize roi, i
     });
 }
 
-/// Column sums of type Sum, kept from row to row.
+/// Column sums of type Sum, kept from row to row in `sums`.
 template <class Sum, class S>
-QorResult sumColumns(Image<const S> src, Image<float> dst, ptrdiff_t elements, int32_t height, int32_t maskSize,
-                     int32_t anchor) {
-    const WorkMemory memory(int64_t{elements} * static_cast<int64_t>(sizeof(Sum)) + kBlockAlignment);
-    if (QorResult r = memory.check()) return r;
-    Sum* const sums = memory.template begin<Sum>();
+void sumColumns(Image<const S> src, Image<float> dst, ptrdiff_t elements, int32_t height, int32_t maskSize,
+                int32_t anchor, Sum* sums) {
     const S* const first = src.row(-anchor);
     kernels::sumTerms<1>(&first, sums, elements);
     for (int32_t k = 1; k < maskSize; ++k) kernels::addRow(sums, src.row(k - anchor), elements);
@@ -75,6 +74,25 @@ QorResult sumColumns(Image<const S> src, Image<float> dst, ptrdiff_t elements, i
         if (y > 0) kernels::slideRow(sums, src.row(y - anchor + maskSize - 1), src.row(y - anchor - 1), elements);
         kernels::acrossTerms<1, false>(sums, 0, 1, dst.row(y), elements, ruleOf<S>(maskSize));
     }
+}
+
+template <class Sum, class S>
+QorResult sumInMemory(Image<const S> src, Image<float> dst, ptrdiff_t elements, int32_t height, int32_t maskSize,
+                      int32_t anchor) {
+    const WorkMemory memory(int64_t{elements} * static_cast<int64_t>(sizeof(Sum)) + kBlockAlignment);
+    if (QorResult r = memory.check()) return r;
+    sumColumns(src, dst, elements, height, maskSize, anchor, memory.template begin<Sum>());
+    return QOR_OK;
+}
+
+/// Short windows of bytes over destinations on 16 bytes need no memory.
+QorResult sumOnStack(Image<const uint8_t> src, Image<float> dst, ptrdiff_t elements, int32_t height, int32_t maskSize,
+                     int32_t anchor) {
+    constexpr ptrdiff_t kStrip = 2048;
+    alignas(kVectorBytes) uint32_t sums[kStrip];
+    for (ptrdiff_t x = 0; x < elements; x += kStrip)
+        sumColumns(Image<const uint8_t>{src.data + x, src.step}, Image<float>{dst.data + x, dst.step},
+                   std::min(kStrip, elements - x), height, maskSize, anchor, +sums);
     return QOR_OK;
 }
 
@@ -84,8 +102,14 @@ QorResult sumWindowColumn(Image<const S> src, Image<float> dst, QorImageSize roi
     if (checked != QOR_OK || sizeCheck(roi) != QOR_OK) return checked;
     const ptrdiff_t elements = ptrdiff_t{roi.width} * channels(layout);
     return underDefaultControl([&] {
-        if (fits<S>(maskSize)) return sumColumns<uint32_t>(src, dst, elements, roi.height, maskSize, anchor);
-        return sumColumns<double>(src, dst, elements, roi.height, maskSize, anchor);
+        if constexpr (sizeof(S) == 1) {
+            constexpr int32_t kShort = 257;  // as many bytes as 16 bits hold the sum of
+            const uintptr_t ends = reinterpret_cast<uintptr_t>(dst.data) | static_cast<uintptr_t>(dst.step);
+            if (maskSize <= kShort && ends % 16 == 0)
+                return sumOnStack(src, dst, elements, roi.height, maskSize, anchor);
+        }
+        if (fits<S>(maskSize)) return sumInMemory<uint32_t>(src, dst, elements, roi.height, maskSize, anchor);
+        return sumInMemory<double>(src, dst, elements, roi.height, maskSize, anchor);
     });
 }
 

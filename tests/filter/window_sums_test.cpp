@@ -50,8 +50,14 @@ void sweepSums(const char* name, Function function) {
     QORI_EXPECT_STATUS(QOR_ERR_ANCHOR, dst, call(function, s, 72, d, 64, QorImageSize{1, 1}, 3, -1));
     QORI_EXPECT_STATUS(QOR_ERR_ANCHOR, dst, call(function, s, 72, d, 64, QorImageSize{1, 1}, 3, 3));
     if (!along) {
-        qorTestFailAllocation(1);
-        QORI_EXPECT_STATUS(QOR_ERR_NO_MEMORY, dst, call(function, s, 72, d, 64, QorImageSize{1, 1}, 3, 0));
+        const auto expectWithoutMemory = [&](QorResult expected, float* to, int size) {
+            qorTestFailAllocation(1);
+            EXPECT_EQ(expected, call(function, s, 72, to, 64, QorImageSize{1, 1}, size, 0));
+            qorTestFailAllocation(0);
+        };
+        ASSERT_EQ(0u, reinterpret_cast<uintptr_t>(d) % 16);
+        expectWithoutMemory(QOR_ERR_NO_MEMORY, d + 1, 3);
+        expectWithoutMemory(sizeof(S) == 1 ? QOR_OK : QOR_ERR_NO_MEMORY, d, 3);
     }
     EXPECT_EQ(0, qorTestLiveBlocks());
     markSwept(name);
@@ -70,6 +76,13 @@ void sumWindowColumn(const char* name, Function function) {
     TEST(WindowSumsSweep, name) { operation<S, Layout::SL>(#name, &name); }
 #include "members/window_sums.inc"
 #undef QORI_MEMBER
+
+/// Rows of several strips.
+TEST(WindowSums, LongRowsOfBytes) {
+    for (int padding : {0, 2})
+        checkWindowSum<uint8_t, Layout::C3, false>({.width = 1'500, .height = 4, .padding = padding}, 5, 2,
+                                                   qoriSumWindowColumn_8u32f_C3R);
+}
 
 /// Sums beyond 32 bits, and the rounding of sums beyond 2^24 in one step.
 TEST(WindowSums, LongWindows) {
