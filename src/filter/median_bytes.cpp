@@ -77,12 +77,15 @@ ByteWindows<Bins>::ByteWindows(WorkBuffer& memory, int32_t columns, QorImageSize
       histograms_(histogramMemory_) {}
 
 template <class Bins>
-void ByteWindows<Bins>::begin(const kernels::ByteRows& rows, int32_t columns) {
+void ByteWindows<Bins>::begin(const kernels::ByteRows& rows, int32_t columns, int32_t height) {
+    // Thresholds are chosen in the time that histograms take for this many elements.
+    constexpr int64_t kLeast = 1500;
     rows_ = rows;
     columns_ = columns;
     y_ = since_ = 0;
-    method_ = bandsSuffice(mask_) ? Method::none : Method::histograms;
-    until_ = bandsSuffice(mask_) ? 0 : INT64_MAX;
+    const bool bands = bandsSuffice(mask_) && columns * (int64_t{mask_.height} + height) >= kLeast;
+    method_ = bands ? Method::none : Method::histograms;
+    until_ = bands ? 0 : INT64_MAX;
 }
 
 template <class Bins>

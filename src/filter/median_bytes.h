@@ -18,8 +18,8 @@ public:
 
     ByteWindows(WorkBuffer& memory, int32_t columns, QorImageSize mask);
 
-    /// Another strip, of so many columns or fewer.
-    void begin(const kernels::ByteRows& rows, int32_t columns);
+    /// Another strip, of so many columns or fewer, of which so many rows of medians will be made.
+    void begin(const kernels::ByteRows& rows, int32_t columns, int32_t height);
     /// The next row of medians, from row 0; rests: how many of the window's elements equal to each come before it, or
     /// null.
     void makeRow(uint8_t* medians, Rest* rests);

@@ -88,6 +88,8 @@ TEST(MedianLarge, BytesOfChangingImages) {
         expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 150 + random().below(90), 500);
         expectMedians<1>(qoriFilterMedian_8u_C1R, {41, 5}, 150 + random().below(90), 500);
     }
+    for (int i = 0; i < 40; ++i)  // too small for thresholds, and just large enough
+        expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 1 + random().below(30), 1 + random().below(30));
     expectMedians<1>(qoriFilterMedian_8u_C1R, {61, 61}, 260, 300);
     expectMedians<3>(qoriFilterMedian_8u_C3R, {19, 17}, 130, 300);
     expectMedians<4>(qoriFilterMedian_8u_C4R, {7, 31}, 70, 200);
