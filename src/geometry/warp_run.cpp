@@ -78,15 +78,17 @@ private:
                INT32_MAX;
     }
 
-    /// Strips touch a cache line of each source row that they cross, for as many rows of the band as share it: they are
-    /// as narrow as keeps these lines in the first-level cache and in reach of the address cache.
+    /// Strips touch some cache lines of each source row that they cross, for as many rows of the band as share them:
+    /// they are as narrow as keeps these lines in the first-level cache and in reach of the address cache.
     int64_t stripWidth() const {
-        constexpr double kSourceRows = 64;
-        constexpr int32_t kLeast = 64, kMost = 1 << 20;
+        constexpr int32_t kBlock = 16, kLeast = 64, kMost = 1 << 20;
+        constexpr double kLines = 256, kLineBytes = 64, kFewRows = 64, kManyRows = 128;
+        const double rows = kLines / (1 + kBandRows * images_.pixelBytes / kLineBytes);
+        const double most = rows < kFewRows ? kFewRows : rows < kManyRows ? rows : kManyRows;
         const double slope = __builtin_fabs(plan_.backward.yx);
-        return slope * kMost <= kSourceRows    ? kMost
-               : slope * kLeast >= kSourceRows ? kLeast
-                                               : static_cast<int32_t>(kSourceRows / slope) / kLeast * kLeast;
+        return slope * kMost <= most    ? kMost
+               : slope * kLeast >= most ? kLeast
+                                        : static_cast<int32_t>(most / slope) / kBlock * kBlock;
     }
 
     /// Kernels prefetch for a row this far below; 0 where that is not worth an address.
