@@ -84,9 +84,10 @@ Row row(QorInterpolationKind kind, Map map, double best = 0, int32_t border = bo
             .best = best};
 }
 
-constexpr Map kTilted{"15 degrees", 15};
-constexpr Map kMaps[] = {{"0 degrees", 0},  {"45 degrees", 45},    {"90 degrees", 90},      {"180 degrees", 180},
-                         {"scale 2", 0, 2}, {"scale 0.5", 0, 0.5}, {"shear 0.3", 0, 1, 0.3}};
+constexpr Map kTilted{"15 degrees", 15}, kHalved{"scale 0.5", 0, 0.5};
+constexpr Map kMaps[] = {{"0 degrees", 0},        {"45 degrees", 45}, {"90 degrees", 90},
+                         {"180 degrees", 180},    {"scale 2", 0, 2},  kHalved,
+                         {"shear 0.3", 0, 1, 0.3}};
 
 std::vector<Row> warpRows(QorInterpolationKind kind, double bestGray, double bestColour) {
     std::vector<Row> rows = {row<uint8_t, 1>(kind, kTilted, bestGray), row<uint8_t, 3>(kind, kTilted, bestColour)};
@@ -96,6 +97,9 @@ std::vector<Row> warpRows(QorInterpolationKind kind, double bestGray, double bes
     }
     rows.push_back(row<uint8_t, 1>(kind, kTilted, 0, borderReplicate));
     rows.push_back(row<uint8_t, 3>(kind, kTilted, 0, borderReplicate));
+    // Three quarters of the destination lie outside.
+    rows.push_back(row<uint8_t, 1>(kind, kHalved, 0, borderReplicate));
+    rows.push_back(row<uint8_t, 3>(kind, kHalved, 0, borderReplicate));
     rows.push_back(row<uint8_t, 4>(kind, kTilted));
     rows.push_back(row<uint16_t, 1>(kind, kTilted));
     rows.push_back(row<uint16_t, 3>(kind, kTilted));

@@ -32,7 +32,31 @@ struct CubicBatch {
         weigh(weights, fractions, n, y);
     }
 
+    /// Moves windows into a source of at least their size.
+    void hold(const WarpSource& source, int n) {
+        hold(column, x, source.left, source.right, n);
+        hold(row, y, source.top, source.bottom, n);
+    }
+
 private:
+    /// The weights of taps beyond the first or last pixel go to it.
+    static void hold(int32_t* whole, WeightOf<T> (*weights)[kTaps], int32_t first, int32_t last, int n) {
+        for (int i = 0; i < n; ++i) {
+            const int32_t begin = whole[i] - 1, held = clampIndex(begin, first, last - (kTaps - 1));
+            if (begin == held) continue;
+            whole[i] = held + 1;
+            // All of them are 1. Copied as a whole: vectors are not forwarded from single weights.
+            if (begin <= held - (kTaps - 1) || begin >= held + (kTaps - 1)) {
+                static constexpr WeightOf<T> kOne[2][kTaps] = {{1, 0, 0, 0}, {0, 0, 0, 1}};
+                __builtin_memcpy(weights[i], kOne[begin > held], sizeof weights[i]);
+                continue;
+            }
+            WeightOf<T> sums[kTaps] = {};
+            for (int k = 0; k < kTaps; ++k) sums[clampIndex(begin + k - held, 0, kTaps - 1)] += weights[i][k];
+            __builtin_memcpy(weights[i], sums, sizeof sums);
+        }
+    }
+
     static void weigh(const CubicWeights& weights, const double* fractions, int n, WeightOf<T> (*out)[kTaps]) {
         const auto power = [&](int k) { return load(weights.power[k]).v; };
         for (int i = 0; i < n; ++i) {
@@ -120,9 +144,9 @@ QORI_INLINE __m256d sumDoubles(const uint8_t* p, ptrdiff_t step, const double* x
     }
 }
 
-/// Where the first pixels of windows lie: in the source, or for windows that leave what may be read in a copy whose
+/// Where the first pixels of windows lie: in the source, or of sources that are smaller than a window in a copy whose
 /// pixels beyond are the nearest ones.
-template <class T, int channels, bool anywhere>
+template <class T, int channels, bool copies>
 class Windows {
 public:
     explicit Windows(const WarpSource& source) : source_(source) {}
@@ -134,9 +158,7 @@ public:
 
     /// Copies of four windows live at once.
     QORI_INLINE Window at(int32_t column, int32_t row, int slot) {
-        const bool isInside =
-            column > source_.left && column + 2 <= source_.right && row > source_.top && row + 2 <= source_.bottom;
-        if (anywhere && !isInside) return {copy(column, row, slot), kStep};
+        if constexpr (copies) return {copy(column, row, slot), kStep};
         return {source_.origin + (row - 1) * source_.step + (column - 1) * ptrdiff_t{kPixel}, source_.step};
     }
 
@@ -152,7 +174,7 @@ private:
     }
 
     const WarpSource& source_;
-    uint8_t memory_[anywhere ? 4 : 1][anywhere ? kTaps * kStep : 1];
+    uint8_t memory_[copies ? 4 : 1][copies ? kTaps * kStep : 1];
 };
 
 /// The first n of four sums, n from 1 on.
@@ -170,8 +192,8 @@ QORI_INLINE void storeSums(uint8_t* dst, __m256d sums, int n) {
 }
 
 /// One channel, four pixels at a time.
-template <class T, bool anywhere>
-void cubicGray(Windows<T, 1, anywhere>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
+template <class T, bool copies>
+void cubicGray(Windows<T, 1, copies>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
     for (int i = 0; i < n; i += 4, dst += 4 * sizeof(T)) {
         const auto sum = [&](int k) __attribute__((always_inline)) {
             const int at = i + k < n ? i + k : n - 1;
@@ -196,14 +218,14 @@ void cubicGray(Windows<T, 1, anywhere>& windows, const CubicBatch<T>& batch, int
     }
 }
 
-template <class T, int channels, bool anywhere>
-void cubicPacked(Windows<T, channels, anywhere>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
+template <class T, int channels, bool copies>
+void cubicPacked(Windows<T, channels, copies>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
     for (int i = 0; i < n; ++i, dst += channels * sizeof(T)) {
         const auto window = windows.at(batch.column[i], batch.row[i], 0);
         // Four elements at a time: the fourth of three is the next pixel's first, which is written next.
         if constexpr (kInDoubles<T>) {
             const __m256d sum = sumDoubles<T, channels>(window.first, window.step, batch.x[i], batch.y[i]);
-            storeSums<T>(dst, sum, i + 1 < n ? 4 : channels);
+            storeSums<T>(dst, sum, i + 1 == n && channels == 3 ? 3 : 4);
         } else {
             const __m128 sum = sumWindow<T, channels>(window.first, window.step, batch.x[i], batch.y[i]);
             const __m128i pixel = narrowFour<T>(clampTo<T>(sum));
@@ -215,20 +237,27 @@ void cubicPacked(Windows<T, channels, anywhere>& windows, const CubicBatch<T>& b
     }
 }
 
-template <class T, int channels, bool anywhere>
+enum class Reach { inside, anywhere, tiny };
+
+template <class T, int channels, Reach reach>
 void cubicRun(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
               uint8_t* dst) {
+    if constexpr (reach == Reach::anywhere) {
+        if (source.right - source.left < kTaps - 1 || source.bottom - source.top < kTaps - 1)
+            return cubicRun<T, channels, Reach::tiny>(source, line, box, first, count, dst);
+    }
     const DoubleAxis across = horizontalDoubles<T>(line, box, INT32_MAX);
     const DoubleAxis down = verticalDoubles<T>(line, box, INT32_MAX);
-    Windows<T, channels, anywhere> windows(source);
+    Windows<T, channels, reach == Reach::tiny> windows(source);
     CubicBatch<T> batch;
     for (int n; count > 0; count -= n, first += n, dst += n * static_cast<int>(sizeof(T)) * channels) {
         n = count < kBatch ? count : kBatch;
         batch.prepare(across, down, *source.cubic, first, n);
+        if constexpr (reach == Reach::anywhere) batch.hold(source, n);
         if constexpr (channels == 1)
-            cubicGray<T, anywhere>(windows, batch, n, dst);
+            cubicGray<T>(windows, batch, n, dst);
         else
-            cubicPacked<T, channels, anywhere>(windows, batch, n, dst);
+            cubicPacked<T, channels>(windows, batch, n, dst);
     }
 }
 
@@ -245,8 +274,8 @@ CubicWeights weightsOf(Cubic cubic) {
 
 template <class T, int channels>
 WarpKernels cubicKernels() {
-    constexpr WarpKernel any = cubicRun<T, channels, true>;
-    return {cubicRun<T, channels, false>, any, any, 1, 1, 2, 2};
+    constexpr WarpKernel any = cubicRun<T, channels, Reach::anywhere>;
+    return {cubicRun<T, channels, Reach::inside>, any, any, 1, 1, 2, 2};
 }
 
 #define QORI_CUBIC(T)                          \
