@@ -159,41 +159,63 @@ TEST(WarpExact, PositionsOfAnySize) {
         }
 }
 
-/// Sources of more columns than 19 bits count, which go by other kernels, at either end.
+/// Sources of more columns than the words of fixed positions count, or than 19 bits, which go by other kernels, at
+/// either end.
 TEST(WarpExact, SourcesOfManyColumns) {
-    constexpr int kWidth = 700'000;
-    const TestImage src(kWarpSrc, {.width = kWidth, .height = 3}, 3), dst(kWarpDst, {.width = 300, .height = 4}, 3);
-    src.fill<uint8_t>(3, drawPixel<uint8_t>);
-    const auto check = [&](auto function, Method method) {
-        for (double start : {-4.25, kWidth - 280.75, 524200.5})
-            for (int32_t border : {borderConstant, borderReplicate}) {
-                const WarpJob job{
-                    method, {1, 0.25, start, 0.005, 0.5, 0.2512}, true, {kWidth, 3}, {300, 4}, border, {50, 60, 70}};
-                SCOPED_TRACE(describe(job));
-                runWhole<uint8_t, 3>(function, job, src, dst);
-                for (int y = 0; y < 4; ++y)
-                    for (int x = 0; x < 300; ++x) {
-                        const reference::Position p = reference::positionOf(job.coeffs, true, x, y);
-                        const bool isInside = p.x >= 0 && p.y >= 0 && p.x <= kWidth - 1 && p.y <= 2;
-                        const auto actual = dst.view<uint8_t>(3).get(x, y, 1);
-                        if (border == borderConstant && !isInside) {
-                            ASSERT_EQ(60, actual) << x << ", " << y;
-                            continue;
+    for (int width : {32'767, 32'768, 700'000}) {
+        const TestImage src(kWarpSrc, {.width = width, .height = 3}, 3), dst(kWarpDst, {.width = 300, .height = 4}, 3);
+        src.fill<uint8_t>(3, drawPixel<uint8_t>);
+        const auto check = [&](auto function, Method method) {
+            for (double start : {-4.25, width - 280.75, 0.75 * width - 0.5})
+                for (int32_t border : {borderConstant, borderReplicate}) {
+                    const WarpJob job{
+                        method, {1, 0.25, start, 0.005, 0.5, 0.2512}, true, {width, 3}, {300, 4}, border, {50, 60, 70}};
+                    SCOPED_TRACE(describe(job));
+                    runWhole<uint8_t, 3>(function, job, src, dst);
+                    for (int y = 0; y < 4; ++y)
+                        for (int x = 0; x < 300; ++x) {
+                            const reference::Position p = reference::positionOf(job.coeffs, true, x, y);
+                            const bool isInside = p.x >= 0 && p.y >= 0 && p.x <= width - 1 && p.y <= 2;
+                            const auto actual = dst.view<uint8_t>(3).get(x, y, 1);
+                            if (border == borderConstant && !isInside) {
+                                ASSERT_EQ(60, actual) << x << ", " << y;
+                                continue;
+                            }
+                            const auto fetch = [&](int i, int j) -> double {
+                                return src.view<uint8_t>(3).get(std::clamp(i, 0, width - 1), std::clamp(j, 0, 2), 1);
+                            };
+                            const double value = method.interpolation == interpNearest
+                                                     ? fetch(static_cast<int>(std::floor(p.x + 0.5)),
+                                                             static_cast<int>(std::floor(p.y + 0.5)))
+                                                     : std::clamp(reference::mixAt(method, p, fetch).value, 0.0, 255.0);
+                            ASSERT_NEAR(value, actual, 0.52) << x << ", " << y;
                         }
-                        const auto fetch = [&](int i, int j) -> double {
-                            return src.view<uint8_t>(3).get(std::clamp(i, 0, kWidth - 1), std::clamp(j, 0, 2), 1);
-                        };
-                        const double value = method.interpolation == interpNearest
-                                                 ? fetch(static_cast<int>(std::floor(p.x + 0.5)),
-                                                         static_cast<int>(std::floor(p.y + 0.5)))
-                                                 : std::clamp(reference::mixAt(method, p, fetch).value, 0.0, 255.0);
-                        ASSERT_NEAR(value, actual, 0.502) << x << ", " << y;
-                    }
-            }
-    };
-    check(qoriWarpAffineNearest_8u_C3R, kNearest);
-    check(qoriWarpAffineLinear_8u_C3R, kLinear);
-    check(qoriWarpAffineCubic_8u_C3R, kCubic);
+                }
+        };
+        check(qoriWarpAffineNearest_8u_C3R, kNearest);
+        check(qoriWarpAffineLinear_8u_C3R, kLinear);
+        check(qoriWarpAffineCubic_8u_C3R, kCubic);
+    }
+}
+
+/// Fixed positions are counted from column 0 of the destination, whatever the tile: at the far end of a row as wide as
+/// they serve, and of a wider one, an error of the step between columns has grown to its largest.
+TEST(WarpExact, PositionsAtTheEndOfLongRows) {
+    for (int width : {65'536, 65'537}) {
+        constexpr double kAlong = 0.1 + 1e-7;
+        const WarpJob job{kLinear,        {kAlong, 0, -0.5, -kAlong / 700, 1, 19}, true, {7000, 40}, {width, 3},
+                          borderReplicate};
+        SCOPED_TRACE(describe(job));
+        const TestImage src(kWarpSrc, {.width = 7000, .height = 40}, 1),
+            dst(kWarpDst, {.width = width, .height = 3}, 1);
+        src.fill<uint8_t>(1, drawPixel<uint8_t>);
+        runWhole<uint8_t, 1>(qoriWarpAffineLinear_8u_C1R, job, src, dst);
+        for (int x = width - 200; x < width; ++x) {
+            const reference::Position p = reference::positionOf(job.coeffs, true, x, 1);
+            const auto fetch = [&](int i, int j) -> double { return src.view<uint8_t>(1).get(i, j); };
+            ASSERT_NEAR(reference::mixAt(kLinear, p, fetch).value, dst.view<uint8_t>(1).get(x, 1), 0.52) << x;
+        }
+    }
 }
 
 /// Noise, turned: the share of elements that are the correctly rounded ones.

@@ -51,8 +51,8 @@ bool isRight(const WarpJob& job, Position at, Fetch fetch, T actual) {
     } else if constexpr (std::is_same_v<T, double>) {
         return std::abs(value - mixed.value) <= 4e-11 * mixed.largestTap * gain;
     } else {
-        // Linear bytes: fractions and weights of 15 bits, three roundings of differences up to 255.
-        const double ofWeights = job.method.interpolation == interpLinear ? 0.024 : 0.001;
+        // Linear bytes: fractions of 16 and 15 bits, two roundings of 2^-8.
+        const double ofWeights = job.method.interpolation == interpLinear ? 0.02 : 0.001;
         const double error = (sizeof(T) == 1 ? ofWeights : 0.1) * gain;
         const double held =
             std::clamp<double>(mixed.value, std::numeric_limits<T>::min(), std::numeric_limits<T>::max());
