@@ -191,9 +191,9 @@ QORI_INLINE void storeSums(uint8_t* dst, __m256d sums, int n) {
     }
 }
 
-/// One channel, four pixels at a time.
+/// One channel, which the compiler prefers where there is one: four pixels at a time.
 template <class T, bool copies>
-void cubicGray(Windows<T, 1, copies>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
+void makePixels(Windows<T, 1, copies>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
     for (int i = 0; i < n; i += 4, dst += 4 * sizeof(T)) {
         const auto sum = [&](int k) __attribute__((always_inline)) {
             const int at = i + k < n ? i + k : n - 1;
@@ -219,7 +219,7 @@ void cubicGray(Windows<T, 1, copies>& windows, const CubicBatch<T>& batch, int n
 }
 
 template <class T, int channels, bool copies>
-void cubicPacked(Windows<T, channels, copies>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
+void makePixels(Windows<T, channels, copies>& windows, const CubicBatch<T>& batch, int n, uint8_t* dst) {
     for (int i = 0; i < n; ++i, dst += channels * sizeof(T)) {
         const auto window = windows.at(batch.column[i], batch.row[i], 0);
         // Four elements at a time: the fourth of three is the next pixel's first, which is written next.
@@ -229,10 +229,8 @@ void cubicPacked(Windows<T, channels, copies>& windows, const CubicBatch<T>& bat
         } else {
             const __m128 sum = sumWindow<T, channels>(window.first, window.step, batch.x[i], batch.y[i]);
             const __m128i pixel = narrowFour<T>(clampTo<T>(sum));
-            if (i + 1 < n)
-                storeFirst<T, 4>(dst, pixel);
-            else
-                storeFirst<T, channels>(dst, pixel);
+            if (i + 1 == n) return storeFirst<T, channels>(dst, pixel);
+            storeFirst<T, 4>(dst, pixel);
         }
     }
 }
@@ -248,16 +246,14 @@ void cubicRun(const WarpSource& source, const WarpLine& line, const WarpBox& box
     }
     const DoubleAxis across = horizontalDoubles<T>(line, box, INT32_MAX);
     const DoubleAxis down = verticalDoubles<T>(line, box, INT32_MAX);
-    Windows<T, channels, reach == Reach::tiny> windows(source);
+    constexpr bool copies = reach == Reach::tiny;
+    Windows<T, channels, copies> windows(source);
     CubicBatch<T> batch;
     for (int n; count > 0; count -= n, first += n, dst += n * static_cast<int>(sizeof(T)) * channels) {
         n = count < kBatch ? count : kBatch;
         batch.prepare(across, down, *source.cubic, first, n);
         if constexpr (reach == Reach::anywhere) batch.hold(source, n);
-        if constexpr (channels == 1)
-            cubicGray<T>(windows, batch, n, dst);
-        else
-            cubicPacked<T, channels>(windows, batch, n, dst);
+        makePixels(windows, batch, n, dst);
     }
 }
 
