@@ -90,7 +90,7 @@ public:
 
 private:
     const WarpPlan& plan_;
-    bool isNearest_, isFixed_;
+    bool isNearest_, isFixed_, isSteep_;
     double bias_, shift_, inverseX_, inverseY_;
     uint64_t fixedAlongX_ = 0, fixedAlongY_ = 0;
 };

@@ -12,9 +12,10 @@ using namespace warp;
 struct Rows {
     const uint8_t *above, *below;
     ptrdiff_t ahead;
+    int32_t turn;
 
-    explicit Rows(const WarpSource& source)
-        : above(source.origin), below(source.origin + source.step), ahead(source.ahead) {}
+    Rows(const WarpSource& source, const WarpLine& line)
+        : above(source.origin), below(source.origin + source.step), ahead(source.ahead), turn(line.turn) {}
 };
 
 /// Positions between pixels as words: across 2 f - 1, down f, in 2^-15.
@@ -146,7 +147,7 @@ struct Packed {
     }
 
     QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
-        if constexpr (!anywhere) prefetchAhead(rows.above + from.offsets[0], rows.ahead);
+        if constexpr (!anywhere) prefetchAhead(rows.above + from.offsets[rows.turn], rows.ahead);
         const __m256i first = four<0>(from);
         const Bytes pixels{_mm256_packus_epi16(first, four<2>(from))};
         if (n == kPixels)
@@ -185,7 +186,7 @@ void linearBytes(const WarpSource& source, const WarpLine& line, const WarpBox& 
                  uint8_t* dst) {
     constexpr bool anywhere = reads == ByteReads::anywhere;
     using Way = std::conditional_t<channels == 1, Gray<anywhere>, Packed<channels, anywhere>>;
-    const Way way{Rows(source)};
+    const Way way{Rows(source, line)};
     if constexpr (reads == ByteReads::fixed)
         makeFixedBlocks(way, source, line, first, count, dst);
     else

@@ -40,6 +40,7 @@ struct Gather {
 
     const uint8_t* origin;
     ptrdiff_t ahead;
+    int32_t turn;
 
     struct Prepared {
         __m256i offsets, shifts;
@@ -52,7 +53,11 @@ struct Gather {
     }
 
     QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
-        if constexpr (!anywhere) prefetchAhead(origin + _mm_cvtsi128_si32(_mm256_castsi256_si128(from.offsets)), ahead);
+        if constexpr (!anywhere) {
+            alignas(kVectorBytes) int32_t offsets[8];
+            store(offsets, Vec<int32_t>{from.offsets});
+            prefetchAhead(origin + offsets[turn], ahead);
+        }
         constexpr bool shifts = anywhere && pixelBytes != kWord;
         if constexpr (kWord == 4) {
             const __m256i words = _mm256_i32gather_epi32(reinterpret_cast<const int*>(origin), from.offsets, 1);
@@ -88,6 +93,7 @@ struct Moves {
 
     const uint8_t* origin;
     ptrdiff_t ahead;
+    int32_t turn;
 
     struct Prepared {
         alignas(kVectorBytes) int32_t offsets[8];
@@ -100,8 +106,8 @@ struct Moves {
     }
 
     QORI_INLINE void make(const Prepared& from, uint8_t* dst, int n) const {
-        prefetchAhead(origin + from.offsets[0], ahead);
-        prefetchAhead(origin + from.offsets[4], ahead);
+        prefetchAhead(origin + from.offsets[turn], ahead);
+        prefetchAhead(origin + from.offsets[turn ^ 4], ahead);
         for (int i = 0; i < n; ++i) movePixel<pixelBytes>(dst + i * pixelBytes, origin + from.offsets[i]);
     }
 };
@@ -118,7 +124,7 @@ void nearestRun(const WarpSource& source, const WarpLine& line, const WarpBox& b
         return copyRow(dst, source.origin + y * source.step + x * ptrdiff_t{pixelBytes}, count * ptrdiff_t{pixelBytes});
     }
     using Way = std::conditional_t<pixelBytes <= 8, Gather<pixelBytes, anywhere>, Moves<pixelBytes>>;
-    const Way way{source.origin, source.ahead};
+    const Way way{source.origin, source.ahead, line.turn};
     if constexpr (reads == Reads::fixed)
         makeFixedBlocks(way, source, line, first, count, dst);
     else

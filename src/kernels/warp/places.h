@@ -29,6 +29,8 @@ struct WarpLine {
     double bias;
     uint64_t fixedAlongX, fixedAlongY;  ///< In units of 2^-48, modulo 2^64, for kernels of fixed positions.
     uint64_t fixedX, fixedY;
+    /// For which of eight pixels a kernel prefetches. Where each lies in a line of its own, rows take turns.
+    int32_t turn;
 };
 
 /// Positions without bias, ends included.
