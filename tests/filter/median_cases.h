@@ -40,6 +40,7 @@ struct MedianValues {
 template <class Pixel>
 auto medianAround(Around around, Pixel pixel) {
     std::vector<decltype(pixel(0, 0))> elements;
+    elements.reserve(static_cast<size_t>((around.left + around.right + 1) * (around.top + around.bottom + 1)));
     for (int dy = -around.top; dy <= around.bottom; ++dy)
         for (int dx = -around.left; dx <= around.right; ++dx) elements.push_back(pixel(dx, dy));
     return reference::median(elements);

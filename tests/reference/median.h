@@ -27,7 +27,7 @@ bool comesBefore(T a, T b) {
 template <class T>
 T median(std::vector<T>& elements) {
     const auto middle = elements.begin() + static_cast<std::ptrdiff_t>(elements.size() / 2);
-    std::nth_element(elements.begin(), middle, elements.end(), comesBefore<T>);
+    std::nth_element(elements.begin(), middle, elements.end(), [](T a, T b) { return comesBefore(a, b); });
     return *middle;
 }
 
