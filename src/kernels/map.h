@@ -107,37 +107,54 @@ constexpr bool runsFromCopy = requires {
     Op::inRegisters;
 };
 
-/// Blocks three at a time, then one at a time, then what is left. Pointers come by value: through a reference, every
+/// Blocks three at a time; gives how many elements that made. Pointers come by value: through a reference, every
 /// store might change them, and they would be loaded again for each vector.
 template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
-QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
-    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
+QORI_INLINE ptrdiff_t mapTriples(Op& op, ptrdiff_t elements, D* dst, const S*... src) {
     ptrdiff_t i = 0;
     for (; i <= elements - 3 * n; i += 3 * n) {
         for (int phase = 0; phase < 3; ++phase)
             storePack<keepAlpha, streams>(dst + i + phase * n, op(phase, loadPack<S, n>(src + i + phase * n)...));
     }
+    return i;
+}
+
+/// Blocks three at a time, then one at a time, then what is left.
+template <bool keepAlpha, int n, class Op, class D, class... S>
+QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
+    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
+    ptrdiff_t i = mapTriples<keepAlpha, false, n>(op, elements, dst, src...);
     int phase = 0;
     for (; i <= elements - n; i += n, ++phase)
-        storePack<keepAlpha, streams>(dst + i, op(phase, loadPack<S, n>(src + i)...));
+        storePack<keepAlpha, false>(dst + i, op(phase, loadPack<S, n>(src + i)...));
     if (i < elements) {
         const ptrdiff_t rest = elements - i;
         storePackUpTo<keepAlpha>(dst + i, applyTail(op, phase, rest, loadPackUpTo<S, n>(src + i, rest)...), rest);
     }
 }
 
+template <int n, class Op, class D, class... S>
+QORI_INLINE ptrdiff_t streamTriples(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
+    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
+    return mapTriples<false, true, n>(op, elements, dst, src...);
+}
+
 }  // namespace detail
 
 /// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
-/// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere.
+/// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere, and with keepAlpha,
+/// which reads what it writes anyway; less than three blocks at the end never stream.
 template <bool keepAlpha, class Op, class D, class... S>
 QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
-    if constexpr (requires { Op::mayStream; }) {
-        if (streaming && reinterpret_cast<uintptr_t>(dst) % kVectorBytes == 0)
-            return detail::mapBlocks<keepAlpha, true, n>(op, elements, dst, src...);
-    }
-    detail::mapBlocks<keepAlpha, false, n>(op, elements, dst, src...);
+    if constexpr (!keepAlpha && requires { Op::mayStream; })
+        if (streaming && reinterpret_cast<uintptr_t>(dst) % kVectorBytes == 0) {
+            const ptrdiff_t done = detail::streamTriples<n>(op, elements, dst, src...);
+            elements -= done;
+            dst += done;
+            (void(src += done), ...);
+        }
+    detail::mapBlocks<keepAlpha, n>(op, elements, dst, src...);
 }
 
 namespace detail {
