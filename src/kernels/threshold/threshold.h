@@ -48,6 +48,7 @@ private:
 /// min(source, threshold). The minimum's second operand is what equal elements and NaN give.
 template <class T, int channels>
 struct ClipAbove {
+    static constexpr bool usesSourceAgain = false;
     Constants<T, channels> threshold;
 
     QORI_INLINE Vec<T> operator()(int phase, Vec<T> source) const { return smaller(threshold[phase], source); }
@@ -56,6 +57,7 @@ struct ClipAbove {
 /// max(source, threshold).
 template <class T, int channels>
 struct ClipBelow {
+    static constexpr bool usesSourceAgain = false;
     Constants<T, channels> threshold;
 
     QORI_INLINE Vec<T> operator()(int phase, Vec<T> source) const { return larger(threshold[phase], source); }
@@ -67,6 +69,7 @@ struct ClipBelow {
 
 template <class T, int channels>
 struct ReplaceAbove {
+    static constexpr bool usesSourceAgain = true;
     ReplaceAbove(Constants<T, channels> limit, Constants<T, channels> value)
         : threshold(limit), other(std::is_unsigned_v<T> ? limit.changeTo(value) : value) {}
 
@@ -84,6 +87,7 @@ struct ReplaceAbove {
 
 template <class T, int channels>
 struct ReplaceBelow {
+    static constexpr bool usesSourceAgain = true;
     ReplaceBelow(Constants<T, channels> limit, Constants<T, channels> value)
         : threshold(limit), other(std::is_unsigned_v<T> ? limit.changeTo(value) : value) {}
 
@@ -102,6 +106,7 @@ struct ReplaceBelow {
 /// At most one of the sides selects an element, as the lower threshold does not exceed the upper one.
 template <class T, int channels>
 struct ReplaceOutside {
+    static constexpr bool usesSourceAgain = true;
     ReplaceBelow<T, channels> lower;
     ReplaceAbove<T, channels> upper;
 
@@ -126,6 +131,7 @@ struct Thresholding {
     template <class T, int n>
     QORI_INLINE Pack<T, n> operator()(int phase, Pack<T, n> source) const {
         static_assert(Pack<T, n>::vectors == 1, "constants repeat from vector to vector");
+        if constexpr (Rule::usesSourceAgain) loadOnce(source.v[0].v);
         return {{rule(phase, source.v[0])}};
     }
 };
