@@ -41,7 +41,7 @@ Row patterns(std::string name, int reach, double bestAtL2, double bestAtFrame, F
                               },
                               {},
                               {}};
-        if (reach > 0 && sizeof(D) == 1) {
+        if (reach > 0 && sizeof(D) == 1 && size.width <= kFrame.width) {
             contenders.plain = plainPatterns(src, dst, reach);
             contenders.output = outputOf(dst);
         }
@@ -55,12 +55,18 @@ Row patterns(std::string name, int reach, double bestAtL2, double bestAtFrame, F
             .bestAtFrame = bestAtFrame};
 }
 
+/// Beyond the largest cache too.
+Row withLarge(Row row) {
+    row.sizes.push_back(kContiguous.back());
+    return row;
+}
+
 const Rows lbp{{
-    patterns<uint8_t, uint8_t>("LBP 3x3 8u C1", 1, 13'565, 10'948, qoriLBPImage3x3_8u_C1R),
+    withLarge(patterns<uint8_t, uint8_t>("LBP 3x3 8u C1", 1, 13'565, 10'948, qoriLBPImage3x3_8u_C1R)),
     patterns<uint8_t, uint8_t>("LBP 3x3 8u C1, mode 3", 0, 0, 0, qoriLBPImageMode3x3_8u_C1R, uint8_t{3}),
     patterns<uint8_t, uint8_t>("LBP 5x5 8u C1", 2, 0, 0, qoriLBPImage5x5_8u_C1R),
     patterns<uint8_t, uint16_t>("LBP 5x5 8u16u C1", 2, 0, 0, qoriLBPImage5x5_8u16u_C1R),
-    patterns<float, uint8_t>("LBP 3x3 32f8u C1", 1, 0, 0, qoriLBPImage3x3_32f8u_C1R),
+    withLarge(patterns<float, uint8_t>("LBP 3x3 32f8u C1", 1, 0, 0, qoriLBPImage3x3_32f8u_C1R)),
     patterns<float, uint8_t>("LBP 5x5 32f8u C1", 2, 0, 0, qoriLBPImage5x5_32f8u_C1R),
     patterns<float, uint16_t>("LBP 5x5 32f16u C1", 2, 0, 0, qoriLBPImage5x5_32f16u_C1R),
     patterns<uint8_t, uint8_t>("LBP horizontal correction 8u C1", 0, 0, 0, qoriLBPImageHorizCorr_8u_C1R),

@@ -145,7 +145,7 @@ QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t border
                               BorderRule::withMirror(Border::of(borderType), &value)};
     const bool isAligned = (reinterpret_cast<uintptr_t>(dst.data) | static_cast<uintptr_t>(dst.step)) % 32 == 0;
     return underControlOf<T>([&] {
-        if (isAligned && streams(streamRules::copy, traffic(roi, elementBytes<T> + elementBytes<D>))) {
+        if (isAligned && streams(streamRules::copy, wholeTraffic(roi, elementBytes<T> + elementBytes<D>))) {
             maker.template operator()<true>()(image, dst);
             streamFence();
         } else {
@@ -160,10 +160,11 @@ QorResult lbpOfMode(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t 
     return lbp(src, dst, roi, borderType, value, []<bool streaming>() {
         return [](const BorderedImage& image, Image<D> to) {
             if constexpr (std::is_floating_point_v<T> || sizeof(D) == 1) {
-                using InPlace = InPlacePatterns<T, D, reach, mode, streaming>;
+                using InPlace = InPlacePatterns<T, D, reach, mode>;
                 if (image.size.width >= InPlace::kLeast)
-                    return makeStrips(image, to, InPlace::kStripPixels,
-                                      [](const BorderedImage& strip, Image<D> part) { InPlace(strip).make(part); });
+                    return makeStrips(image, to, InPlace::kStripPixels, [](const BorderedImage& strip, Image<D> part) {
+                        InPlace(strip).make(part, streaming);
+                    });
             }
             makeFromKeys<T, reach>(image, to,
                                    [](const kernels::PatternKey<T>* const* rows, D* row, ptrdiff_t width, auto ahead) {

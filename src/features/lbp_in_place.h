@@ -11,7 +11,7 @@
 namespace qori::features {
 
 /// A strip of an image at least kLeast pixels wide.
-template <class T, class D, int reach, int mode, bool streaming>
+template <class T, class D, int reach, int mode>
 class InPlacePatterns {
 public:
     static constexpr int32_t kRows = kernels::kPatternBlock;
@@ -27,7 +27,7 @@ public:
             for (int32_t x = 0; x < strip.size.width + 2 * reach; ++x) constants_[x] = value_;
     }
 
-    void make(Image<D> dst) {
+    void make(Image<D> dst, bool streaming) {
         const Sides& open = strip_.rule.open;
         const int32_t width = strip_.size.width, begin = open.left ? 0 : reach,
                       end = open.right ? width : width - reach;
@@ -35,7 +35,7 @@ public:
             const int32_t count = std::min(kRows, strip_.size.height - y);
             const T* rows[kRows + 2 * reach];
             for (int32_t i = 0; i < count + 2 * reach; ++i) rows[i] = seenRow(y - reach + i);
-            kernels::patternRows<reach, mode, streaming>(rows, dst.row(y), dst.step, count, begin, end);
+            kernels::patternRows<reach, mode>(rows, dst.row(y), dst.step, count, begin, end, streaming);
             if (!open.left) makeColumns(rows, count, 0, dst, y);
             if (!open.right) makeColumns(rows, count, width - reach, dst, y);
         }

@@ -109,6 +109,9 @@ void sweepPatterns(int reach, int bytesPerPixel, const char* name, Check check) 
         check(Job{{.width = width, .height = 4}, reach, drawBorder()});
     check(Job{{.width = 70, .height = 9, .padding = 3, .flipped = true}, reach, drawBorder()});
     forStreamingChoices(bytesPerPixel, 1 << 20, [&](const Shape& shape) { check(Job{shape, reach, drawBorder()}); });
+    qorTestSetCacheSize(1);  // pieces that are whole and others, bands of several tiles and what is left of them
+    check(Job{{.width = 16'480, .height = 45}, reach, drawBorder()});
+    qorTestSetCacheSize(0);
     markSwept(name);
 }
 

@@ -8,6 +8,7 @@
 // order is put right once, at the end. Bits are joined in two ways, to keep all ports of the processor busy: the upper
 // ones by averages, which shift a sum to the right and enter a truth on its left, the lower ones by additions.
 #pragma once
+#include "kernels/byte_tables.h"
 #include "kernels/copy_rows.h"
 #include "kernels/vector_math.h"
 
@@ -45,6 +46,10 @@ struct KeyBlock {
     }
 };
 
+/// The lower words of a's lanes and the upper words of b's: of truths, the words of both. Packing keeps an order that
+/// is not needed yet, and runs on one port of the processor where this runs on three.
+QORI_INLINE __m256i alternate(__m256i a, __m256i b) { return _mm256_blend_epi16(a, b, 0xAA); }
+
 /// A byte for each pixel: -1 where the neighbour is smaller (integers), or where it is not smaller (floats, whose
 /// comparisons with NaN are all false).
 template <class Key>
@@ -61,7 +66,7 @@ QORI_INLINE Bytes truths(const KeyBlock<Key>& centre, const KeyBlock<Key>& neigh
     else if constexpr (sizeof(Key) == 2)
         return {_mm256_packs_epi16(truth[0], truth[1])};
     else
-        return {_mm256_packs_epi16(_mm256_packs_epi32(truth[0], truth[1]), _mm256_packs_epi32(truth[2], truth[3]))};
+        return {_mm256_packs_epi16(alternate(truth[0], truth[1]), alternate(truth[2], truth[3]))};
 }
 
 /// Bits from this one on enter by averages.
@@ -94,8 +99,11 @@ QORI_INLINE Bytes joinBits(TruthOf truthOf) {
         return codes;
     else if constexpr (sizeof(Key) == 2)
         return {_mm256_permute4x64_epi64(codes.v, 0xD8)};
-    else
-        return {_mm256_permutevar8x32_epi32(codes.v, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))};
+    else {  // in either half four pixels of each vector, those of the first two and of the last two in turn
+        static constexpr ByteTable apart = bothHalves([](int i) { return i / 8 * 8 + i % 4 * 2 + i / 4 % 2; });
+        return {_mm256_permutevar8x32_epi32(shuffleInBlocks(codes, load(apart.at)).v,
+                                            _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))};
+    }
 }
 
 struct Place {
