@@ -151,23 +151,27 @@ constexpr int kLongRows[] = {8191, 8192, 8193, 12301};
 constexpr int kManyRows = 65;
 
 TEST(Copy, LongRowsArriveWhateverTheirAlignment) {
-    for (int width : kLongRows) {
-        for (int shift : {0, 1, 33}) {
-            const Shape from{.width = width, .height = kManyRows, .padding = 7, .shift = shift};
-            const Shape to{.width = width, .height = kManyRows, .padding = 64 - shift, .flipped = shift == 1};
-            SCOPED_TRACE(describe(from));
-            TestImage src(kSrcSlot, from, 1), dst(kDstSlot, to, 1);
-            src.fill<uint8_t>(1, [] { return random().value<uint8_t>(); });
-            Snapshot expected = dst.snapshot();
-            reference::copy(src.view<uint8_t>(1), expected.view<uint8_t>(1), from.roi(), {{0, 0}}, nullptr);
-            EXPECT_EQ(QOR_OK,
-                      qoriCopy_8u_C1R(src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(), from.roi()));
-            QORI_EXPECT_UNCHANGED(dst, expected);
-            EXPECT_EQ(QOR_OK,
-                      qoriCopy_8u_C1R(dst.data<uint8_t>(), dst.step(), dst.data<uint8_t>(), dst.step(), from.roi()));
-            QORI_EXPECT_UNCHANGED(dst, expected);
+    for (int32_t cache : {1, 1 << 28}) {  // past the cache, and through it
+        qorTestSetCacheSize(cache);
+        for (int width : kLongRows) {
+            for (int shift : {0, 1, 33}) {
+                const Shape from{.width = width, .height = kManyRows, .padding = 7, .shift = shift};
+                const Shape to{.width = width, .height = kManyRows, .padding = 64 - shift, .flipped = shift == 1};
+                SCOPED_TRACE(describe(from));
+                TestImage src(kSrcSlot, from, 1), dst(kDstSlot, to, 1);
+                src.fill<uint8_t>(1, [] { return random().value<uint8_t>(); });
+                Snapshot expected = dst.snapshot();
+                reference::copy(src.view<uint8_t>(1), expected.view<uint8_t>(1), from.roi(), {{0, 0}}, nullptr);
+                EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(src.data<uint8_t>(), src.step(), dst.data<uint8_t>(), dst.step(),
+                                                  from.roi()));
+                QORI_EXPECT_UNCHANGED(dst, expected);
+                EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(dst.data<uint8_t>(), dst.step(), dst.data<uint8_t>(), dst.step(),
+                                                  from.roi()));
+                QORI_EXPECT_UNCHANGED(dst, expected);
+            }
         }
     }
+    qorTestSetCacheSize(0);
 }
 
 TEST(Copy, SameImageAsSourceAndDestinationIsUntouched) {
@@ -193,6 +197,18 @@ TEST(Copy, ZeroStepsRepeatTheSourceRowAndKeepTheLastDestinationRow) {
     uint8_t only[3] = {};
     EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(dst.data<uint8_t>(), dst.step(), only, 0, shape.roi()));
     EXPECT_EQ(0, std::memcmp(row, only, 3));
+}
+
+TEST(Copy, OfRowsInOnePlaceTheLastStays) {
+    constexpr int width = 300'000, rows = 3;
+    std::vector<uint8_t> src(width * rows), dst(width);
+    for (uint8_t& byte : src) byte = random().value<uint8_t>();
+    for (int32_t cache : {1, 1 << 28}) {
+        qorTestSetCacheSize(cache);
+        EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(src.data(), width, dst.data(), 0, {width, rows}));
+        EXPECT_EQ(0, std::memcmp(dst.data(), src.data() + width * (rows - 1), width));
+    }
+    qorTestSetCacheSize(0);
 }
 
 TEST(Copy, AsksForTheCacheOnlyAboveEachBound) {

@@ -8,16 +8,18 @@
 namespace qori::kernels {
 namespace {
 
-constexpr uintptr_t kLine = 64;
+constexpr ptrdiff_t kLine = 2 * kVectorBytes;
+
+/// A cache line of the destination.
+QORI_INLINE void streamLine(uint8_t* dst, const uint8_t* src) {
+    const Bytes a = load(src), b = load(src + kVectorBytes);
+    stream(dst, a);
+    stream(dst + kVectorBytes, b);
+}
 
 /// A piece that begins on a cache line of the destination.
 QORI_INLINE void streamPiece(uint8_t* dst, const uint8_t* src) {
-    constexpr ptrdiff_t step = 2 * kVectorBytes;
-    for (ptrdiff_t at = 0; at < kStreamedPiece; at += step) {
-        const Bytes a = load(src + at), b = load(src + at + kVectorBytes);
-        stream(dst + at, a);
-        stream(dst + at + kVectorBytes, b);
-    }
+    for (ptrdiff_t at = 0; at < kStreamedPiece; at += kLine) streamLine(dst + at, src + at);
 }
 
 }  // namespace
@@ -29,7 +31,7 @@ void copyRowsStreaming(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrd
         ptrdiff_t done[kStreamedTogether];
         for (int32_t k = 0; k < together; ++k) {
             uint8_t* const to = dst + k * dstStep;
-            done[k] = std::min(bytes, static_cast<ptrdiff_t>(-reinterpret_cast<uintptr_t>(to) & (kLine - 1)));
+            done[k] = std::min(bytes, static_cast<ptrdiff_t>(-reinterpret_cast<uintptr_t>(to) & uintptr_t{kLine - 1}));
             copyRow(to, src + k * srcStep, done[k]);
         }
         for (bool isMore = true; isMore;) {
@@ -41,8 +43,12 @@ void copyRowsStreaming(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrd
                 isMore = true;
             }
         }
-        for (int32_t k = 0; k < together; ++k)
-            copyRow(dst + k * dstStep + done[k], src + k * srcStep + done[k], bytes - done[k]);
+        for (int32_t k = 0; k < together; ++k) {
+            uint8_t* const to = dst + k * dstStep;
+            const uint8_t* const from = src + k * srcStep;
+            for (; bytes - done[k] >= kLine; done[k] += kLine) streamLine(to + done[k], from + done[k]);
+            copyRow(to + done[k], from + done[k], bytes - done[k]);
+        }
         dst += kStreamedTogether * dstStep;
         src += kStreamedTogether * srcStep;
     }
