@@ -199,14 +199,18 @@ TEST(Copy, ZeroStepsRepeatTheSourceRowAndKeepTheLastDestinationRow) {
     EXPECT_EQ(0, std::memcmp(row, only, 3));
 }
 
-TEST(Copy, OfRowsInOnePlaceTheLastStays) {
+TEST(Copy, OfRowsThatOverlapTheLastStays) {
     constexpr int width = 300'000, rows = 3;
-    std::vector<uint8_t> src(width * rows), dst(width);
+    std::vector<uint8_t> src(width * rows);
     for (uint8_t& byte : src) byte = random().value<uint8_t>();
-    for (int32_t cache : {1, 1 << 28}) {
-        qorTestSetCacheSize(cache);
-        EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(src.data(), width, dst.data(), 0, {width, rows}));
-        EXPECT_EQ(0, std::memcmp(dst.data(), src.data() + width * (rows - 1), width));
+    for (int step : {0, 1'000}) {
+        std::vector<uint8_t> dst(static_cast<size_t>(width + step * (rows - 1))), expected = dst;
+        for (int y = 0; y < rows; ++y) std::memcpy(expected.data() + y * step, src.data() + y * width, width);
+        for (int32_t cache : {1, 1 << 28}) {
+            qorTestSetCacheSize(cache);
+            EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(src.data(), width, dst.data(), step, {width, rows}));
+            EXPECT_TRUE(dst == expected) << step;
+        }
     }
     qorTestSetCacheSize(0);
 }
