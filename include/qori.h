@@ -8733,7 +8733,7 @@ QORI_API QorResult QORI_CALL qoriWarpAffineNearest_64f_C4R(const double* pSrc, i
 /** Warps a tile by linear interpolation of 2 x 2 pixels: 64f in double precision, the others in single.
  *  Shapes    Tiles, positions and statuses as for qoriWarpAffineNearest.
  *  Elements  Fractions have 24 bits, 53 for 64f and 15 for 8u, so that a result of bytes is off its rounding by
- *            0.024 at most. Integers round to nearest, ties to even.
+ *            0.02 at most. Integers round to nearest, ties to even.
  *  Units     Steps in bytes, any value, not checked but for 64f: a negative step walks an image upwards. Sizes
  *            and offsets in pixels.
  *  Aliasing  Source and destination must not overlap; pBuffer must not overlap anything.
