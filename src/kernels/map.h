@@ -107,6 +107,8 @@ constexpr bool runsFromCopy = requires {
     Op::inRegisters;
 };
 
+constexpr int kCacheLine = 64;
+
 /// Blocks three at a time; gives how many elements that made. Pointers come by value: through a reference, every
 /// store might change them, and they would be loaded again for each vector.
 template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
@@ -133,22 +135,33 @@ QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*...
     }
 }
 
+/// Whether a row may stream. A line of which one part goes past the cache and the other through it costs half a
+/// microsecond: rows begin with a line, or are so long that what is broken at their ends does not count.
+template <class D>
+bool mayPassCache(const D* dst, ptrdiff_t elements) {
+    constexpr ptrdiff_t longRow = 65'536 / static_cast<ptrdiff_t>(sizeof(D));
+    const auto at = reinterpret_cast<uintptr_t>(dst);
+    return at % kCacheLine == 0 || (at % kVectorBytes == 0 && elements >= longRow);
+}
+
+/// As mapTriples, of whole lines.
 template <int n, class Op, class D, class... S>
 QORI_INLINE ptrdiff_t streamTriples(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
+    constexpr ptrdiff_t triple = 3 * n, whole = triple * int{sizeof(D)} % kCacheLine == 0 ? triple : 2 * triple;
     std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
-    return mapTriples<false, true, n>(op, elements, dst, src...);
+    return mapTriples<false, true, n>(op, elements / whole * whole, dst, src...);
 }
 
 }  // namespace detail
 
 /// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
-/// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere, and with keepAlpha,
-/// which reads what it writes anyway; less than three blocks at the end never stream.
+/// sources may be the same. Streaming wants dst on a cache line's boundary (long rows: on a vector's) and is ignored
+/// elsewhere, and with keepAlpha, which reads what it writes anyway; less than six blocks at the end never stream.
 template <bool keepAlpha, class Op, class D, class... S>
 QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
     if constexpr (!keepAlpha && requires { Op::mayStream; })
-        if (streaming && reinterpret_cast<uintptr_t>(dst) % kVectorBytes == 0) {
+        if (streaming && detail::mayPassCache(dst, elements)) {
             const ptrdiff_t done = detail::streamTriples<n>(op, elements, dst, src...);
             elements -= done;
             dst += done;
