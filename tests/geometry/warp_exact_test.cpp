@@ -2,6 +2,7 @@
 // What must come out exactly: maps of pixels to pixels, border values, positions of any size; and how often rounded
 // results are the correctly rounded ones.
 #include <bit>
+#include <limits>
 
 #include "warp_jobs.h"
 
@@ -95,6 +96,46 @@ TEST(WarpExact, PixelsOfWholePositionsInEnlargements) {
     for (int y = 0; y < 20; ++y)
         for (int x = 0; x < 30; ++x)
             ASSERT_EQ(src.view<uint8_t>(1).get(x, y), dst.view<uint8_t>(1).get(3 * x, 3 * y)) << x << ", " << y;
+}
+
+/// Infinities count in windows that hold them, and in no other: beyond the edges windows hold their nearest pixels
+/// only.
+template <class T, int channels, class Function>
+void expectFiniteBeside(Function function, Method method, bool isColumn) {
+    constexpr int side = 9, infinite = 3, reach = 6;
+    const double shift = -reach - 0.375;  // column x is made of position x - 6.375
+    WarpJob job{method,
+                {1, 0, isColumn ? shift : 0.25, 0, 1, isColumn ? 0.25 : shift},
+                true,
+                {side, side},
+                {side + 2 * reach, side + 2 * reach},
+                borderReplicate};
+    SCOPED_TRACE(describe(job));
+    const TestImage src(kWarpSrc, {.width = side, .height = side}, channels * int{sizeof(T)});
+    const TestImage dst(kWarpDst, {.width = job.dst.width, .height = job.dst.height}, channels * int{sizeof(T)});
+    src.fill<T>(channels, [] { return static_cast<T>(random().below(100)); });
+    for (int i = 0; i < side; ++i)
+        for (int c = 0; c < channels; ++c)
+            src.view<T>(channels).set(isColumn ? infinite : i, isColumn ? i : infinite, c,
+                                      std::numeric_limits<T>::infinity());
+    runWhole<T, channels>(function, job, src, dst);
+    const int before = method.interpolation == interpCubic ? 1 : 0, after = before + 1;
+    for (int y = 0; y < job.dst.height; ++y)
+        for (int x = 0; x < job.dst.width; ++x) {
+            const int begin = static_cast<int>(std::floor((isColumn ? x : y) + shift));
+            const bool holdsIt = begin - before <= infinite && infinite <= begin + after;
+            for (int c = 0; c < channels; ++c)
+                ASSERT_EQ(!holdsIt, std::isfinite(dst.view<T>(channels).get(x, y, c))) << x << ", " << y;
+        }
+}
+
+TEST(WarpExact, InfinitiesStayInTheirWindows) {
+    for (bool isColumn : {true, false}) {
+        expectFiniteBeside<float, 1>(qoriWarpAffineLinear_32f_C1R, kLinear, isColumn);
+        expectFiniteBeside<float, 1>(qoriWarpAffineCubic_32f_C1R, kCubic, isColumn);
+        expectFiniteBeside<float, 4>(qoriWarpAffineCubic_32f_C4R, kCubic, isColumn);
+        expectFiniteBeside<double, 3>(qoriWarpAffineCubic_64f_C3R, kCubic, isColumn);
+    }
 }
 
 template <class T, class Function>

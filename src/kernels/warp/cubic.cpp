@@ -144,7 +144,7 @@ QORI_INLINE __m256d sumDoubles(const uint8_t* p, ptrdiff_t step, const double* x
     }
 }
 
-/// Where the first pixels of windows lie: in the source, or of sources that are smaller than a window in a copy whose
+/// Where the first pixels of windows lie: in the source, or with `copies`, of those that leave it, in a copy whose
 /// pixels beyond are the nearest ones.
 template <class T, int channels, bool copies>
 class Windows {
@@ -158,7 +158,11 @@ public:
 
     /// Copies of four windows live at once.
     QORI_INLINE Window at(int32_t column, int32_t row, int slot) {
-        if constexpr (copies) return {copy(column, row, slot), kStep};
+        if constexpr (copies) {
+            const bool isInside =
+                column > source_.left && column + 2 <= source_.right && row > source_.top && row + 2 <= source_.bottom;
+            if (!isInside) return {copy(column, row, slot), kStep};
+        }
         return {source_.origin + (row - 1) * source_.step + (column - 1) * ptrdiff_t{kPixel}, source_.step};
     }
 
@@ -235,24 +239,26 @@ void makePixels(Windows<T, channels, copies>& windows, const CubicBatch<T>& batc
     }
 }
 
-enum class Reach { inside, anywhere, tiny };
+/// Windows beyond the edge are held at it, or copied: of sources that are smaller than a window, and of floats, as a
+/// weight of 0 does not keep an infinity out that the window has nothing to do with.
+enum class Reach { inside, held, copied };
 
 template <class T, int channels, Reach reach>
 void cubicRun(const WarpSource& source, const WarpLine& line, const WarpBox& box, int32_t first, int32_t count,
               uint8_t* dst) {
-    if constexpr (reach == Reach::anywhere) {
+    if constexpr (reach == Reach::held) {
         if (source.right - source.left < kTaps - 1 || source.bottom - source.top < kTaps - 1)
-            return cubicRun<T, channels, Reach::tiny>(source, line, box, first, count, dst);
+            return cubicRun<T, channels, Reach::copied>(source, line, box, first, count, dst);
     }
     const DoubleAxis across = horizontalDoubles<T>(line, box, INT32_MAX);
     const DoubleAxis down = verticalDoubles<T>(line, box, INT32_MAX);
-    constexpr bool copies = reach == Reach::tiny;
+    constexpr bool copies = reach == Reach::copied;
     Windows<T, channels, copies> windows(source);
     CubicBatch<T> batch;
     for (int n; count > 0; count -= n, first += n, dst += n * static_cast<int>(sizeof(T)) * channels) {
         n = count < kBatch ? count : kBatch;
         batch.prepare(across, down, *source.cubic, first, n);
-        if constexpr (reach == Reach::anywhere) batch.hold(source, n);
+        if constexpr (reach == Reach::held) batch.hold(source, n);
         makePixels(windows, batch, n, dst);
     }
 }
@@ -270,7 +276,7 @@ CubicWeights weightsOf(Cubic cubic) {
 
 template <class T, int channels>
 WarpKernels cubicKernels() {
-    constexpr WarpKernel any = cubicRun<T, channels, Reach::anywhere>;
+    constexpr WarpKernel any = cubicRun < T, channels, std::is_floating_point_v<T> ? Reach::copied : Reach::held > ;
     return {cubicRun<T, channels, Reach::inside>, any, any, 1, 1, 2, 2};
 }
 
