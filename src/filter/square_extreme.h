@@ -1,88 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
-// Smallest and largest elements of 3 x 3 pixels around each of a region, a few rows at a time.
+// Smallest and largest elements of 3 x 3 pixels around each of a region, whose neighbours are read from memory.
 #pragma once
-#include "frame/float_control.h"
-#include "frame/plan.h"
-#include "frame/row_window.h"
-#include "frame/streaming.h"
+#include "image/image.h"
 #include "kernels/filter/morphology.h"
 
 namespace qori::filter {
 
-/// Rows made at a time, six being read for four. Measured beyond the caches, two reach 0.9 of this rate; eight gain a
-/// fifth in the second-level cache and nothing beyond it.
-inline constexpr int32_t kExtremeRows = 4;
 inline constexpr int kSquareReach = 1;
 
-template <Layout layout, class T>
-BorderedImage withNeighbours(Image<T> src, QorImageSize roi) {
-    return {asBytes(src.data), src.step, roi, pixelSize<T, layout>, BorderRule::readAll()};
-}
+// Order: kernels::Erosion or Dilation of 8u, 16u, 16s, 32f; one channel of 64f. Arguments are as they must be.
 
-/// One group of rows. Two or three are made as four, the last of which give way: in place, none may be written before
-/// all of the group are made.
-template <class Order, kernels::Stores stores, Layout layout, class T>
-void makeSquareExtremes(const WindowPart& part, int32_t y, int32_t rows, Image<T> dst) {
-    constexpr int n = channels(layout);
-    constexpr bool keepAlpha = layout == Layout::AC4;
-    const ptrdiff_t elements = ptrdiff_t{part.width} * n;
-    const T* src[kExtremeRows + 2];
-    T* to[kExtremeRows];
-    for (int32_t k = 0; k < kExtremeRows + 2; ++k)
-        src[k] = advance(part.row<T>(y - kSquareReach + std::min(k, rows + 1)), n * kSquareReach * elementBytes<T>);
-    for (int32_t k = 0; k < kExtremeRows; ++k) to[k] = dst.row(y + std::min(k, rows - 1));
-    if (rows == 1)
-        kernels::squareRows<Order, n, kernels::Stores::delayed, keepAlpha, 1>(src, to, elements);
-    else
-        kernels::squareRows<Order, n, stores, keepAlpha, kExtremeRows>(src, to, elements);
-}
-
-constexpr WindowNeeds squareExtremeNeeds(Place place) {
-    return {
-        .reach = {kSquareReach, kSquareReach, kSquareReach, kSquareReach}, .rowsAtOnce = kExtremeRows, .place = place};
-}
-
-template <class Order, kernels::Stores stores, Layout layout, class T>
-void runSquareExtremes(const BorderedImage& src, Image<T> dst, uint8_t* memory) {
-    RowWindow window(src, squareExtremeNeeds(stores == kernels::Stores::delayed ? Place::inOrder : Place::apart),
-                     memory);
-    window.forEach([&](const WindowPart& part, int32_t y, int32_t rows) {
-        makeSquareExtremes<Order, stores, layout>(part, y, rows, dst);
-    });
-}
-
-template <class T>
-bool isOnVectors(Image<T> image) {
-    return (reinterpret_cast<uintptr_t>(image.data) | static_cast<uintptr_t>(image.step)) % 32 == 0;
-}
-
-/// Arguments are as they must be; returns QOR_OK or QOR_ERR_NO_MEMORY, with nothing written then.
+/// Returns QOR_OK or QOR_ERR_NO_MEMORY, with nothing written then.
 template <class Order, Layout layout, class T>
-QorResult squareExtremeInPlace(Image<T> image, QorImageSize roi) {
-    const BorderedImage src = withNeighbours<layout>(image, roi);
-    const WorkMemory memory(RowWindow::bytes(src, squareExtremeNeeds(Place::inOrder)));
-    if (QorResult r = memory.check()) return r;
-    return underControlOf<T>([&] {
-        runSquareExtremes<Order, kernels::Stores::delayed, layout>(src, image, memory.begin<uint8_t>());
-        return QOR_OK;
-    });
-}
+QorResult squareExtremeInPlace(Image<T> image, QorImageSize roi);
 
 /// The images share no memory.
 template <class Order, Layout layout, class T>
-void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi) {
-    underControlOf<T>([&] {
-        const BorderedImage image = withNeighbours<layout>(src, roi);
-        constexpr int kBytesPerPixel = 2 * pixelSize<T, layout>;
-        if constexpr (layout != Layout::AC4)  // which has the destination in the cache, having read it
-            if (isOnVectors(dst) && streams(streamRules::copy, traffic(roi, kBytesPerPixel))) {
-                runSquareExtremes<Order, kernels::Stores::streaming, layout>(image, dst, nullptr);
-                streamFence();
-                return QOR_OK;
-            }
-        runSquareExtremes<Order, kernels::Stores::plain, layout>(image, dst, nullptr);
-        return QOR_OK;
-    });
-}
+void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi);
 
 }  // namespace qori::filter
