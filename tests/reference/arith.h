@@ -11,6 +11,7 @@
 #include <limits>
 #include <type_traits>
 
+#include "keeps_nan.h"
 #include "qori.h"
 
 namespace qori::test::reference {
@@ -162,9 +163,6 @@ bool isZero(T a) {
     else
         return a == 0;
 }
-
-/// Inlined, as everything on the way of a signalling NaN: returning it in an x87 register would make it a quiet one.
-#define QORI_KEEPS_NAN inline __attribute__((always_inline))
 
 QORI_KEEPS_NAN float floatFromBits(uint32_t bits) {
     float f;

@@ -8,6 +8,8 @@
 #include <type_traits>
 #include <vector>
 
+#include "keeps_nan.h"
+
 namespace qori::test::reference {
 
 template <class T>
@@ -85,7 +87,7 @@ long double cubic(const LevelTable<L>& table, int k, long double v) {
 }
 
 template <class T, class L>
-T throughLevels(T v, const LevelTable<L>& table, Form form) {
+QORI_KEEPS_NAN T throughLevels(T v, const LevelTable<L>& table, Form form) {
     const int k = intervalOf(v, table, form);
     if (k < 0) return v;
     const L value = table.values[size_t(k)];
