@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "copy_rows.h"
 
+#include "line_ends.h"
+
 namespace qori::kernels {
 namespace {
 
-constexpr ptrdiff_t kVector = kVectorBytes, kLine = 64;
+constexpr ptrdiff_t kVector = kVectorBytes;
 constexpr ptrdiff_t kStringRow = 8192;  // in rows of 2 to 6 KiB string moves gain nothing and fills lose up to 40 %
 
 /// Bytes from p to the next multiple of `boundary`, a power of two.
@@ -37,21 +39,13 @@ QORI_INLINE void copyShort(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
     }
 }
 
-/// The body from an aligned destination on; the last 1 to 128 bytes are the caller's. `done` bytes are already copied.
-template <bool streaming>
-QORI_INLINE ptrdiff_t copyBlocks(uint8_t* dst, const uint8_t* src, ptrdiff_t done, ptrdiff_t bytes) {
-    for (; done < bytes - 4 * kVector; done += 4 * kVector) {
-        const Bytes a = load(src + done), b = load(src + done + kVector);
-        const Bytes c = load(src + done + 2 * kVector), d = load(src + done + 3 * kVector);
-        storeAs<streaming>(dst + done, a);
-        storeAs<streaming>(dst + done + kVector, b);
-        storeAs<streaming>(dst + done + 2 * kVector, c);
-        storeAs<streaming>(dst + done + 3 * kVector, d);
-    }
-    return done;
+template <bool streaming, int vectors>
+QORI_INLINE void copyVectors(uint8_t* dst, const uint8_t* src) {
+    Bytes all[vectors];
+    for (int k = 0; k < vectors; ++k) all[k] = load(src + k * kVector);
+    for (int k = 0; k < vectors; ++k) storeAs<streaming>(dst + k * kVector, all[k]);
 }
 
-template <bool streaming>
 QORI_INLINE void copyAligned(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
     if (bytes <= 2 * kVector) return copyShort(dst, src, bytes);
     if (bytes <= 4 * kVector) {
@@ -64,7 +58,8 @@ QORI_INLINE void copyAligned(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) 
         return;
     }
     store(dst, load(src));
-    const ptrdiff_t done = copyBlocks<streaming>(dst, src, toBoundary(dst, kVector), bytes);
+    ptrdiff_t done = toBoundary(dst, kVector);
+    for (; done < bytes - 4 * kVector; done += 4 * kVector) copyVectors<false, 4>(dst + done, src + done);
     for (ptrdiff_t rest = 4 * kVector; rest > 0; rest -= kVector)
         if (bytes - done > rest - kVector) store(dst + bytes - rest, load(src + bytes - rest));
 }
@@ -99,39 +94,40 @@ QORI_INLINE Bytes patternAt(const Pattern& pattern, ptrdiff_t offset) {
     return load(pattern.bytes + offset % Pattern::period);
 }
 
+/// Six vectors of the pattern from `done` on, again and again, to `end` or less than six vectors before it; gives
+/// where.
 template <bool streaming>
-QORI_INLINE void fillAligned(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
-    if (bytes <= 4 * kVector) return copyAligned<false>(dst, pattern.bytes, bytes);
-    store(dst, load(pattern.bytes));
-    ptrdiff_t done = toBoundary(dst, kVector);
-    const Bytes p0 = load(pattern.bytes + done), p1 = load(pattern.bytes + done + kVector);
-    const Bytes p2 = load(pattern.bytes + done + 2 * kVector);
-    for (; done <= bytes - 6 * kVector; done += 6 * kVector) {
-        storeAs<streaming>(dst + done, p0);
-        storeAs<streaming>(dst + done + kVector, p1);
-        storeAs<streaming>(dst + done + 2 * kVector, p2);
-        storeAs<streaming>(dst + done + 3 * kVector, p0);
-        storeAs<streaming>(dst + done + 4 * kVector, p1);
-        storeAs<streaming>(dst + done + 5 * kVector, p2);
-    }
-    // Up to six vectors are left; p0 comes next and the cycle goes on.
-    if (done <= bytes - kVector) store(dst + done, p0);
-    if (done <= bytes - 2 * kVector) store(dst + done + kVector, p1);
-    if (done <= bytes - 3 * kVector) store(dst + done + 2 * kVector, p2);
-    if (done <= bytes - 4 * kVector) store(dst + done + 3 * kVector, p0);
-    if (done <= bytes - 5 * kVector) store(dst + done + 4 * kVector, p1);
-    store(dst + bytes - kVector, patternAt(pattern, bytes - kVector));
+QORI_INLINE ptrdiff_t fillCycles(uint8_t* dst, const Bytes (&cycle)[3], ptrdiff_t done, ptrdiff_t end) {
+    for (; done <= end - 6 * kVector; done += 6 * kVector)
+        for (int k = 0; k < 6; ++k) storeAs<streaming>(dst + done + k * kVector, cycle[k % 3]);
+    return done;
+}
+
+/// Up to 127 bytes of the pattern from a phase on.
+QORI_INLINE void fillShort(uint8_t* dst, const Pattern& pattern, ptrdiff_t phase, ptrdiff_t bytes) {
+    for (; bytes >= kVector; dst += kVector, phase += kVector, bytes -= kVector) store(dst, patternAt(pattern, phase));
+    if (bytes > 0) storePartial(dst, patternAt(pattern, phase), bytes);
 }
 
 }  // namespace
 
-void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<false>(dst, src, bytes); }
-void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned<true>(dst, src, bytes); }
+void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned(dst, src, bytes); }
+
+void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+    const auto [head, lines] = LineEnds::ofBytes(dst, bytes);
+    if (lines == 0) return copyAligned(dst, src, bytes);
+    copyShort(dst, src, head);
+    const ptrdiff_t end = head + lines;
+    ptrdiff_t done = head;
+    for (; done <= end - 2 * kCacheLine; done += 2 * kCacheLine) copyVectors<true, 4>(dst + done, src + done);
+    if (done < end) copyVectors<true, 2>(dst + done, src + done);
+    copyShort(dst + end, src + end, bytes - end);
+}
 
 void copyRowString(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
     // A string move onto its own source goes byte by byte.
     if (dst == src || bytes < kStringRow) return copyRow(dst, src, bytes);
-    const ptrdiff_t head = toBoundary(dst, kLine);
+    const ptrdiff_t head = toBoundary(dst, kCacheLine);
     copyShort(dst, src, head);
     dst += head;
     src += head;
@@ -170,16 +166,38 @@ void copyRowStreamLoad(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, bool s
     copyRow(dst + done, src + done, bytes - done);
 }
 
-void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) { fillAligned<false>(dst, pattern, bytes); }
-void fillRowStreaming(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) { fillAligned<true>(dst, pattern, bytes); }
+void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
+    if (bytes <= 4 * kVector) return copyAligned(dst, pattern.bytes, bytes);
+    store(dst, load(pattern.bytes));
+    const ptrdiff_t head = toBoundary(dst, kVector);
+    const Bytes cycle[3] = {load(pattern.bytes + head), load(pattern.bytes + head + kVector),
+                            load(pattern.bytes + head + 2 * kVector)};
+    const ptrdiff_t done = fillCycles<false>(dst, cycle, head, bytes);
+    // Up to six vectors are left, the first five of which may be whole; the cycle goes on.
+    for (int k = 0; k < 5; ++k)
+        if (done <= bytes - (k + 1) * kVector) store(dst + done + k * kVector, cycle[k % 3]);
+    store(dst + bytes - kVector, patternAt(pattern, bytes - kVector));
+}
+
+void fillRowStreaming(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
+    const auto [head, lines] = LineEnds::ofBytes(dst, bytes);
+    if (lines == 0) return fillRow(dst, pattern, bytes);
+    fillShort(dst, pattern, 0, head);
+    const Bytes cycle[3] = {patternAt(pattern, head), patternAt(pattern, head + kVector),
+                            patternAt(pattern, head + 2 * kVector)};
+    const ptrdiff_t end = head + lines;
+    ptrdiff_t done = fillCycles<true>(dst, cycle, head, end);
+    for (int k = 0; done < end; done += kVector, ++k) stream(dst + done, cycle[k % 3]);
+    fillShort(dst + end, pattern, end, bytes - end);
+}
 
 bool repeatsWords(const Pattern& pattern) { return isSame(pattern.bytes, pattern.bytes + 4); }
 
 void fillRowString(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
     if (bytes < kStringRow) return fillRow(dst, pattern, bytes);
-    fillRow(dst, pattern, kLine);
+    fillRow(dst, pattern, kCacheLine);
     store(dst + bytes - kVector, patternAt(pattern, bytes - kVector));
-    const ptrdiff_t head = toBoundary(dst, kLine);
+    const ptrdiff_t head = toBoundary(dst, kCacheLine);
     const auto word = detail::loadWord<uint32_t>(pattern.bytes + head % 4);
     uint8_t* begin = dst + head;
     ptrdiff_t words = (bytes - head) / 4;

@@ -6,8 +6,10 @@
 // The row's last span begins early enough to end with the row, so it may do pixels again that are done already: the
 // images of these kernels never overlap, and what a kernel reads of its destination it writes back.
 #pragma once
+#include <algorithm>
 #include <array>
 
+#include "line_ends.h"
 #include "simd.h"
 
 namespace qori::kernels {
@@ -88,13 +90,13 @@ QORI_INLINE void advanceRuns(Pointers& pointers, const std::array<Run, count>& r
     for (size_t r = 0; r < count; ++r) pointers[r] += runs[r].pixelBytes * pixels;
 }
 
-/// Pixels until every output is 32-byte aligned, or -1 where that never happens.
+/// Pixels until every output is at a cache line, or -1 where that never happens.
 template <class Kernel, size_t outs>
-int pixelsToAlignment(const std::array<uint8_t*, outs>& out) {
-    for (int pixels = 0; pixels < 32; ++pixels) {
+int pixelsToLines(const std::array<uint8_t*, outs>& out) {
+    for (int pixels = 0; pixels < kCacheLine; ++pixels) {
         bool aligned = true;
         for (size_t r = 0; r < outs; ++r)
-            aligned &= (reinterpret_cast<uintptr_t>(out[r] + pixels * Kernel::out[r].pixelBytes) & 31u) == 0;
+            aligned &= reinterpret_cast<uintptr_t>(out[r] + pixels * Kernel::out[r].pixelBytes) % kCacheLine == 0;
         if (aligned) return pixels;
     }
     return -1;
@@ -114,13 +116,17 @@ QORI_INLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out, 
         pixels -= by;
     };
     if constexpr (Kernel::mayStream) {
-        const int head = streaming && pixels >= 64 ? detail::pixelsToAlignment<Kernel>(out) : -1;
+        // Two spans are whole vectors of every output, and as many pixels as a line has bytes are whole lines.
+        constexpr int narrowest = std::ranges::min(Kernel::out, {}, &Run::pixelBytes).pixelBytes;
+        const bool isLong = pixels * narrowest >= LineEnds::fewestBytes;
+        const int head = streaming && isLong ? detail::pixelsToLines<Kernel>(out) : -1;
         if (head >= 0) {
             for (int done = 0; done < head; done += span) {
                 kernel.template run<1, false>(out, in);
                 advance(head - done < span ? head - done : span);
             }
-            for (ptrdiff_t groups = pixels / (2 * span); groups > 0; --groups) {
+            static_assert(kCacheLine % (2 * span) == 0);
+            for (ptrdiff_t inLines = pixels / kCacheLine * kCacheLine; inLines > 0; inLines -= 2 * span) {
                 kernel.template run<2, true>(out, in);
                 advance(2 * span);
             }

@@ -21,6 +21,7 @@
 
 #include "copy_rows.h"
 #include "image/driver.h"
+#include "line_ends.h"
 #include "simd.h"
 
 namespace qori::kernels {
@@ -107,8 +108,6 @@ constexpr bool runsFromCopy = requires {
     Op::inRegisters;
 };
 
-constexpr int kCacheLine = 64;
-
 /// Blocks three at a time; gives how many elements that made. Pointers come by value: through a reference, every
 /// store might change them, and they would be loaded again for each vector.
 template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
@@ -121,53 +120,56 @@ QORI_INLINE ptrdiff_t mapTriples(Op& op, ptrdiff_t elements, D* dst, const S*...
     return i;
 }
 
-/// Blocks three at a time, then one at a time, then what is left.
+constexpr int nextPhase(int phase) { return phase == 2 ? 0 : phase + 1; }
+
+/// Blocks three at a time, then one at a time; gives how many elements that made. Less than three blocks may begin at
+/// phase 1 or 2.
+template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
+QORI_INLINE ptrdiff_t mapWholeBlocks(Op& original, int phase, ptrdiff_t elements, D* dst, const S*... src) {
+    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
+    ptrdiff_t i = mapTriples<keepAlpha, streams, n>(op, elements, dst, src...);
+    for (; i <= elements - n; i += n, phase = nextPhase(phase))
+        storePack<keepAlpha, streams>(dst + i, op(phase, loadPack<S, n>(src + i)...));
+    return i;
+}
+
+/// Whole blocks, then what is left.
 template <bool keepAlpha, int n, class Op, class D, class... S>
-QORI_INLINE void mapBlocks(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
-    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
-    ptrdiff_t i = mapTriples<keepAlpha, false, n>(op, elements, dst, src...);
-    int phase = 0;
-    for (; i <= elements - n; i += n, ++phase)
-        storePack<keepAlpha, false>(dst + i, op(phase, loadPack<S, n>(src + i)...));
-    if (i < elements) {
-        const ptrdiff_t rest = elements - i;
-        storePackUpTo<keepAlpha>(dst + i, applyTail(op, phase, rest, loadPackUpTo<S, n>(src + i, rest)...), rest);
+QORI_INLINE void mapBlocks(Op& op, int phase, ptrdiff_t elements, D* dst, const S*... src) {
+    const ptrdiff_t done = mapWholeBlocks<keepAlpha, false, n>(op, phase, elements, dst, src...);
+    if (done < elements) {
+        const ptrdiff_t rest = elements - done;
+        phase = (phase + static_cast<int>(done / n % 3)) % 3;
+        storePackUpTo<keepAlpha>(dst + done, applyTail(op, phase, rest, loadPackUpTo<S, n>(src + done, rest)...), rest);
     }
-}
-
-/// Whether a row may stream. A line of which one part goes past the cache and the other through it costs half a
-/// microsecond: rows begin with a line, or are so long that what is broken at their ends does not count.
-template <class D>
-bool mayPassCache(const D* dst, ptrdiff_t elements) {
-    constexpr ptrdiff_t longRow = 65'536 / static_cast<ptrdiff_t>(sizeof(D));
-    const auto at = reinterpret_cast<uintptr_t>(dst);
-    return at % kCacheLine == 0 || (at % kVectorBytes == 0 && elements >= longRow);
-}
-
-/// As mapTriples, of whole lines.
-template <int n, class Op, class D, class... S>
-QORI_INLINE ptrdiff_t streamTriples(Op& original, ptrdiff_t elements, D* dst, const S*... src) {
-    constexpr ptrdiff_t triple = 3 * n, whole = triple * int{sizeof(D)} % kCacheLine == 0 ? triple : 2 * triple;
-    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
-    return mapTriples<false, true, n>(op, elements / whole * whole, dst, src...);
 }
 
 }  // namespace detail
 
 /// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
-/// sources may be the same. Streaming wants dst on a cache line's boundary (long rows: on a vector's) and is ignored
-/// elsewhere, and with keepAlpha, which reads what it writes anyway; less than six blocks at the end never stream.
+/// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere, and with keepAlpha,
+/// which reads what it writes anyway.
 template <bool keepAlpha, class Op, class D, class... S>
 QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
+    int phase = 0;
+    const auto skip = [&](ptrdiff_t done) {
+        elements -= done;
+        dst += done;
+        (void(src += done), ...);
+    };
     if constexpr (!keepAlpha && requires { Op::mayStream; })
-        if (streaming && detail::mayPassCache(dst, elements)) {
-            const ptrdiff_t done = detail::streamTriples<n>(op, elements, dst, src...);
-            elements -= done;
-            dst += done;
-            (void(src += done), ...);
+        if (streaming) {
+            const auto [head, lines] = LineEnds::ofGroups(dst, elements);
+            if (lines > 0) {
+                if (head > 0) mapRow<keepAlpha>(op, head, false, dst, src...);
+                skip(head);
+                const ptrdiff_t done = detail::mapWholeBlocks<false, true, n>(op, 0, lines, dst, src...);
+                skip(done);
+                phase = static_cast<int>(done / n % 3);
+            }
         }
-    detail::mapBlocks<keepAlpha, n>(op, elements, dst, src...);
+    detail::mapBlocks<keepAlpha, n>(op, phase, elements, dst, src...);
 }
 
 namespace detail {

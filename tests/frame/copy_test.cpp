@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "frame/mask.h"
 #include "harness/sweep.h"
+#include "kernels/line_ends.h"
 #include "reference/move.h"
 
 namespace qori::test {
@@ -197,6 +198,49 @@ TEST(Copy, ZeroStepsRepeatTheSourceRowAndKeepTheLastDestinationRow) {
     uint8_t only[3] = {};
     EXPECT_EQ(QOR_OK, qoriCopy_8u_C1R(dst.data<uint8_t>(), dst.step(), only, 0, shape.roi()));
     EXPECT_EQ(0, std::memcmp(row, only, 3));
+}
+
+/// What streams of `bytes` bytes at every address of two lines: whole lines, as many as there are or none.
+template <class Ends>
+void expectWholeLines(ptrdiff_t size, ptrdiff_t step, ptrdiff_t mostAround, Ends ends) {
+    using kernels::kCacheLine;
+    alignas(kCacheLine) static uint8_t memory[2 * kCacheLine];
+    for (ptrdiff_t at = 0; at < 2 * kCacheLine; at += step)
+        for (ptrdiff_t bytes = 0; bytes < 1'000; bytes += size) {
+            SCOPED_TRACE(testing::Message() << bytes << " bytes in elements of " << size << " from " << at);
+            auto [head, lines] = ends(memory + at, bytes / size);
+            head *= size;
+            lines *= size;
+            EXPECT_EQ(0, lines % kCacheLine);
+            EXPECT_EQ(lines < 3 * kCacheLine, lines == 0);
+            if (lines > 0) {
+                EXPECT_EQ(0, (at + head) % kCacheLine);
+                EXPECT_LE(head + lines, bytes);
+                EXPECT_LT(bytes - head - lines, kCacheLine);
+            } else {
+                EXPECT_LT(bytes, mostAround + 3 * kCacheLine);
+            }
+            if (testing::Test::HasFailure()) return;
+        }
+}
+
+TEST(Copy, WholeCacheLinesStream) {
+    using kernels::LineEnds;
+    expectWholeLines(1, 1, 64, [](uint8_t* dst, ptrdiff_t n) { return LineEnds::ofBytes(dst, n); });
+    const auto inGroups = [](auto element) {
+        using T = decltype(element);
+        constexpr ptrdiff_t size = sizeof(T);
+        const auto ends = [](uint8_t* dst, ptrdiff_t n) { return LineEnds::ofGroups(reinterpret_cast<T*>(dst), n); };
+        expectWholeLines(size, 32, 96 + 64, [=](uint8_t* dst, ptrdiff_t n) {
+            EXPECT_EQ(0, ends(dst, n).head % 12) << "constants of channels";
+            EXPECT_EQ(0, ends(dst + size, n).lines);
+            return ends(dst, n);
+        });
+    };
+    inGroups(uint8_t{});
+    inGroups(uint16_t{});
+    inGroups(float{});
+    inGroups(double{});
 }
 
 TEST(Copy, OfRowsThatOverlapTheLastStays) {

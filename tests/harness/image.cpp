@@ -68,6 +68,7 @@ std::vector<Shape> largeShapes(int bytesPerPixel, int trafficBytes) {
         {.width = 512, .height = tall(512), .atBegin = true},
         {.width = wide, .height = tall(wide), .padding = 64 - wide * bytesPerPixel % 64, .atBegin = true, .shift = 4},
         {.width = 777, .height = tall(777), .padding = 3},
+        {.width = 777, .height = tall(777), .padding = 3, .atBegin = true},
     };
 }
 

@@ -46,7 +46,8 @@ const std::vector<Shape>& smallShapes();
 /// Those without negative steps, for families that check them.
 const std::vector<Shape>& uprightShapes();
 /// Regions whose traffic, at so many bytes per pixel, is a little more than `trafficBytes`; at alignments where stores
-/// can stream and where they cannot.
+/// can stream and where they cannot. Of elements that lie at a multiple of their size, some row begins with a cache
+/// line and some row in the middle of one.
 std::vector<Shape> largeShapes(int bytesPerPixel, int trafficBytes);
 
 /// Pixels seen through a pointer and a step, any alignment.
