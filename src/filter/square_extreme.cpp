@@ -50,9 +50,11 @@ void runSquareExtremes(const BorderedImage& src, Image<T> dst, uint8_t* memory) 
     });
 }
 
+/// Whether rows of so many bytes may stream where they are.
 template <class T>
-bool isOnVectors(Image<T> image) {
-    return (reinterpret_cast<uintptr_t>(image.data) | static_cast<uintptr_t>(image.step)) % 32 == 0;
+bool mayStream(Image<T> image, int64_t rowBytes) {
+    const auto at = reinterpret_cast<uintptr_t>(image.data) | static_cast<uintptr_t>(image.step);
+    return at % 64 == 0 || (at % 32 == 0 && rowBytes % 32 == 0);
 }
 
 }  // namespace
@@ -74,7 +76,8 @@ void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi) {
         const BorderedImage image = withNeighbours<layout>(src, roi);
         constexpr int kBytesPerPixel = 2 * pixelSize<T, layout>;
         if constexpr (layout != Layout::AC4)  // which has the destination in the cache, having read it
-            if (isOnVectors(dst) && streams(streamRules::copy, traffic(roi, kBytesPerPixel))) {
+            if (mayStream(dst, int64_t{roi.width} * pixelSize<T, layout>) &&
+                streams(streamRules::copy, traffic(roi, kBytesPerPixel))) {
                 runSquareExtremes<Order, kernels::Stores::streaming, layout>(image, dst, nullptr);
                 streamFence();
                 return QOR_OK;

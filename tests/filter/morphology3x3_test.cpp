@@ -60,11 +60,16 @@ void sweepSquare(const char* name, Function function) {
         };
         for (int width : {1, 13, 70})
             checkSquare<T, L, Kind::IR, largest>({.width = width, .height = 11, .padding = 2}, inPlace);
-        constexpr int kBytes = 2 * channels(L) * static_cast<int>(sizeof(T));
+        constexpr int kPixel = channels(L) * static_cast<int>(sizeof(T)), kBytes = 2 * kPixel, kWide = 503;
         const std::vector<Shape> shapes = largeShapes(kBytes, kStreamsFrom);
+        const Shape withTail{.width = kWide,
+                             .height = kStreamsFrom / (kWide * kBytes) + 1,
+                             .padding = 64 - kWide * kPixel % 64,
+                             .atBegin = true};
         qorTestSetCacheSize(1);
         const int queries = qorTestCacheQueries();
-        forShapes({shapes[0], shapes[1]}, [=](const Shape& s) { checkSquare<T, L, kind, largest>(s, function); });
+        forShapes({shapes[0], shapes[1], withTail},
+                  [=](const Shape& s) { checkSquare<T, L, kind, largest>(s, function); });
         EXPECT_EQ(L == Layout::AC4 ? 0 : 1, std::min(qorTestCacheQueries() - queries, 1));
         qorTestSetCacheSize(0);
     }

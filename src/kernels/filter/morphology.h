@@ -179,7 +179,8 @@ QORI_NOINLINE void narrowRows(SquareRows<T, rows> image, ptrdiff_t elements, ptr
 
 /// Extremes of 3 x 3 pixels for `rows` destination rows at once; elements to the left and right of the rows, one pixel
 /// of them, are read too. src: rows + 2 of them. Where the same destination row is given several times, the first
-/// counts. The last vector ends with the rows, and may overlap the one before.
+/// counts. The last vector ends with the rows, and may overlap the one before. Rows that stream begin with a cache
+/// line, or on a vector where they are whole vectors: of a line no part goes past the cache and another through it.
 template <class Order, int channels, Stores stores, bool keepAlpha, int rows, class T>
 QORI_NOINLINE void squareRows(const T* const* src, T* const* dst, ptrdiff_t elements) {
     constexpr ptrdiff_t n = Vec<T>::lanes;
@@ -205,10 +206,15 @@ QORI_NOINLINE void squareRows(const T* const* src, T* const* dst, ptrdiff_t elem
         detail::storeExtremes<false, keepAlpha>(image, i - n, out);
         if (overlaps) detail::storeExtremes<false, keepAlpha>(image, last, end);
     } else {
+        constexpr bool streaming = stores == Stores::streaming;
+        const ptrdiff_t passing = elements % n == 0 ? elements : last / (2 * n) * (2 * n);
         ptrdiff_t i = 0;
         for (; i <= last; i += n) {
             detail::squareExtremes<Order>(image, i, pixel, whole, out);
-            detail::storeExtremes<stores == Stores::streaming, keepAlpha>(image, i, out);
+            if (streaming && i < passing)
+                detail::storeExtremes<streaming, keepAlpha>(image, i, out);
+            else
+                detail::storeExtremes<false, keepAlpha>(image, i, out);
         }
         if (i == last + n) return;
         detail::squareExtremes<Order>(image, last, pixel, whole, out);
