@@ -102,6 +102,34 @@ int pixelsToLines(const std::array<uint8_t*, outs>& out) {
     return -1;
 }
 
+/// Whole cache lines of every output, from where all of them begin one; gives how many pixels that made. Apart from
+/// the other loops, which are those of short rows too.
+template <class Kernel, size_t ins, size_t outs>
+QORI_NOINLINE ptrdiff_t streamSpans(const Kernel& kernel, std::array<uint8_t*, outs> out,
+                                    std::array<const uint8_t*, ins> in, ptrdiff_t pixels) {
+    // Two spans are whole vectors of every output, and as many pixels as a line has bytes are whole lines.
+    constexpr int span = Kernel::span, group = 2 * span;
+    static_assert(kCacheLine % group == 0);
+    constexpr ptrdiff_t narrowest = std::ranges::min(Kernel::out, {}, &Run::pixelBytes).pixelBytes;
+    constexpr ptrdiff_t fewest = std::max(kCacheLine, LineEnds::fewestBytes / narrowest);
+    const int head = pixels < fewest ? -1 : pixelsToLines<Kernel>(out);
+    if (head < 0 || pixels - head < fewest) return 0;
+    const auto advance = [&](ptrdiff_t by) {
+        advanceRuns(out, Kernel::out, by);
+        advanceRuns(in, Kernel::in, by);
+    };
+    for (int done = 0; done < head; done += span) {
+        kernel.template run<1, false>(out, in);
+        advance(std::min(head - done, span));
+    }
+    const ptrdiff_t inLines = (pixels - head) / kCacheLine * kCacheLine;
+    for (ptrdiff_t done = 0; done < inLines; done += group) {
+        kernel.template run<2, true>(out, in);
+        advance(group);
+    }
+    return head + inLines;
+}
+
 }  // namespace detail
 
 template <class Kernel, size_t ins, size_t outs>
@@ -115,23 +143,8 @@ QORI_INLINE void mapSpans(const Kernel& kernel, std::array<uint8_t*, outs> out, 
         detail::advanceRuns(in, Kernel::in, by);
         pixels -= by;
     };
-    if constexpr (Kernel::mayStream) {
-        // Two spans are whole vectors of every output, and as many pixels as a line has bytes are whole lines.
-        constexpr int narrowest = std::ranges::min(Kernel::out, {}, &Run::pixelBytes).pixelBytes;
-        const bool isLong = pixels * narrowest >= LineEnds::fewestBytes;
-        const int head = streaming && isLong ? detail::pixelsToLines<Kernel>(out) : -1;
-        if (head >= 0) {
-            for (int done = 0; done < head; done += span) {
-                kernel.template run<1, false>(out, in);
-                advance(head - done < span ? head - done : span);
-            }
-            static_assert(kCacheLine % (2 * span) == 0);
-            for (ptrdiff_t inLines = pixels / kCacheLine * kCacheLine; inLines > 0; inLines -= 2 * span) {
-                kernel.template run<2, true>(out, in);
-                advance(2 * span);
-            }
-        }
-    }
+    if constexpr (Kernel::mayStream)
+        if (streaming) advance(detail::streamSpans(kernel, out, in, pixels));
     for (ptrdiff_t groups = pixels / (2 * span); groups > 0; --groups) {
         kernel.template run<2, false>(out, in);
         advance(2 * span);
