@@ -95,14 +95,6 @@ QORI_INLINE void storePackUpTo(T* p, Pack<T, n> pack, ptrdiff_t count) {
     }
 }
 
-template <class Op, class... Packs>
-QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
-    if constexpr (requires { op.tail(phase, count, packs...); })
-        return op.tail(phase, count, packs...);
-    else
-        return op(phase, packs...);
-}
-
 template <class Op>
 constexpr bool runsFromCopy = requires {
     Op::inRegisters;
@@ -120,29 +112,26 @@ QORI_INLINE ptrdiff_t mapTriples(Op& op, ptrdiff_t elements, D* dst, const S*...
     return i;
 }
 
-constexpr int nextPhase(int phase) { return phase == 2 ? 0 : phase + 1; }
-
-/// Blocks three at a time, then one at a time; gives how many elements that made. Less than three blocks may begin at
-/// phase 1 or 2.
-template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
-QORI_INLINE ptrdiff_t mapWholeBlocks(Op& original, int phase, ptrdiff_t elements, D* dst, const S*... src) {
-    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = original;
-    ptrdiff_t i = mapTriples<keepAlpha, streams, n>(op, elements, dst, src...);
-    for (; i <= elements - n; i += n, phase = nextPhase(phase))
-        storePack<keepAlpha, streams>(dst + i, op(phase, loadPack<S, n>(src + i)...));
-    return i;
+template <class Op, class... Packs>
+QORI_INLINE auto applyTail(Op& op, int phase, ptrdiff_t count, Packs... packs) {
+    if constexpr (requires { op.tail(phase, count, packs...); })
+        return op.tail(phase, count, packs...);
+    else
+        return op(phase, packs...);
 }
 
-/// Whole blocks, then what is left.
 template <bool keepAlpha, int n, class Op, class D, class... S>
-QORI_INLINE void mapBlocks(Op& op, int phase, ptrdiff_t elements, D* dst, const S*... src) {
-    const ptrdiff_t done = mapWholeBlocks<keepAlpha, false, n>(op, phase, elements, dst, src...);
-    if (done < elements) {
-        const ptrdiff_t rest = elements - done;
-        phase = (phase + static_cast<int>(done / n % 3)) % 3;
-        storePackUpTo<keepAlpha>(dst + done, applyTail(op, phase, rest, loadPackUpTo<S, n>(src + done, rest)...), rest);
-    }
+QORI_INLINE void mapTail(Op& op, int phase, ptrdiff_t rest, D* dst, const S*... src) {
+    storePackUpTo<keepAlpha>(dst, applyTail(op, phase, rest, loadPackUpTo<S, n>(src, rest)...), rest);
 }
+
+/// What an operation does with a row; the operation is known to the function alone, so that whatever calls it for many
+/// rows is compiled once for all operations.
+template <class D, class... S>
+using RowFunction = void (*)(void* op, ptrdiff_t elements, bool streaming, D* dst, const S*... src);
+
+template <class Op, class D, class... S>
+QORI_NOINLINE void streamRow(void* operation, ptrdiff_t elements, D* dst, const S*... src);
 
 }  // namespace detail
 
@@ -150,36 +139,55 @@ QORI_INLINE void mapBlocks(Op& op, int phase, ptrdiff_t elements, D* dst, const 
 /// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere, and with keepAlpha,
 /// which reads what it writes anyway.
 template <bool keepAlpha, class Op, class D, class... S>
-QORI_NOINLINE void mapRow(Op& op, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
+QORI_NOINLINE void mapRow(void* operation, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
-    int phase = 0;
-    const auto skip = [&](ptrdiff_t done) {
-        elements -= done;
-        dst += done;
-        (void(src += done), ...);
-    };
+    // As the last call that a row makes, it costs rows that do not stream nothing.
     if constexpr (!keepAlpha && requires { Op::mayStream; })
-        if (streaming) {
-            const auto [head, lines] = LineEnds::ofGroups(dst, elements);
-            if (lines > 0) {
-                if (head > 0) mapRow<keepAlpha>(op, head, false, dst, src...);
-                skip(head);
-                const ptrdiff_t done = detail::mapWholeBlocks<false, true, n>(op, 0, lines, dst, src...);
-                skip(done);
-                phase = static_cast<int>(done / n % 3);
-            }
-        }
-    detail::mapBlocks<keepAlpha, n>(op, phase, elements, dst, src...);
+        if (streaming) return detail::streamRow<Op>(operation, elements, dst, src...);
+    std::conditional_t<detail::runsFromCopy<Op>, Op, Op&> op = *static_cast<Op*>(operation);
+    ptrdiff_t i = detail::mapTriples<keepAlpha, false, n>(op, elements, dst, src...);
+    int phase = 0;
+    for (; i <= elements - n; i += n, ++phase)
+        detail::storePack<keepAlpha, false>(dst + i, op(phase, detail::loadPack<S, n>(src + i)...));
+    if (i < elements) detail::mapTail<keepAlpha, n>(op, phase, elements - i, dst + i, (src + i)...);
 }
 
 namespace detail {
 
-/// mapRow over rows of fewer elements than a block, with buffers of 12 blocks for each image. False, and nothing done,
-/// where rows are long in bytes, are one run, or do not lie apart in every image: a row that is read ahead of the one
-/// before it being written must be the same row.
-template <bool keepAlpha, class Op, class D, class... S>
-QORI_NOINLINE bool mapGathered(Op& op, int channels, QorImageSize roi, const Image<D>& dst,
-                               const Image<const S>&... src) {
+/// A row whose whole cache lines stream. Apart from mapRow, whose phases the compiler knows: short rows take up to 1.5
+/// times as long where it does not.
+template <class Op, class D, class... S>
+void streamRow(void* operation, ptrdiff_t elements, D* dst, const S*... src) {
+    const auto [head, lines] = LineEnds::ofGroups(dst, elements);
+    if (head > 0 || lines == 0) mapRow<false, Op>(operation, lines == 0 ? elements : head, false, dst, src...);
+    if (lines == 0) return;
+    elements -= head;
+    dst += head;
+    (void(src += head), ...);
+    constexpr int n = blockOf<D, S...>;
+    std::conditional_t<runsFromCopy<Op>, Op, Op&> op = *static_cast<Op*>(operation);
+    ptrdiff_t i = mapTriples<false, true, n>(op, lines, dst, src...);
+    int phase = 0;
+    for (; i <= elements - n; i += n, phase = (phase + 1) % 3) {
+        const auto result = op(phase, loadPack<S, n>(src + i)...);
+        if (i + n <= lines)
+            storePack<false, true>(dst + i, result);
+        else
+            storePack<false, false>(dst + i, result);
+    }
+    if (i < elements) mapTail<false, n>(op, phase, elements - i, dst + i, (src + i)...);
+}
+
+}  // namespace detail
+
+namespace detail {
+
+/// A row function over rows of fewer elements than a block, with buffers of 12 blocks for each image. False, and
+/// nothing done, where rows are long in bytes, are one run, or do not lie apart in every image: a row that is read
+/// ahead of the one before it being written must be the same row.
+template <bool keepAlpha, class D, class... S>
+QORI_NOINLINE bool mapGathered(RowFunction<D, S...> makeRow, void* op, int channels, QorImageSize roi,
+                               const Image<D>& dst, const Image<const S>&... src) {
     const int elements = roi.width * channels;
     const auto liesApart = [=](const auto& image) {
         const int bytes = elements * static_cast<int>(sizeof(*image.data));
@@ -200,8 +208,7 @@ QORI_NOINLINE bool mapGathered(Op& op, int channels, QorImageSize roi, const Ima
         if constexpr (keepAlpha) gather(result, dst, y, count);
         [&]<size_t... i>(std::index_sequence<i...>) {
             (gather(sources[i], src, y, count), ...);
-            mapRow<keepAlpha>(op, ptrdiff_t{elements} * count, false, result,
-                              reinterpret_cast<const S*>(sources[i])...);
+            makeRow(op, ptrdiff_t{elements} * count, false, result, reinterpret_cast<const S*>(sources[i])...);
         }
         (std::index_sequence_for<S...>{});
         const int bytes = elements * elementBytes<D>;
@@ -210,21 +217,27 @@ QORI_NOINLINE bool mapGathered(Op& op, int channels, QorImageSize roi, const Ima
     return true;
 }
 
+template <bool keepAlpha, class D, class... S>
+QORI_NOINLINE void mapRows(RowFunction<D, S...> makeRow, void* op, QorImageSize roi, int channels, bool streaming,
+                           const Image<D>& dst, const Image<const S>&... src) {
+    constexpr int fewest = 4;  // rows that are worth gathering
+    if (int64_t{roi.width} * channels < blockOf<D, S...> && roi.height >= fewest) [[unlikely]] {
+        if (mapGathered<keepAlpha>(makeRow, op, channels, roi, dst, src...)) return;
+    }
+    forEachRow(
+        roi, [&](ptrdiff_t pixels, D* d, const S*... s) { makeRow(op, pixels * channels, streaming, d, s...); },
+        walk(dst, channels), walk(src, channels)...);
+    if (streaming) streamFence();
+}
+
 }  // namespace detail
 
 /// mapRow over a region of `channels` interleaved channels.
 template <bool keepAlpha = false, class Op, class D, class... S>
 void mapImage(QorImageSize roi, int channels, Op&& op, bool streaming, Image<D> dst, Image<const S>... src) {
-    constexpr int fewest = 4;  // rows that are worth gathering
-    if (int64_t{roi.width} * channels < blockOf<D, S...> && roi.height >= fewest) [[unlikely]] {
-        // Copies of the images, so that the others may stay in registers.
-        if (detail::mapGathered<keepAlpha>(op, channels, roi, Image<D>{dst}, Image<const S>{src}...)) return;
-    }
-    forEachRow(
-        roi,
-        [&](ptrdiff_t pixels, D* d, const S*... s) { mapRow<keepAlpha>(op, pixels * channels, streaming, d, s...); },
-        walk(dst, channels), walk(src, channels)...);
-    if (streaming) streamFence();
+    using Operation = std::remove_reference_t<Op>;
+    detail::mapRows<keepAlpha, D, S...>(mapRow<keepAlpha, Operation, D, S...>, &op, roi, channels, streaming, dst,
+                                        src...);
 }
 
 /// One constant per channel, repeated over three vectors: the constants of phase p are v[p]. AC4 constants come as four
