@@ -204,7 +204,7 @@ def related(page, pages, support_pages):
 
 
 def operation_page(page, pages, support_pages, show):
-    """`show` gives the Markdown of the operation's pictures, examples and errors, lists of lines by these names."""
+    """`show` gives the Markdown of the operation's pictures, examples, panels and errors, lists of lines by these names."""
     lines = [f"# {page.name}", "", escape(show.get("brief") or page.brief), ""]
     lines += show.get("pictures", [])
     lines += ["## Call", ""]
@@ -213,6 +213,7 @@ def operation_page(page, pages, support_pages, show):
         lines += [f'<p class="language">{title}</p>', ""] + fenced(language, text)
     if show.get("example") or registry_examples(page.members):
         lines += ["## Example", ""] + show.get("example", []) + registry_examples(page.members)
+    lines += show.get("panels", [])
     lines += ["## What exists", ""] + existing(page)
     lines += ["## Behaviour", ""] + details(page.members)
     lines += ["## Errors", "", "The first that applies is returned, and then nothing is written.", ""]
