@@ -1,8 +1,8 @@
 #!/usr/bin/env python3
 """Completes what CPack writes of Debian packages: debian_control.py FILE.deb...
 
-Which of them may be installed for several architectures at once, which CPack cannot say, and what they take when they are
-installed, where it counts what a link leads to. The time is SOURCE_DATE_EPOCH.
+Which of them may be installed for several architectures at once, which CPack cannot say, and what they take when they
+are installed, where it counts what a link leads to. The time is SOURCE_DATE_EPOCH.
 """
 import re
 import subprocess

@@ -103,6 +103,18 @@ class Links(unittest.TestCase):
         self.assertEqual(self.dead(a='<img src="pictures/none.webp">'), ["a.html: pictures/none.webp"])
         self.assertEqual(self.dead(a='<a href="#top">'), ["a.html: #top"])
 
+    def searched(self, index, script='<script src="searchindex.js"></script>'):
+        with tempfile.TemporaryDirectory() as folder:
+            for name, text in {"search.html": script, "a.html": "", "b.html": "", "searchindex.js": index}.items():
+                (Path(folder) / name).write_text(text)
+            return links.not_searched(Path(folder))
+
+    def test_a_search_in_files_finds_every_page(self):
+        self.assertEqual(self.searched('Search.setIndex({"docnames": ["a", "b"]})'), [])
+        self.assertEqual(self.searched('Search.setIndex({"docnames": ["b"]})'), ["a: no search finds it"])
+        self.assertEqual(len(self.searched('{"docnames": ["a", "b"]}')), 1)
+        self.assertEqual(len(self.searched('Search.setIndex({"docnames": ["a", "b"]})', "")), 1)
+
 
 if __name__ == "__main__":
     unittest.main()

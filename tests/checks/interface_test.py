@@ -1,6 +1,8 @@
 """Programs that are linked go on: what packaging/interface-8.txt says of functions and types, the headers still say; and
 what packages say of themselves."""
 import re
+import shutil
+import subprocess
 import sys
 import tempfile
 import unittest
@@ -53,6 +55,32 @@ class DebianPackages(unittest.TestCase):
         self.assertEqual(debian_control.completed(text.format("libqorik5-8"), 9),
                          "Architecture: amd64\nMulti-Arch: same\nPackage: libqorik5-8\nInstalled-Size: 9\n")
         self.assertNotIn("Multi-Arch", debian_control.completed(text.format("python3-qori"), 9))
+
+    def refused(self, folder):
+        done = subprocess.run([folder / "scripts" / "package"], capture_output=True, text=True)
+        self.assertEqual((done.returncode, done.stdout), (1, ""))
+        return done.stderr
+
+    def test_what_cannot_be_made_again_is_refused_with_the_reason(self):
+        with tempfile.TemporaryDirectory() as place:
+            plain, whole, shallow = (Path(place) / name for name in ("plain", "whole", "shallow"))
+            git = ["git", "-c", "user.name=a", "-c", "user.email=a@b.invalid", "-c", "init.defaultBranch=main"]
+            for folder in plain, whole:
+                shutil.copytree(ROOT / "scripts", folder / "scripts")
+            self.assertIn("no git repository", self.refused(plain))
+            subprocess.run([*git, "init", "-q"], cwd=whole, check=True)
+            for name in "one", "two":
+                (whole / "file").write_text(name)
+                subprocess.run([*git, "add", "."], cwd=whole, check=True)
+                subprocess.run([*git, "commit", "-qm", name], cwd=whole, check=True)
+            subprocess.run([*git, "clone", "-q", "--depth", "1", whole.as_uri(), shallow], check=True)
+            self.assertRegex(self.refused(shallow), "the clone is shallow.* git fetch --unshallow")
+            (whole / "file").write_text("changed")
+            (whole / "new").write_text("")
+            text = self.refused(whole)
+            self.assertRegex(text, "differs from its commit.*commit or stash")
+            self.assertIn(" M file", text)
+            self.assertIn("?? new", text)
 
 
 if __name__ == "__main__":

@@ -140,3 +140,8 @@ def shows_its_input(row):
 def test_every_row_of_pictures_has_three_to_five_and_every_page_its_input():
     assert not [n for n, r in RECIPES.items() if not all(3 <= len(set(row.vary)) <= 5 for row in r.rows)]
     assert not [n for n, r in RECIPES.items() if not any(map(shows_its_input, r.rows))]
+
+
+def test_where_methods_stand_beside_each_other_a_part_is_magnified():
+    beside = [(n, row) for n, r in RECIPES.items() for row in r.rows if row.call in ("@", "qori.@")]
+    assert len(beside) > 5 and not [n for n, row in beside if not row.crop]
