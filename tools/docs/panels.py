@@ -77,17 +77,15 @@ def run(photo, folder):
 
 def of_operation(name, photo, qori, folder):
     """For an operation's page: the pictures of its panels, their statements in Python, and where they stand in C."""
-    lines = []
+    figures, codes = [], []
     for panel in (p for p in recipes().values() if p.of == name):
         drawn = render.picture_of(made(panel, photo, qori))
         picture = render.save(drawn, folder / f"panel_of_{panel.name}.webp")
-        caption = escape(panel.caption)
-        lines += ['<div class="shots">',
-                  f'<figure><img src="../_static/pictures/{picture}" alt="{caption}" loading="lazy">'
-                  f'<figcaption>{caption}; <a href="../demo.html#panel-{numbers()[panel.name]}">in C</a></figcaption>'
-                  "</figure>", "</div>", "",
-                  "```python", code(panel), "```", ""]
-    return ["## On the demo's sheet", ""] + lines if lines else []
+        caption, link = escape(panel.caption), f"../demo.html#panel-{numbers()[panel.name]}"
+        figures.append(f'<figure><img src="../_static/pictures/{picture}" alt="{caption}" loading="lazy">'
+                       f'<figcaption>{caption}; <a href="{link}">in C</a></figcaption></figure>')
+        codes += [f"<details><summary>{caption}</summary>", "", "```python", code(panel), "```", "", "</details>", ""]
+    return ["## On the demo's sheet", "", '<div class="shots">', *figures, "</div>", "", *codes] if figures else []
 
 
 def figure(number, panel, name):
