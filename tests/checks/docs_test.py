@@ -57,6 +57,11 @@ class Reference(unittest.TestCase):
             for method in set(re.findall(r"plan\.(\w+)\(", text.replace("WAY", "forward"))):
                 self.assertIn(f"QorResult {method}(", header)
 
+    def test_the_page_of_numerics_says_of_every_operation_what_holds(self):
+        text = reference.bounds(self.pages)
+        self.assertEqual([name for name in self.pages if f"(operations/{name}.md)" not in text], [])
+        self.assertRegex(text, r"\[exp\]\(operations/exp.md\): .*within 1 ulp")
+
     def test_what_does_not_exist_is_an_empty_cell(self):
         table = "\n".join(reference.existing(self.pages["filter_median"]))
         self.assertIn("| `64f` | R |  |  |  |", table)

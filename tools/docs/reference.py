@@ -246,19 +246,21 @@ def support_page(family, members, pages):
 
 # --- numerics ------------------------------------------------------------------------------------------------------
 
+GENERAL_RULES = "by the rules above, and exact where values are moved, chosen or counted."
+
+
 def bounds(pages):
-    """What the registry says of elements, by family: text first said of which operations."""
+    """What the registry says of elements, by family: text first said of which operations. Those of which it says nothing
+    follow the page's general rules."""
     lines = []
     for _, group in by_task(pages):
         for family in dict.fromkeys(p.family.stem for p in group):
             said = {}
             for page in (p for p in group if p.family.stem == family):
-                for g in page.groups:
-                    if "elements" in g.keys:
-                        said.setdefault(g.keys["elements"], {})[page.name] = None
-            if said:
-                title = next(p.family.title for p in group if p.family.stem == family)
-                lines += [f"### {title}", ""]
-                lines += [f"- {', '.join(f'[{n}](operations/{n}.md)' for n in names)}: {escape(text)}"
-                          for text, names in said.items()] + [""]
+                for text in [g.keys["elements"] for g in page.groups if "elements" in g.keys] or [GENERAL_RULES]:
+                    said.setdefault(text, {})[page.name] = None
+            title = next(p.family.title for p in group if p.family.stem == family)
+            lines += [f"### {title}", ""]
+            lines += [f"- {', '.join(f'[{n}](operations/{n}.md)' for n in names)}: {escape(text)}"
+                      for text, names in said.items()] + [""]
     return "\n".join(lines)
