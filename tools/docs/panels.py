@@ -5,6 +5,7 @@ import math
 import re
 import subprocess
 import tempfile
+import textwrap
 from html import escape
 from pathlib import Path
 
@@ -51,8 +52,9 @@ def function(name, source):
 
 def code(panel):
     """Its values and statements, as they run."""
-    return "\n".join([*(f"{name} = {given!r}".replace("'", '"') for name, given in panel.values.items()),
-                      panel.python.strip()])
+    values = (textwrap.fill(f"{name} = {given!r}".replace("'", '"'), 96, subsequent_indent=" " * (len(name) + 4))
+              for name, given in panel.values.items())
+    return "\n".join([*values, panel.python.strip()])
 
 
 def made(panel, photo, qori):
