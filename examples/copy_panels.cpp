@@ -34,7 +34,7 @@ Picture planes(const Picture& photo) {
     Picture out(photo.size(), 3);
     constexpr int strips = static_cast<int>(channels.size());
     for (int i = 0; i < strips; ++i) {
-        const Picture& plane = *all[channels[i]];
+        const Picture& plane = *all[channels[static_cast<size_t>(i)]];
         const int begin = photo.width() * i / strips, end = photo.width() * (i + 1) / strips;
         require(qoriDup_8u_C1C3R(plane.at(begin, 0), plane.step(), out.at(begin, 0), out.step(),
                                  {end - begin, photo.height()}));
@@ -131,16 +131,19 @@ Picture framed(const Picture& photo) {
     return out;
 }
 
+/// Whose inner line is one pixel wide.
+constexpr int kLeastFramed = recipes::framed::part * recipes::framed::lining;
+
 constexpr Panel kPanels[] = {
     {recipes::copyOf::about, copyOf},
     {recipes::planes::about, planes, {3, 1}},
     {recipes::swappedPlanes::about, swappedPlanes},
     {recipes::circle::about, circle, {3, 3}},
-    {recipes::channelBars::about, channelBars, {10, 1}},
-    {recipes::fringes::about, fringes, {60, 1}},
+    {recipes::channelBars::about, channelBars, {recipes::channelBars::bars, 1}},
+    {recipes::fringes::about, fringes, {recipes::fringes::part, 1}},
     {recipes::lake::about, lake, {1, 2}},
     {recipes::puzzle::about, puzzle, {6, 4}},
-    {recipes::framed::about, framed, {84, 84}},
+    {recipes::framed::about, framed, {kLeastFramed, kLeastFramed}},
 };
 
 }  // namespace

@@ -80,7 +80,7 @@ Picture patterns(const Picture& photo) {
     const double most = *std::max_element(counts, counts + kCodes);
     for (int k = 0; k < kCodes; ++k) {
         const int begin = width * k / kCodes, end = width * (k + 1) / kCodes;
-        const int bar = static_cast<int>(0.95 * plot * std::sqrt(counts[k] / most));
+        const int bar = static_cast<int>(high * plot * std::sqrt(counts[k] / most));
         if (bar > 0 && end > begin)
             require(qoriSet_8u_C3R(kInk.data(), out.at(begin, photo.height() - bar), out.step(), {end - begin, bar}));
     }

@@ -112,9 +112,11 @@ Picture outOfFocus(const Picture& photo) {
     return out;
 }
 
+constexpr int kAcross = 2 * recipes::outOfFocus::radius + 1;
+
 constexpr Panel kPanels[] = {
     {recipes::logSpectrum::about, logSpectrum},
-    {recipes::outOfFocus::about, outOfFocus, {31, 31}},
+    {recipes::outOfFocus::about, outOfFocus, {kAcross, kAcross}},
 };
 
 }  // namespace

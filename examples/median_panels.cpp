@@ -6,10 +6,11 @@ namespace {
 
 /// One channel element in eight is black or white, by an arithmetic sequence of pseudo-random numbers.
 void saltAndPepper(const Picture& picture) {
-    uint32_t state = recipes::despeckled::seed;
+    using namespace recipes::despeckled;
+    uint32_t state = seed;
     for (int y = 0; y < picture.height(); ++y)
         for (int i = 0; i < 3 * picture.width(); ++i) {
-            state = state * 1664525u + 1013904223u;
+            state = state * uint32_t{factor} + uint32_t{more};
             if (state >> 29 == 0) picture.at(0, y)[i] = (state >> 28 & 1) != 0 ? 255 : 0;
         }
 }

@@ -94,8 +94,8 @@ Picture enlarged(const Picture& photo) {
     using namespace recipes::enlarged;
     return fields(photo, kindsOf(kinds), [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
         const QorImageSize from{size.width / factor, size.height / factor};
-        const uint8_t* detail =
-            photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) * 9 / 20);
+        const uint8_t* detail = photo.at((photo.width() - from.width) * left[0] / left[1],
+                                         (photo.height() - from.height) * top[0] / top[1]);
         Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
     });
 }
@@ -106,7 +106,8 @@ Picture reduced(const Picture& photo) {
     return fields(photo, kindsOf(kinds), [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
         const QorImageSize to{size.width / factor, size.height / factor}, from{factor * to.width, factor * to.height};
         const Picture small(to, 3);
-        const uint8_t* detail = photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) / 2);
+        const uint8_t* detail =
+            photo.at((photo.width() - from.width) * left[0] / left[1], (photo.height() - from.height) / 2);
         Resizer(from, to, kind).run(detail, photo.step(), small.data(), small.step());
         Resizer(to, size, Kind::nearest).run(small.data(), small.step(), dst, dstStep);
     });

@@ -34,7 +34,7 @@ Picture histograms(const Picture& photo) {
         const double highest = *std::max_element(counts[c], counts[c] + bins);
         for (int k = 0; k < bins; ++k) {
             const int begin = width * k / bins, end = width * (k + 1) / bins;
-            const int bar = static_cast<int>(0.95 * height * std::sqrt(counts[c][k] / highest));
+            const int bar = static_cast<int>(high * height * std::sqrt(counts[c][k] / highest));
             if (bar > 0) require(qoriSet_8u_C3CR(ink, out.at(begin, height - bar) + c, out.step(), {end - begin, bar}));
         }
     }

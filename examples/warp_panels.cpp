@@ -69,7 +69,7 @@ Picture turned(const Picture& photo) {
 
 /// A detail of the photograph turned by each interpolation, its pixels enlarged.
 Picture magnified(const Picture& photo) {
-    using recipes::magnified::angle, recipes::magnified::zoom;
+    using namespace recipes::magnified;
     constexpr auto& names = recipes::magnified::kinds;
     constexpr int kStrips = static_cast<int>(names.size());
     const Picture out(photo.size(), 3), whole(photo.size(), 3);
@@ -77,7 +77,7 @@ Picture magnified(const Picture& photo) {
         warp(kindOf(names[static_cast<size_t>(i)]), turn(photo.size(), angle), false, photo, whole);
         const int x = photo.width() * i / kStrips;
         const Picture field({photo.width() * (i + 1) / kStrips - x, photo.height()}, 3);
-        const double left = photo.width() * 0.4, top = photo.height() * 0.45;
+        const double left = photo.width() * corner[1], top = photo.height() * corner[0];
         warp(interpNearest, {{1.0 / zoom, 0, left, 0, 1.0 / zoom, top}}, true, whole, field);
         paste(field, {0, 0}, out, {x, 0}, field.size());
     }
