@@ -15,6 +15,7 @@ html_theme = "furo"
 html_title = f"qori {version}"
 html_static_path = ["_static"]
 html_css_files = ["qori.css"]
+html_search_scorer = str(Path(__file__).with_name("search_scorer.js"))
 html_show_sourcelink = False
 html_copy_source = False
 html_show_sphinx = False

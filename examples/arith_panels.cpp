@@ -23,33 +23,35 @@ struct Floats {
     float* data() const { return pixels.get(); }
 };
 
-/// Five bands from two stops less to two stops more light: a power of two is a scale factor.
+/// Bands from two stops less to two stops more light: a power of two is a scale factor.
 Picture exposures(const Picture& photo) {
     Picture out(photo.size(), 3);
     constexpr uint8_t one[3] = {1, 1, 1};
-    constexpr int bands = 5;
+    constexpr auto& scales = recipes::exposures::scales;
+    constexpr int bands = static_cast<int>(scales.size());
     for (int i = 0; i < bands; ++i) {
         const int begin = photo.width() * i / bands, end = photo.width() * (i + 1) / bands;
         require(qoriMulC_8u_C3RSfs(photo.at(begin, 0), photo.step(), one, out.at(begin, 0), out.step(),
-                                   {end - begin, photo.height()}, bands / 2 - i));
+                                   {end - begin, photo.height()}, scales[static_cast<size_t>(i)]));
     }
     return out;
 }
 
-/// Evening light: a factor per channel, in 64ths.
+/// Evening light: a factor per channel over a power of two.
 Picture warmth(const Picture& photo) {
     Picture out(photo.size(), 3);
-    constexpr uint8_t factors[3] = {84, 62, 42};
-    require(qoriMulC_8u_C3RSfs(photo.data(), photo.step(), factors, out.data(), out.step(), photo.size(), 6));
+    constexpr auto factors = bytes(recipes::warmth::factors);
+    require(qoriMulC_8u_C3RSfs(photo.data(), photo.step(), factors.data(), out.data(), out.step(), photo.size(),
+                               recipes::warmth::scale));
     return out;
 }
 
-/// What a step of two pixels to the right and down changes: saturated differences both ways, added and brightened.
+/// What a step of some pixels to the right and down changes: saturated differences both ways, added and brightened.
 Picture difference(const Picture& photo) {
     Picture out(photo.size(), 3), back(photo.size(), 3);
-    constexpr uint8_t none[3] = {0, 0, 0}, brighter[3] = {3, 3, 3};
+    using namespace recipes::difference;
+    constexpr uint8_t none[3] = {0, 0, 0}, brighter[3] = {gain, gain, gain};
     require(qoriSet_8u_C3R(none, out.data(), out.step(), out.size()));
-    const int shift = 2;
     const QorImageSize part{photo.width() - shift, photo.height() - shift};
     const uint8_t* moved = photo.at(shift, shift);
     require(qoriSub_8u_C3RSfs(photo.data(), photo.step(), moved, photo.step(), out.data(), out.step(), part, 0));
@@ -66,7 +68,7 @@ Picture vignette(const Picture& photo) {
     for (int y = 0; y < size.height; ++y)
         for (int x = 0; x < size.width; ++x) {
             const double dx = 2.0 * x / size.width - 1, dy = 2.0 * y / size.height - 1, r = dx * dx + dy * dy;
-            *mask.at(x, y) = static_cast<uint8_t>(255 * std::max(0.0, 1 - 0.5 * r));
+            *mask.at(x, y) = static_cast<uint8_t>(255 * std::max(0.0, 1 - recipes::vignette::loss * r));
         }
     require(qoriDup_8u_C1C3R(mask.data(), mask.step(), threefold.data(), threefold.step(), size));
     require(qoriMulScale_8u_C3R(photo.data(), photo.step(), threefold.data(), threefold.step(), out.data(), out.step(),
@@ -77,7 +79,8 @@ Picture vignette(const Picture& photo) {
 /// Through floats and back: e^(gamma ln x), which keeps 255 where it is.
 Picture gammaCurve(const Picture& photo) {
     const QorImageSize size = photo.size();
-    constexpr float gamma = 0.6f, toOne[3] = {1 / 255.0f, 1 / 255.0f, 1 / 255.0f}, toByte[3] = {255, 255, 255};
+    constexpr float gamma = static_cast<float>(recipes::gammaCurve::gamma),
+                    toOne[3] = {1 / 255.0f, 1 / 255.0f, 1 / 255.0f}, toByte[3] = {255, 255, 255};
     constexpr float gammas[3] = {gamma, gamma, gamma};
     const Floats linear(size);
     Picture out(size, 3);
@@ -92,20 +95,18 @@ Picture gammaCurve(const Picture& photo) {
     return out;
 }
 
-/// Square roots in 16ths: shadows open, and black stays black.
+/// Square roots with bits behind the point: shadows open, and black stays black.
 Picture openShadows(const Picture& photo) {
     Picture out(photo.size(), 3);
-    require(qoriSqrt_8u_C3RSfs(photo.data(), photo.step(), out.data(), out.step(), photo.size(), -4));
+    require(qoriSqrt_8u_C3RSfs(photo.data(), photo.step(), out.data(), out.step(), photo.size(),
+                               recipes::openShadows::scale));
     return out;
 }
 
 constexpr Panel kPanels[] = {
-    {"From -2 to +2 stops", "MulC C3, scale factors 2 to -2", exposures, {5, 1}},
-    {"Evening light", "MulC C3, scale factor 6", warmth},
-    {"Difference of a two-pixel step", "Sub, Add, MulC C3", difference, {3, 3}},
-    {"Vignette", "MulScale C3 with a mask", vignette, {2, 2}},
-    {"Gamma 0.6 in floats and back", "Convert, MulC, Ln, Exp 32f C3", gammaCurve},
-    {"Shadows opened", "Sqrt C3, scale factor -4", openShadows},
+    {recipes::exposures::about, exposures, {5, 1}},   {recipes::warmth::about, warmth},
+    {recipes::difference::about, difference, {3, 3}}, {recipes::vignette::about, vignette, {2, 2}},
+    {recipes::gammaCurve::about, gammaCurve},         {recipes::openShadows::about, openShadows},
 };
 
 }  // namespace

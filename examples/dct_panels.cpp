@@ -6,12 +6,12 @@
 namespace demo {
 namespace {
 
-constexpr int kBlock = 8, kStrips = 3;
+constexpr int kBlock = 8, kStrips = static_cast<int>(recipes::requantised::coarseness.size());
 
 /// Every coefficient to the nearest multiple of a step that grows with its frequency, as a codec would store it.
 void quantise(int16_t (&coefficients)[64], int coarseness) {
     for (int i = 0; i < 64; ++i) {
-        const int step = 2 + coarseness * (1 + i % kBlock + i / kBlock);
+        const int step = recipes::requantised::least + coarseness * (1 + i % kBlock + i / kBlock);
         coefficients[i] = static_cast<int16_t>(std::lround(static_cast<double>(coefficients[i]) / step) * step);
     }
 }
@@ -25,7 +25,6 @@ void throughCoefficients(const Picture& plane, int x, int y, int coarseness) {
 
 /// Blocks of 8 x 8 transformed, rounded and transformed back: fine steps in the left third, coarse ones in the right.
 Picture requantised(const Picture& photo) {
-    constexpr int kCoarseness[kStrips] = {4, 16, 48};
     const Picture planes[3] = {{photo.size(), 1}, {photo.size(), 1}, {photo.size(), 1}};
     uint8_t* const data[3] = {planes[0].data(), planes[1].data(), planes[2].data()};
     require(qoriCopy_8u_C3P3R(photo.data(), photo.step(), data, planes[0].step(), photo.size()));
@@ -33,14 +32,15 @@ Picture requantised(const Picture& photo) {
     for (const Picture& plane : planes)
         for (int y = 0; y + kBlock <= photo.height(); y += kBlock)
             for (int i = 0; i < columns; ++i)
-                throughCoefficients(plane, i * kBlock, y, kCoarseness[i * kStrips / columns]);
+                throughCoefficients(plane, i * kBlock, y,
+                                    recipes::requantised::coarseness[static_cast<size_t>(i * kStrips / columns)]);
     const Picture out(photo.size(), 3);
     require(qoriCopy_8u_P3C3R(data, planes[0].step(), out.data(), out.step(), photo.size()));
     return out;
 }
 
 constexpr Panel kPanels[] = {
-    {"8 x 8 cosine blocks, three quantisations", "DCT8x8FwdLS, InvLSClip", requantised, {kStrips * kBlock, kBlock}},
+    {recipes::requantised::about, requantised, {kStrips * kBlock, kBlock}},
 };
 
 }  // namespace

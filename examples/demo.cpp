@@ -69,9 +69,9 @@ std::string place(const Picture& sheet, const Panel& panel, const Picture& photo
     }
     const Result result = timed(panel, photo);
     show(sheet, x, y, result.picture);
-    if (!file.empty()) writePng(file, thumbnail(result.picture, kCell));
+    if (!file.empty()) writePng(file, result.picture);
     char text[160];
-    std::snprintf(text, sizeof text, "%s   %.3f ms, %.0f Mpix/s", panel.functions, result.milliseconds,
+    std::snprintf(text, sizeof text, "%s   %.3f ms, %.0f Mpix/s", panel.about.functions, result.milliseconds,
                   1e-3 * photo.width() * photo.height() / result.milliseconds);
     return text;
 }
@@ -82,7 +82,7 @@ void drawPanels(const Picture& sheet, const Typeface& type, const std::vector<Pa
         const Panel& panel = panels[i];
         const int column = static_cast<int>(i) % kColumns, row = static_cast<int>(i) / kColumns;
         const int x = kGap + column * (kCell.width + kGap), y = kHeader + row * (kCell.height + kCaption + kGap);
-        std::printf("%2d/%d  %-56s ", static_cast<int>(i) + 1, static_cast<int>(panels.size()), panel.caption);
+        std::printf("%2d/%d  %-56s ", static_cast<int>(i) + 1, static_cast<int>(panels.size()), panel.about.caption);
         std::fflush(stdout);
         std::string text;
         try {
@@ -92,9 +92,9 @@ void drawPanels(const Picture& sheet, const Typeface& type, const std::vector<Pa
             throw;
         } catch (const std::exception& error) {
             std::puts("failed");
-            throw std::runtime_error(std::string(panel.caption) + ": " + error.what());
+            throw std::runtime_error(std::string(panel.about.caption) + ": " + error.what());
         }
-        type.draw(sheet, x, y + kCell.height + 24, 22, panel.caption, kBright);
+        type.draw(sheet, x, y + kCell.height + 24, 22, panel.about.caption, kBright);
         type.draw(sheet, x, y + kCell.height + 48, 18, text, kDim);
         std::printf("%s\n", text.c_str());
     }

@@ -59,7 +59,7 @@ void centre(Floats& from, Floats& to, QorImageSize size) {
     move(left, top, 0, 0, {right, low});
 }
 
-/// The magnitudes of the green channel's frequencies, 13 powers of e up to the mean's from black to white.
+/// The magnitudes of the green channel's frequencies, some powers of e up to the mean's from black to white.
 Picture logSpectrum(const Picture& photo) {
     const QorImageSize size = photo.size();
     Picture grey(size, 1), out(size, 3);
@@ -73,7 +73,8 @@ Picture logSpectrum(const Picture& photo) {
     require(qoriLn_32f_C1IR(sizes.data(), sizes.step(), size));
     const float most = *sizes.data();
     centre(sizes, image, size);
-    require(qoriScale_32f8u_C1R(image.data(), image.step(), grey.data(), grey.step(), size, most - 13, most));
+    require(qoriScale_32f8u_C1R(image.data(), image.step(), grey.data(), grey.step(), size,
+                                most - static_cast<float>(recipes::logSpectrum::powers), most));
     require(qoriDup_8u_C1C3R(grey.data(), grey.step(), out.data(), out.step(), size));
     return out;
 }
@@ -99,7 +100,7 @@ Floats disc(QorImageSize size, int radius) {
 /// A convolution as the product of two spectra: its time does not depend on the radius.
 Picture outOfFocus(const Picture& photo) {
     const QorImageSize size = photo.size();
-    Floats image(size, 3), kernel = disc(size, 15);
+    Floats image(size, 3), kernel = disc(size, recipes::outOfFocus::radius);
     Transform transform(size);
     require(qoriConvert_8u32f_C3R(photo.data(), photo.step(), image.data(), image.step(), size));
     require(qoriDFTFwd_RToPack_32f_C3IR(image.data(), image.step(), transform.plan(), transform.buffer()));
@@ -111,9 +112,11 @@ Picture outOfFocus(const Picture& photo) {
     return out;
 }
 
+constexpr int kAcross = 2 * recipes::outOfFocus::radius + 1;
+
 constexpr Panel kPanels[] = {
-    {"Its spectrum, magnitudes as logarithms", "DFTFwd_RToPack C1, MagnitudePack, Ln", logSpectrum},
-    {"Out of focus: a product of spectra", "DFTFwd, MulPack, DFTInv C3", outOfFocus, {31, 31}},
+    {recipes::logSpectrum::about, logSpectrum},
+    {recipes::outOfFocus::about, outOfFocus, {kAcross, kAcross}},
 };
 
 }  // namespace

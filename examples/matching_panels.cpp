@@ -22,8 +22,9 @@ double detailOf(const Picture& grey, QorPoint2D place, QorImageSize size, int sh
 }
 
 Pattern choosePattern(const Picture& grey) {
-    constexpr int kPlaces = 7, kShift = 4;
-    const int side = std::clamp(std::min(grey.width(), grey.height()) / 9, 1, 64);
+    constexpr int kPlaces = recipes::foundTemplate::places, kShift = recipes::foundTemplate::shift;
+    const int smaller = std::min(grey.width(), grey.height());
+    const int side = std::clamp(smaller / recipes::foundTemplate::part, 1, recipes::foundTemplate::most);
     Pattern best{{0, 0}, {side, side}};
     double most = -1;
     for (int i = 0; i < kPlaces * kPlaces; ++i) {
@@ -44,12 +45,13 @@ Picture greyOf(const Picture& photo) {
     return grey;
 }
 
-/// The pattern in other light: half its contrast, and brighter.
+/// The pattern in other light: less contrast, and brighter.
 Picture dimmed(const Picture& grey, const Pattern& pattern) {
     Picture dim(pattern.size, 1);
     require(qoriMulC_8u_C1RSfs(grey.at(pattern.place.x, pattern.place.y), grey.step(), 1, dim.data(), dim.step(),
-                               pattern.size, 1));
-    require(qoriAddC_8u_C1RSfs(dim.data(), dim.step(), 90, dim.data(), dim.step(), pattern.size, 0));
+                               pattern.size, recipes::foundTemplate::scale));
+    require(qoriAddC_8u_C1RSfs(dim.data(), dim.step(), recipes::foundTemplate::light, dim.data(), dim.step(),
+                               pattern.size, 0));
     return dim;
 }
 
@@ -72,12 +74,12 @@ Surface correlate(const Picture& grey, const Picture& tpl) {
 }
 
 void drawFrame(const Picture& out, int x, int y, QorImageSize size, int thickness) {
-    constexpr uint8_t kColour[3] = {255, 200, 0};
+    constexpr auto colour = bytes(recipes::foundTemplate::colour);
     const auto bar = [&](int left, int top, int right, int bottom) {
         left = std::max(left, 0), top = std::max(top, 0);
         right = std::min(right, out.width()), bottom = std::min(bottom, out.height());
         if (left < right && top < bottom)
-            require(qoriSet_8u_C3R(kColour, out.at(left, top), out.step(), {right - left, bottom - top}));
+            require(qoriSet_8u_C3R(colour.data(), out.at(left, top), out.step(), {right - left, bottom - top}));
     };
     const int right = x + size.width, bottom = y + size.height;
     bar(x - thickness, y - thickness, right + thickness, y);
@@ -91,7 +93,8 @@ void frameBest(const Picture& out, const Surface& surface, QorImageSize size) {
     float best = 0;
     int32_t x = 0, y = 0;
     require(qoriMaxIndx_32f_C1R(surface.scores.data(), surface.step, out.size(), &best, &x, &y));
-    drawFrame(out, x - size.width / 2, y - size.height / 2, size, 1 + std::min(out.width(), out.height()) / 160);
+    const int thickness = 1 + std::min(out.width(), out.height()) / recipes::foundTemplate::thin;
+    drawFrame(out, x - size.width / 2, y - size.height / 2, size, thickness);
 }
 
 /// What was looked for stands in the corner.
@@ -119,8 +122,8 @@ Picture surfaceOfTemplate(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"A template in other light (corner), found", "CrossCorrNorm 8u32f, MaxIndx 32f", foundTemplate, {12, 12}},
-    {"Its correlation with every place", "CrossCorrNorm 8u32f, Scale 32f8u, Dup C1C3", surfaceOfTemplate, {12, 12}},
+    {recipes::foundTemplate::about, foundTemplate, {12, 12}},
+    {recipes::surfaceOfTemplate::about, surfaceOfTemplate, {12, 12}},
 };
 
 }  // namespace

@@ -7,7 +7,7 @@
 namespace demo {
 namespace {
 
-constexpr int kSide = 9, kReach = kSide / 2;
+constexpr int kSide = recipes::openedAndClosed::side, kReach = kSide / 2;
 
 /// A disc of kSide pixels across.
 const uint8_t* disc() {
@@ -46,23 +46,24 @@ Picture openedAndClosed(const Picture& photo) {
     return out;
 }
 
-/// Largest minus smallest of 5 x 5 pixels, twice as bright.
+/// Largest minus smallest of a square, brighter.
 Picture gradient(const Picture& photo) {
-    constexpr int rim = 2;
+    using namespace recipes::gradient;
+    constexpr int rim = side / 2;
     const Picture wide = framed(photo, rim);
-    const QorImageSize square{2 * rim + 1, 2 * rim + 1};
+    const QorImageSize square{side, side};
     const QorPoint2D middle{rim, rim};
     const uint8_t* const inner = wide.at(rim, rim);
     Picture smallest(photo.size(), 3), out(photo.size(), 3);
     require(qoriFilterMin_8u_C3R(inner, wide.step(), smallest.data(), smallest.step(), photo.size(), square, middle));
     require(qoriFilterMax_8u_C3R(inner, wide.step(), out.data(), out.step(), photo.size(), square, middle));
-    require(qoriSub_8u_C3IRSfs(smallest.data(), smallest.step(), out.data(), out.step(), photo.size(), -1));
+    require(qoriSub_8u_C3IRSfs(smallest.data(), smallest.step(), out.data(), out.step(), photo.size(), scale));
     return out;
 }
 
 constexpr Panel kPanels[] = {
-    {"Opened (left) and closed (right) by a disc of 9 pixels", "Erode C3, Dilate C3", openedAndClosed},
-    {"Morphological gradient, 5 x 5", "FilterMin C3, FilterMax C3, Sub C3I", gradient},
+    {recipes::openedAndClosed::about, openedAndClosed},
+    {recipes::gradient::about, gradient},
 };
 
 }  // namespace

@@ -1,18 +1,28 @@
 // SPDX-License-Identifier: Apache-2.0
 // What the demo shows: one small function a panel, and a line in its family's list.
 #pragma once
+#include <array>
 #include <span>
 
 #include "picture.h"
+#include "recipe_values.h"
 
 namespace demo {
 
+/// Its caption and every value in it come from its recipe in docs/recipes/panels, which makes it in Python too.
 struct Panel {
-    const char* caption;
-    const char* functions;                  ///< The exports that do the work.
+    recipes::About about;
     Picture (*make)(const Picture& photo);  ///< Three channels, of the photograph's size.
     QorImageSize smallest = {1, 1};         ///< Photographs below this in a side leave nothing to show.
 };
+
+/// Values of a recipe as elements of a picture.
+template <size_t n>
+constexpr std::array<uint8_t, n> bytes(const std::array<int, n>& values) {
+    std::array<uint8_t, n> elements{};
+    for (size_t i = 0; i < n; ++i) elements[i] = static_cast<uint8_t>(values[i]);
+    return elements;
+}
 
 std::span<const Panel> copyPanels();
 std::span<const Panel> arithPanels();

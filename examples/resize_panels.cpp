@@ -4,7 +4,6 @@
 #include <vector>
 
 #include "panels.h"
-#include "recipe_values.h"
 
 namespace demo {
 namespace {
@@ -13,13 +12,13 @@ enum class Kind { nearest, linear, cubic, lanczos, super, smoothLanczos };
 
 /// The interpolations that a recipe names; one of another name does not compile.
 template <size_t n>
-consteval std::array<Kind, n> kindsOf(const recipes::Values<const char*, n>& row) {
+consteval std::array<Kind, n> kindsOf(const std::array<const char*, n>& given) {
     constexpr std::string_view names[] = {"nearest",  "linear", "cubic",
                                           "lanczos3", "super",  "lanczos3, antialias=True"};
     std::array<Kind, n> kinds{};
     for (size_t i = 0; i < n; ++i) {
         size_t kind = 0;
-        while (names[kind] != row.values[i]) ++kind;
+        while (names[kind] != given[i]) ++kind;
         kinds[i] = static_cast<Kind>(kind);
     }
     return kinds;
@@ -85,43 +84,38 @@ Picture fields(const Picture& photo, const std::array<Kind, count>& kinds, Draw 
         const int column = i % columns, x = photo.width() * column / columns;
         const int row = i / columns, y = photo.height() * row / 2;
         const QorImageSize size{photo.width() * (column + 1) / columns - x, photo.height() * (row + 1) / 2 - y};
-        draw(kinds[i], out.at(x, y), out.step(), size);
+        draw(kinds[static_cast<size_t>(i)], out.at(x, y), out.step(), size);
     }
     return out;
 }
 
-/// A detail, enlarged six times by each interpolation.
+/// A detail, enlarged by each interpolation.
 Picture enlarged(const Picture& photo) {
-    return fields(photo, kindsOf(recipes::kEnlargements),
-                  [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
-                      const QorImageSize from{size.width / 6, size.height / 6};
-                      const uint8_t* detail =
-                          photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) * 9 / 20);
-                      Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
-                  });
+    using namespace recipes::enlarged;
+    return fields(photo, kindsOf(kinds), [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
+        const QorImageSize from{size.width / factor, size.height / factor};
+        const uint8_t* detail = photo.at((photo.width() - from.width) * left[0] / left[1],
+                                         (photo.height() - from.height) * top[0] / top[1]);
+        Resizer(from, size, kind).run(detail, photo.step(), dst, dstStep);
+    });
 }
 
-/// A detail on a quarter of its width, shown in squares: what aliasing each way leaves.
+/// A detail on a part of its width, shown in squares: what aliasing each way leaves.
 Picture reduced(const Picture& photo) {
-    return fields(
-        photo, kindsOf(recipes::kReductions), [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
-            const QorImageSize to{size.width / 4, size.height / 4}, from{4 * to.width, 4 * to.height};
-            const Picture small(to, 3);
-            const uint8_t* detail = photo.at((photo.width() - from.width) * 3 / 10, (photo.height() - from.height) / 2);
-            Resizer(from, to, kind).run(detail, photo.step(), small.data(), small.step());
-            Resizer(to, size, Kind::nearest).run(small.data(), small.step(), dst, dstStep);
-        });
+    using namespace recipes::reduced;
+    return fields(photo, kindsOf(kinds), [&](Kind kind, uint8_t* dst, int32_t dstStep, QorImageSize size) {
+        const QorImageSize to{size.width / factor, size.height / factor}, from{factor * to.width, factor * to.height};
+        const Picture small(to, 3);
+        const uint8_t* detail =
+            photo.at((photo.width() - from.width) * left[0] / left[1], (photo.height() - from.height) / 2);
+        Resizer(from, to, kind).run(detail, photo.step(), small.data(), small.step());
+        Resizer(to, size, Kind::nearest).run(small.data(), small.step(), dst, dstStep);
+    });
 }
 
 constexpr Panel kPanels[] = {
-    {recipes::kEnlargements.caption,
-     "ResizeNearest, Linear, Cubic, Lanczos C3",
-     enlarged,
-     {72, 72}},  // Lanczos wants six pixels
-    {recipes::kReductions.caption,
-     "ResizeNearest, Linear, Super, Antialiasing C3",
-     reduced,
-     {32, 32}},  // four pixels a field
+    {recipes::enlarged::about, enlarged, {72, 72}},  // Lanczos wants six pixels
+    {recipes::reduced::about, reduced, {32, 32}},    // four pixels a field
 };
 
 }  // namespace

@@ -1,9 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include <iterator>
 #include <memory>
 
 #include "panels.h"
-#include "recipe_values.h"
 
 namespace demo {
 namespace {
@@ -32,32 +30,35 @@ Picture brightParts(const Picture& photo) {
     return out;
 }
 
-/// Shadows below 64 and lights above 192 in colours of their own, channel by channel between them.
+/// Shadows and lights in colours of their own, channel by channel between them.
 Picture zebra(const Picture& photo) {
-    const uint8_t dark[3] = {64, 64, 64}, light[3] = {192, 192, 192};
-    const uint8_t shadow[3] = {0, 0, 96}, glare[3] = {255, 208, 128};
+    namespace recipe = recipes::zebra;
+    constexpr uint8_t dark[3] = {recipe::dark, recipe::dark, recipe::dark};
+    constexpr uint8_t light[3] = {recipe::light, recipe::light, recipe::light};
+    constexpr auto shadow = bytes(recipe::shadow), glare = bytes(recipe::glare);
     Picture out(photo.size(), 3);
     require(qoriThreshold_LTValGTVal_8u_C3R(photo.data(), photo.step(), out.data(), out.step(), photo.size(), dark,
-                                            shadow, light, glare));
+                                            shadow.data(), light, glare.data()));
     return out;
 }
 
-/// Strips: Otsu's threshold, and what is not 10 levels below the means of larger and larger squares.
+/// Strips: Otsu's threshold, and what is not some levels below the means of larger and larger squares.
 Picture adaptiveBesideOtsu(const Picture& photo) {
-    constexpr auto& sides = recipes::kAdaptiveSides.values;
-    constexpr int kStrips = 1 + static_cast<int>(std::size(sides));
+    constexpr auto& sides = recipes::adaptiveBesideOtsu::sides;
+    constexpr int kStrips = 1 + static_cast<int>(sides.size());
     const QorImageSize size = photo.size();
     const Picture binary = otsuMask(photo);
     Picture grey(size, 1);
     require(qoriCopy_8u_C3C1R(photo.data() + 1, photo.step(), grey.data(), grey.step(), size));
     for (int i = 1; i < kStrips; ++i) {
-        const int x = size.width * i / kStrips, side = sides[i - 1];
+        const int x = size.width * i / kStrips, side = sides[static_cast<size_t>(i - 1)];
         const QorImageSize mask{side, side}, strip{size.width * (i + 1) / kStrips - x, size.height};
         int32_t bytes;
         require(qoriThresholdAdaptiveBoxGetBufferSize(strip, mask, 1, 1, &bytes));
         const auto buffer = std::make_unique<uint8_t[]>(static_cast<size_t>(bytes));
         require(qoriThresholdAdaptiveBox_8u_C1R(grey.at(x, 0), grey.step(), binary.at(x, 0), binary.step(), strip, mask,
-                                                10, 255, 0, borderReplicate, 0, buffer.get()));
+                                                recipes::adaptiveBesideOtsu::delta, 255, 0, borderReplicate, 0,
+                                                buffer.get()));
     }
     Picture out(size, 3);
     require(qoriDup_8u_C1C3R(binary.data(), binary.step(), out.data(), out.step(), size));
@@ -65,9 +66,9 @@ Picture adaptiveBesideOtsu(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {"Otsu mask, the photograph in its left half", "Otsu C1, Threshold C1, Copy C3M", brightParts},
-    {"Channels below 64 and above 192 replaced", "Threshold_LTValGTVal C3", zebra},
-    {recipes::kAdaptiveSides.caption, "ThresholdAdaptiveBox C1", adaptiveBesideOtsu, {5, 1}},
+    {recipes::brightParts::about, brightParts},
+    {recipes::zebra::about, zebra},
+    {recipes::adaptiveBesideOtsu::about, adaptiveBesideOtsu, {5, 1}},
 };
 
 }  // namespace

@@ -1,12 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <cmath>
-#include <iterator>
 #include <numbers>
 #include <string_view>
 #include <vector>
 
 #include "panels.h"
-#include "recipe_values.h"
 
 namespace demo {
 namespace {
@@ -30,7 +28,7 @@ void warp(QorInterpolationKind kind, const Map& map, bool isBackward, const Pict
                                   &initBytes));
     std::vector<uint8_t> memory(static_cast<size_t>(planBytes)), init(static_cast<size_t>(initBytes));
     auto* plan = reinterpret_cast<QorWarpPlan*>(memory.data());
-    constexpr double grey[3] = {60, 60, 60};
+    constexpr double grey[3] = {recipes::turned::outside, recipes::turned::outside, recipes::turned::outside};
     const auto fill = [&](auto function, auto... cubic) {
         return function(from.size(), to.size(), qor8u, map.c, isBackward, 3, cubic..., borderConstant, grey, 0);
     };
@@ -58,42 +56,43 @@ void paste(const Picture& from, QorPoint2D at, const Picture& to, QorPoint2D whe
 
 /// The photograph turned, a strip by each angle.
 Picture turned(const Picture& photo) {
-    constexpr auto& angles = recipes::kTurns.values;
-    constexpr int kStrips = std::size(angles);
+    constexpr auto& angles = recipes::turned::angles;
+    constexpr int kStrips = static_cast<int>(angles.size());
     const Picture out(photo.size(), 3), whole(photo.size(), 3);
     for (int i = 0; i < kStrips; ++i) {
-        warp(interpLinear, turn(photo.size(), angles[i]), false, photo, whole);
+        warp(interpLinear, turn(photo.size(), angles[static_cast<size_t>(i)]), false, photo, whole);
         const int x = photo.width() * i / kStrips;
         paste(whole, {x, 0}, out, {x, 0}, {photo.width() * (i + 1) / kStrips - x, photo.height()});
     }
     return out;
 }
 
-/// A detail of the photograph turned by 15 degrees by each interpolation, its pixels six times as large.
+/// A detail of the photograph turned by each interpolation, its pixels enlarged.
 Picture magnified(const Picture& photo) {
-    constexpr auto& names = recipes::kWarpInterpolations.values;
-    constexpr int kStrips = std::size(names);
+    using namespace recipes::magnified;
+    constexpr auto& names = recipes::magnified::kinds;
+    constexpr int kStrips = static_cast<int>(names.size());
     const Picture out(photo.size(), 3), whole(photo.size(), 3);
     for (int i = 0; i < kStrips; ++i) {
-        warp(kindOf(names[i]), turn(photo.size(), 15), false, photo, whole);
+        warp(kindOf(names[static_cast<size_t>(i)]), turn(photo.size(), angle), false, photo, whole);
         const int x = photo.width() * i / kStrips;
         const Picture field({photo.width() * (i + 1) / kStrips - x, photo.height()}, 3);
-        const double left = photo.width() * 0.4, top = photo.height() * 0.45;
-        warp(interpNearest, {{1 / 6.0, 0, left, 0, 1 / 6.0, top}}, true, whole, field);
+        const double left = photo.width() * corner[1], top = photo.height() * corner[0];
+        warp(interpNearest, {{1.0 / zoom, 0, left, 0, 1.0 / zoom, top}}, true, whole, field);
         paste(field, {0, 0}, out, {x, 0}, field.size());
     }
     return out;
 }
 
-/// Turned by 15 degrees and back, on the left; eight times what that changed, on the right.
+/// Turned and back, on the left; many times what that changed, on the right.
 Picture thereAndBack(const Picture& photo) {
     const Picture there(photo.size(), 3), back(photo.size(), 3), out(photo.size(), 3);
-    warp(interpCubic, turn(photo.size(), 15), false, photo, there);
-    warp(interpCubic, turn(photo.size(), 15), true, there, back);
+    warp(interpCubic, turn(photo.size(), recipes::thereAndBack::angle), false, photo, there);
+    warp(interpCubic, turn(photo.size(), recipes::thereAndBack::angle), true, there, back);
     const Picture more(photo.size(), 3), less(photo.size(), 3);
     const auto subtract = [&](const Picture& a, const Picture& b, const Picture& difference) {
         require(qoriSub_8u_C3RSfs(b.data(), b.step(), a.data(), a.step(), difference.data(), difference.step(),
-                                  photo.size(), -3));
+                                  photo.size(), recipes::thereAndBack::scale));
     };
     subtract(back, photo, more);
     subtract(photo, back, less);
@@ -104,9 +103,9 @@ Picture thereAndBack(const Picture& photo) {
 }
 
 constexpr Panel kPanels[] = {
-    {recipes::kTurns.caption, "WarpAffineLinear C3", turned, {8, 8}},
-    {recipes::kWarpInterpolations.caption, "WarpAffineNearest, Linear, Cubic C3", magnified, {8, 8}},
-    {"There and back, and 8 x the difference", "WarpAffineCubic C3 by both directions", thereAndBack, {8, 8}},
+    {recipes::turned::about, turned, {8, 8}},
+    {recipes::magnified::about, magnified, {8, 8}},
+    {recipes::thereAndBack::about, thereAndBack, {8, 8}},
 };
 
 }  // namespace

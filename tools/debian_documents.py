@@ -8,6 +8,7 @@ FOLDER holds the files as they will be installed, usr/ and so on. The time is SO
 import gzip
 import os
 import re
+import subprocess
 import sys
 import textwrap
 from datetime import datetime, timezone
@@ -55,7 +56,12 @@ def main(folder, package, version, release, maintainer):
     log = gzip.compress(change_log(version, release, maintainer).encode(), 9, mtime=0)
     (documents / "changelog.Debian.gz").write_bytes(log)
     (documents / "copyright").write_text(COPYRIGHT)
-    sbom.write(Path(folder), documents / f"{package}.spdx.json", package, f"{version}-{release}")
+    # Packages of two architectures share this folder, and what they say of their libraries differs.
+    machine = ""
+    if (Path(folder) / "usr" / "lib").exists():
+        machine = "_" + subprocess.run(["dpkg", "--print-architecture"], check=True, capture_output=True,
+                                       text=True).stdout.strip()
+    sbom.write(Path(folder), documents / f"{package}{machine}.spdx.json", package, f"{version}-{release}")
     for path in [documents, *documents.iterdir()]:
         path.chmod(0o755 if path.is_dir() else 0o644)
 

@@ -57,32 +57,42 @@ class Reference(unittest.TestCase):
             for method in set(re.findall(r"plan\.(\w+)\(", text.replace("WAY", "forward"))):
                 self.assertIn(f"QorResult {method}(", header)
 
+    def test_the_page_of_numerics_says_of_every_operation_what_holds(self):
+        text = reference.bounds(self.pages)
+        self.assertEqual([name for name in self.pages if f"(operations/{name}.md)" not in text], [])
+        self.assertRegex(text, r"\[exp\]\(operations/exp.md\): .*within 1 ulp")
+
     def test_what_does_not_exist_is_an_empty_cell(self):
         table = "\n".join(reference.existing(self.pages["filter_median"]))
         self.assertIn("| `64f` | R |  |  |  |", table)
 
 
 class Panels(unittest.TestCase):
-    def header(self, row):
+    def load(self, panels, vary="[]"):
         with tempfile.TemporaryDirectory() as folder:
-            (Path(folder) / "one.toml").write_text('[[recipe]]\nof = ["blur"]\n[[recipe.row]]\ncall = "blur(@)"\n' + row)
-            return panel_values.header(Path(folder))
+            (Path(folder) / "panels").mkdir()
+            (Path(folder) / "one.toml").write_text(f'[[recipe]]\nof = ["blur"]\n[[recipe.row]]\ncall = ""\nvary = {vary}')
+            first = '[[panel]]\nname = "one"\nof = "blur"\nexports = "Blur"\npython = "out = photo * side"\n'
+            (Path(folder) / "panels" / "blur.toml").write_text(first + panels)
+            return panel_values.load(Path(folder)), panel_values.header(Path(folder))
 
-    def test_values_of_a_row_become_a_table_with_a_caption(self):
-        text = self.header('vary = ["3", "15"]\npanel = {name = "Sides", caption = "Blurs by @ x @ pixels"}')
-        self.assertIn('Values<int, 2> kSides{\n    "Blurs by 3 x 3, 15 x 15 pixels",\n    {3, 15}};', text)
-        text = self.header("""vary = ["'a', b=1", "'c'"]\npanel = {name = "Kinds", caption = "Kinds: @"}""")
-        self.assertIn('Values<const char*, 2> kKinds{\n    "Kinds: a, b=1, c",\n    {"a, b=1", "c"}};', text)
-        self.assertNotIn("inline", self.header('vary = ["3", "15"]'))
+    def test_values_become_constants_and_captions(self):
+        text = self.load('caption = "By {sides} x {sides} pixels"\nvalues = {sides = {row = 0}}', '["3", "15"]')[1]
+        self.assertIn('namespace one {\ninline constexpr About about{"By 3 x 3, 15 x 15 pixels", "Blur"};', text)
+        self.assertIn("inline constexpr std::array<int, 2> sides{3, 15};", text)
+        text = self.load('caption = "{n}: {k}"\nvalues = {k = {row = 0}, n = 0.5}', """["'a', b=1", "'c'"]""")[1]
+        self.assertIn('about{"0.5: a, b=1, c", "Blur"};\ninline constexpr std::array<const char*, 2> k{"a, b=1", "c"};', text)
+        self.assertIn("inline constexpr double n = 0.5;", text)
         with self.assertRaises(ValueError):
-            self.header('vary = ["3", "0.5"]\npanel = {name = "Mixed", caption = "@"}')
+            self.load('caption = ""\nvalues = {mixed = [3, 0.5]}')
 
-    def test_every_such_row_is_a_panel(self):
-        source = "".join(p.read_text() for p in (ROOT / "examples").glob("*_panels.cpp"))
-        names = [name for name, *_ in panel_values.panels(ROOT / "docs" / "recipes")]
-        self.assertGreater(len(names), 5)
-        for name in names:
-            self.assertEqual(source.count(f"recipes::k{name}.caption"), 1, name)
+    def test_a_panel_has_the_statements_of_another(self):
+        other = '\n[[panel]]\nname = "two"\nof = "blur"\ncaption = "{side}"\nsame = "one"\nvalues = {side = 5}\n'
+        panels = self.load('caption = ""\nvalues = {side = 3, more = 1}' + other + 'instead = [["photo", "-photo"]]')[0]
+        self.assertEqual(panels["two"].values, {"side": 5, "more": 1})
+        self.assertEqual((panels["two"].python, panels["one"].python), ("out = -photo * side", "out = photo * side"))
+        with self.assertRaises(ValueError):
+            self.load('caption = ""' + other + 'instead = [["what is not there", ""]]')
 
 
 class Links(unittest.TestCase):
@@ -97,6 +107,18 @@ class Links(unittest.TestCase):
         self.assertEqual(self.dead(a='<a href="b.html#there">', b='<p id="here">'), ["a.html: b.html#there"])
         self.assertEqual(self.dead(a='<img src="pictures/none.webp">'), ["a.html: pictures/none.webp"])
         self.assertEqual(self.dead(a='<a href="#top">'), ["a.html: #top"])
+
+    def searched(self, index, script='<script src="searchindex.js"></script>'):
+        with tempfile.TemporaryDirectory() as folder:
+            for name, text in {"search.html": script, "a.html": "", "b.html": "", "searchindex.js": index}.items():
+                (Path(folder) / name).write_text(text)
+            return links.not_searched(Path(folder))
+
+    def test_a_search_in_files_finds_every_page(self):
+        self.assertEqual(self.searched('Search.setIndex({"docnames": ["a", "b"]})'), [])
+        self.assertEqual(self.searched('Search.setIndex({"docnames": ["b"]})'), ["a: no search finds it"])
+        self.assertEqual(len(self.searched('{"docnames": ["a", "b"]}')), 1)
+        self.assertEqual(len(self.searched('Search.setIndex({"docnames": ["a", "b"]})', "")), 1)
 
 
 if __name__ == "__main__":

@@ -15,6 +15,8 @@ import paths  # noqa: E402
 import door_python_model  # noqa: E402
 import examples  # noqa: E402
 import gallery  # noqa: E402
+import inputs  # noqa: E402
+import panels  # noqa: E402
 import recipes  # noqa: E402
 import registry  # noqa: E402
 import render  # noqa: E402
@@ -101,6 +103,28 @@ def test_the_programs_of_a_page_run(path, tmp_path):
             subprocess.run([program], check=True, stdout=subprocess.DEVNULL, timeout=60)
 
 
+def test_every_panel_of_the_demo_has_a_recipe_and_every_recipe_a_panel():
+    entries = [entry for family in panels.listed().values() for entry in family]
+    assert all(recipe == function for recipe, function in entries)
+    assert sorted(recipe for recipe, _ in entries) == sorted(panels.recipes())
+    families = [family for family, those in panels.listed().items() for _ in those]
+    assert [panels.recipes()[name].family for name, _ in entries] == families
+    assert {panel.of for panel in panels.recipes().values()} <= RECIPES.keys()
+
+
+@pytest.fixture(scope="session", params=[(20, 0, 580, 400), (100, 50, 401, 253)], ids=["560x400", "301x203"])
+def sheet(request, tmp_path_factory):
+    """A photograph, and the demo's pictures of it."""
+    photo = inputs.original().crop(request.param)
+    return np.asarray(photo), panels.run(photo, tmp_path_factory.mktemp("demo"))
+
+
+@pytest.mark.parametrize("name", panels.recipes())
+def test_a_recipe_of_a_panel_makes_in_python_what_the_demo_makes_in_c(name, sheet):
+    photo, shown = sheet
+    np.testing.assert_array_equal(panels.made(panels.recipes()[name], photo.copy(), recipes.door()), shown[name])
+
+
 def test_every_operation_has_pictures_an_example_and_a_wrong_use():
     operations = {f.name for f in door_python_model.functions(registry.load(ROOT / "api"))}
     assert set(RECIPES) == operations
@@ -116,3 +140,8 @@ def shows_its_input(row):
 def test_every_row_of_pictures_has_three_to_five_and_every_page_its_input():
     assert not [n for n, r in RECIPES.items() if not all(3 <= len(set(row.vary)) <= 5 for row in r.rows)]
     assert not [n for n, r in RECIPES.items() if not any(map(shows_its_input, r.rows))]
+
+
+def test_where_methods_stand_beside_each_other_a_part_is_magnified():
+    beside = [(n, row) for n, r in RECIPES.items() for row in r.rows if row.call in ("@", "qori.@")]
+    assert len(beside) > 5 and not [n for n, row in beside if not row.crop]

@@ -72,9 +72,6 @@ def pictures(recipe, names, folder):
         if row.setup and not row.varied_setup:
             lines += ["```python", recipes.put(row.setup, "").strip(), "```", ""]
         lines += ['<div class="shots">', *row_figures(recipe, number, row, names, folder), "</div>", ""]
-        if row.panel:
-            sheet = panels.of_recipes()[row.panel["name"]]
-            lines += [f'<p>The same values in C: <a href="../demo.html#panel-{sheet}">panel {sheet} of the demo</a>.</p>', ""]
     return lines
 
 
@@ -100,6 +97,7 @@ def make(pages, folder):
         shown = found[name] = {"brief": recipe.brief}
         for what, maker in (("pictures", lambda: pictures(recipe, names, folder)),
                             ("example", lambda: examples.markdown(recipe, names, model)),
+                            ("panels", lambda: panels.of_operation(name, names["photo"], qori, folder)),
                             ("errors", lambda: errors(recipe, names))):
             try:
                 shown[what] = maker()

@@ -1,11 +1,15 @@
-"""The demo's panels: one function of examples/ is the recipe of the contact sheet and of the page, picture and code."""
+"""The demo's panels: a recipe of docs/recipes/panels is what the contact sheet shows, made in C, and what the
+operation's page shows, made in Python. A test holds the two together byte for byte."""
+import functools
+import math
 import re
 import subprocess
 import tempfile
-from dataclasses import dataclass
+import textwrap
 from html import escape
 from pathlib import Path
 
+import numpy as np
 from PIL import Image
 
 import inputs
@@ -13,19 +17,29 @@ import panel_values
 import render
 from paths import DEMO, ROOT, TYPEFACE
 
-ENTRY = re.compile(r'\{(?:"([^"]+)"|recipes::k(\w+)\.caption),\s*"([^"]+)",\s*(\w+)', re.S)
+ENTRY = re.compile(r"\{recipes::(\w+)::about,\s*(\w+)[,}]")
 
 
 class PanelError(Exception):
     pass
 
 
-@dataclass
-class Panel:
-    caption: str
-    exports: str
-    code: str
-    recipe: str     # the name of the row whose values it shows, or nothing
+@functools.cache
+def recipes():
+    """{name: recipe}."""
+    return panel_values.load(ROOT / "docs" / "recipes")
+
+
+def listed(folder=ROOT / "examples"):
+    """{family: (name of the recipe, name of the function) of each panel} in the order of the sheet."""
+    order = re.findall(r"(\w+)Panels\(\)", (folder / "demo.cpp").read_text())
+    sources = {family: (folder / f"{family}_panels.cpp").read_text() for family in order}
+    return {family: ENTRY.findall(text[text.index("kPanels[]"):]) for family, text in sources.items()}
+
+
+def numbers():
+    """{name: its number on the sheet}."""
+    return {name: n for n, (name, _) in enumerate([p for family in listed().values() for p in family], 1)}
 
 
 def function(name, source):
@@ -36,31 +50,44 @@ def function(name, source):
     return match[0]
 
 
-def load(folder=ROOT / "examples"):
-    """{family: panels} in the order of the sheet."""
-    captions = {name: text for name, text, _, _ in panel_values.panels(ROOT / "docs" / "recipes")}
-    order = re.findall(r"(\w+)Panels\(\)", (folder / "demo.cpp").read_text())
-    found = {}
-    for family in order:
-        source = (folder / f"{family}_panels.cpp").read_text()
-        listed = source[source.index("kPanels[]"):]
-        found[family] = [Panel(c or captions[r], e, function(f, source), r) for c, r, e, f in ENTRY.findall(listed)]
-    return found
+def code(panel):
+    """Its values and statements, as they run."""
+    values = (textwrap.fill(f"{name} = {given!r}".replace("'", '"'), 96, subsequent_indent=" " * (len(name) + 4))
+              for name, given in panel.values.items())
+    return "\n".join([*values, panel.python.strip()])
 
 
-def of_recipes():
-    """{name of a row: its panel's number on the sheet}."""
-    panels = [p for family in load().values() for p in family]
-    return {p.recipe: number for number, p in enumerate(panels, 1) if p.recipe}
+def made(panel, photo, qori):
+    """The picture by the package."""
+    names = {"np": np, "math": math, "qori": qori, "photo": photo}
+    exec(compile(code(panel), panel.name, "exec"), names)
+    return names["out"]
 
 
-def run(folder):
-    """The panels of the photograph as pictures 1.png and on; how many there are."""
-    photograph = folder / "photograph.png"
-    inputs.original().save(photograph, compress_level=1)
-    done = subprocess.run([DEMO, photograph, folder / "sheet.png", TYPEFACE, folder], check=True, capture_output=True,
+def run(photo, folder):
+    """The panels of a photograph, an image, by the demo: {name: pixels}."""
+    source = folder / "photograph.png"
+    photo.save(source, compress_level=1)
+    done = subprocess.run([DEMO, source, folder / "sheet.png", TYPEFACE, folder], check=True, capture_output=True,
                           text=True)
-    return len(re.findall(r"^ *\d+/\d+ ", done.stdout, re.M))
+    names = numbers()
+    count = len(re.findall(r"^ *\d+/\d+ ", done.stdout, re.M))
+    if count != len(names):
+        raise PanelError(f"the demo has {count} panels, examples/ lists {len(names)}")
+    return {name: np.asarray(Image.open(folder / f"{n}.png")) for name, n in names.items()}
+
+
+def of_operation(name, photo, qori, folder):
+    """For an operation's page: the pictures of its panels, their statements in Python, and where they stand in C."""
+    figures, codes = [], []
+    for panel in (p for p in recipes().values() if p.of == name):
+        drawn = render.picture_of(made(panel, photo, qori))
+        picture = render.save(drawn, folder / f"panel_of_{panel.name}.webp")
+        caption, link = escape(panel.caption), f"../demo.html#panel-{numbers()[panel.name]}"
+        figures.append(f'<figure><img src="../_static/pictures/{picture}" alt="{caption}" loading="lazy">'
+                       f'<figcaption>{caption}; <a href="{link}">in C</a></figcaption></figure>')
+        codes += [f"<details><summary>{caption}</summary>", "", "```python", code(panel), "```", "", "</details>", ""]
+    return ["## On the demo's sheet", "", '<div class="shots">', *figures, "</div>", "", *codes] if figures else []
 
 
 def figure(number, panel, name):
@@ -72,17 +99,18 @@ def figure(number, panel, name):
 def markdown(pictures):
     """By family the pictures, and below them the code of each."""
     with tempfile.TemporaryDirectory() as place:
-        count, families = run(Path(place)), load()
-        if count != sum(map(len, families.values())):
-            raise PanelError(f"the demo has {count} panels, examples/ lists {sum(map(len, families.values()))}")
-        lines, number = [], 0
-        for family, panels in families.items():
-            figures, codes = [], []
-            for number, panel in enumerate(panels, number + 1):
-                picture = Image.open(Path(place) / f"{number}.png")
-                figures.append(figure(number, panel, render.save(picture, pictures / f"panel_{number}.webp")))
-                # An anchor within: browsers open what they are sent into.
-                codes += [f'<details><summary>{escape(panel.caption)}</summary><a id="panel-{number}"></a>', "", "```cpp",
-                          panel.code.rstrip(), "```", "", "</details>", ""]
-            lines += [f"## {family.capitalize()}", "", '<div class="shots">', *figures, "</div>", "", *codes]
+        shown = run(inputs.original(), Path(place))
+    lines, number = [], 0
+    for family, panels in listed().items():
+        figures, codes = [], []
+        source = (ROOT / "examples" / f"{family}_panels.cpp").read_text()
+        for number, (name, maker) in enumerate(panels, number + 1):
+            panel = recipes()[name]
+            picture = render.save(Image.fromarray(shown[name]), pictures / f"panel_{number}.webp")
+            figures.append(figure(number, panel, picture))
+            # An anchor within: browsers open what they are sent into.
+            codes += [f'<details><summary>{escape(panel.caption)}</summary><a id="panel-{number}"></a>', "", "```cpp",
+                      function(maker, source).rstrip(), "```", "",
+                      f'<p>In Python: <a href="operations/{panel.of}.html">{panel.of}</a>.</p>', "", "</details>", ""]
+        lines += [f"## {family.capitalize()}", "", '<div class="shots">', *figures, "</div>", "", *codes]
     return "\n".join(lines)

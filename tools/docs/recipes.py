@@ -12,7 +12,7 @@ docs/recipes/*.toml are lists of [[recipe]]:
     vary      three to five texts
     picture   what is drawn of the result r, an expression of render.py's functions; the result itself where left out
     note      a sentence before the pictures; crop: [row, column, height, width] that is magnified
-    panel     the demo shows the same values on its sheet: see panel_values.py
+docs/recipes/panels/*.toml are the recipes of the demo's panels: see panel_values.py and panels.py
 """
 import ast
 import copy
@@ -39,7 +39,6 @@ class Row:
     picture: str = "r"
     note: str = ""
     crop: list = None
-    panel: dict = None
 
     def text(self, value):
         """What stands below the picture."""

@@ -204,7 +204,7 @@ def related(page, pages, support_pages):
 
 
 def operation_page(page, pages, support_pages, show):
-    """`show` gives the Markdown of the operation's pictures, examples and errors, lists of lines by these names."""
+    """`show` gives the Markdown of the operation's pictures, examples, panels and errors, lists of lines by these names."""
     lines = [f"# {page.name}", "", escape(show.get("brief") or page.brief), ""]
     lines += show.get("pictures", [])
     lines += ["## Call", ""]
@@ -213,6 +213,7 @@ def operation_page(page, pages, support_pages, show):
         lines += [f'<p class="language">{title}</p>', ""] + fenced(language, text)
     if show.get("example") or registry_examples(page.members):
         lines += ["## Example", ""] + show.get("example", []) + registry_examples(page.members)
+    lines += show.get("panels", [])
     lines += ["## What exists", ""] + existing(page)
     lines += ["## Behaviour", ""] + details(page.members)
     lines += ["## Errors", "", "The first that applies is returned, and then nothing is written.", ""]
@@ -245,19 +246,21 @@ def support_page(family, members, pages):
 
 # --- numerics ------------------------------------------------------------------------------------------------------
 
+GENERAL_RULES = "by the rules above, and exact where values are moved, chosen or counted."
+
+
 def bounds(pages):
-    """What the registry says of elements, by family: text first said of which operations."""
+    """What the registry says of elements, by family: text first said of which operations. Those of which it says nothing
+    follow the page's general rules."""
     lines = []
     for _, group in by_task(pages):
         for family in dict.fromkeys(p.family.stem for p in group):
             said = {}
             for page in (p for p in group if p.family.stem == family):
-                for g in page.groups:
-                    if "elements" in g.keys:
-                        said.setdefault(g.keys["elements"], {})[page.name] = None
-            if said:
-                title = next(p.family.title for p in group if p.family.stem == family)
-                lines += [f"### {title}", ""]
-                lines += [f"- {', '.join(f'[{n}](operations/{n}.md)' for n in names)}: {escape(text)}"
-                          for text, names in said.items()] + [""]
+                for text in [g.keys["elements"] for g in page.groups if "elements" in g.keys] or [GENERAL_RULES]:
+                    said.setdefault(text, {})[page.name] = None
+            title = next(p.family.title for p in group if p.family.stem == family)
+            lines += [f"### {title}", ""]
+            lines += [f"- {', '.join(f'[{n}](operations/{n}.md)' for n in names)}: {escape(text)}"
+                      for text, names in said.items()] + [""]
     return "\n".join(lines)
