@@ -176,6 +176,26 @@ void transformApart(const FourierPlan& plan, const SpectrumColumns& columns, con
     });
 }
 
+/// The way back of both: the real columns of a channel share a lane where none is free for the saved one.
+void inverseFirstColumns(const FourierPlan& plan, const SpectrumColumns& from, const SpectrumColumns& to,
+                         const Work& w) {
+    const kernels::FourierTable* const table = plan.columns();
+    const bool isSavedApart = from.hasLastColumn() && !from.areJoined();
+    float* const free = w.lines + from.freeLane();
+    from.forEachChannel([&](int c) {
+        const float* const joined = from.areJoined() ? savedOf(plan, w, c) : nullptr;
+        kernels::joinRealColumns(from.column(0, c), joined, plan.columnInverse, w.lines + c);
+        if (isSavedApart) kernels::joinRealColumns(savedColumn(plan, w, c), nullptr, plan.columnInverse, free + c);
+    });
+    kernels::transformLines(table, w.lines, w.work);
+    kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(0));
+    if (from.areJoined()) return;
+    to.forEachChannel([&](int c) {
+        kernels::storeRealColumn(w.lines + c, table->positions(), to.column(0, c));
+        if (isSavedApart) kernels::storeRealColumn(free + c, table->positions(), to.column(1, c));
+    });
+}
+
 }  // namespace
 
 void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer) {
@@ -222,12 +242,7 @@ void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
         kernels::transformColumns(table, from.packed(b), to.between(b), plan.columnInverse, Parts::exchanged, w.lines,
                                   w.work);
     kernels::columnsToLines(from.packed(0), plan.columnInverse, Parts::exchanged, w.lines);
-    from.forEachChannel(
-        [&](int c) { kernels::joinRealColumns(from.column(0, c), last(c), plan.columnInverse, w.lines + c); });
-    kernels::transformLines(table, w.lines, w.work);
-    kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(0));
-    if (!to.hasLastColumn())
-        to.forEachChannel([&](int c) { kernels::storeRealColumn(w.lines + c, table->positions(), to.column(0, c)); });
+    inverseFirstColumns(plan, from, to, w);
     inverseRealRows(plan, images, w);
 }
 

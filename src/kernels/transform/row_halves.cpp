@@ -54,12 +54,12 @@ void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float
 void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roots, float* lines) {
     if (!goByTwo(rows, n)) {
         const ptrdiff_t apart = ptrdiff_t{n} * kLineColumns;
-        rowsToLines(rows, n, scale, Parts::inOrder, lines);
+        rowsToLines(rows, n, 2 * scale, Parts::inOrder, lines);
         for (int c = 0; c < rows.processed; ++c) joinHalves(lines + c * apart, n, roots);
         return;
     }
     const line::EightRows in(rows);
-    const Vec<float> factor = splat(scale);
+    const Vec<float> factor = splat(2 * scale);
     const ptrdiff_t points = n / 2;
     const auto join = [=](ptrdiff_t k, ComplexLine x, ComplexLine y) {
         const line::Halves z = line::joinHalf(x, y, roots + kHalfRootFloats * k);
@@ -67,8 +67,7 @@ void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roo
         line::storeLine(lines + k * kLineFloats, z.at);
     };
     const TwoLines ends = loadTwo(in, 0, factor);
-    const ComplexLine zero = line::sumAndDifference(ends.first);
-    line::storeLine(lines, {zero.im, zero.re});
+    line::storeLine(lines, line::joinEnds(ends.first));
     ComplexLine waiting = ends.second;
     ptrdiff_t k = 2;
     for (; k < points - k; k += 2) {
