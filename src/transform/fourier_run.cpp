@@ -59,6 +59,12 @@ public:
         rows.first = asBytes(rows.row(0) + ptrdiff_t{x} * rows.channels + channel);
         return rows;
     }
+    /// Of an image that has no others.
+    kernels::ColumnPair onlyColumns(int channel) const {
+        kernels::ColumnPair pair{column(0, channel), column(width_ - 1, channel)};
+        if (!hasLastColumn()) pair.second.count = 0;
+        return pair;
+    }
     /// Calls each(channel) for those that are processed.
     template <class Each>
     void forEachChannel(Each each) const {
@@ -100,12 +106,16 @@ void forEachLines(const FourierPlan& plan, const Images& images, float* lines, E
 
 /// Odd rows go in pairs, as the parts of complex ones, which costs half and has a rounding more. Where there are no
 /// more rows than lanes, or where that is a larger part of the errors and rows are short, they go alone.
-bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 15; }
+bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 31; }
 
 void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
-    if (plan.halfRoots != 0)
+    if (plan.hasShortRows)
+        forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
+            kernels::shortRowsToSpectra(plan.shortRows(), src, plan.rowForward, w.lines, dst);
+        });
+    else if (plan.halfRoots != 0)
         forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
             kernels::rowsToLines(src, width, plan.rowForward, Parts::inOrder, w.lines);
             forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
@@ -128,21 +138,27 @@ void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& 
 void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
-    if (plan.halfRoots != 0)
+    if (plan.hasShortRows)
+        forEachRows(plan, images, kColumns, [&](const LineRows&, const LineRows& dst) {
+            kernels::shortSpectraToRows(plan.shortRows(), dst, plan.rowInverse, w.lines);
+        });
+    else if (plan.halfRoots != 0)
         forEachRows(plan, images, kColumns, [&](const LineRows&, const LineRows& dst) {
             kernels::rowsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
             forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
             kernels::linesToRows(w.lines, table->positions(), width, Parts::exchanged, dst);
         });
-    else
-        forEachRows(plan, images, 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
-            kernels::spectraToPairs(dst, width, plan.rowInverse, w.lines);
+    else {
+        const bool alone = areAlone(plan.size);
+        forEachRows(plan, images, alone ? kColumns : 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
+            kernels::spectraToPairs(dst, width, plan.rowInverse, alone, w.lines);
             forEachLines(plan, images, w.lines, [&](float* lines) {
                 kernels::joinPairs(lines, width);
                 kernels::transformLines(table, lines, w.work);
             });
             kernels::pairsToRows(w.lines, table->positions(), width, dst);
         });
+    }
 }
 
 /// The first block of columns, in lines, with both real columns of a channel in a lane; the last one's frequencies go
@@ -202,6 +218,10 @@ void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     const Work w(plan, buffer);
     forwardRealRows(plan, images, w);
     const SpectrumColumns columns(plan, images.dst, images.dstStep, images);
+    if (plan.shortColumnTable != 0)
+        return columns.forEachChannel([&](int c) {
+            kernels::shortColumnsToSpectra(plan.shortColumns(), columns.onlyColumns(c), plan.columnForward, w.lines);
+        });
     const kernels::FourierTable* const table = plan.columns();
     kernels::columnsToLines(columns.between(0), plan.columnForward, Parts::inOrder, w.lines);
     if (columns.areJoined())
@@ -233,6 +253,13 @@ void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     const Work w(plan, buffer);
     const SpectrumColumns from(plan, images.src, images.srcStep, images);
     const SpectrumColumns to(plan, images.dst, images.dstStep, images);
+    if (plan.shortColumnTable != 0) {
+        from.forEachChannel([&](int c) {
+            kernels::shortSpectraToColumns(plan.shortColumns(), from.onlyColumns(c), plan.columnInverse, w.lines,
+                                           to.onlyColumns(c));
+        });
+        return inverseRealRows(plan, images, w);
+    }
     const kernels::FourierTable* const table = plan.columns();
     // From the right, and the last column before all: what is written is where the source's pairs have been read.
     const auto last = [&](int c) { return from.hasLastColumn() ? savedOf(plan, w, c) : nullptr; };

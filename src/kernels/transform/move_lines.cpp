@@ -9,6 +9,27 @@ namespace {
 
 constexpr int kRows = kLineColumns;
 
+using qori::load, qori::store;
+
+/// Where eight floats are as doubles: four of one part of a line, then four of the other.
+template <class T>
+struct WidePlace {
+    T *first, *second;
+};
+QORI_INLINE void store(WidePlace<double> to, Vec<float> v) {
+    _mm256_store_pd(to.first, _mm256_cvtps_pd(_mm256_castps256_ps128(v.v)));
+    _mm256_store_pd(to.second, _mm256_cvtps_pd(_mm256_extractf128_ps(v.v, 1)));
+}
+QORI_INLINE Vec<float> load(WidePlace<const double> from) {
+    const __m128 low = _mm256_cvtpd_ps(_mm256_load_pd(from.first));
+    return {_mm256_insertf128_ps(_mm256_castps128_ps256(low), _mm256_cvtpd_ps(_mm256_load_pd(from.second)), 1)};
+}
+/// In floats, as between other places.
+template <class T>
+QORI_INLINE WidePlace<T> operator+(WidePlace<T> at, ptrdiff_t floats) {
+    return {at.first + floats / 2, at.second + floats / 2};
+}
+
 /// Eight rows become eight columns.
 QORI_INLINE void turn(Vec<float> (&v)[kRows]) {
     for (int i = 0; i < 4; ++i) {
@@ -200,7 +221,7 @@ void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, c
     if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(true));
 }
 
-void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines) {
+void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines) {
     const RowPair pair(rows);
     const auto to = [=](bool isMirrored) {
         return [=](ptrdiff_t e) {
@@ -209,7 +230,9 @@ void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines
         };
     };
     turnRowsIn(pair.first, n, scale, n * kLineFloats, to(false));
-    turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
+    if (!areAlone) return turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
+    for (int c = 0; c < rows.processed; ++c)
+        for (ptrdiff_t e = 0; e < n; ++e) store(to(true)(e) + c * n * kLineFloats, zero<float>());
 }
 
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
@@ -219,6 +242,40 @@ void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, cons
     };
     turnRowsOut(pair.first, n, n * kLineFloats, from(kLineColumns));
     if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(0));
+}
+
+void rowsToWideLines(const LineRows& rows, ptrdiff_t n, float* lines) {
+    turnRowsIn(rows, n, 1, n * kLineFloats, [=](ptrdiff_t e) {
+        auto* const at = reinterpret_cast<double*>(lines + e * kLineFloats);
+        return WidePlace<double>{at, at + 4};
+    });
+}
+
+void wideLinesToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
+    turnRowsOut(rows, n, n * kLineFloats, [=](ptrdiff_t e) {
+        const auto* const at = reinterpret_cast<const double*>(lines + ptrdiff_t{positions[e]} * kLineFloats);
+        return WidePlace<const double>{at + 4, at};
+    });
+}
+
+void spectraToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
+    const auto at = [=](ptrdiff_t k) { return lines + ptrdiff_t{positions[k]} * kLineFloats; };
+    if (n % 2 == 0)
+        return turnRowsOut(rows, n, n * kLineFloats, [=](ptrdiff_t e) { return at(e / 2) + e % 2 * kLineColumns; });
+    turnRowsOut(rows, n, n * kLineFloats, [=](ptrdiff_t e) {
+        const PackedPlace place(e, n, false);
+        return at(place.line) + place.part * kLineColumns;
+    });
+}
+
+void rowsToSpectra(const LineRows& rows, ptrdiff_t n, float* lines) {
+    if (n % 2 == 0)
+        return turnRowsIn(rows, n, 1, n * kLineFloats,
+                          [=](ptrdiff_t e) { return lines + e / 2 * kLineFloats + e % 2 * kLineColumns; });
+    turnRowsIn(rows, n, 1, n * kLineFloats, [=](ptrdiff_t e) {
+        const PackedPlace place(e, n, false);
+        return lines + ptrdiff_t{place.line} * kLineFloats + place.part * kLineColumns;
+    });
 }
 
 void columnsToLines(const LineColumns& columns, float scale, Parts parts, float* lines) {

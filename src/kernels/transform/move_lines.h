@@ -39,10 +39,22 @@ void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roo
 void rowsToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines);
 /// The spectra of splitPairs, n odd: frequency 0, then the parts of 1, 2, ...
 void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
-/// The other way round, for joinPairs.
-void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines);
+/// The other way round, for joinPairs; the second spectra are 0 where rows are alone.
+void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines);
 /// Element e is line positions[e], parts exchanged: of the first eight rows its second part.
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+
+// Of up to 8 rows of n elements in doubles (short_rows.h): n lines for each channel.
+
+/// Element e becomes line e: of the first four rows its real part, of the others the imaginary one.
+void rowsToWideLines(const LineRows& rows, ptrdiff_t n, float* lines);
+/// Element e is line positions[e], parts exchanged.
+void wideLinesToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+/// Spectra as floats: frequency k, eight real parts and eight imaginary ones, is where line positions[k] begins; of an
+/// even n the last is the imaginary part of the first.
+void spectraToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+/// Frequency k to line k.
+void rowsToSpectra(const LineRows& rows, ptrdiff_t n, float* lines);
 
 /// Complex columns, one in each of the lanes `begin` to `end`. Of one channel the parts of lane l are elements
 /// element + 2 l and the next. Of several the channels of one complex column have lanes one behind the other, lane 0
