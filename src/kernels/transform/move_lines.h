@@ -72,7 +72,7 @@ void columnsToLines(const LineColumns& columns, float scale, Parts parts, float*
 /// Row y is line positions[y].
 void linesToColumns(const float* lines, const int32_t* positions, Parts parts, const LineColumns& columns);
 
-/// Columns to lines, their transform, lines to columns: in one go where whole blocks of one channel allow it.
+/// Columns to lines, their transform, lines to columns: in one go where blocks and the length allow it.
 void transformColumns(const FourierTable* table, const LineColumns& from, const LineColumns& to, float scale,
                       Parts parts, float* lines, float* work);
 
