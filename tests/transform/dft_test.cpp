@@ -238,6 +238,21 @@ TEST(Dft, RoundTrip) {
         }
 }
 
+/// Means near the end of the floats come back as they are.
+TEST(Dft, LargeMeansStayFinite) {
+    for (const QorImageSize size : {QorImageSize{64, 1}, {256, 2}, {30, 9}, {33, 9}, {1, 6}}) {
+        SCOPED_TRACE(testing::Message() << size.width << "x" << size.height);
+        const Plan plan(Dft::exportsOf(Elements::real), size, fftNoDiv);
+        const TestImage image(kSrc, shapeOf(size), 4);
+        image.fill<float>(1, [] { return 0.0f; });
+        image.view<float>(1).set(0, 0, 0, 3e38f);
+        EXPECT_EQ(QOR_OK,
+                  call(qoriDFTInv_PackToR_32f_C1IR, image.data<float>(), image.step(), plan.get(), plan.buffer()));
+        const View<float> pixels = image.view<float>(1);
+        image.forEach([&](int x, int y) { EXPECT_EQ(3e38f, pixels.get(x, y)) << x << "," << y; });
+    }
+}
+
 /// A plan is used where it was copied to, by several calls; the results do not depend on where it is.
 TEST(Dft, PlansMayBeMoved) {
     const QorImageSize size{303, 6};

@@ -91,7 +91,7 @@ QORI_NOINLINE void splitByTwo(const float* lines, int32_t n, const int32_t* posi
 template <int channels>
 QORI_NOINLINE void joinByTwo(const LineRows& rows, int32_t n, float scale, const float* roots, float* lines) {
     const line::EightRows in(rows);
-    const Vec<float> factor = splat(2 * scale);
+    const Vec<float> factor = splat(scale);
     const ptrdiff_t points = n / 2, apart = ptrdiff_t{n} * kLineColumns;
     const auto join = [=](ptrdiff_t k, int c, ComplexLine x, ComplexLine y) {
         const line::Halves z = line::joinHalf(x, y, roots + kHalfRootFloats * k);
@@ -136,7 +136,7 @@ void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float
 void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roots, float* lines) {
     if (!goByTwo(rows, n)) {
         const ptrdiff_t apart = ptrdiff_t{n} * kLineColumns;
-        rowsToLines(rows, n, 2 * scale, Parts::inOrder, lines);
+        rowsToLines(rows, n, scale, Parts::inOrder, lines);
         for (int c = 0; c < rows.processed; ++c) joinHalves(lines + c * apart, n, roots);
         return;
     }
