@@ -212,6 +212,21 @@ void inverseFirstColumns(const FourierPlan& plan, const SpectrumColumns& from, c
     });
 }
 
+/// The saved columns of several channels become pixels one behind the other, and columns again. Lines are free.
+void turnSaved(const FourierPlan& plan, const Images& images, const Work& w, Direction direction) {
+    const ptrdiff_t channels = images.channels, height = plan.size.height;
+    if (channels == 1) return;
+    std::copy_n(w.saved, channels * height, w.lines);
+    for (ptrdiff_t c = 0; c < channels; ++c)
+        for (ptrdiff_t y = 0; y < height; ++y) {
+            const ptrdiff_t inPixel = y * channels + c, inColumn = c * height + y;
+            if (direction == Direction::forward)
+                w.saved[inPixel] = w.lines[inColumn];
+            else
+                w.saved[inColumn] = w.lines[inPixel];
+        }
+}
+
 }  // namespace
 
 void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer) {
@@ -232,18 +247,19 @@ void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
         if (columns.hasLastColumn())
             columns.forEachChannel([&](int c) { kernels::floatsToColumn(savedOf(plan, w, c), columns.column(x, c)); });
     };
-    // From the right, where whole blocks write what they have read and pass a column on, the last one at first; the
+    // From the right, where whole blocks write what they have read and pass a pixel on, the last one at first; the
     // first block takes what is left.
-    int32_t b = columns.blocks() - 1;
-    const auto isShifted = [&] {
-        return columns.hasLastColumn() &&
-               kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
-    };
-    while (b > 0 && isShifted()) --b;
-    if (b == 0) return storeSaved(std::min(plan.size.width, 2 * kColumns) - 1);
-    // Else from the left: packed pairs begin an element before those between, which have been read by then. The last
+    const int32_t blocks = columns.blocks();
+    if (columns.hasLastColumn() && kernels::areColumnsShiftable(table, columns.between(blocks - 1))) {
+        turnSaved(plan, images, w, Direction::forward);
+        for (int32_t b = blocks - 1; b > 0; --b)
+            kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
+        turnSaved(plan, images, w, Direction::inverse);
+        return storeSaved(std::min(plan.size.width, 2 * kColumns / images.channels) - 1);
+    }
+    // Else from the left: packed pairs begin a pixel before those between, which have been read by then. The last
     // column waits until the last block has been read.
-    for (b = 1; b < columns.blocks(); ++b)
+    for (int32_t b = 1; b < blocks; ++b)
         kernels::transformColumns(table, columns.between(b), columns.packed(b), plan.columnForward, Parts::inOrder,
                                   w.lines, w.work);
     storeSaved(plan.size.width - 1);

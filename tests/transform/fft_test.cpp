@@ -59,7 +59,10 @@ struct Fft {
         for (int x = 0; x <= 6; ++x)
             for (int y = 0; y <= 6; ++y)
                 if (isMain || random().oneIn(4)) check(QorImageSize{1 << x, 1 << y});
-        if (!isMain) return check(QorImageSize{2048, 2});
+        if (!isMain) {
+            for (QorImageSize size : {QorImageSize{64, 32}, {8, 1024}, {2048, 2}}) check(size);
+            return;
+        }
         for (QorImageSize size :
              {QorImageSize{128, 16}, {16, 256}, {512, 2}, {2, 1024}, {2048, 1}, {4, 2048}, {4096, 2}})
             check(size);

@@ -104,6 +104,21 @@ QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines,
         });
 }
 
+/// The same of four channels: rows begin four elements earlier, and carry as many.
+template <int radix>
+QORI_NOINLINE void passOutShiftedByFour(const FourierTable& table, const float* lines, Frequencies f, float* carry,
+                                        const LineColumns& to) {
+    lastStage<radix>(
+        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+            float *const row = rowOf(to, y), *const carried = carry + 4 * y;
+            const __m128 behind = _mm_loadu_ps(carried), lastImaginary = _mm256_extractf128_ps(a.im.v, 1);
+            _mm_storeu_ps(carried, _mm256_castps256_ps128(a.re.v));
+            store(row, Vec<float>{_mm256_blend_ps(a.im.v, a.re.v, 0xF0)});
+            store(row + kLineColumns,
+                  Vec<float>{_mm256_insertf128_ps(_mm256_castps128_ps256(lastImaginary), behind, 1)});
+        });
+}
+
 /// The stages behind the first and before the last, then the last, of blocks that fit a cache.
 template <class Last>
 void middleAndLast(const FourierTable& table, int32_t stage, float* lines, ptrdiff_t points, Frequencies f, Last last) {
@@ -171,12 +186,19 @@ void transformColumns(const FourierTable* table, const LineColumns& from, const 
     linesToColumns(lines, table->positions(), parts, to);
 }
 
-bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+bool areColumnsShiftable(const FourierTable* table, const LineColumns& columns) {
+    const int channels = columns.rows.channels;
+    return (channels == 1 || channels == 4) && isWhole(columns) && isFusible(*table);
+}
+
+void transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
                              float* lines) {
-    if (columns.rows.channels != 1 || !isWhole(columns) || !isFusible(*table)) return false;
-    transformFused<false, PlainLanes>(*table, columns, scale, lines,
-                                      [&](Frequencies f) { passOutShifted<8>(*table, lines, f, carry, columns); });
-    return true;
+    if (columns.rows.channels == 1)
+        return transformFused<false, PlainLanes>(
+            *table, columns, scale, lines, [&](Frequencies f) { passOutShifted<8>(*table, lines, f, carry, columns); });
+    transformFused<false, FourChannelLanes>(*table, columns, scale, lines, [&](Frequencies f) {
+        passOutShiftedByFour<8>(*table, lines, f, carry, columns);
+    });
 }
 
 }  // namespace qori::kernels

@@ -77,9 +77,10 @@ void transformColumns(const FourierTable* table, const LineColumns& from, const 
                       Parts parts, float* lines, float* work);
 
 /// The transform of eight complex columns of the layout between rows and columns into the packed one, whose rows begin
-/// an element earlier: `carry` has an element a row that comes behind these, and gets those that come before. False,
-/// and nothing done, where blocks are not whole or the length is not made for it.
-bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+/// a pixel earlier: `carry` has a pixel a row that comes behind these, and gets those that come before. Blocks are
+/// whole, of one channel or of four, and the length is made for it.
+bool areColumnsShiftable(const FourierTable* table, const LineColumns& columns);
+void transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
                              float* lines);
 
 // Single columns are those of one channel; its lane takes the place of lane 0 where `lines` begins with it.
