@@ -117,9 +117,11 @@ const Rows complex{{row(Kind::complex, {64, 64}), row(Kind::complex, {256, 256},
                     row(Kind::complex, {2048, 2048}, 192), row(Kind::complex, {4096, 4096}, 107)}};
 const Rows anySize{{row(Kind::forward, {640, 360}), row(Kind::forward, {1920, 1080}), row(Kind::forward, {1000, 1000}),
                     row(Kind::forward, {509, 509}), row(Kind::complex, {1000, 1000}), row(Kind::complex, {509, 509})}};
-const Rows severalChannels{{channelRow(Kind::forward, {64, 64}, 3), channelRow(Kind::forward, {512, 512}, 3),
-                            channelRow(Kind::inverse, {512, 512}, 3), channelRow(Kind::forward, {512, 512}, 4),
-                            channelRow(Kind::inverse, {512, 512}, 4), channelRow(Kind::forward, {1000, 1000}, 3)}};
+const Rows severalChannels{{channelRow(Kind::forward, {64, 64}, 3), channelRow(Kind::inverse, {64, 64}, 3),
+                            channelRow(Kind::forward, {64, 64}, 4), channelRow(Kind::inverse, {64, 64}, 4),
+                            channelRow(Kind::forward, {512, 512}, 3), channelRow(Kind::inverse, {512, 512}, 3),
+                            channelRow(Kind::forward, {512, 512}, 4), channelRow(Kind::inverse, {512, 512}, 4),
+                            channelRow(Kind::forward, {1000, 1000}, 3)}};
 
 /// Squares whose work is n log n.
 std::vector<Step> squares(const std::vector<int>& sides) {

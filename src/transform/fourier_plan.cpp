@@ -13,7 +13,11 @@ int32_t pointsOfRow(int32_t width, Elements elements) {
     return elements == Elements::complex || width % 2 == 1 ? width : width / 2;
 }
 
-bool isHalved(int32_t width, Elements elements) { return elements != Elements::complex && width % 2 == 0; }
+bool isShort(int32_t width, Elements elements) { return elements != Elements::complex && kernels::isShortRow(width); }
+
+bool isHalved(int32_t width, Elements elements) {
+    return elements != Elements::complex && width % 2 == 0 && !isShort(width, elements);
+}
 
 /// Pixels that no buffer holds, and whose bytes 64 bits do.
 constexpr int64_t kTooMany = int64_t{1} << 40;
@@ -39,19 +43,26 @@ FourierSizes::FourierSizes(QorImageSize size, Elements elements) {
     BlockLayout record, buffer;
     record.add(sizeof(FourierPlan));
     plan.size = size;
-    plan.rowTable = place(record, kernels::fourierTableBytes(points));
+    plan.hasShortRows = isShort(size.width, elements);
+    plan.rowTable =
+        place(record, plan.hasShortRows ? kernels::shortRowTableBytes(size.width) : kernels::fourierTableBytes(points));
     plan.columnTable = place(record, kernels::fourierTableBytes(size.height));
+    if (elements != Elements::complex && kernels::areShortColumns(size.width, size.height))
+        plan.shortColumnTable = place(record, kernels::shortRowTableBytes(size.height));
     if (isHalved(size.width, elements)) plan.halfRoots = place(record, kernels::halfRootsBytes(size.width));
     planBytes = record.bytes() + kBlockAlignment;
 
-    initBytes = std::max(kernels::fourierInitBytes(points), kernels::fourierInitBytes(size.height));
+    const int64_t ofRows = plan.hasShortRows ? 0 : kernels::fourierInitBytes(points);
+    initBytes = std::max(ofRows, kernels::fourierInitBytes(size.height));
     if (isHalved(size.width, elements)) initBytes = std::max(initBytes, kernels::halfRootsInitBytes(size.width));
     if (initBytes > 0) initBytes += kBlockAlignment;
 
     // Rows are turned with all of their channels, columns eight at a time whichever they are.
     const int channels = elements == Elements::real ? 4 : 1;
-    buffer.add(kLineBytes * std::max<int64_t>(int64_t{points} * channels, size.height));
-    plan.workAt = place(buffer, std::max(kernels::fourierWorkBytes(points), kernels::fourierWorkBytes(size.height)));
+    const int64_t rowLines = plan.hasShortRows ? kernels::shortRowLines(size.width) : int64_t{kLineBytes} * points;
+    const int64_t rowWork = plan.hasShortRows ? 0 : kernels::fourierWorkBytes(points);
+    buffer.add(std::max(rowLines * channels, int64_t{kLineBytes} * size.height));
+    plan.workAt = place(buffer, std::max(rowWork, kernels::fourierWorkBytes(size.height)));
     plan.savedAt =
         place(buffer, elements == Elements::complex ? 0 : channels * int64_t{size.height} * elementBytes<float>);
     if (elements == Elements::integers)
@@ -73,8 +84,13 @@ void fillFourierPlan(QorFft2DPlan* block, const FourierSizes& sizes, int32_t tag
     plan->columnInverse = ofColumns.inverse;
     void* const memory = sizes.initBytes == 0 ? nullptr : blockStart(init);
     const int32_t points = plan->halfRoots != 0 ? plan->size.width / 2 : plan->size.width;
-    kernels::makeFourierTable(tableOf<kernels::FourierTable>(plan, plan->rowTable), points, memory);
+    if (plan->hasShortRows)
+        kernels::makeShortRowTable(tableOf<kernels::ShortRowTable>(plan, plan->rowTable), plan->size.width);
+    else
+        kernels::makeFourierTable(tableOf<kernels::FourierTable>(plan, plan->rowTable), points, memory);
     kernels::makeFourierTable(tableOf<kernels::FourierTable>(plan, plan->columnTable), plan->size.height, memory);
+    if (plan->shortColumnTable != 0)
+        kernels::makeShortRowTable(tableOf<kernels::ShortRowTable>(plan, plan->shortColumnTable), plan->size.height);
     if (plan->halfRoots != 0) kernels::makeHalfRoots(tableOf<float>(plan, plan->halfRoots), plan->size.width, memory);
 }
 

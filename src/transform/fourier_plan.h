@@ -3,7 +3,7 @@
 #pragma once
 #include "frame/checks.h"
 #include "frame/plan.h"
-#include "kernels/transform/fourier.h"
+#include "kernels/transform/short_rows.h"
 
 namespace qori::transform {
 
@@ -26,11 +26,17 @@ struct FourierPlan {
     /// Of one row or column: 1, 1 / n or 1 / sqrt(n).
     float rowForward, rowInverse, columnForward, columnInverse;
     int32_t rowTable, columnTable, halfRoots;
+    int32_t shortColumnTable;  ///< Of narrow images, or 0.
+    bool hasShortRows;         ///< Whose table is another.
     /// Where a transform's work memory and the saved columns are in the buffer, behind the lines.
     int32_t workAt, savedAt;
     int32_t imageAt;  ///< Integer plans: of the image as floats.
 
     const kernels::FourierTable* rows() const { return tableOf<kernels::FourierTable>(this, rowTable); }
+    const kernels::ShortRowTable& shortRows() const { return *tableOf<kernels::ShortRowTable>(this, rowTable); }
+    const kernels::ShortRowTable& shortColumns() const {
+        return *tableOf<kernels::ShortRowTable>(this, shortColumnTable);
+    }
     const kernels::FourierTable* columns() const { return tableOf<kernels::FourierTable>(this, columnTable); }
     const float* roots() const { return tableOf<float>(this, halfRoots); }
 };

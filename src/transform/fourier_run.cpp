@@ -59,6 +59,12 @@ public:
         rows.first = asBytes(rows.row(0) + ptrdiff_t{x} * rows.channels + channel);
         return rows;
     }
+    /// Of an image that has no others.
+    kernels::ColumnPair onlyColumns(int channel) const {
+        kernels::ColumnPair pair{column(0, channel), column(width_ - 1, channel)};
+        if (!hasLastColumn()) pair.second.count = 0;
+        return pair;
+    }
     /// Calls each(channel) for those that are processed.
     template <class Each>
     void forEachChannel(Each each) const {
@@ -100,12 +106,16 @@ void forEachLines(const FourierPlan& plan, const Images& images, float* lines, E
 
 /// Odd rows go in pairs, as the parts of complex ones, which costs half and has a rounding more. Where there are no
 /// more rows than lanes, or where that is a larger part of the errors and rows are short, they go alone.
-bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 15; }
+bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 31; }
 
 void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
-    if (plan.halfRoots != 0)
+    if (plan.hasShortRows)
+        forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
+            kernels::shortRowsToSpectra(plan.shortRows(), src, plan.rowForward, w.lines, dst);
+        });
+    else if (plan.halfRoots != 0)
         forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
             kernels::rowsToLines(src, width, plan.rowForward, Parts::inOrder, w.lines);
             forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
@@ -128,21 +138,27 @@ void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& 
 void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
-    if (plan.halfRoots != 0)
+    if (plan.hasShortRows)
+        forEachRows(plan, images, kColumns, [&](const LineRows&, const LineRows& dst) {
+            kernels::shortSpectraToRows(plan.shortRows(), dst, plan.rowInverse, w.lines);
+        });
+    else if (plan.halfRoots != 0)
         forEachRows(plan, images, kColumns, [&](const LineRows&, const LineRows& dst) {
             kernels::rowsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
             forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
             kernels::linesToRows(w.lines, table->positions(), width, Parts::exchanged, dst);
         });
-    else
-        forEachRows(plan, images, 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
-            kernels::spectraToPairs(dst, width, plan.rowInverse, w.lines);
+    else {
+        const bool alone = areAlone(plan.size);
+        forEachRows(plan, images, alone ? kColumns : 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
+            kernels::spectraToPairs(dst, width, plan.rowInverse, alone, w.lines);
             forEachLines(plan, images, w.lines, [&](float* lines) {
                 kernels::joinPairs(lines, width);
                 kernels::transformLines(table, lines, w.work);
             });
             kernels::pairsToRows(w.lines, table->positions(), width, dst);
         });
+    }
 }
 
 /// The first block of columns, in lines, with both real columns of a channel in a lane; the last one's frequencies go
@@ -176,12 +192,51 @@ void transformApart(const FourierPlan& plan, const SpectrumColumns& columns, con
     });
 }
 
+/// The way back of both: the real columns of a channel share a lane where none is free for the saved one.
+void inverseFirstColumns(const FourierPlan& plan, const SpectrumColumns& from, const SpectrumColumns& to,
+                         const Work& w) {
+    const kernels::FourierTable* const table = plan.columns();
+    const bool isSavedApart = from.hasLastColumn() && !from.areJoined();
+    float* const free = w.lines + from.freeLane();
+    from.forEachChannel([&](int c) {
+        const float* const joined = from.areJoined() ? savedOf(plan, w, c) : nullptr;
+        kernels::joinRealColumns(from.column(0, c), joined, plan.columnInverse, w.lines + c);
+        if (isSavedApart) kernels::joinRealColumns(savedColumn(plan, w, c), nullptr, plan.columnInverse, free + c);
+    });
+    kernels::transformLines(table, w.lines, w.work);
+    kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(0));
+    if (from.areJoined()) return;
+    to.forEachChannel([&](int c) {
+        kernels::storeRealColumn(w.lines + c, table->positions(), to.column(0, c));
+        if (isSavedApart) kernels::storeRealColumn(free + c, table->positions(), to.column(1, c));
+    });
+}
+
+/// The saved columns of several channels become pixels one behind the other, and columns again. Lines are free.
+void turnSaved(const FourierPlan& plan, const Images& images, const Work& w, Direction direction) {
+    const ptrdiff_t channels = images.channels, height = plan.size.height;
+    if (channels == 1) return;
+    std::copy_n(w.saved, channels * height, w.lines);
+    for (ptrdiff_t c = 0; c < channels; ++c)
+        for (ptrdiff_t y = 0; y < height; ++y) {
+            const ptrdiff_t inPixel = y * channels + c, inColumn = c * height + y;
+            if (direction == Direction::forward)
+                w.saved[inPixel] = w.lines[inColumn];
+            else
+                w.saved[inColumn] = w.lines[inPixel];
+        }
+}
+
 }  // namespace
 
 void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer) {
     const Work w(plan, buffer);
     forwardRealRows(plan, images, w);
     const SpectrumColumns columns(plan, images.dst, images.dstStep, images);
+    if (plan.shortColumnTable != 0)
+        return columns.forEachChannel([&](int c) {
+            kernels::shortColumnsToSpectra(plan.shortColumns(), columns.onlyColumns(c), plan.columnForward, w.lines);
+        });
     const kernels::FourierTable* const table = plan.columns();
     kernels::columnsToLines(columns.between(0), plan.columnForward, Parts::inOrder, w.lines);
     if (columns.areJoined())
@@ -192,18 +247,19 @@ void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
         if (columns.hasLastColumn())
             columns.forEachChannel([&](int c) { kernels::floatsToColumn(savedOf(plan, w, c), columns.column(x, c)); });
     };
-    // From the right, where whole blocks write what they have read and pass a column on, the last one at first; the
+    // From the right, where whole blocks write what they have read and pass a pixel on, the last one at first; the
     // first block takes what is left.
-    int32_t b = columns.blocks() - 1;
-    const auto isShifted = [&] {
-        return columns.hasLastColumn() &&
-               kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
-    };
-    while (b > 0 && isShifted()) --b;
-    if (b == 0) return storeSaved(std::min(plan.size.width, 2 * kColumns) - 1);
-    // Else from the left: packed pairs begin an element before those between, which have been read by then. The last
+    const int32_t blocks = columns.blocks();
+    if (columns.hasLastColumn() && kernels::areColumnsShiftable(table, columns.between(blocks - 1))) {
+        turnSaved(plan, images, w, Direction::forward);
+        for (int32_t b = blocks - 1; b > 0; --b)
+            kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
+        turnSaved(plan, images, w, Direction::inverse);
+        return storeSaved(std::min(plan.size.width, 2 * kColumns / images.channels) - 1);
+    }
+    // Else from the left: packed pairs begin a pixel before those between, which have been read by then. The last
     // column waits until the last block has been read.
-    for (b = 1; b < columns.blocks(); ++b)
+    for (int32_t b = 1; b < blocks; ++b)
         kernels::transformColumns(table, columns.between(b), columns.packed(b), plan.columnForward, Parts::inOrder,
                                   w.lines, w.work);
     storeSaved(plan.size.width - 1);
@@ -213,6 +269,13 @@ void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     const Work w(plan, buffer);
     const SpectrumColumns from(plan, images.src, images.srcStep, images);
     const SpectrumColumns to(plan, images.dst, images.dstStep, images);
+    if (plan.shortColumnTable != 0) {
+        from.forEachChannel([&](int c) {
+            kernels::shortSpectraToColumns(plan.shortColumns(), from.onlyColumns(c), plan.columnInverse, w.lines,
+                                           to.onlyColumns(c));
+        });
+        return inverseRealRows(plan, images, w);
+    }
     const kernels::FourierTable* const table = plan.columns();
     // From the right, and the last column before all: what is written is where the source's pairs have been read.
     const auto last = [&](int c) { return from.hasLastColumn() ? savedOf(plan, w, c) : nullptr; };
@@ -222,12 +285,7 @@ void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
         kernels::transformColumns(table, from.packed(b), to.between(b), plan.columnInverse, Parts::exchanged, w.lines,
                                   w.work);
     kernels::columnsToLines(from.packed(0), plan.columnInverse, Parts::exchanged, w.lines);
-    from.forEachChannel(
-        [&](int c) { kernels::joinRealColumns(from.column(0, c), last(c), plan.columnInverse, w.lines + c); });
-    kernels::transformLines(table, w.lines, w.work);
-    kernels::linesToColumns(w.lines, table->positions(), Parts::exchanged, to.between(0));
-    if (!to.hasLastColumn())
-        to.forEachChannel([&](int c) { kernels::storeRealColumn(w.lines + c, table->positions(), to.column(0, c)); });
+    inverseFirstColumns(plan, from, to, w);
     inverseRealRows(plan, images, w);
 }
 

@@ -27,14 +27,32 @@ struct Field {
     }
 };
 
-/// Sums of n numbers times e^(sign 2 pi i j k / n).
+/// Sums of n numbers times e^(sign 2 pi i j k / n); of many by those of even and of odd index.
 inline std::vector<Complex> transformed(const std::vector<Complex>& in, int sign) {
     const size_t n = in.size();
     std::vector<Complex> roots(n), out(n);
+    if (n % 2 == 0 && n > 32) {
+        std::vector<Complex> halves[2];
+        for (size_t j = 0; j < n; ++j) halves[j % 2].push_back(in[j]);
+        for (std::vector<Complex>& half : halves) half = transformed(half, sign);
+        for (size_t k = 0; k < n / 2; ++k) {
+            const double turn = sign * 2 * 3.14159265358979323846 * static_cast<double>(k) / static_cast<double>(n);
+            const Complex odd = halves[1][k] * std::polar(1.0, turn);
+            out[k] = halves[0][k] + odd;
+            out[k + n / 2] = halves[0][k] - odd;
+        }
+        return out;
+    }
     for (size_t k = 0; k < n; ++k)
         roots[k] = std::polar(1.0, sign * 2 * 3.14159265358979323846 * static_cast<double>(k) / static_cast<double>(n));
-    for (size_t k = 0; k < n; ++k)
-        for (size_t j = 0, turn = 0; j < n; ++j, turn = (turn + k) % n) out[k] += in[j] * roots[turn];
+    for (size_t k = 0; k < n; ++k) {
+        double re = 0, im = 0;  // without the operator's care for infinities, which costs most of the time
+        for (size_t j = 0, turn = 0; j < n; ++j, turn = turn + k < n ? turn + k : turn + k - n) {
+            re += in[j].real() * roots[turn].real() - in[j].imag() * roots[turn].imag();
+            im += in[j].real() * roots[turn].imag() + in[j].imag() * roots[turn].real();
+        }
+        out[k] = {re, im};
+    }
     return out;
 }
 

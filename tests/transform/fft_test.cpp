@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <array>
 #include <initializer_list>
 
 #include "fourier_members.h"
@@ -58,7 +59,10 @@ struct Fft {
         for (int x = 0; x <= 6; ++x)
             for (int y = 0; y <= 6; ++y)
                 if (isMain || random().oneIn(4)) check(QorImageSize{1 << x, 1 << y});
-        if (!isMain) return check(QorImageSize{2048, 2});
+        if (!isMain) {
+            for (QorImageSize size : {QorImageSize{64, 32}, {8, 1024}, {2048, 2}}) check(size);
+            return;
+        }
         for (QorImageSize size :
              {QorImageSize{128, 16}, {16, 256}, {512, 2}, {2, 1024}, {2048, 1}, {4, 2048}, {4096, 2}})
             check(size);
@@ -143,6 +147,40 @@ TEST(Fft, ConstantsAreExact) {
         const View<float> spectrum = image.view<float>(1);
         image.forEach([&](int x, int y) { EXPECT_EQ(x + y == 0 ? expected : 0, spectrum.get(x, y)) << x << "," << y; });
     }
+}
+
+/// Sums and differences of two pixels, halved: to nearest, halves to even, saturated; any scale factor.
+TEST(Fft, IntegersAreRoundedToEven) {
+    const QorImageSize size{2, 1};
+    const Plan plan(Fft::exportsOf(Elements::integers), size, fftNoDiv);
+    const auto forward = [&](uint8_t a, uint8_t b, int32_t scaleFactor) {
+        const uint8_t src[2] = {a, b};
+        std::array<int32_t, 2> dst{-7, -7};
+        EXPECT_EQ(QOR_OK,
+                  qoriFFTFwd_RToPack_8u32s_C1RSfs(src, 2, dst.data(), 8, plan.get(), scaleFactor, plan.buffer()));
+        return dst;
+    };
+    const auto inverse = [&](int32_t a, int32_t b, int32_t scaleFactor) {
+        const int32_t src[2] = {a, b};
+        std::array<uint8_t, 2> dst{77, 77};
+        EXPECT_EQ(QOR_OK,
+                  qoriFFTInv_PackToR_32s8u_C1RSfs(src, 8, dst.data(), 2, plan.get(), scaleFactor, plan.buffer()));
+        return dst;
+    };
+    using Integers = std::array<int32_t, 2>;
+    using Bytes = std::array<uint8_t, 2>;
+    EXPECT_EQ((Integers{2, 0}), forward(1, 2, 1));
+    EXPECT_EQ((Integers{2, 2}), forward(5, 0, 1));
+    EXPECT_EQ((Integers{4, -4}), forward(0, 7, 1));
+    EXPECT_EQ((Integers{INT32_MAX, INT32_MIN}), forward(1, 200, -31));
+    EXPECT_EQ((Integers{0, 0}), forward(255, 0, INT32_MAX));
+    EXPECT_EQ((Integers{INT32_MAX, INT32_MIN}), forward(0, 1, INT32_MIN));
+    EXPECT_EQ((Bytes{2, 0}), inverse(2, 1, 1));
+    EXPECT_EQ((Bytes{2, 2}), inverse(5, 0, 1));
+    EXPECT_EQ((Bytes{254, 254}), inverse(509, 0, 1));
+    EXPECT_EQ((Bytes{255, 0}), inverse(-100, 1000, 0));
+    EXPECT_EQ((Bytes{0, 0}), inverse(INT32_MAX, 0, INT32_MAX));
+    EXPECT_EQ((Bytes{255, 0}), inverse(0, 1, INT32_MIN));
 }
 
 }  // namespace

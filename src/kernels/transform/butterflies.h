@@ -159,6 +159,9 @@ QORI_INLINE void butterfly(ComplexLineOf<T> (&a)[p], const T* turns) {
 /// Of two real frequencies a and b in the places of the parts: a + b and a - b.
 QORI_INLINE ComplexLine sumAndDifference(ComplexLine a) { return {a.re + a.im, a.re - a.im}; }
 
+/// The first point, parts exchanged, of two such frequencies.
+QORI_INLINE ComplexLine joinEnds(ComplexLine a) { return {a.re - a.im, a.re + a.im}; }
+
 /// A point or frequency k and the one at n / 2 - k.
 struct Halves {
     ComplexLine at, mirror;
@@ -176,13 +179,16 @@ QORI_INLINE Halves splitHalf(ComplexLine z, ComplexLine y, const float* root) {
              negMulAdd(high, z.im, mulAdd(turn, difference, low * y.im))}};
 }
 
-/// From frequencies x and y to points, parts exchanged.
+/// From frequencies x and y to points, parts exchanged. Terms as in splitHalf, doubled at last: twice a frequency may
+/// be infinite where the points are not.
 QORI_INLINE Halves joinHalf(ComplexLine x, ComplexLine y, const float* root) {
-    const Vec<float> two = splat(2.0f);
-    const ComplexLine even = {x.re + y.re, x.im - y.im}, odd = {x.re - y.re, x.im + y.im};
-    const ComplexLine turned = times(odd, splat(root[0]), splat(-root[1]));
-    return {{mulAdd(turned.re, two, even.im), negMulAdd(turned.im, two, even.re)},
-            {mulSub(turned.re, two, even.im), mulAdd(turned.im, two, even.re)}};
+    const Vec<float> turn = splat(root[0]), low = splat(root[2]), high = splat(root[3]);
+    const Vec<float> sum = x.im + y.im, difference = x.re - y.re;
+    const ComplexLine at = {negMulAdd(high, y.im, mulAdd(turn, difference, low * x.im)),
+                            mulAdd(high, y.re, negMulAdd(turn, sum, low * x.re))};
+    const ComplexLine mirror = {negMulAdd(high, x.im, mulAdd(turn, difference, low * y.im)),
+                                mulAdd(high, x.re, mulAdd(turn, sum, low * y.re))};
+    return {at + at, mirror + mirror};
 }
 
 }  // namespace line

@@ -13,8 +13,33 @@ QORI_INLINE ComplexLine exchangedIf(ComplexLine a) {
 
 QORI_INLINE float* rowOf(const LineColumns& columns, ptrdiff_t y) { return columns.rows.row(y) + columns.element; }
 
+/// Whole blocks of one channel, and of four of which all are processed: two columns of four lanes each.
+struct PlainLanes {
+    QORI_INLINE static ComplexLine read(const float* p) { return line::separate(load(p), load(p + kLineColumns)); }
+    QORI_INLINE static void write(float* p, ComplexLine a) {
+        Vec<float> low, high;
+        line::interleave(a, low, high);
+        store(p, low);
+        store(p + kLineColumns, high);
+    }
+};
+struct FourChannelLanes {
+    QORI_INLINE static ComplexLine read(const float* p) { return exchanged({load(p), load(p + kLineColumns)}); }
+    QORI_INLINE static void write(float* p, ComplexLine a) {
+        a = exchanged(a);
+        store(p, a.re);
+        store(p + kLineColumns, a.im);
+    }
+
+private:
+    /// The halves in the middle change places, either way.
+    QORI_INLINE static ComplexLine exchanged(ComplexLine a) {
+        return {{_mm256_permute2f128_ps(a.re.v, a.im.v, 0x20)}, {_mm256_permute2f128_ps(a.re.v, a.im.v, 0x31)}};
+    }
+};
+
 /// The first stage, of the whole length: rows of the image to lines.
-template <int radix, bool isExchanged>
+template <int radix, bool isExchanged, class Lanes>
 QORI_NOINLINE void passIn(const LineColumns& from, float scale, const FourierTable& table, float* lines) {
     const ptrdiff_t part = table.points / radix, apart = part * kLineFloats;
     const float* w = table.at<float>(table.stages[0].twiddles);
@@ -22,8 +47,7 @@ QORI_NOINLINE void passIn(const LineColumns& from, float scale, const FourierTab
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
         for (int q = 0; q < radix; ++q) {
-            const float* const p = rowOf(from, j + q * part);
-            const ComplexLine z = line::separate(load(p), load(p + kLineColumns));
+            const ComplexLine z = Lanes::read(rowOf(from, j + q * part));
             a[q] = exchangedIf<isExchanged>({z.re * factor, z.im * factor});
         }
         line::butterfly(a);
@@ -53,15 +77,11 @@ QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Freque
 }
 
 /// To rows of the image.
-template <int radix, bool isExchanged>
+template <int radix, bool isExchanged, class Lanes>
 QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to) {
     lastStage<radix>(
         table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
-            float* const row = rowOf(to, y);
-            Vec<float> low, high;
-            line::interleave(exchangedIf<isExchanged>(a), low, high);
-            store(row, low);
-            store(row + kLineColumns, high);
+            Lanes::write(rowOf(to, y), exchangedIf<isExchanged>(a));
         });
 }
 
@@ -84,6 +104,21 @@ QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines,
         });
 }
 
+/// The same of four channels: rows begin four elements earlier, and carry as many.
+template <int radix>
+QORI_NOINLINE void passOutShiftedByFour(const FourierTable& table, const float* lines, Frequencies f, float* carry,
+                                        const LineColumns& to) {
+    lastStage<radix>(
+        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+            float *const row = rowOf(to, y), *const carried = carry + 4 * y;
+            const __m128 behind = _mm_loadu_ps(carried), lastImaginary = _mm256_extractf128_ps(a.im.v, 1);
+            _mm_storeu_ps(carried, _mm256_castps256_ps128(a.re.v));
+            store(row, Vec<float>{_mm256_blend_ps(a.im.v, a.re.v, 0xF0)});
+            store(row + kLineColumns,
+                  Vec<float>{_mm256_insertf128_ps(_mm256_castps128_ps256(lastImaginary), behind, 1)});
+        });
+}
+
 /// The stages behind the first and before the last, then the last, of blocks that fit a cache.
 template <class Last>
 void middleAndLast(const FourierTable& table, int32_t stage, float* lines, ptrdiff_t points, Frequencies f, Last last) {
@@ -102,34 +137,33 @@ void middleAndLast(const FourierTable& table, int32_t stage, float* lines, ptrdi
     last(f);
 }
 
-/// All stages; last(frequencies) does the last.
-template <int firstRadix, bool isExchanged, class Last>
+/// All stages; last(frequencies) does the last. The first radix is 8 or 4.
+template <bool isExchanged, class Lanes, class Last>
 void transformFused(const FourierTable& table, const LineColumns& from, float scale, float* lines, Last last) {
-    passIn<firstRadix, isExchanged>(from, scale, table, lines);
+    const int32_t firstRadix = table.stages[0].radix;
+    if (firstRadix == 8)
+        passIn<8, isExchanged, Lanes>(from, scale, table, lines);
+    else
+        passIn<4, isExchanged, Lanes>(from, scale, table, lines);
     if (table.points <= line::kPointsAtOnce) return middleAndLast(table, 1, lines, table.points, {0, 1}, last);
     const ptrdiff_t part = table.points / firstRadix;
     for (int32_t i = 0; i < firstRadix; ++i)
         middleAndLast(table, 1, lines + i * part * kLineFloats, part, {i, firstRadix}, last);
 }
 
-/// By the first radix, 8 or 4.
-template <bool isExchanged, class Last>
-void transformFused(const FourierTable& table, const LineColumns& from, float scale, float* lines, Last last) {
-    if (table.stages[0].radix == 8)
-        transformFused<8, isExchanged>(table, from, scale, lines, last);
-    else
-        transformFused<4, isExchanged>(table, from, scale, lines, last);
-}
-
-template <bool isExchanged>
-void transformFused(const FourierTable& table, const LineColumns& from, const LineColumns& to, float scale,
+template <class Lanes>
+void transformFused(const FourierTable& table, const LineColumns& from, const LineColumns& to, float scale, Parts parts,
                     float* lines) {
-    transformFused<isExchanged>(table, from, scale, lines,
-                                [&](Frequencies f) { passOut<8, isExchanged>(table, lines, f, to); });
+    if (parts == Parts::inOrder)
+        transformFused<false, Lanes>(table, from, scale, lines,
+                                     [&](Frequencies f) { passOut<8, false, Lanes>(table, lines, f, to); });
+    else
+        transformFused<true, Lanes>(table, from, scale, lines,
+                                    [&](Frequencies f) { passOut<8, true, Lanes>(table, lines, f, to); });
 }
 
 bool isWhole(const LineColumns& columns) {
-    return columns.rows.channels == 1 && columns.begin == 0 && columns.end == kLineColumns;
+    return columns.begin == 0 && columns.end == kLineColumns && columns.rows.processed == columns.rows.channels;
 }
 
 /// Powers of two from 32 on, and their products with others where those come in between.
@@ -144,20 +178,27 @@ bool isFusible(const FourierTable& table) {
 void transformColumns(const FourierTable* table, const LineColumns& from, const LineColumns& to, float scale,
                       Parts parts, float* lines, float* work) {
     if (isWhole(from) && isWhole(to) && isFusible(*table)) {
-        if (parts == Parts::inOrder) return transformFused<false>(*table, from, to, scale, lines);
-        return transformFused<true>(*table, from, to, scale, lines);
+        if (from.rows.channels == 1) return transformFused<PlainLanes>(*table, from, to, scale, parts, lines);
+        if (from.rows.channels == 4) return transformFused<FourChannelLanes>(*table, from, to, scale, parts, lines);
     }
     columnsToLines(from, scale, parts, lines);
     transformLines(table, lines, work);
     linesToColumns(lines, table->positions(), parts, to);
 }
 
-bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+bool areColumnsShiftable(const FourierTable* table, const LineColumns& columns) {
+    const int channels = columns.rows.channels;
+    return (channels == 1 || channels == 4) && isWhole(columns) && isFusible(*table);
+}
+
+void transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
                              float* lines) {
-    if (!isWhole(columns) || !isFusible(*table)) return false;
-    transformFused<false>(*table, columns, scale, lines,
-                          [&](Frequencies f) { passOutShifted<8>(*table, lines, f, carry, columns); });
-    return true;
+    if (columns.rows.channels == 1)
+        return transformFused<false, PlainLanes>(
+            *table, columns, scale, lines, [&](Frequencies f) { passOutShifted<8>(*table, lines, f, carry, columns); });
+    transformFused<false, FourChannelLanes>(*table, columns, scale, lines, [&](Frequencies f) {
+        passOutShiftedByFour<8>(*table, lines, f, carry, columns);
+    });
 }
 
 }  // namespace qori::kernels

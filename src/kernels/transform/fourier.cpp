@@ -46,8 +46,7 @@ void splitHalves(float* lines, int32_t n, const int32_t* positions, const float*
 
 void joinHalves(float* lines, int32_t n, const float* roots) {
     const int32_t points = n / 2;
-    const ComplexLine ends = line::sumAndDifference(line::loadLine(lines));
-    line::storeLine(lines, {ends.im, ends.re});
+    line::storeLine(lines, line::joinEnds(line::loadLine(lines)));
     for (int32_t k = 1; k <= points - k; ++k) {
         float *const at = lineAt(lines, k), *const mirror = lineAt(lines, points - k);
         const line::Halves z = line::joinHalf(line::loadLine(at), line::loadLine(mirror), roots + kHalfRootFloats * k);

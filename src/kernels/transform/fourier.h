@@ -87,8 +87,8 @@ void makeHalfRoots(float* roots, int32_t n, void* init = nullptr);
 /// From the transform of n / 2 points to the spectra of eight real sequences of n: frequency k at positions[k] for
 /// 0 < k < n / 2; at positions[0] the real frequencies 0 and n / 2 in the places of the parts.
 void splitHalves(float* lines, int32_t n, const int32_t* positions, const float* roots);
-/// From such spectra in natural order to the points whose transform is the sequences, parts exchanged (element 2 k of a
-/// sequence comes out in the place of the imaginary part). Not scaled: n times the sequence.
+/// From such spectra in natural order to the points whose transform is the sequences, parts exchanged
+/// (element 2 k of a sequence comes out in the place of the imaginary part). Not scaled: n times the sequence.
 void joinHalves(float* lines, int32_t n, const float* roots);
 
 /// From the transform of n points to the spectra of two times eight real sequences: for 0 < k < n - k, frequency k of

@@ -32,9 +32,9 @@ constexpr int64_t forPrimeFactors(int64_t n, int64_t bound, Each each) {
 
 /// Primes whose predecessor's factors without kernels of their own have a small sum are convolved: a stage of radix q
 /// costs about 2 q a point, forth and back, a convolution with a chirp 200 to 300 points' worth of vector operations
-/// for each of its own. Primes that could be summed, (p - 1)^2 / 2 operations, gain from 61 on where that sum is next
+/// for each of its own. Primes that could be summed, (p - 1)^2 / 2 operations, gain from 67 on where that sum is next
 /// to nothing.
-constexpr int64_t kLeastRotated = 61, kMostSum = 45, kMostSumOfSummed = 13;
+constexpr int64_t kLeastRotated = 67, kMostSum = 45, kMostSumOfSummed = 13;
 constexpr bool isRotatable(int64_t n) {
     if (n < kLeastRotated) return false;
     const int64_t most = n <= kMostPrimeFactor ? kMostSumOfSummed : kMostSum;

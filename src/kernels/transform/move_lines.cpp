@@ -9,6 +9,27 @@ namespace {
 
 constexpr int kRows = kLineColumns;
 
+using qori::load, qori::store;
+
+/// Where eight floats are as doubles: four of one part of a line, then four of the other.
+template <class T>
+struct WidePlace {
+    T *first, *second;
+};
+QORI_INLINE void store(WidePlace<double> to, Vec<float> v) {
+    _mm256_store_pd(to.first, _mm256_cvtps_pd(_mm256_castps256_ps128(v.v)));
+    _mm256_store_pd(to.second, _mm256_cvtps_pd(_mm256_extractf128_ps(v.v, 1)));
+}
+QORI_INLINE Vec<float> load(WidePlace<const double> from) {
+    const __m128 low = _mm256_cvtpd_ps(_mm256_load_pd(from.first));
+    return {_mm256_insertf128_ps(_mm256_castps128_ps256(low), _mm256_cvtpd_ps(_mm256_load_pd(from.second)), 1)};
+}
+/// In floats, as between other places.
+template <class T>
+QORI_INLINE WidePlace<T> operator+(WidePlace<T> at, ptrdiff_t floats) {
+    return {at.first + floats / 2, at.second + floats / 2};
+}
+
 /// Eight rows become eight columns.
 QORI_INLINE void turn(Vec<float> (&v)[kRows]) {
     for (int i = 0; i < 4; ++i) {
@@ -25,11 +46,11 @@ QORI_INLINE void turn(Vec<float> (&v)[kRows]) {
     }
 }
 
-/// Elements of all channels in their order: place(e) is where element e of the first channel belongs, other channels
-/// are `apart` floats behind the one before. Called once for each.
+/// Elements of all channels in their order from pixel `first` on: place(e) is where element e of the first channel
+/// belongs, other channels are `apart` floats behind the one before. Called once for each.
 template <class Place>
-QORI_INLINE auto ofChannels(int channels, ptrdiff_t apart, Place place) {
-    return [=, channel = 0, element = ptrdiff_t{0}](ptrdiff_t) mutable {
+QORI_INLINE auto ofChannels(int channels, ptrdiff_t apart, ptrdiff_t first, Place place) {
+    return [=, channel = 0, element = first](ptrdiff_t) mutable {
         const auto at = place(element) + channel * apart;
         if (++channel == channels) {
             channel = 0;
@@ -39,19 +60,26 @@ QORI_INLINE auto ofChannels(int channels, ptrdiff_t apart, Place place) {
     };
 }
 
-/// Where rows end, the last one stands in for those that are not there: their lanes hold no junk.
+/// Eight whole rows, four pixels at a time; each(element, vectors) of the next four elements. The pixels done.
+template <int channels, class Each>
+QORI_INLINE ptrdiff_t forFourPixels(ptrdiff_t n, ptrdiff_t apart, Each each) {
+    ptrdiff_t x = 0;
+    for (; x + 4 <= n; x += 4)
+#pragma GCC unroll 4
+        for (int g = 0; g < channels; ++g)
+            each(
+                x * channels + 4 * g, [=](auto place, int i) __attribute__((always_inline)) {
+                    return place(x + (4 * g + i) / channels) + (4 * g + i) % channels * apart;
+                });
+    return x;
+}
+
+/// Elements from `first` on. Where rows end, the last one stands in for those that are not there: their lanes hold no
+/// junk.
 template <class Place>
-QORI_INLINE void turnElementsIn(const LineRows& rows, ptrdiff_t elements, float scale, Place place) {
+QORI_INLINE void turnElementsIn(const LineRows& rows, ptrdiff_t first, ptrdiff_t elements, float scale, Place place) {
     const Vec<float> factor = splat(scale);
-    ptrdiff_t e = 0;
-    const line::EightRows eight(rows);
-    if (rows.count >= kRows)
-        for (; e + 4 <= elements; e += 4) {
-            Vec<float> v[4];
-            line::loadTurned(eight, e, v);
-            for (int i = 0; i < 4; ++i) store(place(e + i), v[i] * factor);
-        }
-    for (; e < elements; e += kRows) {
+    for (ptrdiff_t e = first; e < elements; e += kRows) {
         Vec<float> v[kRows];
         for (int y = 0; y < kRows; ++y)
             v[y] = loadUpTo(rows.row(y < rows.count ? y : rows.count - 1) + e, elements - e) * factor;
@@ -60,22 +88,30 @@ QORI_INLINE void turnElementsIn(const LineRows& rows, ptrdiff_t elements, float 
     }
 }
 
+template <int channels, class Place>
+QORI_INLINE void turnPixelsIn(const LineRows& rows, ptrdiff_t n, float scale, ptrdiff_t apart, Place place) {
+    const Vec<float> factor = splat(scale);
+    const line::EightRows eight(rows);
+    ptrdiff_t done = 0;
+    if (rows.count >= kRows)
+        done = forFourPixels<channels>(
+            n, apart, [=](ptrdiff_t e, auto placeOf) __attribute__((always_inline)) {
+                Vec<float> v[4];
+                line::loadTurned(eight, e, v);
+#pragma GCC unroll 4
+                for (int i = 0; i < 4; ++i) store(placeOf(place, i), v[i] * factor);
+            });
+    turnElementsIn(rows, done * channels, n * channels, scale, ofChannels(channels, apart, done, place));
+}
+
 /// Of 4 channels the first three.
 QORI_INLINE __m256i withoutFourth(__m256i lanes) {
     return _mm256_and_si256(lanes, _mm256_setr_epi32(-1, -1, -1, 0, -1, -1, -1, 0));
 }
 
 template <class Place>
-QORI_INLINE void turnElementsOut(const LineRows& rows, ptrdiff_t elements, Place place) {
-    ptrdiff_t e = 0;
-    const line::EightRows eight(rows);
-    if (line::isPlain(rows))
-        for (; e + 4 <= elements; e += 4) {
-            Vec<float> v[4];
-            for (int i = 0; i < 4; ++i) v[i] = load(place(e + i));
-            line::storeTurned(eight, e, v);
-        }
-    for (; e < elements; e += kRows) {
+QORI_INLINE void turnElementsOut(const LineRows& rows, ptrdiff_t first, ptrdiff_t elements, Place place) {
+    for (ptrdiff_t e = first; e < elements; e += kRows) {
         Vec<float> v[kRows];
         for (int i = 0; i < kRows; ++i) v[i] = e + i < elements ? load(place(e + i)) : zero<float>();
         turn(v);
@@ -86,17 +122,38 @@ QORI_INLINE void turnElementsOut(const LineRows& rows, ptrdiff_t elements, Place
     }
 }
 
+template <int channels, class Place>
+QORI_INLINE void turnPixelsOut(const LineRows& rows, ptrdiff_t n, ptrdiff_t apart, Place place) {
+    const line::EightRows eight(rows);
+    ptrdiff_t done = 0;
+    if (line::isPlain(rows))
+        done = forFourPixels<channels>(
+            n, apart, [=](ptrdiff_t e, auto placeOf) __attribute__((always_inline)) {
+                Vec<float> v[4];
+#pragma GCC unroll 4
+                for (int i = 0; i < 4; ++i) v[i] = load(placeOf(place, i));
+                line::storeTurned(eight, e, v);
+            });
+    turnElementsOut(rows, done * channels, n * channels, ofChannels(channels, apart, done, place));
+}
+
 /// Of n elements of each channel; of a channel's lines there are `floats`.
 template <class Place>
 QORI_INLINE void turnRowsIn(const LineRows& rows, ptrdiff_t n, float scale, ptrdiff_t floats, Place place) {
-    if (rows.channels == 1) return turnElementsIn(rows, n, scale, place);
-    turnElementsIn(rows, n * rows.channels, scale, ofChannels(rows.channels, floats, place));
+    switch (rows.channels) {
+        case 3: return turnPixelsIn<3>(rows, n, scale, floats, place);
+        case 4: return turnPixelsIn<4>(rows, n, scale, floats, place);
+        default: return turnPixelsIn<1>(rows, n, scale, floats, place);
+    }
 }
 
 template <class Place>
 QORI_INLINE void turnRowsOut(const LineRows& rows, ptrdiff_t n, ptrdiff_t floats, Place place) {
-    if (rows.channels == 1) return turnElementsOut(rows, n, place);
-    turnElementsOut(rows, n * rows.channels, ofChannels(rows.channels, floats, place));
+    switch (rows.channels) {
+        case 3: return turnPixelsOut<3>(rows, n, floats, place);
+        case 4: return turnPixelsOut<4>(rows, n, floats, place);
+        default: return turnPixelsOut<1>(rows, n, floats, place);
+    }
 }
 
 /// The eight rows of each part of a pair; the second may have none, and repeats the first's last then.
@@ -200,7 +257,7 @@ void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, c
     if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(true));
 }
 
-void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines) {
+void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines) {
     const RowPair pair(rows);
     const auto to = [=](bool isMirrored) {
         return [=](ptrdiff_t e) {
@@ -209,7 +266,9 @@ void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines
         };
     };
     turnRowsIn(pair.first, n, scale, n * kLineFloats, to(false));
-    turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
+    if (!areAlone) return turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
+    for (int c = 0; c < rows.processed; ++c)
+        for (ptrdiff_t e = 0; e < n; ++e) store(to(true)(e) + c * n * kLineFloats, zero<float>());
 }
 
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
@@ -219,6 +278,40 @@ void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, cons
     };
     turnRowsOut(pair.first, n, n * kLineFloats, from(kLineColumns));
     if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(0));
+}
+
+void rowsToWideLines(const LineRows& rows, ptrdiff_t n, float* lines) {
+    turnRowsIn(rows, n, 1, n * kLineFloats, [=](ptrdiff_t e) {
+        auto* const at = reinterpret_cast<double*>(lines + e * kLineFloats);
+        return WidePlace<double>{at, at + 4};
+    });
+}
+
+void wideLinesToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
+    turnRowsOut(rows, n, n * kLineFloats, [=](ptrdiff_t e) {
+        const auto* const at = reinterpret_cast<const double*>(lines + ptrdiff_t{positions[e]} * kLineFloats);
+        return WidePlace<const double>{at + 4, at};
+    });
+}
+
+void spectraToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {
+    const auto at = [=](ptrdiff_t k) { return lines + ptrdiff_t{positions[k]} * kLineFloats; };
+    if (n % 2 == 0)
+        return turnRowsOut(rows, n, n * kLineFloats, [=](ptrdiff_t e) { return at(e / 2) + e % 2 * kLineColumns; });
+    turnRowsOut(rows, n, n * kLineFloats, [=](ptrdiff_t e) {
+        const PackedPlace place(e, n, false);
+        return at(place.line) + place.part * kLineColumns;
+    });
+}
+
+void rowsToSpectra(const LineRows& rows, ptrdiff_t n, float* lines) {
+    if (n % 2 == 0)
+        return turnRowsIn(rows, n, 1, n * kLineFloats,
+                          [=](ptrdiff_t e) { return lines + e / 2 * kLineFloats + e % 2 * kLineColumns; });
+    turnRowsIn(rows, n, 1, n * kLineFloats, [=](ptrdiff_t e) {
+        const PackedPlace place(e, n, false);
+        return lines + ptrdiff_t{place.line} * kLineFloats + place.part * kLineColumns;
+    });
 }
 
 void columnsToLines(const LineColumns& columns, float scale, Parts parts, float* lines) {

@@ -39,10 +39,22 @@ void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roo
 void rowsToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines);
 /// The spectra of splitPairs, n odd: frequency 0, then the parts of 1, 2, ...
 void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
-/// The other way round, for joinPairs.
-void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, float* lines);
+/// The other way round, for joinPairs; the second spectra are 0 where rows are alone.
+void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines);
 /// Element e is line positions[e], parts exchanged: of the first eight rows its second part.
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+
+// Of up to 8 rows of n elements in doubles (short_rows.h): n lines for each channel.
+
+/// Element e becomes line e: of the first four rows its real part, of the others the imaginary one.
+void rowsToWideLines(const LineRows& rows, ptrdiff_t n, float* lines);
+/// Element e is line positions[e], parts exchanged.
+void wideLinesToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+/// Spectra as floats: frequency k, eight real parts and eight imaginary ones, is where line positions[k] begins; of an
+/// even n the last is the imaginary part of the first.
+void spectraToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
+/// Frequency k to line k.
+void rowsToSpectra(const LineRows& rows, ptrdiff_t n, float* lines);
 
 /// Complex columns, one in each of the lanes `begin` to `end`. Of one channel the parts of lane l are elements
 /// element + 2 l and the next. Of several the channels of one complex column have lanes one behind the other, lane 0
@@ -60,14 +72,15 @@ void columnsToLines(const LineColumns& columns, float scale, Parts parts, float*
 /// Row y is line positions[y].
 void linesToColumns(const float* lines, const int32_t* positions, Parts parts, const LineColumns& columns);
 
-/// Columns to lines, their transform, lines to columns: in one go where whole blocks of one channel allow it.
+/// Columns to lines, their transform, lines to columns: in one go where blocks and the length allow it.
 void transformColumns(const FourierTable* table, const LineColumns& from, const LineColumns& to, float scale,
                       Parts parts, float* lines, float* work);
 
 /// The transform of eight complex columns of the layout between rows and columns into the packed one, whose rows begin
-/// an element earlier: `carry` has an element a row that comes behind these, and gets those that come before. False,
-/// and nothing done, where blocks are not whole or the length is not made for it.
-bool transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
+/// a pixel earlier: `carry` has a pixel a row that comes behind these, and gets those that come before. Blocks are
+/// whole, of one channel or of four, and the length is made for it.
+bool areColumnsShiftable(const FourierTable* table, const LineColumns& columns);
+void transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
                              float* lines);
 
 // Single columns are those of one channel; its lane takes the place of lane 0 where `lines` begins with it.
