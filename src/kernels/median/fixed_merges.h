@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Merges as straight code, for those of square masks from 7 x 7 to 15 x 15, and what goes with them.
+// Merges as straight code, for those of square masks from 7 x 7 on, and what goes with them.
 #pragma once
 #include <array>
 #include <utility>
@@ -95,13 +95,18 @@ QORI_INLINE void sortSteps(std::integer_sequence<int, i...>, V* v) {
     (order(v[kFixedSort<n>.list[i].low / kPlacesPerVector], v[kFixedSort<n>.list[i].high / kPlacesPerVector]), ...);
 }
 
+template <int... i, class V>
+QORI_INLINE void copyAll(std::integer_sequence<int, i...>, const V* from, V* to) {
+    ((to[i] = from[i]), ...);
+}
+
 /// Runs as long as those of square masks: up to eight elements.
 template <int n, class V>
 QORI_INLINE void sortStraight(V* a) {
     V v[n];
-    for (int i = 0; i < n; ++i) v[i] = {a[i].v};
+    copyAll(Count<n>{}, a, v);
     sortSteps<n>(Count<kFixedSort<n>.count>{}, v);
-    for (int i = 0; i < n; ++i) a[i].v = v[i].v;
+    copyAll(Count<n>{}, v, a);
 }
 
 template <int taken, int least, int... k, class V>
@@ -127,6 +132,6 @@ constexpr auto fixedMergesOf(std::integer_sequence<int, number...>) {
     return std::array<FixedMerge<V>, sizeof...(number)>{mergeOutOfLine<number, V>...};
 }
 template <class V>
-inline constexpr auto kFixedMerges = fixedMergesOf<V>(Count<kFixedShapes.count>{});
+inline constexpr auto kFixedMerges = fixedMergesOf<V>(Count<kFixedCount<V>>{});
 
 }  // namespace qori::kernels::tiles
