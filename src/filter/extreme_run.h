@@ -83,6 +83,10 @@ public:
         return isKept_ ? rows_.row((y - task_.cover.box.y) % rows_.ring.rows) : inImage(y);
     }
 
+    /// A row that the destination has not come to. The image has it still, and unlike its copy no stores on their way
+    /// to memory, which loads across two of them would wait for.
+    const T* rowAhead(int32_t y) const { return task_.toKeys == nullptr ? inImage(y) : row(y); }
+
 private:
     const T* inImage(int32_t y) const { return task_.src.row(y) + ptrdiff_t{task_.cover.box.x} * task_.channels; }
     void copy(int32_t y) {
@@ -262,7 +266,7 @@ public:
             source_.enter(y, [this](int32_t row) { raise(row); });
             for (int64_t k = 0; k < task_.cover.taps; ++k) {
                 const Tap tap = taps_[k];
-                rows_[k] = rowOf(tap.level, y + tap.y) + task_.elements(tap.x - task_.cover.box.x);
+                rows_[k] = rowOf(tap, y) + task_.elements(tap.x - task_.cover.box.x);
             }
             task_.joins->joinInto(rows_, static_cast<int>(task_.cover.taps), task_.dst.row(y),
                                   task_.elements(task_.roi.width), task_.finish);
@@ -275,16 +279,20 @@ private:
     int64_t widthOf(int32_t level) const {
         return int64_t{task_.roi.width} + task_.cover.box.width - (int64_t{1} << level);
     }
-    const T* rowOf(int32_t level, int32_t y) const {
-        if (level == 0) return source_.row(y);
+    T* levelRow(int32_t level, int32_t y) const {
         return level_[level].row((y - task_.cover.box.y) % level_[level].ring.rows);
+    }
+    /// A tap's row, for destination row y.
+    const T* rowOf(Tap tap, int32_t y) const {
+        if (tap.level > 0) return levelRow(tap.level, y + tap.y);
+        return tap.y > 0 ? source_.rowAhead(y + tap.y) : source_.row(y + tap.y);
     }
     /// Makes the levels of a source row.
     void raise(int32_t y) {
         for (int32_t level = 1; level <= task_.cover.levels; ++level) {
-            const T* const lower = rowOf(level - 1, y);
+            const T* const lower = level > 1 ? levelRow(level - 1, y) : source_.rowAhead(y);
             const T* const both[] = {lower, lower + task_.elements(int64_t{1} << (level - 1))};
-            task_.joins->join(both, 2, const_cast<T*>(rowOf(level, y)), task_.elements(widthOf(level)));
+            task_.joins->join(both, 2, levelRow(level, y), task_.elements(widthOf(level)));
         }
     }
 
