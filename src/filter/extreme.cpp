@@ -64,11 +64,6 @@ QorResult runIn(const ExtremeTask<T>& task, WorkFrom from) {
     return QOR_OK;
 }
 
-template <class Order, bool keyed, class T>
-QorResult runCover(const ExtremeTask<T>& task, WorkFrom from) {
-    return task.cover.rects > 0 ? runIn<RectRun<Order, keyed>>(task, from) : runIn<TapRun<Order, keyed>>(task, from);
-}
-
 /// Whether a window is all of 3 x 3 pixels, with or without zeros around them in its mask.
 bool isSquare(const Window& window, const QorImageRect& box) {
     if (box.width != 3 || box.height != 3) return false;
@@ -99,34 +94,59 @@ QorResult squareOf(Image<const S> src, Image<S> dst, QorImageSize roi, Layout la
     }
 }
 
-template <class T, bool largest>
-using OrderOf = std::conditional_t<largest, kernels::Maximum<T>, kernels::Minimum<T>>;
+template <class T>
+QorResult runCover(const ExtremeTask<T>& task, WorkFrom from) {
+    return task.cover.rects > 0 ? runIn<RectRun<T>>(task, from) : runIn<TapRun<T>>(task, from);
+}
+
+template <class S>
+const auto& joinsOf(bool largest) {
+    if constexpr (std::is_same_v<S, uint8_t>)
+        return kernels::kByteJoins[largest];
+    else if constexpr (std::is_same_v<S, uint16_t>)
+        return kernels::kWordJoins[largest];
+    else if constexpr (std::is_same_v<S, int16_t>)
+        return kernels::kSignedWordJoins[largest];
+    else
+        return kernels::kKeyJoins[largest];
+}
+
+template <class T>
+struct ElementOf;
+template <class T>
+struct ElementOf<kernels::Joins<T>> {
+    using Type = T;
+};
 
 }  // namespace
 
 template <class S, bool largest>
 QorResult extremeOf(Image<const S> src, Image<S> dst, QorImageSize roi, Layout layout, const Window& window,
                     WorkFrom memory) {
-    constexpr bool isFloat = std::is_floating_point_v<S>;
-    using T = std::conditional_t<isFloat, kernels::FloatKey, S>;
-    using Order = OrderOf<T, largest>;
-    const ExtremeTask<T> task{{reinterpret_cast<const T*>(src.data), src.step},
-                              {reinterpret_cast<T*>(dst.data), dst.step},
-                              roi,
-                              channels(layout),
-                              layout == Layout::AC4,
-                              src.data == dst.data && src.step == dst.step,
-                              window,
-                              coverOf(window)};
+    const auto& joins = joinsOf<S>(largest);
+    using T = typename ElementOf<std::remove_cvref_t<decltype(joins)>>::Type;
+    ExtremeTask<T> task{{reinterpret_cast<const T*>(src.data), src.step},
+                        {reinterpret_cast<T*>(dst.data), dst.step},
+                        roi,
+                        channels(layout),
+                        src.data == dst.data && src.step == dst.step,
+                        window,
+                        coverOf(window),
+                        &joins,
+                        {layout == Layout::AC4, false},
+                        nullptr};
     const QorImageRect& box = task.cover.box;
     const bool isCentred = box.x == -1 && box.y == -1;
     if (isSquare(window, box) && (isCentred || !task.isInPlace))
         if (squareOf<largest>(src, dst, roi, layout, box, task.isInPlace) == QOR_OK) return QOR_OK;
     // Without memory for it in place, the square is a rectangle like others.
     // One pixel is what it is, payloads of NaNs included.
-    if constexpr (isFloat)
-        if (!task.cover.isOnePixel()) return runCover<Order, true>(task, memory);
-    return runCover<Order, false>(task, memory);
+    if constexpr (std::is_floating_point_v<S>)
+        if (!task.cover.isOnePixel()) {
+            task.finish.decodes = true;
+            task.toKeys = kernels::toKeys<largest>;
+        }
+    return runCover(task, memory);
 }
 
 #define QORI_EXTREMES(S)                                                                                             \

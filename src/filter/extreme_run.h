@@ -24,10 +24,12 @@ struct ExtremeTask {
     Image<T> dst;
     QorImageSize roi;
     int32_t channels;
-    bool keepAlpha;
     bool isInPlace;
     Window window;
     WindowCover cover;
+    const kernels::Joins<T>* joins;
+    kernels::Finish finish;
+    void (*toKeys)(const T* bits, T* keys, ptrdiff_t elements);  ///< Of floats that are joined; else null.
 
     ptrdiff_t elements(int64_t pixels) const { return static_cast<ptrdiff_t>(pixels * channels); }
     /// The task of some of its columns.
@@ -56,13 +58,11 @@ struct ElementRows {
 
 /// Source rows as joins want them, from the box's first column on. For a group of destination rows from y on, those of
 /// y + lowest to y + group - 1 + highest are there.
-template <class Order, bool keyed>
+template <class T>
 class SourceRows {
 public:
-    using T = typename Order::Element;
-
     SourceRows(const ExtremeTask<T>& task, int32_t lowest, int32_t group, bool isKept, WorkBuffer& work)
-        : task_(task), entered_(task.cover.box.y), isKept_(isKept || keyed) {
+        : task_(task), entered_(task.cover.box.y), isKept_(isKept || task.toKeys != nullptr) {
         const int32_t highest = task.cover.lastRow();
         ahead_ = task.isInPlace && highest < 0 ? 0 : highest;
         elements_ = task.elements(int64_t{task.roi.width} + task.cover.box.width - 1);
@@ -83,15 +83,18 @@ public:
         return isKept_ ? rows_.row((y - task_.cover.box.y) % rows_.ring.rows) : inImage(y);
     }
 
+    /// A row that the destination has not come to. The image has it still, and unlike its copy no stores on their way
+    /// to memory, which loads across two of them would wait for.
+    const T* rowAhead(int32_t y) const { return task_.toKeys == nullptr ? inImage(y) : row(y); }
+
 private:
     const T* inImage(int32_t y) const { return task_.src.row(y) + ptrdiff_t{task_.cover.box.x} * task_.channels; }
     void copy(int32_t y) {
         const T* const from = inImage(y);
         T* const to = rows_.row((y - task_.cover.box.y) % rows_.ring.rows);
-        if constexpr (keyed)
-            kernels::join<Order, kernels::IntoKeys<Order>>(&from, 1, to, elements_);
-        else
-            kernels::copyRow(asBytes(to), asBytes(from), elements_ * elementBytes<T>);
+        if constexpr (std::is_same_v<T, kernels::FloatKey>)
+            if (task_.toKeys != nullptr) return task_.toKeys(from, to, elements_);
+        kernels::copyRow(asBytes(to), asBytes(from), elements_ * elementBytes<T>);
     }
 
     const ExtremeTask<T>& task_;
@@ -101,28 +104,15 @@ private:
     bool isKept_;
 };
 
-/// Joins into a row of the destination.
-template <class Order, bool keyed, class T>
-void joinInto(const ExtremeTask<T>& task, int32_t y, const T* const* taps, int count) {
-    using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
-    const ptrdiff_t elements = task.elements(task.roi.width);
-    if (task.keepAlpha)
-        kernels::join<Order, Finish, true>(taps, count, task.dst.row(y), elements);
-    else
-        kernels::join<Order, Finish>(taps, count, task.dst.row(y), elements);
-}
-
 // --- rectangles -----------------------------------------------------------------------------------------------------
 
 /// Destination rows made at a time: what joins hold in registers from row to row is loaded and stored once for all.
 inline constexpr int32_t kGroup = kernels::kMostEntering;
 
 /// The extremes of a rectangle, some rows at a time.
-template <class Order>
+template <class T>
 class RunningRect {
 public:
-    using T = typename Order::Element;
-
     void take(const QorImageRect& rect, ptrdiff_t elements, WorkBuffer& work) {
         rect_ = rect;
         elements_ = elements;
@@ -136,8 +126,8 @@ public:
     int32_t together(int32_t rows) const { return std::min(rows, rect_.height - phase_); }
 
     /// Rows enter, each the join of its taps, and are joined with what is elsewhere.
-    template <class Finish, bool keepAlpha>
-    void enter(int32_t rows, const T* const* taps, int tapsEach, const T* const* elsewhere, T* const* to) {
+    void enter(const kernels::Joins<T>& joins, int32_t rows, const T* const* taps, int tapsEach,
+               const T* const* elsewhere, T* const* to, kernels::Finish finish) {
         kernels::EnteringRow<T> row[kGroup];
         for (int32_t k = 0; k < rows; ++k) {
             T* const entering = block_.row(phase_ + k);
@@ -145,18 +135,17 @@ public:
                       elsewhere == nullptr ? nullptr : elsewhere[k], to[k]};
         }
         const T* const before = phase_ == 0 ? nullptr : soFar_.row(0);
-        kernels::enterBlock<Order, Finish, keepAlpha>(
-            kernels::EnteringRows<T>{taps, tapsEach, row, rows, before, soFar_.row(0), elements_});
+        joins.enter({taps, tapsEach, row, rows, before, soFar_.row(0), elements_, finish});
         phase_ += rows;
-        if (phase_ == rect_.height) endBlock();
+        if (phase_ == rect_.height) endBlock(joins);
     }
 
 private:
-    void endBlock() {
+    void endBlock(const kernels::Joins<T>& joins) {
         phase_ = 0;
         if (rect_.height <= 2) return;
         const auto step = static_cast<ptrdiff_t>(block_.ring.rowBytes) / elementBytes<T>;
-        kernels::joinBlockUpwards<Order>(block_.row(rect_.height - 1), step, rect_.height - 1, elements_);
+        joins.joinUpwards(block_.row(rect_.height - 1), step, rect_.height - 1, elements_);
     }
 
     QorImageRect rect_{};
@@ -165,11 +154,9 @@ private:
     int32_t phase_ = 0;
 };
 
-template <class Order, bool keyed>
+template <class T>
 class RectRun {
 public:
-    using T = typename Order::Element;
-
     RectRun(const ExtremeTask<T>& task, WorkBuffer& work)
         : task_(task), source_(task, lowestRow(task.cover), kGroup, isKept(task), work) {
         const ptrdiff_t elements = task.elements(task.roi.width);
@@ -221,13 +208,7 @@ private:
         }
         const int count = widen(k, y, rows, taps);
         const T* const* const others = k > 0 ? elsewhere : nullptr;
-        using Finish = std::conditional_t<keyed, kernels::FromKeys<Order>, kernels::AsIs>;
-        if (!isLast)
-            running_[k].template enter<kernels::AsIs, false>(rows, taps, count, others, to);
-        else if (task_.keepAlpha)
-            running_[k].template enter<Finish, true>(rows, taps, count, others, to);
-        else
-            running_[k].template enter<Finish, false>(rows, taps, count, others, to);
+        running_[k].enter(*task_.joins, rows, taps, count, others, to, isLast ? task_.finish : kernels::Finish{});
         return rows;
     }
 
@@ -248,8 +229,8 @@ private:
             if (next == rect.width) return count;
             for (int32_t i = 0; i < rows; ++i) {
                 T* const out = wider_[pass % 2].row(i);
-                kernels::join<Order>(taps + i * count, count, out,
-                                     task_.elements(int64_t{task_.roi.width} + rect.width - next));
+                task_.joins->join(taps + i * count, count, out,
+                                  task_.elements(int64_t{task_.roi.width} + rect.width - next));
                 row[i] = out;
             }
             has = next;
@@ -257,8 +238,8 @@ private:
     }
 
     const ExtremeTask<T>& task_;
-    SourceRows<Order, keyed> source_;
-    RunningRect<Order> running_[WindowCover::kMostRects];
+    SourceRows<T> source_;
+    RunningRect<T> running_[WindowCover::kMostRects];
     Widening widening_[WindowCover::kMostRects]{};
     ElementRows<T> wider_[2];
     ElementRows<T> joined_;
@@ -266,11 +247,9 @@ private:
 
 // --- taps -----------------------------------------------------------------------------------------------------------
 
-template <class Order, bool keyed>
+template <class T>
 class TapRun {
 public:
-    using T = typename Order::Element;
-
     TapRun(const ExtremeTask<T>& task, WorkBuffer& work)
         : task_(task), source_(task, task.cover.box.y, 1, task.isInPlace, work) {
         taps_ = work.take<Tap>(task.cover.taps);
@@ -287,9 +266,10 @@ public:
             source_.enter(y, [this](int32_t row) { raise(row); });
             for (int64_t k = 0; k < task_.cover.taps; ++k) {
                 const Tap tap = taps_[k];
-                rows_[k] = rowOf(tap.level, y + tap.y) + task_.elements(tap.x - task_.cover.box.x);
+                rows_[k] = rowOf(tap, y) + task_.elements(tap.x - task_.cover.box.x);
             }
-            joinInto<Order, keyed>(task_, y, rows_, static_cast<int>(task_.cover.taps));
+            task_.joins->joinInto(rows_, static_cast<int>(task_.cover.taps), task_.dst.row(y),
+                                  task_.elements(task_.roi.width), task_.finish);
         }
     }
 
@@ -299,21 +279,25 @@ private:
     int64_t widthOf(int32_t level) const {
         return int64_t{task_.roi.width} + task_.cover.box.width - (int64_t{1} << level);
     }
-    const T* rowOf(int32_t level, int32_t y) const {
-        if (level == 0) return source_.row(y);
+    T* levelRow(int32_t level, int32_t y) const {
         return level_[level].row((y - task_.cover.box.y) % level_[level].ring.rows);
+    }
+    /// A tap's row, for destination row y.
+    const T* rowOf(Tap tap, int32_t y) const {
+        if (tap.level > 0) return levelRow(tap.level, y + tap.y);
+        return tap.y > 0 ? source_.rowAhead(y + tap.y) : source_.row(y + tap.y);
     }
     /// Makes the levels of a source row.
     void raise(int32_t y) {
         for (int32_t level = 1; level <= task_.cover.levels; ++level) {
-            const T* const lower = rowOf(level - 1, y);
+            const T* const lower = level > 1 ? levelRow(level - 1, y) : source_.rowAhead(y);
             const T* const both[] = {lower, lower + task_.elements(int64_t{1} << (level - 1))};
-            kernels::join<Order>(both, 2, const_cast<T*>(rowOf(level, y)), task_.elements(widthOf(level)));
+            task_.joins->join(both, 2, levelRow(level, y), task_.elements(widthOf(level)));
         }
     }
 
     const ExtremeTask<T>& task_;
-    SourceRows<Order, keyed> source_;
+    SourceRows<T> source_;
     ElementRows<T> level_[kMostLevels];
     Tap* taps_;
     const T** rows_;

@@ -8,10 +8,12 @@
 namespace qori::filter {
 
 /// How many times as long as tiles histograms take for as many pixels, measured at 16 x 16 to 64 x 64: for squares with
-/// code of their own and for other masks, up to 9 x 9 and above.
+/// code of their own and for other masks, by their area.
 template <class T>
-constexpr int histogramsTake(bool hasCode, bool isSmall) {
+constexpr double histogramsTake(bool hasCode, int32_t area) {
+    const bool isSmall = area <= 9 * 9, isLarge = area > 15 * 15;
     if (!hasCode) return isSmall ? 4 : 2;
+    if (isLarge) return sizeof(T) == 2 ? 1.5 : 1.25;
     return isSmall ? 6 : sizeof(T) == 2 ? 3 : 2;
 }
 
@@ -24,12 +26,12 @@ bool tilesPay(QorImageSize size, QorImageSize mask) {
     if (std::max(mask.width, mask.height) > tiles::kMostMask) return false;
     const int32_t area = mask.width * mask.height;
     const bool hasCode =
-        mask.width == mask.height && mask.width >= tiles::kLeastFixed && mask.width <= tiles::kMostFixed;
-    if (area > (sizeof(T) == 2 || hasCode ? 15 * 15 : 11 * 11)) return false;
+        mask.width == mask.height && mask.width >= tiles::kLeastFixed && mask.width <= tiles::mostFixed(Vec<T>::lanes);
+    if (!hasCode && area > (sizeof(T) == 2 ? 15 * 15 : 11 * 11)) return false;
     const int64_t width = int64_t{tiles::sideOf(mask.width)} * Vec<T>::lanes, height = tiles::sideOf(mask.height);
     const int64_t made = roundUp(size.width, width) * roundUp(size.height, height);
-    const int64_t others = int64_t{size.width} * size.height * histogramsTake<T>(hasCode, area <= 81);
-    return others >= made + (hasCode ? 500 : 2000);
+    const double others = static_cast<double>(int64_t{size.width} * size.height) * histogramsTake<T>(hasCode, area);
+    return others >= static_cast<double>(made + (hasCode ? 500 : 2000));
 }
 
 template <class T>

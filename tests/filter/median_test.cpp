@@ -374,7 +374,7 @@ void expectMajorities(Function function, QorImageSize mask, T zero, T one) {
 }
 
 TEST(Median, MajoritiesInTiles) {
-    for (int side = 7; side <= 17; side += 2)
+    for (int side = 7; side <= 23; side += 2)
         for (int i = 0; i < 9; ++i) {
             expectMajorities<uint8_t>(qoriFilterMedian_8u_C1R, {side, side}, 3, 255);
             expectMajorities<uint16_t>(qoriFilterMedian_16u_C1R, {side, side}, 0x7FFF, 0x8000);

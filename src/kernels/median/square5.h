@@ -132,4 +132,19 @@ QORI_NOINLINE void medianSquare5(const T* const* src, T* const* dst, int rows, p
     }
 }
 
+#define QORI_SQUARES5(how, T) \
+    how template void medianSquare5<false>(const T* const*, T* const*, int, ptrdiff_t, ptrdiff_t);
+#define QORI_SQUARES5_WITH_ALPHA(how, T) \
+    how template void medianSquare5<true>(const T* const*, T* const*, int, ptrdiff_t, ptrdiff_t);
+#define QORI_ALL_SQUARES5(how)              \
+    QORI_SQUARES5(how, uint8_t)             \
+    QORI_SQUARES5(how, uint16_t)            \
+    QORI_SQUARES5(how, int16_t)             \
+    QORI_SQUARES5(how, float)               \
+    QORI_SQUARES5(how, double)              \
+    QORI_SQUARES5_WITH_ALPHA(how, uint8_t)  \
+    QORI_SQUARES5_WITH_ALPHA(how, uint16_t) \
+    QORI_SQUARES5_WITH_ALPHA(how, int16_t)
+QORI_ALL_SQUARES5(extern)
+
 }  // namespace qori::kernels

@@ -73,16 +73,20 @@ struct MergeShape {
     constexpr bool operator==(const MergeShape&) const = default;
 };
 
-inline constexpr int32_t kLongestFixed = 144, kLeastFixed = 7, kMostFixed = 15;
+inline constexpr int32_t kLongestFixed = 264, kLeastFixed = 7;
+
+/// Square masks from kLeastFixed to these have code of their own, by lanes of a vector: others are faster by
+/// histograms.
+constexpr int32_t mostFixed(int lanes) { return lanes == 32 ? 15 : lanes == 16 ? 21 : 19; }
 
 /// How the tiles of square masks are halved.
 template <int side>
 inline constexpr Halvings kHalvings{QorImageSize{side, side}};
 
-/// The merges of square masks of kLeastFixed to kMostFixed, all of which have code of their own.
+/// The merges of square masks that have code of their own, from small masks to large ones.
 struct FixedShapes {
-    std::array<MergeShape, 80> shape{};
-    int count = 0;
+    std::array<MergeShape, 140> shape{};
+    int count = 0, countUpTo[mostFixed(16) + 1]{};
 
     constexpr void add(MergeShape s) {
         for (int i = 0; i < count; ++i)
@@ -90,7 +94,7 @@ struct FixedShapes {
         shape[static_cast<size_t>(count++)] = s;
     }
     constexpr FixedShapes() {
-        for (int32_t side = kLeastFixed; side <= kMostFixed; side += 2) {
+        for (int32_t side = kLeastFixed; side <= mostFixed(16); side += 2) {
             const Halvings halvings(QorImageSize{side, side});
             for (int i = 0; i < halvings.levels; ++i) {
                 const Halving& h = halvings.level[static_cast<size_t>(i)];
@@ -99,14 +103,19 @@ struct FixedShapes {
                 add({h.coreCount, h.addedCount(), h.begin, h.end});
                 if (h.others > 0) add({h.otherLength, h.half, 0, h.otherLength + h.half});
             }
+            countUpTo[side] = count;
         }
     }
 };
 inline constexpr FixedShapes kFixedShapes;
 
-/// Its number among them, or -1.
-constexpr int numberOfFixed(const MergeShape& shape) {
-    for (int i = 0; i < kFixedShapes.count; ++i)
+/// How many of them elements of a vector have.
+template <class V>
+inline constexpr int kFixedCount = kFixedShapes.countUpTo[mostFixed(V::lanes)];
+
+/// Its number among so many of them, or -1.
+constexpr int numberOfFixed(const MergeShape& shape, int count = kFixedShapes.count) {
+    for (int i = 0; i < count; ++i)
         if (kFixedShapes.shape[static_cast<size_t>(i)] == shape) return i;
     return -1;
 }

@@ -40,11 +40,11 @@ Comparators sortOf(Memory& memory, int32_t n) {
     return sort;
 }
 
-template <class Memory>
+template <class V, class Memory>
 Merge mergeOf(Memory& memory, int32_t first, int32_t second, int32_t begin, int32_t end) {
     Merge merge;
     merge.first = first, merge.second = second, merge.begin = begin, merge.end = end;
-    merge.fixed = numberOfFixed({first, second, begin, end});
+    merge.fixed = numberOfFixed({first, second, begin, end}, kFixedCount<V>);
     if (merge.fixed >= 0) return merge;
     merge.rest.list = memory.template take<Comparator>(comparators::mostToMerge(first, second));
     comparators::pairRuns(merge);
@@ -64,7 +64,7 @@ public:
             Round& round = round_[rounds_];
             round.runs = runs, round.length = length, round.last = last;
             const bool evens = runs % 2 == 0;
-            const auto make = [&](int32_t second) { return mergeOf(memory, length, second, 0, length + second); };
+            const auto make = [&](int32_t second) { return mergeOf<V>(memory, length, second, 0, length + second); };
             if (runs > 2 || last == length) round.whole = make(length);
             if (evens && last != length) round.tail = make(last);
             last += evens ? length : 0;
@@ -148,8 +148,8 @@ private:
         static_cast<tiles::Halving&>(level) = halving;
         for (auto& tree : level.added) tree = tiles::MergeTree<V>(memory, level.half, level.length);
         if (level.isLast) return;
-        level.core = tiles::mergeOf(memory, level.coreCount, level.addedCount(), level.begin, level.end);
-        level.corners = tiles::mergeOf(memory, level.otherLength, level.half, 0, level.otherLength + level.half);
+        level.core = tiles::mergeOf<V>(memory, level.coreCount, level.addedCount(), level.begin, level.end);
+        level.corners = tiles::mergeOf<V>(memory, level.otherLength, level.half, 0, level.otherLength + level.half);
         level.cornerSort = tiles::sortOf(memory, level.half);
         for (int k = 0; k < 2; ++k) {
             level.cores[k] = memory.template take<V>(level.core.length());
@@ -162,6 +162,8 @@ private:
 
     /// The medians of a tile at that pixel, given its core and the extra runs of columns and of rows.
     void halve(const Level* level, const V* core, Extras columns, Extras rows, QorPoint2D at);
+    template <int side>
+    bool halveSquareOf(const V* core, Extras columns, Extras rows);
     template <int side, int index>
     QORI_NOINLINE void halveSquare(const V* core, Extras columns, Extras rows, QorPoint2D at);
     template <int side, int index>

@@ -67,6 +67,8 @@ QORI_NOINLINE void mergeTwo(const Merge& merge, const Operands<V>& a, const Oper
     compare<2>(merge.rest, a.to, b.to);
 }
 
+inline constexpr int32_t kMostStraight = 14;
+
 /// A run of so many elements, of which the list is.
 template <class V>
 QORI_NOINLINE void sortOne(const Comparators& sort, int32_t length, V* a) {
@@ -75,12 +77,15 @@ QORI_NOINLINE void sortOne(const Comparators& sort, int32_t length, V* a) {
         case 4: return sortStraight<4>(a);
         case 6: return sortStraight<6>(a);
         case 8: return sortStraight<8>(a);
+        case 10: return sortStraight<10>(a);
+        case 12: return sortStraight<12>(a);
+        case 14: return sortStraight<14>(a);
         default: return compare<1>(sort, a, a);
     }
 }
 template <class V>
 QORI_NOINLINE void sortTwo(const Comparators& sort, int32_t length, V* a, V* b) {
-    if (length > 8 || length % 2 != 0) return compare<2>(sort, a, b);
+    if (length > kMostStraight || length % 2 != 0) return compare<2>(sort, a, b);
     sortOne(sort, length, a);
     sortOne(sort, length, b);
 }
@@ -154,14 +159,8 @@ void MedianTiles<K>::run(const K* const* rows, const ptrdiff_t* columns, V* medi
     const V* const core = core_.run(columns_ + left * columnLength_) + coreBegin_;
     const Extras columnsBeside{columns_, columns_ + mask_.width * columnLength_, columnLength_};
     const Extras rowsBeside{rows_, rows_ + top * rowLength_, rowLength_};
-    switch (mask_.width == mask_.height ? mask_.width : 0) {
-        case 7: return halveSquare<7, 0>(core, columnsBeside, rowsBeside, {0, 0});
-        case 9: return halveSquare<9, 0>(core, columnsBeside, rowsBeside, {0, 0});
-        case 11: return halveSquare<11, 0>(core, columnsBeside, rowsBeside, {0, 0});
-        case 13: return halveSquare<13, 0>(core, columnsBeside, rowsBeside, {0, 0});
-        case 15: return halveSquare<15, 0>(core, columnsBeside, rowsBeside, {0, 0});
-        default: return halve(levels_, core, columnsBeside, rowsBeside, {0, 0});
-    }
+    if (mask_.width != mask_.height || !halveSquareOf<tiles::kLeastFixed>(core, columnsBeside, rowsBeside))
+        halve(levels_, core, columnsBeside, rowsBeside, {0, 0});
 }
 
 template <class K>
@@ -209,6 +208,18 @@ void MedianTiles<K>::lengthen(const Level* level, const Extras& other, QorPoint2
 }
 
 // --- square masks: the same, of constants ---------------------------------------------------------------------------
+
+/// False where the mask's side is neither that nor a larger one of those that have code.
+template <class K>
+template <int side>
+bool MedianTiles<K>::halveSquareOf(const V* core, Extras columns, Extras rows) {
+    if (mask_.width == side) {
+        halveSquare<side, 0>(core, columns, rows, {0, 0});
+        return true;
+    }
+    if constexpr (side + 2 <= tiles::mostFixed(V::lanes)) return halveSquareOf<side + 2>(core, columns, rows);
+    return false;
+}
 
 template <class K>
 template <int side, int index>
