@@ -260,8 +260,8 @@ struct ByRule {
     }
 };
 
-/// Calls run(operation) with the row operation for the scale; false where all results are 0. The operations' types do not
-/// depend on Run: lambdas made here would, and each layout that runs them would compile their loops again.
+/// Calls run(operation) with the row operation for the scale; false where all results are 0. The operations' types do
+/// not depend on Run: lambdas made here would, and each layout that runs them would compile their loops again.
 template <class Op, class T, class Run>
 bool withScaledOperation(int32_t scale, Run run) {
     using C = Component<T>;
