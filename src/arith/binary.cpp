@@ -38,8 +38,7 @@ QorResult multiply(Image<const T> src1, Image<const T> src2, Image<T> dst, QorIm
 template <class T, Layout layout>
 QorResult multiplyFractions(Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi) {
     if (QorResult r = firstOf(nullCheck(src1, src2, dst), stepCheck(src1, src2, dst), sizeCheck(roi))) return r;
-    const auto product = [](auto a, auto b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
-    runBinary<layout>(kernels::Binary<T, decltype(product)>{product}, src1, src2, dst, roi);
+    runBinary<layout>(kernels::Binary<T, kernels::FractionProduct>{}, src1, src2, dst, roi);
     return QOR_OK;
 }
 

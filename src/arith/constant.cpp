@@ -159,8 +159,7 @@ QorResult divideConstant(Image<const T> src, const T* value, Image<T> dst, QorIm
 template <class T, Layout layout>
 QorResult multiplyConstantFraction(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi) {
     if (QorResult r = check<false>(src, value, dst, roi)) return r;
-    const auto product = [](auto a, auto b) __attribute__((always_inline)) { return kernels::fractionProduct(a, b); };
-    runConstant<layout>(kernels::Binary<T, decltype(product)>{product}, value, src, dst, roi);
+    runConstant<layout>(kernels::Binary<T, kernels::FractionProduct>{}, value, src, dst, roi);
     return QOR_OK;
 }
 

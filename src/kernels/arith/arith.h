@@ -241,34 +241,46 @@ struct Exact {
     }
 };
 
-/// Calls run(operation) with the row operation for the scale; false where all results are 0.
+template <class Op>
+struct Halved {
+    template <class V>
+    QORI_INLINE V operator()(V a, V b) const {
+        return Op::halved(a, b);
+    }
+};
+
+template <class Op, class Rule>
+struct ByRule {
+    Rule rule;
+
+    template <class T>
+    QORI_INLINE Vec<T> operator()(Vec<T> a, Vec<T> b) const {
+        const auto wide = Op::wide(a, b);
+        return elements<T>(narrow<Component<T>>(rule(wide.low), rule(wide.high)));
+    }
+};
+
+/// Calls run(operation) with the row operation for the scale; false where all results are 0. The operations' types do
+/// not depend on Run: lambdas made here would, and each layout that runs them would compile their loops again.
 template <class Op, class T, class Run>
 bool withScaledOperation(int32_t scale, Run run) {
     using C = Component<T>;
-    const auto binary = [&](auto function) { run(Binary<T, decltype(function)>{function}); };
+    const auto binary = [&]<class Function>(Function function) { run(Binary<T, Function>{function}); };
     if constexpr (isFloat<T>) {
         binary(Exact<Op>{});
         return true;
     } else {
         if constexpr (requires(Vec<T> a) { Op::halved(a, a); }) {
             if (scale == 1) {
-                binary([](Vec<T> a, Vec<T> b) __attribute__((always_inline)) { return Op::halved(a, b); });
+                binary(Halved<Op>{});
                 return true;
             }
         }
-        return withScaleRule<C, typename Op::W, Op::limit>(scale, [&](auto rule) {
-            constexpr bool unscaled = std::is_same_v<decltype(rule), Saturate<C, typename Op::W>>;
-            const auto byRule = [rule](Vec<T> a, Vec<T> b) __attribute__((always_inline)) {
-                const auto wide = Op::wide(a, b);
-                return elements<T>(narrow<C>(rule(wide.low), rule(wide.high)));
-            };
-            // What does not depend on the rule is compiled whatever the rule is.
-            if constexpr (!Op::hasExact)
-                binary(byRule);
-            else if constexpr (unscaled)
+        return withScaleRule<C, typename Op::W, Op::limit>(scale, [&]<class Rule>(Rule rule) {
+            if constexpr (Op::hasExact && std::is_same_v<Rule, Saturate<C, typename Op::W>>)
                 binary(Exact<Op>{});
             else
-                binary(byRule);
+                binary(ByRule<Op, Rule>{rule});
         });
     }
 }
@@ -289,6 +301,13 @@ QORI_INLINE Vec<T> fractionProduct(Vec<T> a, Vec<T> b) {
     };
     return narrow<T>(divide(product.low), divide(product.high));
 }
+
+struct FractionProduct {
+    template <class V>
+    QORI_INLINE V operator()(V a, V b) const {
+        return fractionProduct(a, b);
+    }
+};
 
 /// One value, for results known beforehand.
 template <class T>

@@ -49,13 +49,15 @@ struct Finish {
 
 namespace detail {
 
-/// Calls body(first) to body(last) with constants: sums must not live in arrays that are walked.
+/// Calls body(first) to body(last) with constants: sums must not live in arrays that are walked. In one expression: were
+/// it by recursion, the compiler would take the last body through as many functions as there are bodies.
+template <int first, class Body, int... i>
+QORI_INLINE void forEachOf(const Body& body, std::integer_sequence<int, i...>) {
+    (body(std::integral_constant<int, first + i>{}), ...);
+}
 template <int first, int last, class Body>
 QORI_INLINE void forEach(const Body& body) {
-    if constexpr (first <= last) {
-        body(std::integral_constant<int, first>{});
-        forEach<first + 1, last>(body);
-    }
+    if constexpr (first <= last) forEachOf<first>(body, std::make_integer_sequence<int, last - first + 1>{});
 }
 #define QORI_LAMBDA __attribute__((always_inline))
 
