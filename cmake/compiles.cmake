@@ -1,11 +1,12 @@
 # qori_compiles(name FOLDERS folders... OPTIONS options... SOURCES sources...): each source compiles. The objects are of no
-# use, so the compiler is clang where it is installed, which reads the vector intrinsics in a third of gcc's time; and only
-# once, as a module that its own installation describes. Sources that do not include them still do not see them.
+# use, so the compiler is clang where it is installed, which reads the vector intrinsics in a third of gcc's time; and
+# only once, as a module that its own installation describes. Sources that do not include them still do not see them.
 find_program(QORI_CLANG NAMES clang++-14 clang++)
 set(qori_compiles_launcher ${CMAKE_CXX_COMPILER_LAUNCHER})
 if(QORI_CLANG AND QORI_CCACHE)
     # It keeps results with modules only where it trusts the compiler's list of what was read.
-    set(qori_compiles_launcher ${CMAKE_COMMAND} -E env CCACHE_DEPEND=1 CCACHE_SLOPPINESS=time_macros,modules ${QORI_CCACHE})
+    set(qori_compiles_launcher ${CMAKE_COMMAND} -E env CCACHE_DEPEND=1
+        CCACHE_SLOPPINESS=time_macros,modules ${QORI_CCACHE})
 endif()
 function(qori_compiles name)
     cmake_parse_arguments(PARSE_ARGV 1 that "" "" "FOLDERS;OPTIONS;SOURCES")

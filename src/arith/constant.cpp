@@ -69,7 +69,7 @@ template <class Op, Layout layout, class T>
 QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale) {
     return underControlOf<kernels::Component<T>>([&] {
         const auto run = [&](auto operation) { runConstant<layout>(operation, value, src, dst, roi); };
-        if (!kernels::withScaledOperation<Op, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
+        if (!kernels::withScaledOperation<Op, T, true>(scale, run)) fillConstant<layout>(dst, roi, T{});
         return QOR_OK;
     });
 }

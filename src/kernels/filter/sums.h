@@ -49,8 +49,8 @@ struct Finish {
 
 namespace detail {
 
-/// Calls body(first) to body(last) with constants: sums must not live in arrays that are walked. In one expression: were
-/// it by recursion, the compiler would take the last body through as many functions as there are bodies.
+/// Calls body(first) to body(last) with constants: sums must not live in arrays that are walked. In one expression:
+/// by recursion the compiler would take the last body through as many functions as there are bodies.
 template <int first, class Body, int... i>
 QORI_INLINE void forEachOf(const Body& body, std::integer_sequence<int, i...>) {
     (body(std::integral_constant<int, first + i>{}), ...);
