@@ -28,7 +28,7 @@ struct ExtremeTask {
     Window window;
     WindowCover cover;
     const kernels::Joins<T>* joins;
-    kernels::Finish finish;
+    kernels::JoinFinish finish;
     void (*toKeys)(const T* bits, T* keys, ptrdiff_t elements);  ///< Of floats that are joined; else null.
 
     ptrdiff_t elements(int64_t pixels) const { return static_cast<ptrdiff_t>(pixels * channels); }
@@ -127,7 +127,7 @@ public:
 
     /// Rows enter, each the join of its taps, and are joined with what is elsewhere.
     void enter(const kernels::Joins<T>& joins, int32_t rows, const T* const* taps, int tapsEach,
-               const T* const* elsewhere, T* const* to, kernels::Finish finish) {
+               const T* const* elsewhere, T* const* to, kernels::JoinFinish finish) {
         kernels::EnteringRow<T> row[kGroup];
         for (int32_t k = 0; k < rows; ++k) {
             T* const entering = block_.row(phase_ + k);
@@ -208,7 +208,7 @@ private:
         }
         const int count = widen(k, y, rows, taps);
         const T* const* const others = k > 0 ? elsewhere : nullptr;
-        running_[k].enter(*task_.joins, rows, taps, count, others, to, isLast ? task_.finish : kernels::Finish{});
+        running_[k].enter(*task_.joins, rows, taps, count, others, to, isLast ? task_.finish : kernels::JoinFinish{});
         return rows;
     }
 

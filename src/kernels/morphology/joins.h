@@ -15,7 +15,7 @@ namespace qori::kernels {
 using FloatKey = uint32_t;
 
 /// What becomes of joined elements on their way into a destination.
-struct Finish {
+struct JoinFinish {
     bool keepsAlpha;  ///< Every fourth element stays what it is in the destination.
     bool decodes;     ///< Keys become floats' bits again, a quiet NaN where there was no number.
 
@@ -42,7 +42,7 @@ struct EnteringRows {
     const T* before;  ///< The join of the block's rows above, or null where these are its first.
     T* soFar;         ///< Becomes that join with these rows; may be `before`.
     ptrdiff_t elements;
-    Finish finish;
+    JoinFinish finish;
 };
 
 /// The joins of an order. Elements are told apart by their bits: 16-bit ones of both kinds are uint16_t here.
@@ -51,7 +51,7 @@ struct Joins {
     /// to[i] = the extreme of row[0][i] ... row[count - 1][i]. `to` may be one of the rows.
     void (*join)(const T* const* row, int count, T* to, ptrdiff_t elements);
     /// The same, finished; `to` is none of the rows.
-    void (*joinInto)(const T* const* row, int count, T* to, ptrdiff_t elements, Finish finish);
+    void (*joinInto)(const T* const* row, int count, T* to, ptrdiff_t elements, JoinFinish finish);
     void (*enter)(const EnteringRows<T>& rows);
     /// Each row becomes its join with all rows below it. Rows are `step` elements apart and padded to whole vectors.
     void (*joinUpwards)(T* last, ptrdiff_t step, int32_t rows, ptrdiff_t elements);

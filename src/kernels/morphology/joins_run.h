@@ -53,7 +53,7 @@ QORI_INLINE Vec<FloatKey> bitsOf(Vec<FloatKey> keys) {
 }
 
 template <class Order, int vectors, class T>
-QORI_INLINE void finish(Vec<T>* a, const Finish& how, const T* there) {
+QORI_INLINE void finish(Vec<T>* a, const JoinFinish& how, const T* there) {
     if constexpr (std::is_same_v<T, FloatKey>)
         if (how.decodes)
             for (int v = 0; v < vectors; ++v) a[v] = bitsOf<Order::isLargest>(a[v]);
@@ -83,7 +83,7 @@ QORI_INLINE void joinVectors(Taps<T, fixed> taps, ptrdiff_t at, Vec<T>* out) {
 }
 
 template <class Order, bool finishes, int vectors, class T, int fixed>
-QORI_INLINE void joinBlock(Taps<T, fixed> taps, ptrdiff_t at, T* to, const Finish& how) {
+QORI_INLINE void joinBlock(Taps<T, fixed> taps, ptrdiff_t at, T* to, const JoinFinish& how) {
     Vec<T> out[vectors];
     joinVectors<Order, vectors>(taps, at, out);
     if constexpr (finishes) finish<Order, vectors>(out, how, static_cast<const T*>(to) + at);
@@ -92,7 +92,7 @@ QORI_INLINE void joinBlock(Taps<T, fixed> taps, ptrdiff_t at, T* to, const Finis
 
 /// Rows of less than a vector.
 template <class Order, class T>
-QORI_NOINLINE void joinNarrow(const T* const* row, int count, T* to, ptrdiff_t elements, const Finish& how) {
+QORI_NOINLINE void joinNarrow(const T* const* row, int count, T* to, ptrdiff_t elements, const JoinFinish& how) {
     Vec<T> out = loadPartial(row[0], elements);
     for (int k = 1; k < count; ++k) out = Order::join(out, loadPartial(row[k], elements));
     if constexpr (std::is_same_v<T, FloatKey>)
@@ -101,12 +101,12 @@ QORI_NOINLINE void joinNarrow(const T* const* row, int count, T* to, ptrdiff_t e
     storePartial(to, out, elements);
 }
 
-inline constexpr Finish kNoFinish{false, false};
+inline constexpr JoinFinish kNoFinish{false, false};
 
 /// The last vector ends with the row and overlaps the one before: where `to` is one of the rows, it joins what is
 /// joined already, which only rows that are not finished allow.
 template <class Order, bool finishes, int fixed, class T>
-QORI_NOINLINE void joinRows(const T* const* row, int count, T* to, ptrdiff_t elements, const Finish& how) {
+QORI_NOINLINE void joinRows(const T* const* row, int count, T* to, ptrdiff_t elements, const JoinFinish& how) {
     constexpr ptrdiff_t n = Vec<T>::lanes;
     constexpr int vectors = 4;
     const Taps<T, fixed> taps{row, count};
@@ -129,7 +129,7 @@ void join(const T* const* row, int count, T* to, ptrdiff_t elements) {
 }
 
 template <class Order, class T = typename Order::Element>
-void joinInto(const T* const* row, int count, T* to, ptrdiff_t elements, Finish how) {
+void joinInto(const T* const* row, int count, T* to, ptrdiff_t elements, JoinFinish how) {
     if (how.isNone()) return join<Order>(row, count, to, elements);
     if constexpr (std::is_same_v<T, FloatKey>) {  // which always are finished
         switch (count) {
