@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "copy_rows.h"
 
-#include "line_ends.h"
+#include "streamed_lines.h"
 
 namespace qori::kernels {
 namespace {
@@ -114,7 +114,7 @@ QORI_INLINE void fillShort(uint8_t* dst, const Pattern& pattern, ptrdiff_t phase
 void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned(dst, src, bytes); }
 
 void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
-    const auto [head, lines] = LineEnds::ofBytes(dst, bytes);
+    const auto [head, lines] = StreamedLines::ofBytes(dst, bytes);
     if (lines == 0) return copyAligned(dst, src, bytes);
     copyShort(dst, src, head);
     const ptrdiff_t end = head + lines;
@@ -180,7 +180,7 @@ void fillRow(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
 }
 
 void fillRowStreaming(uint8_t* dst, const Pattern& pattern, ptrdiff_t bytes) {
-    const auto [head, lines] = LineEnds::ofBytes(dst, bytes);
+    const auto [head, lines] = StreamedLines::ofBytes(dst, bytes);
     if (lines == 0) return fillRow(dst, pattern, bytes);
     fillShort(dst, pattern, 0, head);
     const Bytes cycle[3] = {patternAt(pattern, head), patternAt(pattern, head + kVector),

@@ -9,8 +9,8 @@
 #include <algorithm>
 #include <array>
 
-#include "line_ends.h"
 #include "simd.h"
+#include "streamed_lines.h"
 
 namespace qori::kernels {
 
@@ -111,7 +111,7 @@ QORI_NOINLINE ptrdiff_t streamSpans(const Kernel& kernel, std::array<uint8_t*, o
     constexpr int span = Kernel::span, group = 2 * span;
     static_assert(kCacheLine % group == 0);
     constexpr ptrdiff_t narrowest = std::ranges::min(Kernel::out, {}, &Run::pixelBytes).pixelBytes;
-    constexpr ptrdiff_t fewest = std::max(kCacheLine, LineEnds::fewestBytes / narrowest);
+    constexpr ptrdiff_t fewest = std::max(kCacheLine, StreamedLines::fewestBytes / narrowest);
     const int head = pixels < fewest ? -1 : pixelsToLines<Kernel>(out);
     if (head < 0 || pixels - head < fewest) return 0;
     const auto advance = [&](ptrdiff_t by) {

@@ -21,8 +21,8 @@
 
 #include "copy_rows.h"
 #include "image/driver.h"
-#include "line_ends.h"
 #include "simd.h"
+#include "streamed_lines.h"
 
 namespace qori::kernels {
 
@@ -158,7 +158,7 @@ namespace detail {
 /// times as long where it does not.
 template <class Op, class D, class... S>
 void streamRow(void* operation, ptrdiff_t elements, D* dst, const S*... src) {
-    const auto [head, lines] = LineEnds::ofGroups(dst, elements);
+    const auto [head, lines] = StreamedLines::ofGroups(dst, elements);
     if (head > 0 || lines == 0) mapRow<false, Op>(operation, lines == 0 ? elements : head, false, dst, src...);
     if (lines == 0) return;
     elements -= head;

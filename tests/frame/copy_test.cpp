@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "frame/mask.h"
 #include "harness/sweep.h"
-#include "kernels/line_ends.h"
+#include "kernels/streamed_lines.h"
 #include "reference/move.h"
 
 namespace qori::test {
@@ -225,12 +225,14 @@ void expectWholeLines(ptrdiff_t size, ptrdiff_t step, ptrdiff_t mostAround, Ends
 }
 
 TEST(Copy, WholeCacheLinesStream) {
-    using kernels::LineEnds;
-    expectWholeLines(1, 1, 64, [](uint8_t* dst, ptrdiff_t n) { return LineEnds::ofBytes(dst, n); });
+    using kernels::StreamedLines;
+    expectWholeLines(1, 1, 64, [](uint8_t* dst, ptrdiff_t n) { return StreamedLines::ofBytes(dst, n); });
     const auto inGroups = [](auto element) {
         using T = decltype(element);
         constexpr ptrdiff_t size = sizeof(T);
-        const auto ends = [](uint8_t* dst, ptrdiff_t n) { return LineEnds::ofGroups(reinterpret_cast<T*>(dst), n); };
+        const auto ends = [](uint8_t* dst, ptrdiff_t n) {
+            return StreamedLines::ofGroups(reinterpret_cast<T*>(dst), n);
+        };
         expectWholeLines(size, 32, 96 + 64, [=](uint8_t* dst, ptrdiff_t n) {
             EXPECT_EQ(0, ends(dst, n).head % 12) << "constants of channels";
             EXPECT_EQ(0, ends(dst + size, n).lines);
