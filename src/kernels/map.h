@@ -168,7 +168,7 @@ void streamRow(void* operation, ptrdiff_t elements, D* dst, const S*... src) {
     std::conditional_t<runsFromCopy<Op>, Op, Op&> op = *static_cast<Op*>(operation);
     ptrdiff_t i = mapTriples<false, true, n>(op, lines, dst, src...);
     int phase = 0;
-    for (; i <= elements - n; i += n, phase = (phase + 1) % 3) {
+    for (; i <= elements - n; i += n, phase = phase == 2 ? 0 : phase + 1) {
         const auto result = op(phase, loadPack<S, n>(src + i)...);
         if (i + n <= lines)
             storePack<false, true>(dst + i, result);
@@ -224,9 +224,12 @@ QORI_NOINLINE void mapRows(RowFunction<D, S...> makeRow, void* op, QorImageSize 
     if (int64_t{roi.width} * channels < blockOf<D, S...> && roi.height >= fewest) [[unlikely]] {
         if (mapGathered<keepAlpha>(makeRow, op, channels, roi, dst, src...)) return;
     }
-    forEachRow(
-        roi, [&](ptrdiff_t pixels, D* d, const S*... s) { makeRow(op, pixels * channels, streaming, d, s...); },
-        walk(dst, channels), walk(src, channels)...);
+    constexpr ptrdiff_t fewestToStream = StreamedLines::fewestBytes / elementBytes<D>;
+    const auto makeOne = [=](ptrdiff_t pixels, D* d, const S*... s) {
+        const ptrdiff_t elements = pixels * channels;
+        makeRow(op, elements, streaming && elements >= fewestToStream, d, s...);
+    };
+    forEachRow(roi, makeOne, walk(dst, channels), walk(src, channels)...);
     if (streaming) streamFence();
 }
 
