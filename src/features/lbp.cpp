@@ -123,9 +123,13 @@ void makeStrips(const BorderedImage& image, Image<D> dst, int32_t most, MakeStri
     }
 }
 
-/// A kernel makes a row from the rows of keys around it.
-template <class T, int reach, class D, class MakeRow>
-void makeFromKeys(const BorderedImage& image, Image<D> dst, MakeRow makeRow) {
+/// A kernel that makes a row from the rows of keys around it.
+template <class T, class D>
+using RowMaker = void (*)(const kernels::PatternKey<T>* const* rows, D* row, ptrdiff_t width,
+                          const kernels::PatternRowAhead<T>& ahead);
+
+template <class T, int reach, class D>
+void makeFromKeys(const BorderedImage& image, Image<D> dst, RowMaker<T, D> makeRow) {
     makeStrips(image, dst, kStripBytes / elementBytes<T>, [&](const BorderedImage& strip, Image<D> to) {
         KeyRows<T, reach> keys(strip);
         for (int32_t y = 0; y < strip.size.height; ++y) {
@@ -166,10 +170,7 @@ QorResult lbpOfMode(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t 
                         InPlace(strip).make(part, streaming);
                     });
             }
-            makeFromKeys<T, reach>(image, to,
-                                   [](const kernels::PatternKey<T>* const* rows, D* row, ptrdiff_t width, auto ahead) {
-                                       kernels::patternRow<D, reach, mode, streaming>(rows, row, width, ahead);
-                                   });
+            makeFromKeys<T, reach, D>(image, to, kernels::patternRow<D, reach, mode, streaming, T>);
         };
     });
 }
@@ -189,12 +190,14 @@ QorResult lbpImageHorizCorr(Image<const T> src, Image<uint8_t> dst, QorImageSize
     using Key = kernels::PatternKey<T>;
     return lbp(src, dst, roi, borderType, value, []<bool streaming>() {
         return [](const BorderedImage& image, Image<uint8_t> to) {
-            makeFromKeys<T, 1>(image, to, [](const Key* const* rows, uint8_t* row, ptrdiff_t width, auto ahead) {
-                constexpr ptrdiff_t kAhead = 16;
-                alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
-                kernels::patternColumnSums(rows, sums + kAhead, width);
-                kernels::correctedPatternRow<streaming>(rows, sums + kAhead, row, width, ahead);
-            });
+            makeFromKeys<T, 1, uint8_t>(
+                image, to,
+                [](const Key* const* rows, uint8_t* row, ptrdiff_t width, const kernels::PatternRowAhead<T>& ahead) {
+                    constexpr ptrdiff_t kAhead = 16;
+                    alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
+                    kernels::patternColumnSums(rows, sums + kAhead, width);
+                    kernels::correctedPatternRow<streaming>(rows, sums + kAhead, row, width, ahead);
+                });
         };
     });
 }

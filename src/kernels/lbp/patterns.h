@@ -243,9 +243,10 @@ QORI_INLINE void forEachBlock(ptrdiff_t width, const Ahead& ahead, MakeBlock mak
 }  // namespace lbp
 
 /// One row of codes. rows: at the first pixel, from `reach` above to `reach` below. Streaming: dst is 32-byte aligned.
-template <class D, int reach, int mode, bool streaming, class Key, class Ahead>
-void patternRow(const Key* const* rowsAround, D* dst, ptrdiff_t width, Ahead ahead) {
-    const lbp::RowsAround<Key, reach> rows(rowsAround);
+template <class D, int reach, int mode, bool streaming, class T>
+void patternRow(const PatternKey<T>* const* rowsAround, D* dst, ptrdiff_t width, const PatternRowAhead<T>& rowAhead) {
+    const lbp::RowsAround<PatternKey<T>, reach> rows(rowsAround);
+    const PatternRowAhead<T> ahead = rowAhead;  // which stores might change
     lbp::forEachBlock(
         width, ahead, [&](ptrdiff_t x, ptrdiff_t n) __attribute__((always_inline)) {
             lbp::patternBlock<D, reach, mode, streaming>(rows, dst + x, x, n);
