@@ -24,6 +24,7 @@ function(qori_compiles name)
         add_custom_command(OUTPUT ${object} DEPENDS ${source} DEPFILE ${object}.d VERBATIM COMMAND_EXPAND_LISTS
             COMMAND ${qori_compiles_launcher} ${compiler} -std=c++20 -O0 -mavx2 -mfma ${warnings} ${that_OPTIONS}
                 ${that_FOLDERS} -MD -MF ${object}.d -o ${object} -c ${source}
+            COMMAND ${CMAKE_COMMAND} -E touch ${object}
             COMMENT "Compiling ${name}: ${stem}")
     endforeach()
     file(MAKE_DIRECTORY ${CMAKE_CURRENT_BINARY_DIR}/${name})
