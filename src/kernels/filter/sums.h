@@ -67,18 +67,33 @@ constexpr bool takesVectors = requires(const Load& load, const typename Taps::So
     load.vector(p, 0);
 };
 
+/// One vector of a tap, to the sums of `rows` rows.
+template <class Taps, int first, int last, int rows, int wide, class Vector, class Scalar>
+QORI_INLINE void addVector(typename Taps::Partial (&sums)[rows][wide], int i, Vector v, const Scalar (&k)[rows]) {
+    loadOnce(v.v);
+    if constexpr (first <= 0) Taps::add(sums[0][i / 2].v[i % 2], v, k[0]);
+    if constexpr (first <= 1 && last >= 1) Taps::add(sums[1][i / 2].v[i % 2], v, k[1]);
+    if constexpr (first <= 2 && last >= 2) Taps::add(sums[2][i / 2].v[i % 2], v, k[2]);
+    if constexpr (first <= 3 && last >= 3) Taps::add(sums[3][i / 2].v[i % 2], v, k[3]);
+}
+
 /// One tap: the coefficients of all rows, then one vector after the other. Sums, coefficients and a vector are as many
 /// as the registers; a vector that is kept waiting would be loaded again for every row.
 template <class Taps, int first, int last, int rows, int wide, class Load>
 QORI_INLINE void addVectors(typename Taps::Partial (&sums)[rows][wide], const typename Taps::Source* p,
                             const typename Taps::Coefficient* c, ptrdiff_t row, const Load& load) {
-    decltype(Taps::broadcast(c)) k[last - first + 1];
-    forEach<first, last>([&](auto r) QORI_LAMBDA { k[r - first] = Taps::broadcast(c - (r - first) * row); });
-    forEach<0, 2 * wide - 1>([&](auto i) QORI_LAMBDA {
-        auto v = load.vector(p, i);
-        loadOnce(v.v);
-        forEach<first, last>([&](auto r) QORI_LAMBDA { Taps::add(sums[r][i / 2].v[i % 2], v, k[r - first]); });
-    });
+    static_assert(rows <= 4 && wide <= 2);
+    decltype(Taps::broadcast(c)) k[rows];
+    if constexpr (first <= 0) k[0] = Taps::broadcast(c - (0 - first) * row);
+    if constexpr (first <= 1 && last >= 1) k[1] = Taps::broadcast(c - (1 - first) * row);
+    if constexpr (first <= 2 && last >= 2) k[2] = Taps::broadcast(c - (2 - first) * row);
+    if constexpr (first <= 3 && last >= 3) k[3] = Taps::broadcast(c - (3 - first) * row);
+    addVector<Taps, first, last>(sums, 0, load.vector(p, 0), k);
+    addVector<Taps, first, last>(sums, 1, load.vector(p, 1), k);
+    if constexpr (wide == 2) {
+        addVector<Taps, first, last>(sums, 2, load.vector(p, 2), k);
+        addVector<Taps, first, last>(sums, 3, load.vector(p, 3), k);
+    }
 }
 
 /// Adds one source row to the sums of the outputs `first` to `last` of a band; c is the row of the kernel that the
@@ -106,7 +121,8 @@ QORI_INLINE void addSourceRow(const PackedKernel<Taps>& kernel, typename Taps::P
         c += Taps::repeats;
     };
     if constexpr (count > 0) {
-        forEach<0, count - 1>([&](auto t) QORI_LAMBDA { addTap(t == count - 1); });
+#pragma GCC unroll 8
+        for (int t = 0; t < count; ++t) addTap(t == count - 1);
         // Source rows that share coefficients would else share them through the stack.
         __asm__ volatile("" : : : "memory");
     } else {
