@@ -245,70 +245,78 @@ QorResult normRelL2(Image<const T> src1, Image<const T> src2, QorImageSize roi, 
 
 /// Doubles added from left to right. As long as no partial sum can pass 2^53 all of them are exact, and integers in any
 /// order give the same.
-template <class T, int n>
+template <class T, bool single>
 class OrderedDotProduct {
 public:
     Totals totals{};
+
+    explicit OrderedDotProduct(int channels) : n_(channels) {}
 
     void addRow(ptrdiff_t pixels, const T* a, const T* b) {
         while (pixels > 0) {
             if (room_ < kPiece) settle();
             const auto now = static_cast<ptrdiff_t>(std::min<int64_t>(pixels, std::max(room_, kPiece)));
             if (room_ < kPiece) {
-                kernels::sequentialDotRow<n>(totals.of, now, a, b);
+                kernels::sequentialDotRow(totals.of, n_, now, a, b);
             } else {
-                kernels::reduceRow<Measure>(sums_, n, now * n, a, b);
+                kernels::reduceRow<Measure>(sums_, n_, now * n_, a, b);
                 room_ -= now;
                 pending_ = true;
             }
-            a += now * n;
-            b += now * n;
+            a += now * n_;
+            b += now * n_;
             pixels -= now;
         }
     }
     /// Moves what the integers hold into the totals, and looks how many pixels there is room for.
     void settle() {
         if (pending_) {
-            const Totals moved = finish(sums_, {n, n});
-            for (int c = 0; c < n; ++c) totals.of[c] += moved.of[c];
+            const Totals moved = finish(sums_, {n_, n_});
+            for (int c = 0; c < n_; ++c) totals.of[c] += moved.of[c];
             sums_ = {};
             pending_ = false;
         }
         double largest = 0;
-        for (int c = 0; c < n; ++c) largest = std::max(largest, __builtin_fabs(totals.of[c]));
+        for (int c = 0; c < n_; ++c) largest = std::max(largest, __builtin_fabs(totals.of[c]));
         room_ = static_cast<int64_t>(std::max(0x1p53 - largest, 0.0) / kLargestProduct);
     }
 
 private:
-    using Measure = typename decltype(chooseMeasure<Quantity::products, T, n == 1>())::type;
+    using Measure = typename decltype(chooseMeasure<Quantity::products, T, single>())::type;
     static constexpr double kLargestValue = std::is_signed_v<T> ? 1 << (8 * sizeof(T) - 1) : (1 << 8 * sizeof(T)) - 1;
     static constexpr double kLargestProduct = kLargestValue * kLargestValue;
     static constexpr int64_t kPiece = 4'096;
 
+    int n_;
     kernels::AccumulatorsOf<Measure> sums_;
     bool pending_ = false;
     int64_t room_ = static_cast<int64_t>(0x1p53 / kLargestProduct);  ///< Pixels that the integers may still take.
 };
 
-template <class T, Layout layout>
-Totals dotProductTotals(QorImageSize roi, int32_t hint, Image<const T> src1, Image<const T> src2) {
-    constexpr int n = channels(layout);
-    if constexpr (std::is_same_v<T, float>) {
-        return totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
-    } else if constexpr (sizeof(T) == 4) {
+template <class T, bool single>
+QORI_NOINLINE Totals orderedTotals(QorImageSize roi, int n, Image<const T> src1, Image<const T> src2) {
+    if constexpr (sizeof(T) == 4) {
         Totals totals{};
         kernels::forEachRowToReduce(
             roi, n,
-            [&](ptrdiff_t pixels, const T* a, const T* b) { kernels::sequentialDotRow<n>(totals.of, pixels, a, b); },
+            [&](ptrdiff_t pixels, const T* a, const T* b) { kernels::sequentialDotRow(totals.of, n, pixels, a, b); },
             src1, src2);
         return totals;
     } else {
-        OrderedDotProduct<T, n> sum;
+        OrderedDotProduct<T, single> sum(n);
         kernels::forEachRowToReduce(
             roi, n, [&](ptrdiff_t pixels, const T* a, const T* b) { sum.addRow(pixels, a, b); }, src1, src2);
         sum.settle();
         return sum.totals;
     }
+}
+
+template <class T, Layout layout>
+Totals dotProductTotals(QorImageSize roi, int32_t hint, Image<const T> src1, Image<const T> src2) {
+    if constexpr (std::is_same_v<T, float>)
+        return totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
+    else
+        return orderedTotals<T, layout == Layout::C1 && sizeof(T) < 4>(roi, channels(layout), src1, src2);
 }
 
 template <class T, Layout layout>

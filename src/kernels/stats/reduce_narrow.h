@@ -55,19 +55,38 @@ QORI_NOINLINE inline void packRows(uint8_t* out, const uint8_t* src, ptrdiff_t s
     }
 }
 
+/// What is done with rows brought together, one of each image; pieces are long enough for a call that is not direct.
+using RowsTogether = void (*)(void* context, ptrdiff_t pixels, const uint8_t* const* rows);
+
 /// Out of line, so that the buffers are on the stack only where they are used.
-template <class Row, class T, size_t... image>
-QORI_NOINLINE void forEachRowsTogether(QorImageSize roi, int pixelBytes, Row& row, const Image<const T>* images,
-                                       std::index_sequence<image...>) {
-    alignas(kVectorBytes) uint8_t together[sizeof...(image)][kTogether];
+template <size_t images>
+QORI_NOINLINE void forEachRowsTogether(QorImageSize roi, int pixelBytes, RowsTogether use, void* context,
+                                       const Image<const uint8_t> (&image)[images]) {
+    alignas(kVectorBytes) uint8_t together[images][kTogether];
+    const uint8_t* rowsOf[images];
+    for (size_t i = 0; i < images; ++i) rowsOf[i] = together[i];
     const ptrdiff_t bytes = ptrdiff_t{roi.width} * pixelBytes;
     const auto most = static_cast<int32_t>(kTogether / bytes);
     for (int32_t y = 0; y < roi.height;) {
         const int32_t rows = std::min(most, roi.height - y);
-        (packRows(together[image], asBytes(images[image].row(y)), images[image].step, rows, bytes), ...);
-        row(ptrdiff_t{rows} * roi.width, reinterpret_cast<const T*>(together[image])...);
+        for (size_t i = 0; i < images; ++i) packRows(together[i], image[i].row(y), image[i].step, rows, bytes);
+        use(context, ptrdiff_t{rows} * roi.width, rowsOf);
         y += rows;
     }
+}
+
+template <class T>
+Image<const uint8_t> bytesOf(Image<const T> image) {
+    return {asBytes(image.data), image.step};
+}
+
+template <class Row, class T, size_t... i>
+QORI_INLINE void reduceRowsTogether(QorImageSize roi, int pixelBytes, Row& row,
+                                    const Image<const uint8_t> (&images)[sizeof...(i)], std::index_sequence<i...>) {
+    const auto use = [](void* context, ptrdiff_t pixels, const uint8_t* const* rows) {
+        (*static_cast<Row*>(context))(pixels, reinterpret_cast<const T*>(rows[i])...);
+    };
+    forEachRowsTogether(roi, pixelBytes, use, &row, images);
 }
 
 }  // namespace detail
@@ -78,9 +97,9 @@ QORI_INLINE void forEachRowToReduce(QorImageSize roi, int channels, Row row, Ima
     const int pixelBytes = channels * static_cast<int>(sizeof(T));
     if (roi.height >= detail::kFewRows && int64_t{roi.width} * pixelBytes <= detail::kNarrow &&
         !isOneRun(roi, walk(first, channels), walk(more, channels)...)) {
-        const Image<const T> images[] = {first, more...};
-        return detail::forEachRowsTogether(roi, pixelBytes, row, images,
-                                           std::make_index_sequence<1 + sizeof...(More)>());
+        const Image<const uint8_t> images[] = {detail::bytesOf(first), detail::bytesOf(more)...};
+        return detail::reduceRowsTogether<Row, T>(roi, pixelBytes, row, images,
+                                                  std::make_index_sequence<1 + sizeof...(More)>());
     }
     forEachRow(roi, row, walk(first, channels), walk(more, channels)...);
 }

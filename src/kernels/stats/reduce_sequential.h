@@ -8,7 +8,7 @@ namespace qori::kernels {
 /// Dot products of 32-bit integers, which no integer register holds: products and sums in double precision, one
 /// channel's from left to right.
 template <int channels, class T>
-QORI_NOINLINE void sequentialDotRow(double* sums, ptrdiff_t pixels, const T* a, const T* b) {
+QORI_NOINLINE void sequentialDotRowOf(double* sums, ptrdiff_t pixels, const T* a, const T* b) {
     double own[channels];
     for (int c = 0; c < channels; ++c) own[c] = sums[c];
     for (ptrdiff_t x = 0; x < pixels; ++x)
@@ -17,6 +17,15 @@ QORI_NOINLINE void sequentialDotRow(double* sums, ptrdiff_t pixels, const T* a, 
             own[c] += static_cast<double>(a[i]) * static_cast<double>(b[i]);
         }
     for (int c = 0; c < channels; ++c) sums[c] = own[c];
+}
+
+template <class T>
+void sequentialDotRow(double* sums, int channels, ptrdiff_t pixels, const T* a, const T* b) {
+    switch (channels) {
+        case 1: return sequentialDotRowOf<1>(sums, pixels, a, b);
+        case 3: return sequentialDotRowOf<3>(sums, pixels, a, b);
+        default: return sequentialDotRowOf<4>(sums, pixels, a, b);
+    }
 }
 
 QORI_INLINE Vec<float> scaled(Vec<float> a, float weight) { return {_mm256_mul_ps(a.v, _mm256_set1_ps(weight))}; }
