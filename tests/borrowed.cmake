@@ -6,7 +6,7 @@ list(REMOVE_ITEM sources frame/unwind_test.cpp)
 # Cases of many values, which touch the memory that their neighbours touch: half of all the time over slow libraries.
 set(slow ResizeNumbers.ConstantsStay ResizeNumbers.NothingIsComputedOnTheBuffersGarbage
     ResizeNumbers.WorkMemoryFollowsTheDestination Median.EveryPatternOf5x5 Median.MajoritiesInTiles
-    Norms.SumsOfSquaresPast64Bits)
+    Norms.SumsOfSquaresPast64Bits Norms.SumsOfMorePixelsThan32BitsCount CountInRange.CountsPastEveryLane)
 list(JOIN slow : slow)
 # Of where a block came from one call is kept: the tests' own vectors took most of the time of some, each with a stack of
 # thirty calls that are none, because their programs keep no frame pointers.
