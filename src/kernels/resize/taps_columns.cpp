@@ -2,6 +2,7 @@
 #include "taps_columns.h"
 
 #include "floats.h"
+#include "kernels/copy_rows.h"
 
 namespace qori::kernels {
 namespace {
@@ -19,89 +20,101 @@ QORI_INLINE __m256i toIntegers(__m256 sum) {
     return _mm256_cvtps_epi32(finish == Finish::limited ? _mm256_min_ps(sum, _mm256_set1_ps(0x1p30f)) : sum);
 }
 
-/// Rounds and saturates the n (at most kTapBlock) elements of four sums.
+/// Rounds and saturates a block of sums.
 template <Finish finish, class T>
-QORI_INLINE void storeSums(T* dst, const __m256 sum[4], ptrdiff_t n) {
+QORI_INLINE void storeSums(T* dst, const __m256 sum[4]) {
     if constexpr (std::is_same_v<T, float>) {
-        for (int j = 0; j < 4; ++j) storeUpTo(dst + 8 * j, Vec<float>{sum[j]}, n - 8 * j);
+        for (int j = 0; j < 4; ++j) store(dst + 8 * j, Vec<float>{sum[j]});
     } else {
         __m256i whole[4];
         for (int j = 0; j < 4; ++j) whole[j] = toIntegers<finish>(sum[j]);
         if constexpr (sizeof(T) == 1) {
             const __m256i packed =
                 _mm256_packus_epi16(_mm256_packs_epi32(whole[0], whole[1]), _mm256_packs_epi32(whole[2], whole[3]));
-            storeUpTo(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))}, n);
+            store(dst, Bytes{_mm256_permutevar8x32_epi32(packed, _mm256_setr_epi32(0, 4, 1, 5, 2, 6, 3, 7))});
         } else {
             for (int j = 0; j < 4; j += 2) {
                 const __m256i packed = std::is_signed_v<T> ? _mm256_packs_epi32(whole[j], whole[j + 1])
                                                            : _mm256_packus_epi32(whole[j], whole[j + 1]);
-                storeUpTo(dst + 8 * j, Vec<T>{_mm256_permute4x64_epi64(packed, 0xD8)}, n - 8 * j);
+                store(dst + 8 * j, Vec<T>{_mm256_permute4x64_epi64(packed, 0xD8)});
             }
         }
     }
 }
 
 template <Finish finish, class T>
-QORI_INLINE void finishSums(T* dst, __m256 sum[4], float scale, ptrdiff_t n) {
+QORI_INLINE void finishSums(T* dst, __m256 sum[4], float scale) {
     if constexpr (finish == Finish::scaled)
         for (int j = 0; j < 4; ++j) sum[j] = _mm256_mul_ps(sum[j], _mm256_set1_ps(scale));
-    storeSums<finish>(dst, sum, n);
+    storeSums<finish>(dst, sum);
+}
+
+/// Makes one row or two, of at least one block. The last block ends with the row and may make elements again.
+template <class T>
+using SumRows = void (*)(const float* const* rows, const PairedTaps& taps, float scale, T* dst, T* second,
+                         ptrdiff_t elements);
+
+template <class Body>
+QORI_INLINE void forEachBlock(ptrdiff_t elements, Body body) {
+    const ptrdiff_t last = elements - kTapBlock;
+    for (ptrdiff_t i = 0;; i = std::min(i + kTapBlock, last)) {
+        body(i);
+        if (i == last) return;
+    }
 }
 
 template <Finish finish, class T>
-QORI_NOINLINE void sumColumn(const float* const* rows, const PairedTaps& given, float scale, T* dst,
-                             ptrdiff_t elements) {
+void sumColumn(const float* const* rows, const PairedTaps& given, float scale, T* dst, T*, ptrdiff_t elements) {
     const PairedTaps taps = given;  // not reloaded after every store
-    for (ptrdiff_t i = 0; i < elements; i += kTapBlock) {
+    forEachBlock(elements, [&](ptrdiff_t i) {
         __m256 sums[4];
         for (int j = 0; j < 4; j += kPairVectors)
             sumChain<kPairVectors>(
                 taps.first, taps.count, [&](int32_t k) { return rows[k] + i + 8 * j; }, sums + j,
                 finish == Finish::scaled ? kAscendingTaps : kPairedTaps);
-        finishSums<finish>(dst + i, sums, scale, elements - i);
-    }
+        finishSums<finish>(dst + i, sums, scale);
+    });
 }
 
 template <Finish finish, class Fixed, class T>
-QORI_INLINE void sumBlockPair(const float* const* rows, const PairedTaps& taps, float scale, ptrdiff_t at, T* dst,
-                              T* second, ptrdiff_t n) {
-    __m256 sums[4], others[4];
-    for (int j = 0; j < 4; j += kPairVectors)
-        sumPair<kPairVectors>(
-            taps, Fixed{}, [&](int32_t k) { return rows[k] + at + 8 * j; }, sums + j, others + j);
-    finishSums<finish>(dst + at, sums, scale, n);
-    finishSums<finish>(second + at, others, scale, n);
-}
-
-template <Finish finish, class Fixed, class T>
-QORI_NOINLINE void sumColumnPair(const float* const* rows, const PairedTaps& given, float scale, T* dst, T* second,
-                                 ptrdiff_t elements) {
+void sumColumnPair(const float* const* rows, const PairedTaps& given, float scale, T* dst, T* second,
+                   ptrdiff_t elements) {
     const PairedTaps taps = given;
     const float* own[Fixed::count + Fixed::shift + 1];
     for (int k = 0; k < Fixed::count + Fixed::shift; ++k) own[k] = rows[k];
     const float* const* const from = Fixed::count > 0 ? own : rows;
-    // Whole blocks first: with partial ones in the same loop, registers do not suffice.
-    ptrdiff_t i = 0;
-    for (; i + kTapBlock <= elements; i += kTapBlock) {
+    forEachBlock(elements, [&](ptrdiff_t i) {
         if constexpr (sizeof(T) < 4) {
             prefetchAhead(dst + i);
             prefetchAhead(second + i);
         }
-        sumBlockPair<finish, Fixed>(from, taps, scale, i, dst, second, kTapBlock);
-    }
-    if (i < elements) sumBlockPair<finish, Fixed>(from, taps, scale, i, dst, second, elements - i);
+        __m256 sums[4], others[4];
+        for (int j = 0; j < 4; j += kPairVectors)
+            sumPair<kPairVectors>(
+                taps, Fixed{}, [&](int32_t k) { return from[k] + i + 8 * j; }, sums + j, others + j);
+        finishSums<finish>(dst + i, sums, scale);
+        finishSums<finish>(second + i, others, scale);
+    });
 }
 
 template <Finish finish, class T>
-void sumColumns(const float* const* rows, const PairedTaps& taps, float scale, T* dst, T* second, ptrdiff_t elements) {
-    if (second == nullptr) return sumColumn<finish>(rows, taps, scale, dst, elements);
-    const auto sum = [&]<class Fixed>(Fixed) {
-        sumColumnPair<finish, Fixed>(rows, taps, scale, dst, second, elements);
-    };
+SumRows<T> chooseSum(const PairedTaps& taps, bool isPair) {
+    if (!isPair) return sumColumn<finish, T>;
+    SumRows<T> chosen = nullptr;
+    const auto choose = [&]<class Fixed>(Fixed) { chosen = sumColumnPair<finish, Fixed, T>; };
     if constexpr (finish == Finish::plain)
-        withFixedTaps(taps, sum);
+        withFixedTaps(taps, choose);
     else
-        withAnyTaps(taps, sum);
+        withAnyTaps(taps, choose);
+    return chosen;
+}
+
+template <class T>
+SumRows<T> chooseSum(const PairedTaps& taps, ColumnFinish finish, bool isPair) {
+    if (finish.scale != 1) return chooseSum<Finish::scaled, T>(taps, isPair);
+    if constexpr (!std::is_same_v<T, float>)
+        if (!finish.isBounded) return chooseSum<Finish::limited, T>(taps, isPair);
+    return chooseSum<Finish::plain, T>(taps, isPair);
 }
 
 }  // namespace
@@ -114,11 +127,13 @@ void fillUpBlock(float* row, ptrdiff_t elements) {
 template <class T>
 void filterColumn(const float* const* rows, const PairedTaps& taps, ColumnFinish finish, T* dst, T* second,
                   ptrdiff_t elements) {
-    if (finish.scale != 1)
-        return sumColumns<Finish::scaled>(rows, taps, static_cast<float>(finish.scale), dst, second, elements);
-    if (finish.isBounded || std::is_same_v<T, float>)
-        return sumColumns<Finish::plain>(rows, taps, 1, dst, second, elements);
-    if constexpr (!std::is_same_v<T, float>) sumColumns<Finish::limited>(rows, taps, 1, dst, second, elements);
+    const SumRows<T> sum = chooseSum<T>(taps, finish, second != nullptr);
+    const auto scale = static_cast<float>(finish.scale);
+    if (elements >= kTapBlock) return sum(rows, taps, scale, dst, second, elements);
+    T narrow[2][kTapBlock];
+    sum(rows, taps, scale, narrow[0], narrow[1], kTapBlock);
+    copyRow(asBytes(dst), asBytes(narrow[0]), elements * elementBytes<T>);
+    if (second != nullptr) copyRow(asBytes(second), asBytes(narrow[1]), elements * elementBytes<T>);
 }
 
 namespace {
@@ -157,7 +172,13 @@ void finishAll(const double* totals, double scale, T* dst, ptrdiff_t elements) {
             const double* const from = totals + i + 8 * j;
             sums[j] = Totals<1>{{_mm256_loadu_pd(from)}, {_mm256_loadu_pd(from + 4)}}.times(scale, 0);
         }
-        storeSums<finish>(dst + i, sums, elements - i);
+        if (i + kTapBlock <= elements) {
+            storeSums<finish>(dst + i, sums);
+            continue;
+        }
+        T last[kTapBlock];
+        storeSums<finish>(last, sums);
+        copyRow(asBytes(dst + i), asBytes(last), (elements - i) * elementBytes<T>);
     }
 }
 
