@@ -51,7 +51,7 @@ private:
         const ptrdiff_t sums = lines_.lineElements();
         kernels::fillUpBlock(filtered_, elements);
         totals_.run(
-            source_, ring_, sums, [&] { lines_.expand(sequence.next(), ring_.next()); },
+            source_.vertical(), ring_, sums, [&] { lines_.expand(sequence.next(), ring_.next()); },
             [&](int32_t y, const double* totals) {
                 kernels::finishTotals(totals, {1, true}, sums_, sums);
                 lines_.filter(sums_, filtered_);

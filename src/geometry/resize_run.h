@@ -20,6 +20,13 @@ inline Range tapRange(const ResizePlan& plan, const Axis& axis, int32_t position
     return range;
 }
 
+/// What sums down the columns of a tile know of its source: the rows that may be read.
+struct VerticalSource {
+    const ResizePlan& plan;
+    const Tile& tile;
+    Range rows;
+};
+
 /// What the ways have in common: the tile, the source pixels that may be read, and access to rows by source index.
 template <class T, int channels>
 struct TileSource {
@@ -40,6 +47,7 @@ struct TileSource {
         const ptrdiff_t y = tile.y == 0 ? 0 : sourceOffset(plan.vertical, tile.y);
         image = {advance(src.data, -(y * src.step + x * ptrdiff_t{channels} * elementBytes<T>)), src.step};
     }
+    VerticalSource vertical() const { return {plan, tile, rows}; }
     /// The row's pixel at a column.
     const T* at(int32_t row, int32_t column) const {
         return advance(image.row(row), ptrdiff_t{column} * channels * elementBytes<T>);

@@ -47,8 +47,8 @@ public:
 
     /// Makes a strip of the tile. Calls filterNext() for rows in the ring, from the tile's first on, and
     /// finish(y, totals) for each destination row.
-    template <class Source, class FilterNext, class Finish>
-    void run(const Source& source, Ring& ring, ptrdiff_t elements, FilterNext filterNext, Finish finish) {
+    template <class FilterNext, class Finish>
+    void run(const VerticalSource& source, Ring& ring, ptrdiff_t elements, FilterNext filterNext, Finish finish) {
         const ResizePlan& plan = source.plan;
         const Tile& tile = source.tile;
         const int32_t begin = source.rows.clamp(plan.firstTap(plan.vertical, tile.y));
@@ -75,9 +75,8 @@ public:
 private:
     /// Adds the blocks from tap `next` on of which all rows are there, up to `last` rows behind the ring's first.
     /// Returns the row that the next one waits for.
-    template <class Source>
-    int32_t addBlocks(const Source& source, const Ring& ring, int32_t y, int32_t count, int32_t last, int32_t& next,
-                      ptrdiff_t elements) {
+    int32_t addBlocks(const VerticalSource& source, const Ring& ring, int32_t y, int32_t count, int32_t last,
+                      int32_t& next, ptrdiff_t elements) {
         const ResizePlan& plan = source.plan;
         const int32_t position = source.tile.y + y, tap = plan.firstTap(plan.vertical, position);
         const int32_t begin = source.rows.clamp(plan.firstTap(plan.vertical, source.tile.y));
