@@ -39,7 +39,7 @@ kernels::ChannelVectors<T> constantsOf(const T* value) {
 /// dst = operation(src), per element, where the operation has the constants.
 template <Layout layout, class T, class Operation>
 void runUnary(Operation operation, Image<const T> src, Image<T> dst, QorImageSize roi) {
-    const bool streaming = streamsTo<layout>(dst, roi, src);
+    const bool streaming = streamsTo(channels(layout), dst, roi, src);
     kernels::mapImage<keepsAlpha<layout>>(roi, channels(layout), operation, streaming, dst, src);
 }
 
@@ -66,10 +66,11 @@ void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
 }
 
 template <class Op, Layout layout, class T>
-QorResult combine(const T* value, Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale) {
+QorResult combineWith(const T* value, Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale) {
     return underControlOf<kernels::Component<T>>([&] {
         const auto run = [&](auto operation) { runConstant<layout>(operation, value, src, dst, roi); };
-        if (!kernels::withScaledOperation<Op, T, true>(scale, run)) fillConstant<layout>(dst, roi, T{});
+        if (!kernels::withScaledOperation<Op, T>(scale, run))
+            fillConstant<keepsAlpha<layout>>(channels(layout), dst, roi, T{});
         return QOR_OK;
     });
 }
@@ -88,11 +89,11 @@ QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImage
     if constexpr (std::is_unsigned_v<T>) {
         constexpr int bits = 8 * elementBytes<T>;
         if (scale <= -bits && allValues<layout>(value, [](T v) { return v != 0; })) {  // no sum is 0
-            fillConstant<layout>(dst, roi, std::numeric_limits<T>::max());
+            fillConstant<keepsAlpha<layout>>(channels(layout), dst, roi, std::numeric_limits<T>::max());
             return QOR_OK;
         }
     }
-    return combine<kernels::Sum<T>, layout>(value, src, dst, roi, scale);
+    return combineWith<kernels::Sum<T>, layout>(value, src, dst, roi, scale);
 }
 
 template <class T, Layout layout>
@@ -104,7 +105,7 @@ QorResult subtractConstant(Image<const T> src, const T* value, Image<T> dst, Qor
             return QOR_OK;
         }
     }
-    return combine<kernels::Difference<T>, layout>(value, src, dst, roi, scale);
+    return combineWith<kernels::Difference<T>, layout>(value, src, dst, roi, scale);
 }
 
 template <class T, Layout layout>
@@ -112,7 +113,7 @@ QorResult multiplyConstant(Image<const T> src, const T* value, Image<T> dst, Qor
     if (QorResult r = check<std::is_same_v<T, uint8_t>>(src, value, dst, roi)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (allValues<layout>(value, isZeroValue<T>)) {
-            fillConstant<layout>(dst, roi, T{});
+            fillConstant<keepsAlpha<layout>>(channels(layout), dst, roi, T{});
             return QOR_OK;
         }
     }
@@ -122,7 +123,7 @@ QorResult multiplyConstant(Image<const T> src, const T* value, Image<T> dst, Qor
             return QOR_OK;
         }
     }
-    return combine<kernels::Product<T>, layout>(value, src, dst, roi, scale);
+    return combineWith<kernels::Product<T>, layout>(value, src, dst, roi, scale);
 }
 
 template <Layout layout, class T>
@@ -131,7 +132,7 @@ QorResult runDivision(Image<const T> src, const T* value, Image<T> dst, QorImage
     if constexpr (std::is_integral_v<T>) {
         // Up to 2^(scale-1): at most a half, which goes to 0.
         if (scale > static_cast<int>(std::bit_width(kernels::largestMagnitude<T> - 1))) {
-            fillConstant<layout>(dst, roi, T{});
+            fillConstant<keepsAlpha<layout>>(channels(layout), dst, roi, T{});
             return QOR_OK;
         }
     }

@@ -9,7 +9,7 @@ namespace {
 template <Layout layout, class T, class Divide>
 QorResult runDivision(Divide divide, Image<const T> src1, Image<const T> src2, Image<T> dst, QorImageSize roi) {
     kernels::Division<T, Divide> operation{divide, {}};
-    runBinary<layout>(operation, src1, src2, dst, roi);
+    runBinary<keepsAlpha<layout>>(channels(layout), operation, src1, src2, dst, roi);
     return operation.zeros.template any<keepsAlpha<layout>, T>() ? QOR_WARN_DIV_BY_ZERO : QOR_OK;
 }
 

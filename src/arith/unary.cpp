@@ -10,7 +10,7 @@ using namespace kernels;
 
 template <Layout layout, class T, class Op>
 QorResult runUnary(Op&& op, Image<const T> src, Image<T> dst, QorImageSize roi) {
-    mapImage<keepsAlpha<layout>>(roi, channels(layout), op, streamsTo<layout>(dst, roi, src), dst, src);
+    mapImage<keepsAlpha<layout>>(roi, channels(layout), op, streamsTo(channels(layout), dst, roi, src), dst, src);
     return QOR_OK;
 }
 
@@ -56,11 +56,7 @@ QorResult absolute(Image<const T> src, Image<T> dst, QorImageSize roi) {
 template <class T, Layout layout>
 QorResult square(Image<const T> src, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
     if (QorResult r = check(src, dst, roi)) return r;
-    return underControlOf<kernels::Component<T>>([&] {
-        const auto run = [&](auto operation) { runBinary<layout>(operation, src, src, dst, roi); };
-        if (!withScaledOperation<Product<T>, T>(scale, run)) fillConstant<layout>(dst, roi, T{});
-        return QOR_OK;
-    });
+    return combine<Product<T>, keepsAlpha<layout>>(channels(layout), src, src, dst, roi, scale);
 }
 
 template <class T, Layout layout>
