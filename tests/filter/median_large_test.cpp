@@ -120,9 +120,18 @@ TEST(MedianLarge, BytesOfChangingImages) {
     expectMedians<4>(qoriFilterMedian_8u_C4R, {7, 31}, 70, 200);
 }
 
-/// The most rows whose counts are bytes with a sign, the most elements whose counts are words; and one size more.
+/// The most rows whose counts are bytes with a sign or without, the most elements whose counts are words with a sign or
+/// without; and one size more.
 TEST(MedianLarge, MasksAtTheEndsOfCounters) {
-    for (QorImageSize mask : {QorImageSize{3, 127}, {257, 127}, {259, 127}, {3, 129}, {127, 257}, {3, 255}, {3, 257}})
+    for (QorImageSize mask : {QorImageSize{3, 127},
+                              {257, 127},
+                              {259, 127},
+                              {3, 129},
+                              {127, 257},
+                              {3, 255},
+                              {3, 257},
+                              {257, 255},
+                              {259, 255}})
         expectMedians<1>(qoriFilterMedian_8u_C1R, mask, 3 + random().below(140), 20);
 }
 

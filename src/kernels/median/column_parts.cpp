@@ -149,6 +149,11 @@ int ColumnParts::partOf(int32_t x, int32_t below) const {
     return part;
 }
 
+/// Columns are tall where differences of their counts do not fit signed bytes. Sums of theirs begin with this, so that
+/// signed comparisons are right for all words.
+template <bool isTall>
+constexpr int16_t kBias = isTall ? INT16_MIN : 0;
+
 /// Adds counts of columns, or differences of two as signed ones.
 template <bool isSigned>
 QORI_INLINE void add(PartSums& sums, __m256i counts) {
@@ -161,7 +166,8 @@ template <bool isTall>
 QORI_INLINE PartSums ColumnParts::summedUp(int32_t x, int part) const {
     const uint8_t* p = within(part, x);
     const uint8_t* const end = p + ptrdiff_t{width_} * kApart;
-    PartSums sums{_mm256_setzero_si256(), _mm256_setzero_si256()};
+    const __m256i none = _mm256_set1_epi16(kBias<isTall>);
+    PartSums sums{none, none};
     if (isTall || width_ % 2 != 0) {
         add<false>(sums, block(p));
         p += kApart;
@@ -194,8 +200,9 @@ QORI_INLINE void storeInOrder(uint16_t* p, const PartSums& sums) {
 }
 
 /// All of a part's elements.
+template <bool isTall>
 QORI_INLINE int32_t lastOf(const PartSums& sums) {
-    return _mm_extract_epi16(_mm256_extracti128_si256(sums.high, 1), 7);
+    return (_mm_extract_epi16(_mm256_extracti128_si256(sums.high, 1), 7) - kBias<isTall>)&0xFFFF;
 }
 
 /// The counts within another part: those of the one left before where they are not much out of date.
@@ -216,8 +223,8 @@ QORI_NOINLINE void ColumnParts::leave(Window& now, Window& left, int32_t below) 
     Window next = now;
     next.part += isAbove ? 1 : -1;
     next.counts = countsOf<isTall>(left, now.x, next.part);
-    const int32_t all = lastOf(next.counts);
-    next.rest += isAbove ? -lastOf(now.counts) : all;
+    const int32_t all = lastOf<isTall>(next.counts);
+    next.rest += isAbove ? -lastOf<isTall>(now.counts) : all;
     if (next.rest < 0 || next.rest >= all) {
         next.part = partOf(now.x, below);
         next.counts = countsOf<isTall>(left, now.x, next.part);
@@ -244,7 +251,7 @@ void ColumnParts::follow(int32_t below, uint8_t* to, uint16_t* rests) const {
         int32_t rest = now.rest, x = now.x;
 #pragma GCC unroll 4
         for (; x <= last; ++x) {
-            const __m256i ranks = _mm256_set1_epi16(static_cast<int16_t>(rest));
+            const __m256i ranks = _mm256_set1_epi16(static_cast<int16_t>(rest + kBias<isTall>));
             const __m256i low = _mm256_cmpgt_epi16(counts.low, ranks), high = _mm256_cmpgt_epi16(counts.high, ranks);
             const auto bits = static_cast<unsigned>(_mm256_movemask_epi8(_mm256_packs_epi16(low, high)));
             if (rest < 0 || bits == 0) break;
@@ -252,9 +259,9 @@ void ColumnParts::follow(int32_t below, uint8_t* to, uint16_t* rests) const {
             to[x] = static_cast<uint8_t>(base + bin);
             if constexpr (wantsRests) {
                 alignas(kVectorBytes) uint16_t stored[kBins + 1];
-                stored[0] = 0;
+                stored[0] = static_cast<uint16_t>(kBias<isTall>);
                 storeInOrder(stored + 1, counts);
-                rests[x] = static_cast<uint16_t>(rest - stored[bin]);
+                rests[x] = static_cast<uint16_t>(rest + kBias<isTall> - stored[bin]);
             }
             rest += beneathLeaving[x] - beneathEntering[x];
             move<isTall>(counts, leaving, leaving + across);
@@ -269,7 +276,7 @@ void ColumnParts::follow(int32_t below, uint8_t* to, uint16_t* rests) const {
 
 void ColumnParts::medians(int32_t below, uint8_t* to, uint16_t* rests) const {
     constexpr int32_t kMostSigned = 127;
-    if (height_ > kMostSigned)
+    if (height_ > kMostSigned || width_ * height_ > INT16_MAX)
         rests == nullptr ? follow<true, false>(below, to, rests) : follow<true, true>(below, to, rests);
     else
         rests == nullptr ? follow<false, false>(below, to, rests) : follow<false, true>(below, to, rests);

@@ -22,8 +22,8 @@ class ColumnParts {
 public:
     using Rest = uint16_t;
 
-    /// Counts of a column are bytes, those of a window signed words.
-    static bool suffice(int64_t width, int64_t height) { return height <= 255 && width * height <= 32767; }
+    /// Counts of a column are bytes, those of a window words.
+    static bool suffice(int64_t width, int64_t height) { return height <= 255 && width * height <= UINT16_MAX; }
     static int64_t bytes(int32_t columns) { return paddedOf(columns) * (kApart + kParts + 2 * kEntryBytes); }
 
     /// Memory of bytes(columns), on a 32-byte boundary.
