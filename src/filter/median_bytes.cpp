@@ -62,7 +62,7 @@ int32_t ByteWindows<Histograms>::columnsOf(QorImageSize size, QorImageSize mask)
         // Of 128, 192 and 256 medians the most are the fastest: rows take time to begin, and windows' other columns cost
         // as much as those of medians, more than it costs that counts are in the second-level cache.
         constexpr int32_t kMedians = 256;
-        most = int64_t{kMedians} + mask.width - 1;
+        most = int64_t{std::max(kMedians, mask.width)} + mask.width - 1;
     } else {
         // Counts stay in the first-level cache, unless the mask alone takes more.
         constexpr int kCache = 44 << 10;
