@@ -59,8 +59,8 @@ template <class Histograms>
 int32_t ByteWindows<Histograms>::columnsOf(QorImageSize size, QorImageSize mask) {
     int64_t most;
     if constexpr (kIsSmall) {
-        // Of 128, 192 and 256 medians the most are the fastest: rows take time to begin, and windows' other columns cost
-        // as much as those of medians, more than it costs that counts are in the second-level cache.
+        // Of 128, 192 and 256 medians the most are the fastest: rows take time to begin, and windows' other columns
+        // cost as much as those of medians, more than it costs that counts are in the second-level cache.
         constexpr int32_t kMedians = 256;
         most = int64_t{std::max(kMedians, mask.width)} + mask.width - 1;
     } else {
