@@ -185,7 +185,7 @@ Ladder contents(int side) {
                                          make("chequers", [](int x, int y) { return (x / 90 + y / 70) % 2 * 170; }),
                                          make("steep slope", [](int x, int y) { return x + y / 2; })};
             },
-            "rows whose medians take more than 64 values need whole histograms"};
+            "rows whose medians take more than 32 values need whole histograms"};
 }
 
 const Ladders ladders{{sides<uint8_t>("median 8u, mask side", qoriFilterMedian_8u_C1R, 0),

@@ -10,9 +10,9 @@ namespace qori::filter {
 // Not in an unnamed namespace: what is called once would be inlined there, and be 3 % slower.
 
 /// Bytes, in strips of columns from top to bottom.
-template <class Bins>
+template <class Histograms>
 class ByteMedians {
-    using Windows = ByteWindows<Bins>;
+    using Windows = ByteWindows<Histograms>;
 
 public:
     template <class T>
@@ -50,7 +50,7 @@ private:
 };
 
 /// Other elements by their ordinals, in tiles.
-template <class T, class Bins, class Coordinate>
+template <class T, class Histograms, class Coordinate>
 class OrdinalMedians {
     using Ordinals = kernels::Ordinals<T, Coordinate>;
 
@@ -87,7 +87,7 @@ public:
     }
 
 private:
-    using Rest = typename Bins::Rest;
+    using Rest = typename Histograms::Rest;
 
     void tile(const MedianJob<T>& job, ptrdiff_t at, int32_t y0, QorImageSize size) {
         const int32_t columns = size.width + job.mask.width - 1, rows = size.height + job.mask.height - 1;
@@ -103,7 +103,7 @@ private:
     }
 
     int32_t columns_, rows_;
-    ByteWindows<Bins> windows_;
+    ByteWindows<Histograms> windows_;
     Rest* rests_;
     uint8_t* bytes_;
     Ordinals ordinals_;
@@ -123,20 +123,20 @@ QorResult runMethod(const MedianJob<T>& job) {
 
 template <class T>
 QorResult medianOfAny(const MedianJob<T>& job) {
-    using kernels::LargeBins;
-    using kernels::SmallBins;
+    using kernels::ColumnHistograms;
+    using kernels::ColumnParts;
     if constexpr (sizeof(T) < 8)
         if (tilesPay<T>(job.size, job.mask)) return runMethod<TileMedians<T>>(job);
-    const bool small = SmallBins::suffice(job.mask.width, job.mask.height);
+    const bool small = ColumnParts::suffice(job.mask.width, job.mask.height);
     if constexpr (sizeof(T) == 1) {
-        return small ? runMethod<ByteMedians<SmallBins>>(job) : runMethod<ByteMedians<LargeBins>>(job);
+        return small ? runMethod<ByteMedians<ColumnParts>>(job) : runMethod<ByteMedians<ColumnHistograms>>(job);
     } else {
         constexpr int32_t kMostForBytes = 128;
         if (small && std::max(job.mask.width, job.mask.height) <= kMostForBytes)
-            return runMethod<OrdinalMedians<T, SmallBins, uint8_t>>(job);
+            return runMethod<OrdinalMedians<T, ColumnParts, uint8_t>>(job);
         constexpr int32_t kMostForWords = 1 << 15;
         if (std::max(job.mask.width, job.mask.height) > kMostForWords) return QOR_ERR_NO_MEMORY;
-        return runMethod<OrdinalMedians<T, LargeBins, uint16_t>>(job);
+        return runMethod<OrdinalMedians<T, ColumnHistograms, uint16_t>>(job);
     }
 }
 

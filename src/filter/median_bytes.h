@@ -4,14 +4,15 @@
 #pragma once
 #include "frame/plan.h"
 #include "kernels/median/bands.h"
+#include "kernels/median/column_parts.h"
 #include "kernels/median/histograms.h"
 
 namespace qori::filter {
 
-template <class Bins>
+template <class Histograms>
 class ByteWindows {
 public:
-    using Rest = typename Bins::Rest;
+    using Rest = typename Histograms::Rest;
 
     /// Columns of strips that pay, at most.
     static int32_t columnsOf(QorImageSize size, QorImageSize mask);
@@ -25,15 +26,12 @@ public:
     void makeRow(uint8_t* medians, Rest* rests);
 
 private:
-    using Histograms = kernels::ColumnHistograms<Bins>;
-    enum class Method { none, bands16, bands32, bands64, histograms };
+    static constexpr bool kIsSmall = std::is_same_v<Histograms, kernels::ColumnParts>;
+    enum class Method { none, bands16, bands32, histograms };
 
     static bool bandsSuffice(QorImageSize mask);
     static Method methodFor(int thresholds) {
-        return thresholds <= 16   ? Method::bands16
-               : thresholds <= 32 ? Method::bands32
-               : thresholds <= 64 ? Method::bands64
-                                  : Method::histograms;
+        return thresholds <= 16 ? Method::bands16 : thresholds <= 32 ? Method::bands32 : Method::histograms;
     }
     bool makeRowByBands(uint8_t* medians, uint16_t* rests);
     void makeRowByHistograms(uint8_t* medians, Rest* rests);
@@ -51,11 +49,10 @@ private:
     int64_t until_ = 0;  ///< ... and the one at which others are thought of.
     kernels::ColumnBands<16> bands16_;
     kernels::ColumnBands<32> bands32_;
-    kernels::ColumnBands<64> bands64_;
     Histograms histograms_;
 };
 
-extern template class ByteWindows<kernels::SmallBins>;
-extern template class ByteWindows<kernels::LargeBins>;
+extern template class ByteWindows<kernels::ColumnParts>;
+extern template class ByteWindows<kernels::ColumnHistograms>;
 
 }  // namespace qori::filter

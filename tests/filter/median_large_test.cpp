@@ -40,6 +40,24 @@ Plane<uint8_t> changingBytes(int width, int height, int longest) {
     return image;
 }
 
+/// Columns of values within 2 of levels `apart` from each other, the lowest one of which is `first`, in no order, so
+/// that each row's medians take up to all of them, go back and forth and far.
+Plane<uint8_t> aroundLevels(int width, int height, int first, int apart) {
+    Plane<uint8_t> image{width, height};
+    const int levels = (255 - first) / apart + 1;
+    int level = 0, left = 0;
+    for (int x = 0; x < width; ++x, --left) {
+        if (left == 0) {
+            level =
+                random().oneIn(3) ? random().below(levels) : std::clamp(level + random().below(3) - 1, 0, levels - 1);
+            left = 1 + random().below(random().oneIn(2) ? 4 : 40);
+        }
+        for (int y = 0; y < height; ++y)
+            image.at(x, y) = static_cast<uint8_t>(std::clamp(first + level * apart + random().below(5) - 2, 0, 255));
+    }
+    return image;
+}
+
 /// By histograms of whole windows.
 Plane<uint8_t> mediansOf(Plane<uint8_t>& src, QorImageSize mask) {
     Plane<uint8_t> result{src.width - mask.width + 1, src.height - mask.height + 1};
@@ -62,14 +80,14 @@ Plane<uint8_t> mediansOf(Plane<uint8_t>& src, QorImageSize mask) {
 }
 
 /// Several planes as channels; the last one of four is not written where there are only three.
-template <int channels, class Function>
-void expectMedians(Function function, QorImageSize mask, int width, int height) {
+template <int channels, class Function, class Draw>
+void expectMediansOfPlanes(Function function, QorImageSize mask, int width, int height, Draw draw) {
     SCOPED_TRACE("mask " + std::to_string(mask.width) + "x" + std::to_string(mask.height));
     const int columns = width + mask.width - 1, rows = height + mask.height - 1;
     std::vector<Plane<uint8_t>> expected;
     Plane<uint8_t> src{columns * channels, rows}, dst{width * channels, height};
     for (int c = 0; c < channels; ++c) {
-        Plane<uint8_t> plane = changingBytes(columns, rows, 2 * mask.height + 200);
+        Plane<uint8_t> plane = draw(columns, rows);
         for (int y = 0; y < rows; ++y)
             for (int x = 0; x < columns; ++x) src.at(x * channels + c, y) = plane.at(x, y);
         expected.push_back(mediansOf(plane, mask));
@@ -83,10 +101,17 @@ void expectMedians(Function function, QorImageSize mask, int width, int height) 
                     << "channel " << c << " at " << x << ", " << y;
 }
 
+template <int channels, class Function>
+void expectMedians(Function function, QorImageSize mask, int width, int height) {
+    expectMediansOfPlanes<channels>(function, mask, width, height, [=](int columns, int rows) {
+        return changingBytes(columns, rows, 2 * mask.height + 200);
+    });
+}
+
 TEST(MedianLarge, BytesOfChangingImages) {
     for (int i = 0; i < 6; ++i) {
-        expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 150 + random().below(90), 500);
-        expectMedians<1>(qoriFilterMedian_8u_C1R, {41, 5}, 150 + random().below(90), 500);
+        expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 150 + random().below(180), 500);
+        expectMedians<1>(qoriFilterMedian_8u_C1R, {41, 5}, 150 + random().below(180), 500);
     }
     for (int i = 0; i < 40; ++i)  // too small for thresholds, and just large enough
         expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 1 + random().below(30), 1 + random().below(30));
@@ -95,10 +120,30 @@ TEST(MedianLarge, BytesOfChangingImages) {
     expectMedians<4>(qoriFilterMedian_8u_C4R, {7, 31}, 70, 200);
 }
 
-/// The most rows whose counts are bytes with a sign, the most elements whose counts are words; and one size more.
+/// The most rows whose counts are bytes with a sign or without, the most elements whose counts are words with a sign or
+/// without; and one size more.
 TEST(MedianLarge, MasksAtTheEndsOfCounters) {
-    for (QorImageSize mask : {QorImageSize{3, 127}, {257, 127}, {259, 127}, {3, 129}, {127, 257}, {3, 255}, {3, 257}})
+    for (QorImageSize mask : {QorImageSize{3, 127},
+                              {257, 127},
+                              {259, 127},
+                              {3, 129},
+                              {127, 257},
+                              {3, 255},
+                              {3, 257},
+                              {257, 255},
+                              {259, 255}})
         expectMedians<1>(qoriFilterMedian_8u_C1R, mask, 3 + random().below(140), 20);
+}
+
+/// Medians at both sides of every multiple of 16, where counts of columns may be parted, and jumps between them; each
+/// height has counts of its own, one or two bytes with or without a sign, and few rows are as good as many.
+TEST(MedianLarge, BytesThatJumpBetweenLevels) {
+    for (QorImageSize mask : {QorImageSize{17, 17}, {3, 129}, {33, 41}, {65, 127}, {31, 255}, {129, 3}})
+        for (int apart : {1, 16, 32, 85, 255})
+            expectMediansOfPlanes<1>(qoriFilterMedian_8u_C1R, mask, 300 + random().below(300), 2 + random().below(4),
+                                     [=](int columns, int rows) {
+                                         return aroundLevels(columns, rows, random().oneIn(2) ? 0 : 15 % apart, apart);
+                                     });
 }
 
 /// Elements by their order: each kind of bytes, made many values whose order is that of the bytes.

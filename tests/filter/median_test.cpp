@@ -56,9 +56,9 @@ void median(const char* name, Function function) {
     for (QorImageSize mask : {QorImageSize{3, 3}, {5, 5}}) sweepRectangles<T, L>(function, mask, everyNth(shapes, 4));
     for (QorImageSize mask : {QorImageSize{1, 1}, {3, 1}, {5, 1}, {1, 3}, {1, 5}, {7, 7}, {5, 3}, {1, 7}, {9, 1}})
         sweepRectangles<T, L>(function, mask, everyNth(shapes, 31));
-    // Masks beyond the region, of more rows than a byte counts, of more elements than a word does, of more columns
-    // than a byte names.
-    for (QorImageSize mask : {QorImageSize{15, 21}, {61, 61}, {3, 257}, {257, 3}, {129, 1}, {183, 181}}) {
+    // Masks beyond the region, of more rows than a byte counts, of more elements than a word does with a sign or
+    // without, of more columns than a byte names.
+    for (QorImageSize mask : {QorImageSize{15, 21}, {61, 61}, {3, 257}, {257, 3}, {129, 1}, {183, 181}, {257, 257}}) {
         const int width = 1 + random().below(40), height = 1 + random().below(4);
         sweepRectangles<T, L>(function, mask, {{.width = width, .height = height, .padding = 7}});
     }

@@ -190,6 +190,5 @@ bool ColumnBands<lanes>::medians(int32_t columns, int32_t width, int32_t below, 
 
 template class ColumnBands<16>;
 template class ColumnBands<32>;
-template class ColumnBands<64>;
 
 }  // namespace qori::kernels

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Medians of bytes from counts of few thresholds. Where windows are large their medians differ little along a row, so
 // that column histograms need not know all values: of every column it is counted how many elements are up to each of
-// 16, 32 or 64 thresholds, those around the medians. Sums over the columns of a window follow it from pixel to pixel; a
+// 16 or 32 thresholds, those around the medians. Sums over the columns of a window follow it from pixel to pixel; a
 // median is the first threshold up to which there are more than half, if the threshold before is one less. Otherwise
 // it is not among them, which is said, and they have to be chosen anew. No branch depends on the elements.
 #pragma once
@@ -12,7 +12,7 @@ namespace qori::kernels {
 
 /// Ascending; -1 stands before the value 0.
 struct Thresholds {
-    static constexpr int kMost = 64;
+    static constexpr int kMost = 32;
     int16_t at[kMost];
     int count = 0;
 };
@@ -55,6 +55,5 @@ private:
 
 extern template class ColumnBands<16>;
 extern template class ColumnBands<32>;
-extern template class ColumnBands<64>;
 
 }  // namespace qori::kernels
