@@ -62,12 +62,26 @@ struct Frequencies {
     int32_t first, apart;
 };
 
-/// The last stage, of blocks of `radix` lines: calls write(frequency, line) for each line of its results.
+/// Whether a first-level cache of 64 sets of 8 lines or more keeps the rows of a block from when they are read to when
+/// they are written: those a power of two apart share few sets.
+bool areKept(const LineColumns& columns) {
+    constexpr ptrdiff_t sets = 64, ways = 8, least = kLineBytes, most = sets * kLineBytes;
+    const ptrdiff_t step = columns.rows.step, power = step & -step;
+    return columns.rows.count <= ways * most / (power < least ? least : power > most ? most : power);
+}
+
+/// The last stage, of blocks of `radix` lines: calls write(frequency, line) for each line of its results, whose rows
+/// are those of `to`. Rows that are no longer in the cache are asked for before the butterfly, as stores wait for each
+/// other.
 template <int radix, class Write>
-QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Frequencies f, Write write) {
+QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to,
+                           Write write) {
     const int32_t part = table.points / radix;
     const int32_t* const positions = table.positions();
+    const bool isAhead = !areKept(to);
     for (int32_t k = f.first; k < part; k += f.apart) {
+        for (int p = 0; p < radix && isAhead; ++p)
+            _mm_prefetch(reinterpret_cast<const char*>(rowOf(to, k + ptrdiff_t{p} * part)), _MM_HINT_T0);
         const float* const x = lines + ptrdiff_t{positions[k]} * kLineFloats;
         ComplexLine a[radix];
         for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * kLineFloats);
@@ -80,7 +94,7 @@ QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Freque
 template <int radix, bool isExchanged, class Lanes>
 QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to) {
     lastStage<radix>(
-        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+        table, lines, f, to, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             Lanes::write(rowOf(to, y), exchangedIf<isExchanged>(a));
         });
 }
@@ -92,7 +106,7 @@ QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines,
     const __m256i next = _mm256_setr_epi32(1, 2, 3, 4, 5, 6, 7, 0);
     constexpr int last = 0x80;
     lastStage<radix>(
-        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+        table, lines, f, to, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             float* const row = rowOf(to, y);
             Vec<float> low, high;
             line::interleave(a, low, high);
@@ -109,7 +123,7 @@ template <int radix>
 QORI_NOINLINE void passOutShiftedByFour(const FourierTable& table, const float* lines, Frequencies f, float* carry,
                                         const LineColumns& to) {
     lastStage<radix>(
-        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+        table, lines, f, to, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             float *const row = rowOf(to, y), *const carried = carry + 4 * y;
             const __m128 behind = _mm_loadu_ps(carried), lastImaginary = _mm256_extractf128_ps(a.im.v, 1);
             _mm_storeu_ps(carried, _mm256_castps256_ps128(a.re.v));
