@@ -166,10 +166,7 @@ void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& 
         const bool alone = areAlone(plan.size);
         forEachRows(plan, images, alone ? kColumns : 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
             kernels::spectraToPairs(dst, width, plan.rowInverse, alone, w.lines);
-            forEachLines(plan, images, w.lines, [&](float* lines) {
-                kernels::joinPairs(lines, width);
-                kernels::transformLines(table, lines, w.work);
-            });
+            forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
             kernels::pairsToRows(w.lines, table->positions(), width, dst);
         });
     }
