@@ -13,10 +13,12 @@ int32_t pointsOfRow(int32_t width, Elements elements) {
     return elements == Elements::complex || width % 2 == 1 ? width : width / 2;
 }
 
-bool isShort(int32_t width, Elements elements) { return elements != Elements::complex && kernels::isShortRow(width); }
+bool isShort(QorImageSize size, Elements elements) {
+    return elements != Elements::complex && kernels::isShortRow(size.width, size.height);
+}
 
-bool isHalved(int32_t width, Elements elements) {
-    return elements != Elements::complex && width % 2 == 0 && !isShort(width, elements);
+bool isHalved(QorImageSize size, Elements elements) {
+    return elements != Elements::complex && size.width % 2 == 0 && !isShort(size, elements);
 }
 
 /// Pixels that no buffer holds, and whose bytes 64 bits do.
@@ -43,18 +45,18 @@ FourierSizes::FourierSizes(QorImageSize size, Elements elements) {
     BlockLayout record, buffer;
     record.add(sizeof(FourierPlan));
     plan.size = size;
-    plan.hasShortRows = isShort(size.width, elements);
+    plan.hasShortRows = isShort(size, elements);
     plan.rowTable =
         place(record, plan.hasShortRows ? kernels::shortRowTableBytes(size.width) : kernels::fourierTableBytes(points));
     plan.columnTable = place(record, kernels::fourierTableBytes(size.height));
     if (elements != Elements::complex && kernels::areShortColumns(size.width, size.height))
         plan.shortColumnTable = place(record, kernels::shortRowTableBytes(size.height));
-    if (isHalved(size.width, elements)) plan.halfRoots = place(record, kernels::halfRootsBytes(size.width));
+    if (isHalved(size, elements)) plan.halfRoots = place(record, kernels::halfRootsBytes(size.width));
     planBytes = record.bytes() + kBlockAlignment;
 
     const int64_t ofRows = plan.hasShortRows ? 0 : kernels::fourierInitBytes(points);
     initBytes = std::max(ofRows, kernels::fourierInitBytes(size.height));
-    if (isHalved(size.width, elements)) initBytes = std::max(initBytes, kernels::halfRootsInitBytes(size.width));
+    if (isHalved(size, elements)) initBytes = std::max(initBytes, kernels::halfRootsInitBytes(size.width));
     if (initBytes > 0) initBytes += kBlockAlignment;
 
     // Rows are turned with all of their channels, columns eight at a time whichever they are.
@@ -91,7 +93,10 @@ void fillFourierPlan(QorFft2DPlan* block, const FourierSizes& sizes, int32_t tag
     kernels::makeFourierTable(tableOf<kernels::FourierTable>(plan, plan->columnTable), plan->size.height, memory);
     if (plan->shortColumnTable != 0)
         kernels::makeShortRowTable(tableOf<kernels::ShortRowTable>(plan, plan->shortColumnTable), plan->size.height);
-    if (plan->halfRoots != 0) kernels::makeHalfRoots(tableOf<float>(plan, plan->halfRoots), plan->size.width, memory);
+    if (plan->hasWideHalves())
+        kernels::makeWideHalfRoots(tableOf<double>(plan, plan->halfRoots), plan->size.width);
+    else if (plan->halfRoots != 0)
+        kernels::makeHalfRoots(tableOf<float>(plan, plan->halfRoots), plan->size.width, memory);
 }
 
 }  // namespace qori::transform

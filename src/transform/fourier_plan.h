@@ -39,6 +39,9 @@ struct FourierPlan {
     }
     const kernels::FourierTable* columns() const { return tableOf<kernels::FourierTable>(this, columnTable); }
     const float* roots() const { return tableOf<float>(this, halfRoots); }
+    /// Roots are doubles, in as many bytes.
+    bool hasWideHalves() const { return halfRoots != 0 && kernels::hasWideHalves(size.width, size.height); }
+    const double* wideRoots() const { return tableOf<double>(this, halfRoots); }
 };
 
 /// Every size that has to do with a plan.

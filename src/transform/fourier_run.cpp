@@ -118,8 +118,15 @@ void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& 
     else if (plan.halfRoots != 0)
         forEachRows(plan, images, kColumns, [&](const LineRows& src, const LineRows& dst) {
             kernels::rowsToLines(src, width, plan.rowForward, Parts::inOrder, w.lines);
-            forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
-            kernels::halvesToRows(w.lines, width, table->positions(), plan.roots(), dst);
+            const bool isWide = plan.hasWideHalves();
+            forEachLines(plan, images, w.lines, [&](float* lines) {
+                kernels::transformLines(table, lines, w.work);
+                if (isWide) kernels::splitWideHalves(lines, width, table->positions(), plan.wideRoots());
+            });
+            if (isWide)
+                kernels::linesToRows(w.lines, table->positions(), width, Parts::inOrder, dst);
+            else
+                kernels::halvesToRows(w.lines, width, table->positions(), plan.roots(), dst);
         });
     else {
         const bool alone = areAlone(plan.size);
@@ -144,18 +151,22 @@ void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& 
         });
     else if (plan.halfRoots != 0)
         forEachRows(plan, images, kColumns, [&](const LineRows&, const LineRows& dst) {
-            kernels::rowsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
-            forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
+            const bool isWide = plan.hasWideHalves();
+            if (isWide)
+                kernels::rowsToLines(dst, width, plan.rowInverse, Parts::inOrder, w.lines);
+            else
+                kernels::rowsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
+            forEachLines(plan, images, w.lines, [&](float* lines) {
+                if (isWide) kernels::joinWideHalves(lines, width, plan.wideRoots());
+                kernels::transformLines(table, lines, w.work);
+            });
             kernels::linesToRows(w.lines, table->positions(), width, Parts::exchanged, dst);
         });
     else {
         const bool alone = areAlone(plan.size);
         forEachRows(plan, images, alone ? kColumns : 2 * kColumns, [&](const LineRows&, const LineRows& dst) {
             kernels::spectraToPairs(dst, width, plan.rowInverse, alone, w.lines);
-            forEachLines(plan, images, w.lines, [&](float* lines) {
-                kernels::joinPairs(lines, width);
-                kernels::transformLines(table, lines, w.work);
-            });
+            forEachLines(plan, images, w.lines, [&](float* lines) { kernels::transformLines(table, lines, w.work); });
             kernels::pairsToRows(w.lines, table->positions(), width, dst);
         });
     }

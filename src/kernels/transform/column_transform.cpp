@@ -62,12 +62,31 @@ struct Frequencies {
     int32_t first, apart;
 };
 
-/// The last stage, of blocks of `radix` lines: calls write(frequency, line) for each line of its results.
+/// Of a first-level cache of 64 sets of 8 lines or more: rows a power of two apart share few.
+bool areKept(const LineRows& rows) {
+    constexpr ptrdiff_t sets = 64, ways = 8, least = kLineBytes, most = sets * kLineBytes;
+    const ptrdiff_t power = rows.step & -rows.step;
+    return rows.count <= ways * most / (power < least ? least : power > most ? most : power);
+}
+
+/// Stores wait for each other: rows that are in a second-level cache, but no longer in the first, are asked for before.
+/// Others are written as whole lines, which need not be fetched.
+bool areAskedFor(const LineColumns& from, const LineColumns& to) {
+    const bool isSmall = to.rows.count * to.rows.step <= 1 << 21;
+    return !areKept(to.rows) && (from.rows.first == to.rows.first || isSmall);
+}
+
+/// The last stage, of blocks of `radix` lines: calls write(frequency, line) for each line of its results, whose rows
+/// are those of `to`.
 template <int radix, class Write>
-QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Frequencies f, Write write) {
+QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to,
+                           bool isAhead, Write write) {
     const int32_t part = table.points / radix;
     const int32_t* const positions = table.positions();
     for (int32_t k = f.first; k < part; k += f.apart) {
+        if (isAhead)
+            for (int p = 0; p < radix; ++p)
+                _mm_prefetch(reinterpret_cast<const char*>(rowOf(to, k + ptrdiff_t{p} * part)), _MM_HINT_T0);
         const float* const x = lines + ptrdiff_t{positions[k]} * kLineFloats;
         ComplexLine a[radix];
         for (int q = 0; q < radix; ++q) a[q] = line::loadLine(x + q * kLineFloats);
@@ -78,9 +97,10 @@ QORI_INLINE void lastStage(const FourierTable& table, const float* lines, Freque
 
 /// To rows of the image.
 template <int radix, bool isExchanged, class Lanes>
-QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to) {
+QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Frequencies f, const LineColumns& to,
+                           bool isAhead) {
     lastStage<radix>(
-        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+        table, lines, f, to, isAhead, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             Lanes::write(rowOf(to, y), exchangedIf<isExchanged>(a));
         });
 }
@@ -88,11 +108,11 @@ QORI_NOINLINE void passOut(const FourierTable& table, const float* lines, Freque
 /// The same into rows that begin an element earlier, on the boundaries of what was read.
 template <int radix>
 QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines, Frequencies f, float* carry,
-                                  const LineColumns& to) {
+                                  const LineColumns& to, bool isAhead) {
     const __m256i next = _mm256_setr_epi32(1, 2, 3, 4, 5, 6, 7, 0);
     constexpr int last = 0x80;
     lastStage<radix>(
-        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+        table, lines, f, to, isAhead, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             float* const row = rowOf(to, y);
             Vec<float> low, high;
             line::interleave(a, low, high);
@@ -107,9 +127,9 @@ QORI_NOINLINE void passOutShifted(const FourierTable& table, const float* lines,
 /// The same of four channels: rows begin four elements earlier, and carry as many.
 template <int radix>
 QORI_NOINLINE void passOutShiftedByFour(const FourierTable& table, const float* lines, Frequencies f, float* carry,
-                                        const LineColumns& to) {
+                                        const LineColumns& to, bool isAhead) {
     lastStage<radix>(
-        table, lines, f, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
+        table, lines, f, to, isAhead, [&](ptrdiff_t y, const ComplexLine& a) __attribute__((always_inline)) {
             float *const row = rowOf(to, y), *const carried = carry + 4 * y;
             const __m128 behind = _mm_loadu_ps(carried), lastImaginary = _mm256_extractf128_ps(a.im.v, 1);
             _mm_storeu_ps(carried, _mm256_castps256_ps128(a.re.v));
@@ -154,12 +174,13 @@ void transformFused(const FourierTable& table, const LineColumns& from, float sc
 template <class Lanes>
 void transformFused(const FourierTable& table, const LineColumns& from, const LineColumns& to, float scale, Parts parts,
                     float* lines) {
+    const bool isAhead = areAskedFor(from, to);
     if (parts == Parts::inOrder)
         transformFused<false, Lanes>(table, from, scale, lines,
-                                     [&](Frequencies f) { passOut<8, false, Lanes>(table, lines, f, to); });
+                                     [&](Frequencies f) { passOut<8, false, Lanes>(table, lines, f, to, isAhead); });
     else
         transformFused<true, Lanes>(table, from, scale, lines,
-                                    [&](Frequencies f) { passOut<8, true, Lanes>(table, lines, f, to); });
+                                    [&](Frequencies f) { passOut<8, true, Lanes>(table, lines, f, to, isAhead); });
 }
 
 bool isWhole(const LineColumns& columns) {
@@ -193,11 +214,13 @@ bool areColumnsShiftable(const FourierTable* table, const LineColumns& columns) 
 
 void transformColumnsShifted(const FourierTable* table, const LineColumns& columns, float scale, float* carry,
                              float* lines) {
+    const bool isAhead = areAskedFor(columns, columns);
     if (columns.rows.channels == 1)
-        return transformFused<false, PlainLanes>(
-            *table, columns, scale, lines, [&](Frequencies f) { passOutShifted<8>(*table, lines, f, carry, columns); });
+        return transformFused<false, PlainLanes>(*table, columns, scale, lines, [&](Frequencies f) {
+            passOutShifted<8>(*table, lines, f, carry, columns, isAhead);
+        });
     transformFused<false, FourChannelLanes>(*table, columns, scale, lines, [&](Frequencies f) {
-        passOutShiftedByFour<8>(*table, lines, f, carry, columns);
+        passOutShiftedByFour<8>(*table, lines, f, carry, columns, isAhead);
     });
 }
 

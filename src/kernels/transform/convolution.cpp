@@ -3,7 +3,7 @@
 //
 // A prime p: with a generator g of the numbers modulo p, frequency g^-m is the first point and the sum over k of
 // x(g^k) e^(-2 pi i g^(k - m) / p), a convolution of p - 1 points (Rader: Discrete Fourier transforms when the number
-// of data samples is prime, 1968). It is used where p - 1 has small factors.
+// of data samples is prime, 1968).
 //
 // Any n: with jk = (j^2 + k^2 - (k - j)^2) / 2, the sum over j of x(j) e^(-2 pi i jk / n) is a chirp times the
 // convolution of x times the chirp with the chirp's conjugate (Bluestein: A linear filtering approach to the
@@ -49,19 +49,23 @@ struct Convolution {
     float* block;
 };
 
-/// Points times a chirp, which are less than half of the convolution's, 0 behind them; frequencies in order.
-struct ChirpOrder {
+/// Points times a chirp, which are at most half of the convolution's, 0 behind them; frequencies in order. Without a
+/// chirp they are part of another convolution, which goes on between exchanged parts.
+template <bool hasChirp>
+struct PaddedOrder {
     const float* chirp;
     ptrdiff_t points;
 
     /// How many of the parts of an outer stage hold points.
-    static constexpr int filled(int radix) { return (radix + 1) / 2; }
+    static constexpr int filled(int radix) { return radix / 2; }
     QORI_INLINE ComplexLine load(const float* block, ptrdiff_t i) const {
         if (i >= points) return {zero<float>(), zero<float>()};
-        return line::times(line::loadLine(block + i * kLineFloats), chirp + 2 * i);
+        const ComplexLine a = line::loadLine(block + i * kLineFloats);
+        return hasChirp ? line::times(a, chirp + 2 * i) : a;
     }
     QORI_INLINE void store(float* block, ptrdiff_t i, ComplexLine a) const {
-        if (i < points) line::storeLine(block + i * kLineFloats, line::times(a, chirp + 2 * i));
+        if (i >= points) return;
+        line::storeLine(block + i * kLineFloats, hasChirp ? line::times(a, chirp + 2 * i) : exchanged(a));
     }
 };
 
@@ -149,23 +153,29 @@ void turnBackBy(int32_t radix, float* lines, ptrdiff_t points, const float* spec
     }
 }
 
-/// Forth and back from a stage on. Large blocks are divided first.
-void convolveBlock(const FourierTable& inner, int32_t stage, float* lines, ptrdiff_t points, const float* spectrum,
-                   float* first) {
-    const int32_t last = inner.stageCount - 1;
-    if (stage < last && points > line::kPointsAtOnce) {
+void convolvePart(const Convolution& c, float* work, ptrdiff_t at, float* first);
+
+/// Forth and back from a stage on, of points from `at` on. Large blocks are divided first.
+void convolveBlock(const Convolution& c, int32_t stage, float* work, ptrdiff_t at, ptrdiff_t points, float* first) {
+    const FourierTable& inner = c.inner;
+    const ptrdiff_t part = inner.convolvedPoints;
+    const int32_t end = part > 1 ? inner.stageCount : inner.stageCount - 1;
+    float* const lines = work + at * kLineFloats;
+    if (stage < end && points > line::kPointsAtOnce) {
         const FourierTable::Stage& divided = inner.stages[stage];
         line::runStage(inner, divided, lines, 1);
-        const ptrdiff_t part = points / divided.radix;
+        const ptrdiff_t apart = points / divided.radix;
         for (ptrdiff_t i = 0; i < divided.radix; ++i)
-            convolveBlock(inner, stage + 1, lines + i * part * kLineFloats, part, spectrum + 2 * i * part,
-                          i == 0 ? first : nullptr);
+            convolveBlock(c, stage + 1, work, at + i * apart, apart, i == 0 ? first : nullptr);
         return line::runStageBack(inner, divided, lines, 1);
     }
-    for (int32_t i = stage; i < last; ++i)
+    for (int32_t i = stage; i < end; ++i)
         line::runStage(inner, inner.stages[i], lines, points / inner.stages[i].length);
-    turnBackBy(inner.stages[last].radix, lines, points, spectrum, first);
-    for (int32_t i = last - 1; i >= stage; --i)
+    if (part == 1)
+        turnBackBy(inner.stages[end].radix, lines, points, c.spectrum + 2 * at, first);
+    else
+        for (ptrdiff_t i = 0; i < points; i += part) convolvePart(c, work, at + i, i == 0 ? first : nullptr);
+    for (int32_t i = end - 1; i >= stage; --i)
         line::runStageBack(inner, inner.stages[i], lines, points / inner.stages[i].length);
 }
 
@@ -174,31 +184,29 @@ template <int radix, bool isRotated, class Order>
 void convolveFrom(const Convolution& c, Order order, float* work, float* first) {
     enter<radix, isRotated>(c, order, work);
     const ptrdiff_t part = c.inner.points / radix;
-    for (ptrdiff_t i = 0; i < radix; ++i)
-        convolveBlock(c.inner, 1, work + i * part * kLineFloats, part, c.spectrum + 2 * i * part,
-                      i == 0 ? first : nullptr);
+    for (ptrdiff_t i = 0; i < radix; ++i) convolveBlock(c, 1, work, i * part, part, i == 0 ? first : nullptr);
     leave<radix, isRotated>(c, order, work);
 }
 
-template <int radix, class Order>
-void convolveFrom(const Convolution& c, Order order, float* work, float* first) {
-    if constexpr (line::isOdd<radix>)
-        if (c.inner.stages[0].rotation != 0) return convolveFrom<radix, true>(c, order, work, first);
-    convolveFrom<radix, false>(c, order, work, first);
+template <int radix>
+void convolveFrom(const Convolution& c, const RotatedOrder& order, float* work, float* first) {
+    if (c.inner.stages[0].rotation != 0)
+        convolveFrom<radix, true>(c, order, work, first);
+    else
+        convolveFrom<radix, false>(c, order, work, first);
 }
 
 /// Where the first radix has no kernel of its own, points are put in order before and behind all stages.
-template <class Order>
-void convolveInOrder(const Convolution& c, Order order, float* work, float* first) {
+void convolveInOrder(const Convolution& c, const RotatedOrder& order, float* work, float* first) {
     for (ptrdiff_t i = 0; i < c.inner.points; ++i) line::storeLine(work + i * kLineFloats, order.load(c.block, i));
-    convolveBlock(c.inner, 0, work, c.inner.points, c.spectrum, first);
+    convolveBlock(c, 0, work, 0, c.inner.points, first);
     for (ptrdiff_t i = 0; i < c.inner.points; ++i)
         order.store(c.block, i, exchanged(line::loadLine(work + i * kLineFloats)));
 }
 
-template <class Order>
-void convolve(const Convolution& c, Order order, float* work, float* first) {
+void convolve(const Convolution& c, const RotatedOrder& order, float* work, float* first) {
     switch (c.inner.stages[0].radix) {
+        case 2: return convolveFrom<2, true>(c, order, work, first);  // the only even factor
         case 3: return convolveFrom<3>(c, order, work, first);
         case 4: return convolveFrom<4>(c, order, work, first);
         case 5: return convolveFrom<5>(c, order, work, first);
@@ -206,6 +214,23 @@ void convolve(const Convolution& c, Order order, float* work, float* first) {
         case 8: return convolveFrom<8>(c, order, work, first);
         default: return convolveInOrder(c, order, work, first);
     }
+}
+
+template <bool hasChirp>
+void convolve(const Convolution& c, const PaddedOrder<hasChirp>& order, float* work, float* first) {
+    if (c.inner.stages[0].radix == 8)
+        convolveFrom<8, false>(c, order, work, first);
+    else
+        convolveFrom<4, false>(c, order, work, first);
+}
+
+/// The work of a part is behind that of the whole.
+void convolvePart(const Convolution& c, float* work, ptrdiff_t at, float* first) {
+    const FourierTable& padded = *c.inner.at<FourierTable>(c.inner.inner);
+    const ptrdiff_t points = c.inner.convolvedPoints;
+    const float* const spectrum = c.inner.at<float>(c.inner.spectrumAt) + 2 * (at / points * padded.points);
+    convolve(Convolution{padded, spectrum, work + at * kLineFloats}, PaddedOrder<false>{nullptr, points},
+             work + c.inner.points * ptrdiff_t{kLineFloats}, first);
 }
 
 }  // namespace
@@ -216,7 +241,7 @@ void line::transformByConvolution(const FourierTable& table, float* block, float
         const auto* const powers = table.at<int32_t>(table.factorsAt);
         return convolve(c, RotatedOrder{powers, powers + c.inner.points}, work, block);
     }
-    convolve(c, ChirpOrder{table.at<float>(table.factorsAt), table.convolvedPoints}, work, nullptr);
+    convolve(c, PaddedOrder<true>{table.at<float>(table.factorsAt), table.convolvedPoints}, work, nullptr);
 }
 
 }  // namespace qori::kernels

@@ -51,14 +51,16 @@ struct FourierTable {
     };
 
     int32_t points, stageCount;
-    /// The length of the blocks that the stages leave; above 1 it is a prime whose predecessor has small factors
-    /// (isRotated), or a product of large primes. Each block is convolved, with roots of unity in the order of a
-    /// generator's powers or with a chirp, by transforms of the table at `inner`.
+    /// The length of the blocks that the stages leave; above 1 it is a prime, or a product of large primes. Each block
+    /// is convolved, with roots of unity in the order of a generator's powers (isRotated) or with a chirp, by
+    /// transforms of the table at `inner`. Where the stages of that one leave blocks again, they are parts of the
+    /// convolution, each cyclic, and go through longer ones by transforms of its own inner table.
     int32_t convolvedPoints;
     bool isRotated;
     int32_t positionsAt, factorsAt, spectrumAt, inner;
     Stage stages[kMostStages];
 
+    /// Of tables that are not inner ones.
     const int32_t* positions() const { return at<int32_t>(positionsAt); }
     template <class T>
     const T* at(int32_t offset) const {

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
-// Tables of transforms: factors of the length, twiddles, the order of frequencies, what blocks are convolved with.
-#include <initializer_list>
-
-#include "fourier.h"
+// Tables of transforms: twiddles, the order of frequencies, what blocks are convolved with.
+#include "factors.h"
 #include "roots.h"
 
 namespace qori::kernels {
 namespace {
+
+using line::Factors, line::TableUse;
 
 /// Lengths up to this one make every root anew and take no memory for it.
 constexpr int64_t kMostWithoutMemory = 1024;
@@ -16,90 +16,33 @@ constexpr int64_t kMostSmall = kMostPrimeFactor - 1;
 
 constexpr int64_t inLines(int64_t bytes) { return (bytes + kLineBytes - 1) / kLineBytes * kLineBytes; }
 
-constexpr bool isPrime(int64_t n) {
-    for (int64_t i = 3; i * i <= n; i += 2)
-        if (n % i == 0) return false;
-    return true;
-}
-
-/// Calls each(prime) for the prime factors of n up to a bound, as often as they divide it; returns what is left.
-template <class Each>
-constexpr int64_t forPrimeFactors(int64_t n, int64_t bound, Each each) {
-    for (int64_t prime = 2; prime <= bound; ++prime)
-        for (; n % prime == 0; n /= prime) each(prime);
-    return n;
-}
-
-/// Primes whose predecessor's factors without kernels of their own have a small sum are convolved: a stage of radix q
-/// costs about 2 q a point, forth and back, a convolution with a chirp 200 to 300 points' worth of vector operations
-/// for each of its own. Primes that could be summed, (p - 1)^2 / 2 operations, gain from 67 on where that sum is next
-/// to nothing.
-constexpr int64_t kLeastRotated = 67, kMostSum = 45, kMostSumOfSummed = 13;
-constexpr bool isRotatable(int64_t n) {
-    if (n < kLeastRotated) return false;
-    const int64_t most = n <= kMostPrimeFactor ? kMostSumOfSummed : kMostSum;
-    int64_t sum = 0;
-    const int64_t left = forPrimeFactors(n - 1, most, [&](int64_t prime) { sum += prime > 7 ? prime : 0; });
-    return left == 1 && sum <= most && isPrime(n);
-}
-
-struct Factors {
-    int32_t radix[FourierTable::kMostStages];
-    int32_t count = 0;
-    int64_t convolved;
-
-    /// Odd primes from the largest, then a 2 or 4s, then 8s, of which the last has no twiddles.
-    explicit Factors(int64_t n) : convolved(n) {
-        for (int32_t prime = kMostPrimeFactor; prime >= 3; prime -= 2)
-            if (isPrime(prime))
-                for (; convolved % prime == 0; convolved /= prime) radix[count++] = prime;
-        int32_t twos = 0;
-        for (; convolved % 2 == 0; convolved /= 2) ++twos;
-        if (convolved == 1 && count > 0 && isRotatable(radix[0])) {
-            convolved = radix[0];
-            for (int32_t i = 1; i < count; ++i) radix[i - 1] = radix[i];
-            --count;
-        }
-        if (twos == 1) radix[count++] = 2, twos = 0;
-        for (; twos % 3 != 0; twos -= 2) radix[count++] = 4;
-        for (; twos > 0; twos -= 3) radix[count++] = 8;
-    }
-};
-
-/// The shortest cyclic convolution of small factors that holds a chirp's linear one; powers of two, of few stages, are
-/// worth a twentieth. Its twos are 3 or more: the last stage is not of radix 2.
-int64_t convolutionPoints(int64_t chirp) {
-    const int64_t least = 2 * chirp - 1;
-    const auto from = [=](int64_t n) {
-        while (n < least) n *= 2;
-        return n;
-    };
-    int64_t best = from(8);
-    int64_t mostOdd = best - best / 20;
-    for (int64_t odd : {3, 5, 9, 15, 25, 27, 45, 75})
-        if (from(8 * odd) <= mostOdd) best = mostOdd = from(8 * odd);
-    return best;
-}
-
-/// b of a b = 1 modulo a prime.
-int32_t inverseOf(int64_t a, int32_t prime) {
+/// b of a b = 1 modulo a number that has no factor in common with a.
+int32_t inverseOf(int64_t a, int32_t n) {
     int32_t b = 1;
-    while (a * b % prime != 1) ++b;
+    while (a * b % n != 1) ++b;
     return b;
+}
+
+/// Twiddles are spared a stage of odd radix, and the first one of a prime's convolution, whose points are not in order
+/// anyway.
+constexpr bool isStageRotated(int64_t radix, int64_t part, bool isFirstOfPrime) {
+    if (part == 1) return false;
+    return radix % 2 == 1 ? part % radix != 0 : isFirstOfPrime && part % 2 == 1;
 }
 
 /// The record's fields and its bytes. Offsets count only where the bytes are below 2^31.
 struct FourierLayout {
     FourierTable table{};
     int64_t bytes = inLines(sizeof(FourierTable));
-    int64_t convolution = 0;
+    int64_t convolution = 0;  ///< Points of the inner table's transform,
+    int64_t padded = 0;       ///< and of its own inner one's.
 
-    explicit FourierLayout(int64_t n) {
-        const Factors factors(n);
+    QORI_NOINLINE explicit FourierLayout(int64_t n, TableUse use = TableUse::alone) {
+        const Factors factors(n, use);
         table.points = static_cast<int32_t>(n);
         table.stageCount = factors.count;
         table.convolvedPoints = static_cast<int32_t>(factors.convolved);
-        table.isRotated = isRotatable(factors.convolved);
+        table.isRotated = use == TableUse::alone && line::isRotatable(factors.convolved);
         int64_t length = n;
         for (int32_t i = 0; i < factors.count; ++i) {
             const int32_t radix = factors.radix[i];
@@ -108,18 +51,23 @@ struct FourierLayout {
             stage.length = static_cast<int32_t>(length);
             stage.turns = radix % 2 == 1 ? add((radix / 2) * (radix / 2) * 8) : 0;
             const int64_t part = length / radix;
-            if (part > 1 && radix % 2 == 1 && part % radix != 0)
+            if (isStageRotated(radix, part, use == TableUse::prime && i == 0))
                 stage.rotation = inverseOf(part % radix, radix);
             else if (part > 1)
                 stage.twiddles = add(part * (radix - 1) * 8);
             length /= radix;
         }
-        table.positionsAt = add(4 * n);
+        if (use == TableUse::alone) table.positionsAt = add(4 * n);
         if (factors.convolved == 1) return;
-        convolution = table.isRotated ? factors.convolved - 1 : convolutionPoints(factors.convolved);
-        table.factorsAt = add(8 * factors.convolved);
-        table.spectrumAt = add(8 * convolution);
-        table.inner = add(FourierLayout(convolution).bytes);
+        convolution = table.isRotated ? factors.convolved - 1 : line::convolutionPoints(factors.convolved);
+        const FourierLayout inner = ofConvolution();
+        padded = inner.convolution;
+        if (use == TableUse::alone) table.factorsAt = add(8 * factors.convolved);
+        if (padded == 0) table.spectrumAt = add(8 * convolution * (use == TableUse::prime ? n / factors.convolved : 1));
+        table.inner = add(inner.bytes);
+    }
+    FourierLayout ofConvolution() const {
+        return FourierLayout(convolution, table.isRotated ? TableUse::prime : TableUse::chirp);
     }
 
 private:
@@ -174,41 +122,64 @@ void fillStages(FourierTable* table, const Roots& roots) {
     }
 }
 
-/// A transform in double precision, by the factors of n one after the other.
-void transformDoubles(const Root* in, int64_t stride, Root* out, int64_t n, const Roots& roots, int64_t ratio) {
-    if (n == 1) {
-        *out = *in;
-        return;
-    }
-    int64_t radix = 2;
-    while (n % radix != 0) ++radix;
-    const int64_t part = n / radix;
-    for (int64_t q = 0; q < radix; ++q)
-        transformDoubles(in + q * stride, stride * radix, out + q * part, part, roots, ratio * radix);
-    for (int64_t k = 0; k < part; ++k) {
-        Root sum[kMostSum] = {};
-        for (int64_t p = 0; p < radix; ++p)
-            for (int64_t q = 0; q < radix; ++q) {
-                const Root term = out[q * part + k] * roots(q * (k + p * part) * ratio);
-                sum[p] = {sum[p].re + term.re, sum[p].im + term.im};
+/// The stages of a table in double precision: points come to lie as lines do.
+QORI_NOINLINE void runStages(const FourierTable& table, Root* points, const Roots& roots) {
+    for (int32_t i = 0; i < table.stageCount; ++i) {
+        const FourierTable::Stage& stage = table.stages[i];
+        const int32_t radix = stage.radix, part = stage.part();
+        const int64_t ratio = table.points / stage.length;
+        Root turns[kMostPrimeFactor], in[kMostPrimeFactor];
+        for (int32_t q = 0; q < radix; ++q) turns[q] = rootOfUnity(q, radix);
+        for (int32_t block = 0; block < table.points; block += stage.length)
+            for (int32_t j = 0, start = 0; j < part; ++j) {
+                Root* const at = points + block + j;
+                for (int32_t q = 0; q < radix; ++q) in[q] = at[ptrdiff_t{(start + q) % radix} * part];
+                for (int32_t p = 0; p < radix; ++p) {
+                    Root sum = {};
+                    for (int32_t q = 0; q < radix; ++q) {
+                        const Root term = in[q] * turns[p * q % radix];
+                        sum = {sum.re + term.re, sum.im + term.im};
+                    }
+                    at[ptrdiff_t{p} * part] = stage.twiddles == 0 ? sum : sum * roots(j * p * ratio);
+                }
+                start = (start + radix - stage.rotation) % radix;
             }
-        for (int64_t p = 0; p < radix; ++p) out[p * part + k] = sum[p];
     }
 }
 
-/// The transform of a wave of the convolution's length, in the order that the inner transform leaves. Behind the wave
-/// is memory for the transform, and unless each root is to be made anew, for roots.
-void fillSpectrum(FourierTable* table, int64_t convolution, Root* wave) {
-    Root* const spectrum = wave + convolution;
-    const Roots roots(convolution, convolution > kMostSmall ? spectrum + convolution : nullptr);
-    transformDoubles(wave, 1, spectrum, convolution, roots, 1);
-    const int32_t* const positions = table->at<FourierTable>(table->inner)->positions();
-    for (int64_t k = 0; k < convolution; ++k)
-        storeRoot(table->at<float>(table->spectrumAt) + 2 * ptrdiff_t{positions[k]}, spectrum[k]);
+/// Memory of the steps that make spectra.
+struct SpectrumMemory {
+    Root *wave, *padded;
+    void* roots;  ///< Null: each is made anew.
+};
+
+void storeSpectrum(const FourierTable& inner, Root* wave, void* memory, float* out) {
+    runStages(inner, wave, Roots(inner.points, memory));
+    for (int32_t k = 0; k < inner.points; ++k) storeRoot(out + 2 * ptrdiff_t{k}, wave[k]);
+}
+
+/// What the frequencies of a convolution are multiplied with, in the order that its stages leave. Where they leave
+/// parts, what each of these is convolved with goes around on both sides of point 0.
+void fillSpectrum(FourierTable* table, const SpectrumMemory& memory) {
+    auto* const inner = table->at<FourierTable>(table->inner);
+    const int32_t part = inner->convolvedPoints;
+    if (part == 1) return storeSpectrum(*inner, memory.wave, memory.roots, table->at<float>(table->spectrumAt));
+    runStages(*inner, memory.wave, Roots(inner->points, memory.roots));
+    const FourierTable& ofPart = *inner->at<FourierTable>(inner->inner);
+    auto* out = inner->at<float>(inner->spectrumAt);
+    for (const Root* wave = memory.wave; wave < memory.wave + inner->points; wave += part) {
+        for (int32_t j = 0; j < ofPart.points; ++j) {
+            const int32_t before = ofPart.points - j;
+            memory.padded[j] = j < part ? wave[j] : before < part ? wave[part - before] : Root{};
+        }
+        storeSpectrum(ofPart, memory.padded, memory.roots, out);
+        out += 2 * ptrdiff_t{ofPart.points};
+    }
 }
 
 /// The chirp e^(-i pi j^2 / n), and of the convolution its conjugate around 0.
-void fillChirp(FourierTable* table, int64_t convolution, Root* wave) {
+void fillChirp(FourierTable* table, int64_t convolution, const SpectrumMemory& memory) {
+    Root* const wave = memory.wave;
     const int64_t n = table->convolvedPoints;
     auto* const chirp = table->at<float>(table->factorsAt);
     const auto scale = 1 / static_cast<double>(convolution);
@@ -220,10 +191,10 @@ void fillChirp(FourierTable* table, int64_t convolution, Root* wave) {
         wave[j] = back;
         if (j > 0) wave[convolution - j] = back;
     }
-    fillSpectrum(table, convolution, wave);
+    fillSpectrum(table, memory);
 }
 
-/// A number whose powers modulo a rotatable prime are all but 0: none of its powers by a factor less than p - 1 is 1.
+/// A number whose powers modulo a prime are all but 0: none of its powers by a factor less than p - 1 is 1.
 int64_t generatorOf(int64_t p) {
     const auto isOne = [=](int64_t base, int64_t exponent) {
         int64_t product = 1;
@@ -231,29 +202,40 @@ int64_t generatorOf(int64_t p) {
             if (exponent % 2 == 1) product = product * base % p;
         return product == 1;
     };
-    for (int64_t g = 2;; ++g) {
-        bool generates = true;
-        forPrimeFactors(p - 1, kMostSum, [&](int64_t prime) { generates &= !isOne(g, (p - 1) / prime); });
-        if (generates) return g;
-    }
+    const auto generates = [=](int64_t g) {
+        int64_t left = p - 1;
+        for (int64_t prime = 2; prime * prime <= left; ++prime) {
+            if (left % prime != 0) continue;
+            if (isOne(g, (p - 1) / prime)) return false;
+            while (left % prime == 0) left /= prime;
+        }
+        return left == 1 || !isOne(g, (p - 1) / left);
+    };
+    int64_t g = 2;
+    while (!generates(g)) ++g;
+    return g;
 }
 
 /// The powers of a generator, which say where points come from, their inverses, where frequencies go, and of the
 /// convolution the roots of unity in the inverses' order.
-void fillRotation(FourierTable* table, Root* wave) {
+void fillRotation(FourierTable* table, const SpectrumMemory& memory) {
+    const FourierTable& inner = *table->at<FourierTable>(table->inner);
     const int64_t p = table->convolvedPoints, generator = generatorOf(p);
     auto* const powers = table->at<int32_t>(table->factorsAt);
     auto* const inverses = powers + (p - 1);
-    const auto scale = 1 / static_cast<double>(p - 1);
+    const bool isPadded = inner.convolvedPoints > 1;
+    const int64_t parts = isPadded ? (p - 1) / inner.convolvedPoints : p - 1;
+    const int64_t padded = isPadded ? inner.at<FourierTable>(inner.inner)->points : 1;
+    const auto scale = 1 / static_cast<double>(parts * padded);
     int64_t power = 1;
     for (int64_t k = 0; k < p - 1; ++k, power = power * generator % p) {
         const int64_t back = k == 0 ? 0 : p - 1 - k;
         powers[k] = static_cast<int32_t>(power);
         inverses[back] = static_cast<int32_t>(power);
         const Root root = rootOfUnity(power, p);
-        wave[back] = {root.re * scale, root.im * scale};
+        memory.wave[back] = {root.re * scale, root.im * scale};
     }
-    fillSpectrum(table, p - 1, wave);
+    fillSpectrum(table, memory);
 }
 
 }  // namespace
@@ -261,33 +243,46 @@ void fillRotation(FourierTable* table, Root* wave) {
 int64_t fourierTableBytes(int64_t n) { return FourierLayout(n).bytes; }
 
 int64_t fourierInitBytes(int64_t n) {
-    const int64_t convolution = FourierLayout(n).convolution;
+    const FourierLayout layout(n);
     const int64_t own = n > kMostWithoutMemory ? Roots::bytes(n) : 0;
+    if (layout.convolution <= kMostSmall) return own;
+    const int64_t longest = layout.convolution > layout.padded ? layout.convolution : layout.padded;
     const int64_t ofConvolution =
-        convolution <= kMostSmall ? 0
-                                  : 2 * convolution * static_cast<int64_t>(sizeof(Root)) + Roots::bytes(convolution);
+        (layout.convolution + layout.padded) * static_cast<int64_t>(sizeof(Root)) + Roots::bytes(longest);
     return own > ofConvolution ? own : ofConvolution;
 }
 
-int64_t fourierWorkBytes(int64_t n) { return kLineBytes * FourierLayout(n).convolution; }
+int64_t fourierWorkBytes(int64_t n) {
+    const FourierLayout layout(n);
+    return kLineBytes * (layout.convolution + layout.padded);
+}
 
 void makeFourierTable(FourierTable* table, int32_t n, void* init) {
     const FourierLayout layout(n);
     *table = layout.table;
-    fillStages(table, Roots(n, n > kMostWithoutMemory ? init : nullptr));
+    const auto fill = [=](FourierTable* of) {
+        fillStages(of, Roots(of->points, of->points > kMostWithoutMemory ? init : nullptr));
+    };
+    fill(table);
     fillPositions(table);
     if (layout.convolution == 0) return;
     auto* const inner = table->at<FourierTable>(table->inner);
-    *inner = FourierLayout(layout.convolution).table;
-    const auto points = layout.convolution;
-    fillStages(inner, Roots(points, points > kMostWithoutMemory ? init : nullptr));
-    fillPositions(inner);
-    Root small[2 * kMostSmall];
-    Root* const wave = points > kMostSmall ? static_cast<Root*>(init) : small;
+    const FourierLayout ofConvolution = layout.ofConvolution();
+    *inner = ofConvolution.table;
+    fill(inner);
+    if (layout.padded > 0) {
+        auto* const ofPart = inner->at<FourierTable>(inner->inner);
+        *ofPart = ofConvolution.ofConvolution().table;
+        fill(ofPart);
+    }
+    Root small[kMostSmall];
+    const bool isSmall = layout.convolution <= kMostSmall;
+    Root *const wave = isSmall ? small : static_cast<Root*>(init), *const padded = wave + layout.convolution;
+    const SpectrumMemory memory{wave, padded, isSmall ? nullptr : padded + layout.padded};
     if (table->isRotated)
-        fillRotation(table, wave);
+        fillRotation(table, memory);
     else
-        fillChirp(table, points, wave);
+        fillChirp(table, layout.convolution, memory);
 }
 
 int64_t halfRootsInitBytes(int64_t n) { return n > kMostWithoutMemory ? Roots::bytes(n) : 0; }

@@ -257,8 +257,44 @@ void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, c
     if (pair.second.count > 0) turnRowsOut(pair.second, n, n * kLineFloats, from(true));
 }
 
+namespace {
+
+/// Element e of eight rows.
+QORI_INLINE Vec<float> turnedElement(line::EightRows rows, ptrdiff_t e) {
+    alignas(kVectorBytes) float lanes[kRows];
+    for (int y = 0; y < kRows; ++y) lanes[y] = *rows.at(y, e);
+    return load(lanes);
+}
+
+/// Two times eight rows of one channel: their frequencies are put together where they are at hand.
+void joinWholePairs(const RowPair& pair, ptrdiff_t n, float scale, float* lines) {
+    const line::EightRows first(pair.first), second(pair.second);
+    const Vec<float> factor = splat(scale);
+    const auto put = [=](ptrdiff_t k, const Vec<float>* a, const Vec<float>* b) {
+        const ComplexLine x = {a[0] * factor, a[1] * factor}, y = {b[0] * factor, b[1] * factor};
+        line::storeLine(lines + k * kLineFloats, ComplexLine{x.im + y.re, x.re - y.im});
+        line::storeLine(lines + (n - k) * kLineFloats, ComplexLine{y.re - x.im, x.re + y.im});
+    };
+    line::storeLine(lines, ComplexLine{turnedElement(second, 0) * factor, turnedElement(first, 0) * factor});
+    ptrdiff_t e = 1;
+    for (; e + 4 <= n; e += 4) {
+        Vec<float> a[4], b[4];
+        line::loadTurned(first, e, a);
+        line::loadTurned(second, e, b);
+        put(e / 2 + 1, a, b);
+        put(e / 2 + 2, a + 2, b + 2);
+    }
+    if (e == n) return;
+    const Vec<float> a[2] = {turnedElement(first, e), turnedElement(first, e + 1)};
+    const Vec<float> b[2] = {turnedElement(second, e), turnedElement(second, e + 1)};
+    put(e / 2 + 1, a, b);
+}
+
+}  // namespace
+
 void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines) {
     const RowPair pair(rows);
+    if (rows.channels == 1 && rows.count == 2 * kRows && !areAlone) return joinWholePairs(pair, n, scale, lines);
     const auto to = [=](bool isMirrored) {
         return [=](ptrdiff_t e) {
             const PackedPlace place(e, n, isMirrored);
@@ -266,9 +302,12 @@ void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlon
         };
     };
     turnRowsIn(pair.first, n, scale, n * kLineFloats, to(false));
-    if (!areAlone) return turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
-    for (int c = 0; c < rows.processed; ++c)
-        for (ptrdiff_t e = 0; e < n; ++e) store(to(true)(e) + c * n * kLineFloats, zero<float>());
+    if (!areAlone)
+        turnRowsIn(pair.secondOrLast(), n, scale, n * kLineFloats, to(true));
+    else
+        for (int c = 0; c < rows.processed; ++c)
+            for (ptrdiff_t e = 0; e < n; ++e) store(to(true)(e) + c * n * kLineFloats, zero<float>());
+    for (int c = 0; c < rows.processed; ++c) joinPairs(lines + c * n * kLineFloats, static_cast<int32_t>(n));
 }
 
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows) {

@@ -39,7 +39,7 @@ void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roo
 void rowsToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines);
 /// The spectra of splitPairs, n odd: frequency 0, then the parts of 1, 2, ...
 void pairsToSpectra(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);
-/// The other way round, for joinPairs; the second spectra are 0 where rows are alone.
+/// The other way round, and joinPairs; the second spectra are 0 where rows are alone.
 void spectraToPairs(const LineRows& rows, ptrdiff_t n, float scale, bool areAlone, float* lines);
 /// Element e is line positions[e], parts exchanged: of the first eight rows its second part.
 void pairsToRows(const float* lines, const int32_t* positions, ptrdiff_t n, const LineRows& rows);

@@ -84,6 +84,26 @@ QORI_INLINE Line widen(Vec<float> v) {
     return {{_mm256_cvtps_pd(_mm256_castps256_ps128(v.v))}, {_mm256_cvtps_pd(_mm256_extractf128_ps(v.v, 1))}};
 }
 
+/// The line at k and its mirror, four lanes at a time, as doubles: each(x, y, root) makes two lines of two. From memory
+/// and to it, where halves of vectors cost no shuffle.
+template <class Each>
+QORI_INLINE void forWideHalves(float* at, float* mirror, const double* root, Each each) {
+    const auto take = [](const float* p) {
+        return Line{{_mm256_cvtps_pd(_mm_load_ps(p))}, {_mm256_cvtps_pd(_mm_load_ps(p + kLineColumns))}};
+    };
+    const auto put = [](float* p, Line a) {
+        _mm_store_ps(p, _mm256_cvtpd_ps(a.re.v));
+        _mm_store_ps(p + kLineColumns, _mm256_cvtpd_ps(a.im.v));
+    };
+    const Vec<double> re = splat(root[0]), im = splat(root[1]);
+    for (int lane = 0; lane < kLineColumns; lane += 4) {
+        Line first, second;
+        each(take(at + lane), take(mirror + lane), re, im, first, second);
+        put(mirror + lane, second);
+        put(at + lane, first);
+    }
+}
+
 double* lineAt(double* lines, int32_t i) { return lines + ptrdiff_t{i} * kLineDoubles; }
 
 /// Frequency k of eight rows to the line of their transform at k; frequency n / 2 has the imaginary part of 0.
@@ -182,6 +202,41 @@ void makeShortRowTable(ShortRowTable* table, int32_t n) {
         }
         table->positions[k] = position;
     }
+}
+
+void makeWideHalfRoots(double* roots, int32_t n) {
+    for (int32_t k = 0; k <= n / 4; ++k) {
+        const Root root = rootOfUnity(k, n);
+        *roots++ = root.re;
+        *roots++ = root.im;
+    }
+}
+
+void splitWideHalves(float* lines, int32_t n, const int32_t* positions, const double* roots) {
+    const auto at = [=](int32_t k) { return lines + ptrdiff_t{positions[k]} * kLineFloats; };
+    line::storeLine(at(0), line::sumAndDifference(line::loadLine(at(0))));
+    const Vec<double> half = splat(0.5);
+    for (int32_t k = 1; k <= n / 2 - k; ++k)
+        forWideHalves(at(k), at(n / 2 - k), roots + 2 * k,
+                      [=](Line z, Line y, Vec<double> re, Vec<double> im, Line& x, Line& mirror) {
+                          const Line even = {z.re + y.re, z.im - y.im};
+                          const Line odd = line::times(Line{z.im + y.im, y.re - z.re}, re * half, im * half);
+                          x = line::mulAdd(even, half, odd);
+                          mirror = {line::mulSub(even.re, half, odd.re), line::negMulAdd(even.im, half, odd.im)};
+                      });
+}
+
+void joinWideHalves(float* lines, int32_t n, const double* roots) {
+    const auto at = [=](int32_t k) { return lines + ptrdiff_t{k} * kLineFloats; };
+    line::storeLine(at(0), line::joinEnds(line::loadLine(at(0))));
+    for (int32_t k = 1; k <= n / 2 - k; ++k)
+        forWideHalves(at(k), at(n / 2 - k), roots + 2 * k,
+                      [](Line x, Line y, Vec<double> re, Vec<double> im, Line& z, Line& mirror) {
+                          const Line even = {x.re + y.re, x.im - y.im};
+                          const Line odd = line::times(Line{x.im + y.im, x.re - y.re}, re, im);
+                          z = {even.im + odd.im, even.re - odd.re};
+                          mirror = {odd.im - even.im, even.re + odd.re};
+                      });
 }
 
 void shortRowsToSpectra(const ShortRowTable& table, const LineRows& src, float scale, float* lines,

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Spectra of rows of few real elements, in doubles. What is special about real rows costs a rounding or two, a large
-// part of all where rows are short; in doubles only the results are rounded, for up to twice the time.
+// Spectra of rows of few real elements, in doubles: all of it, or where the points of half as many come apart. What is
+// special about real rows costs a rounding or two, a large part of all where rows are short.
 //
 // Points are lines (butterflies.h) of four doubles each: of eight rows the first four are the real parts, the others
 // the imaginary ones, so that one transform serves all and the two spectra come apart by sums.
@@ -11,9 +11,9 @@ namespace qori::kernels {
 
 inline constexpr int32_t kMostShortRow = 128;
 
-/// Whether rows of this length are worth it: up to 16 elements, and where floats were measured to have larger errors
-/// than another library's have.
-constexpr bool isShortRow(int32_t n) {
+/// Whether columns of this length, or rows that are few, are worth it: up to 16 elements, and where floats were
+/// measured to have larger errors than another library's have.
+constexpr bool isShortLength(int32_t n) {
     switch (n) {
         case 20:
         case 25:
@@ -27,6 +27,15 @@ constexpr bool isShortRow(int32_t n) {
         case 128: return true;
         default: return n <= 16;
     }
+}
+
+/// Whether rows are. Where there are more than eight, the errors of columns are larger than what wide halves leave of
+/// the rows'; odd ones have no halves.
+constexpr bool isShortRow(int32_t width, int32_t height) {
+    return isShortLength(width) && (width <= 20 || width % 2 == 1 || height <= kLineColumns);
+}
+constexpr bool hasWideHalves(int32_t width, int32_t height) {
+    return width % 2 == 0 && isShortLength(width) && !isShortRow(width, height);
 }
 
 /// Tables of one length; no addresses. At a multiple of 64.
@@ -49,7 +58,7 @@ struct ShortRowTable {
     }
 };
 
-/// Of a length that isShortRow.
+/// Of a length that isShortLength.
 int64_t shortRowTableBytes(int32_t n);
 void makeShortRowTable(ShortRowTable* table, int32_t n);
 
@@ -65,8 +74,14 @@ void shortSpectraToRows(const ShortRowTable& table, const LineRows& rows, float 
 
 /// Whether the columns of an image this narrow, which are all real, go the same way.
 constexpr bool areShortColumns(int32_t width, int32_t height) {
-    return width <= 2 && (isShortRow(height) || height == 48);
+    return width <= 2 && (isShortLength(height) || height == 48);
 }
+
+/// splitHalves and joinHalves of fourier.h with everything between the points and the frequencies in doubles. Roots are
+/// pairs of doubles, n / 4 + 1 of them.
+void makeWideHalfRoots(double* roots, int32_t n);
+void splitWideHalves(float* lines, int32_t n, const int32_t* positions, const double* roots);
+void joinWideHalves(float* lines, int32_t n, const double* roots);
 
 /// Columns of single elements; the second may have none.
 struct ColumnPair {
