@@ -167,7 +167,8 @@ const Rows rows{{
 
 // --- ladders --------------------------------------------------------------------------------------------------------
 
-const std::vector<int> kCounts = {2, 3, 4, 5, 8, 9, 15, 16, 17, 18, 32, 33, 64, 128, 129, 130, 256, 512, 1024, 4096};
+const std::vector<int> kCounts = {2,  3,  4,   5,   8,   9,   15,  16,   17,   18,  32,
+                                  33, 64, 128, 256, 257, 258, 512, 1024, 1026, 4096};
 const std::vector<int> kSides = {16, 23, 32, 45, 56, 63, 64, 65, 72, 91, 128, 256};
 
 template <class T, class L, class Function>
@@ -212,6 +213,8 @@ const Ladders ladders{
      countLadder<float, float>("LUT cubic 32f, levels", 128, qoriLUT_Cubic_32f_C1R),
      countLadder<uint16_t, int32_t>("LUT step 16u, levels, 32 x 32", 32, qoriLUT_16u_C1R),
      countLadder<uint16_t, int32_t>("LUT step 16u, levels, 128 x 128", 128, qoriLUT_16u_C1R),
+     countLadder<uint16_t, int32_t>("LUT linear 16u, levels, 64 x 64", 64, qoriLUT_Linear_16u_C1R),
+     countLadder<uint16_t, int32_t>("LUT cubic 16u, levels, 64 x 64", 64, qoriLUT_Cubic_16u_C1R),
      sideLadder<uint16_t, int32_t>("LUT step 16u of 64 levels, squares", 64, qoriLUT_16u_C1R),
      sideLadder<uint16_t, int32_t>("LUT linear 16u of 64 levels, squares", 64, qoriLUT_Linear_16u_C1R)}};
 

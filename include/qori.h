@@ -5389,9 +5389,9 @@ QORI_API QorResult QORI_CALL qoriLUT_32f_AC4IR(float* pSrcDst, int32_t srcDstSte
  *  Notes     Levels should ascend, equal ones allowed. In any other order an interval whose upper level is not
  *            above its lower one holds nothing; where several hold an element, the first one counts in 32f, the
  *            last one in integers. Results depend on neither the image's size nor the caller's floating-point
- *            modes. Memory is taken from qorMalloc: 32f, and 16 bits with more than 129 levels, 8 bytes an
- *            interval and channel; 16 bits of more than 8192 pixels, 128 KiB a channel. AC4 may rewrite channel
- *            3 with its own value: do not let another thread write it during the call.
+ *            modes. Memory is taken from qorMalloc by 32f, 8 bytes an interval and channel, and by 16 bits of
+ *            more than 4096 pixels, 128 KiB a channel; up to 257 levels they take it from 8193 pixels on. AC4
+ *            may rewrite channel 3 with its own value: do not let another thread write it during the call.
  *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the
  *            others QOR_ERR_NULL_PTR (a pointer is null), then channel by channel QOR_ERR_NULL_PTR (its pValues
@@ -5490,9 +5490,9 @@ QORI_API QorResult QORI_CALL qoriLUT_Linear_32f_AC4IR(float* pSrcDst, int32_t sr
  *  Notes     Levels should ascend. In any other order an interval whose upper level is not above its lower one
  *            holds nothing; where several hold an element, the first one counts in 32f, the last one in
  *            integers. Results depend on neither the image's size nor the caller's floating-point modes. Memory
- *            is taken from qorMalloc: 32f, and 16 bits with more than 129 levels, three times 8 bytes an
- *            interval and channel; 16 bits of more than 8192 pixels, 128 KiB a channel. AC4 may rewrite channel
- *            3 with its own value: do not let another thread write it during the call.
+ *            is taken from qorMalloc by 32f, three times 8 bytes an interval and channel, and by 16 bits of
+ *            more than 4096 pixels, 128 KiB a channel; up to 257 levels they take it from 8193 pixels on. AC4
+ *            may rewrite channel 3 with its own value: do not let another thread write it during the call.
  *  Returns   QOR_OK; C1 in this order QOR_ERR_NULL_PTR (a pointer is null), QOR_ERR_SIZE (width or height below
  *            1), QOR_ERR_STEP (a step below 1), QOR_ERR_LUT_LEVELS (nLevels below 2), QOR_ERR_NO_MEMORY; the
  *            others QOR_ERR_NULL_PTR (a pointer is null), then channel by channel QOR_ERR_NULL_PTR (its pValues

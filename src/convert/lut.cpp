@@ -6,6 +6,7 @@
 #include "frame/plan.h"
 #include "kernels/lut/curve.h"
 #include "kernels/lut/few_steps.h"
+#include "kernels/lut/kept_polynomials.h"
 #include "kernels/lut/places.h"
 #include "kernels/lut/table_rows.h"
 
@@ -25,7 +26,8 @@ template <class T>
 struct Channel {
     Curve<Level<T>> curve;
     Form form;
-    bool isOrdered;  ///< Levels never decrease.
+    bool isOrdered;                          ///< Levels never decrease.
+    const kernels::PolynomialRoom* solving;  ///< Where the curve is solved as elements need it; null: all of it is.
 };
 
 QorResult countCheck(int32_t count) { return count < 2 ? QOR_ERR_LUT_LEVELS : QOR_OK; }
@@ -109,6 +111,14 @@ Search searchOf(const Channel<T>& channel) {
     return channel.form == Form::step ? Search::lastOrTail : Search::last;
 }
 
+template <bool isCubic, class T>
+void mapByCurve(T* plane, int pixels, const uint32_t* places, const Channel<T>& channel) {
+    if constexpr (std::is_integral_v<T>)
+        if (channel.solving != nullptr)
+            return kernels::mapBySolving<isCubic>(plane, pixels, places, channel.curve, *channel.solving);
+    kernels::mapByCurve<isCubic>(plane, pixels, places, channel.curve);
+}
+
 /// Finds each element's interval, then looks up or computes what it gives.
 template <Layout layout, class T>
 void mapBySearch(Image<const T> src, Image<T> dst, QorImageSize roi, const Channel<T>* channel) {
@@ -121,8 +131,8 @@ void mapBySearch(Image<const T> src, Image<T> dst, QorImageSize roi, const Chann
         kernels::findPlaces(plane, pixels, curve.levels, curve.count, way[c], places);
         switch (channel[c].form) {
             case Form::step: return kernels::replaceByValues(plane, pixels, places, curve.values, curve.count);
-            case Form::linear: return kernels::mapByCurve<false>(plane, pixels, places, curve);
-            case Form::cubic: return kernels::mapByCurve<true>(plane, pixels, places, curve);
+            case Form::linear: return mapByCurve<false>(plane, pixels, places, channel[c]);
+            case Form::cubic: return mapByCurve<true>(plane, pixels, places, channel[c]);
         }
     };
     kernels::mapByPlanes<n, n, T>(roi, processed, src, dst,
@@ -155,55 +165,66 @@ void mapFewSteps(Image<const T> src, Image<T> dst, QorImageSize roi, const Chann
 
 /// 16 bits: whether so few pixels are searched one by one that no memory is taken for a table of 65536 entries.
 /// Measured: filling it takes as long as a search of 1,600 pixels (steps of 64 levels, which are found in 3 ns each) or
-/// of 7,700 (curves: 4 ns).
-inline bool isSmall(QorImageSize roi, Form form) {
-    return int64_t{roi.width} * roi.height <= (form == Form::step ? 4'096 : 8'192);
+/// of 7,700 (curves of up to 256 intervals: 4 ns).
+template <Layout layout, class T>
+bool isSmall(QorImageSize roi, const Channel<T>* channel) {
+    int32_t most = 4'096;
+    if (channel[0].form != Form::step) most *= 2;
+    for (int c = 0; c < processedChannels(layout); ++c)
+        if (channel[c].curve.count > 257) most = 4'096;
+    return int64_t{roi.width} * roi.height <= most;
 }
 
-/// Polynomials of so many intervals a channel stand on the stack: those of 16 bits, so that their small regions rarely
-/// take memory. Others come from the allocator, and cost no more than a table, which solves them too.
-template <class T>
-constexpr int32_t kMostOnStack = std::is_floating_point_v<T> ? 1 : 128;
-
+/// Takes no memory. Not all intervals are solved where they are more than the pixels, either.
 template <Layout layout, class T>
-QorResult mapElements(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T>* channel) {
+void mapFewWords(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T>* channel) {
     constexpr int processed = processedChannels(layout);
-    OwnedBlocks<3 * processed> blocks;
-    double onStack[processed][3][kMostOnStack<T>];
-    for (int i = 0; i < processed; ++i) {
-        if (channel[i].form == Form::step) continue;
-        Curve<Level<T>>& curve = channel[i].curve;
-        const int32_t intervals = curve.count - 1;
-        const bool fits = !std::is_floating_point_v<T> && intervals <= kMostOnStack<T>;
-        for (int power = 0; power < (curve.isCubic ? 3 : 1); ++power)
-            curve.c[power] =
-                fits ? onStack[i][power] : blocks.template add<double>(int64_t{intervals} * elementBytes<double>);
+    kernels::KeptPolynomials<processed> kept;
+    kernels::PolynomialRoom rooms[processed];
+    const int32_t most = std::min(roi.width * roi.height, kept.kMost);
+    for (int c = 0; c < processed; ++c) {
+        if (channel[c].form == Form::step) continue;
+        if (channel[c].curve.count - 1 <= most) {
+            kept.solveAll(c, channel[c].curve);
+        } else {
+            rooms[c] = kept.forget(c);
+            channel[c].solving = &rooms[c];
+        }
     }
-    if (QorResult r = blocks.check()) return r;
-    for (int i = 0; i < processed; ++i)
-        if (channel[i].form != Form::step) kernels::fillPolynomials(channel[i].curve);
     mapBySearch<layout>(src, dst, roi, channel);
-    return QOR_OK;
 }
 
 template <Layout layout, class T>
 QorResult mapWords(Image<const T> src, Image<T> dst, QorImageSize roi, Channel<T>* channel, Form form) {
     constexpr int32_t mostOverTable = 12;  // levels that are compared in less time than a table is looked up
-    const bool small = isSmall(roi, form);
+    const bool small = isSmall<layout>(roi, channel);
     if (form == Form::step && isFewSteps<layout>(channel, small ? kernels::kMostFewSteps : mostOverTable)) {
         mapFewSteps<layout>(src, dst, roi, channel);
         return QOR_OK;
     }
-    return small ? mapElements<layout>(src, dst, roi, channel) : mapWordsByTable<layout>(src, dst, roi, channel);
+    if (!small) return mapWordsByTable<layout>(src, dst, roi, channel);
+    mapFewWords<layout>(src, dst, roi, channel);
+    return QOR_OK;
 }
 
+/// Curves take memory for their polynomials.
 template <Layout layout>
 QorResult mapFloats(Image<const float> src, Image<float> dst, QorImageSize roi, Channel<float>* channel, Form form) {
     if (form == Form::step && isFewSteps<layout>(channel, kernels::kMostFewSteps)) {
         mapFewSteps<layout>(src, dst, roi, channel);
         return QOR_OK;
     }
-    return mapElements<layout>(src, dst, roi, channel);
+    constexpr int processed = processedChannels(layout);
+    OwnedBlocks<3 * processed> blocks;
+    for (int c = 0; c < processed && form != Form::step; ++c) {
+        Curve<float>& curve = channel[c].curve;
+        for (int power = 0; power < (curve.isCubic ? 3 : 1); ++power)
+            curve.c[power] = blocks.template add<double>(int64_t{curve.count - 1} * elementBytes<double>);
+    }
+    if (QorResult r = blocks.check()) return r;
+    for (int c = 0; c < processed && form != Form::step; ++c) kernels::fillPolynomials(channel[c].curve);
+    mapBySearch<layout>(src, dst, roi, channel);
+    return QOR_OK;
 }
 
 /// Checked arguments. Cubics of fewer than four levels are straight lines.
@@ -215,7 +236,8 @@ QorResult map(Image<const T> src, Image<T> dst, QorImageSize roi, const Level<T>
         const Form own = form == Form::cubic && counts[c] < 4 ? Form::linear : form;
         channel[c] = {{levels[c], values[c], counts[c], {}, own == Form::cubic},
                       own,
-                      kernels::neverDecreasing(levels[c], counts[c])};
+                      kernels::neverDecreasing(levels[c], counts[c]),
+                      nullptr};
     }
     if constexpr (std::is_same_v<T, uint8_t>) {
         mapBytes<layout>(src, dst, roi, channel);

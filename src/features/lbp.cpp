@@ -141,38 +141,50 @@ void makeFromKeys(const BorderedImage& image, Image<D> dst, RowMaker<T, D> makeR
     });
 }
 
-/// maker<streaming>() gives what makes the image.
-template <class T, class D, class Maker>
-QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value, Maker maker) {
+/// make(image, destination, streaming). What streams lies on multiples of so many bytes.
+template <uintptr_t alignment, class T, class D, class Make>
+QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value, Make make) {
     if (QorResult r = firstOf(nullCheck(src, dst), sizeCheck(roi))) return r;
     const BorderedImage image{asBytes(src.data), src.step, roi, elementBytes<T>,
                               BorderRule::withMirror(Border::of(borderType), &value)};
-    const bool isAligned = (reinterpret_cast<uintptr_t>(dst.data) | static_cast<uintptr_t>(dst.step)) % 32 == 0;
+    const uintptr_t first = reinterpret_cast<uintptr_t>(dst.data), step = static_cast<uintptr_t>(dst.step);
+    const bool mayStream = step % kVectorBytes == 0 && first % alignment == 0;
     return underControlOf<T>([&] {
-        if (isAligned && streams(streamRules::copy, wholeTraffic(roi, elementBytes<T> + elementBytes<D>))) {
-            maker.template operator()<true>()(image, dst);
-            streamFence();
-        } else {
-            maker.template operator()<false>()(image, dst);
-        }
+        const bool streaming =
+            mayStream && streams(streamRules::copy, wholeTraffic(roi, elementBytes<T> + elementBytes<D>));
+        make(image, dst, streaming);
+        if (streaming) streamFence();
         return QOR_OK;
     });
 }
 
+template <class T, class D, int reach>
+void makeImage(const kernels::PatternMakers<T, D>& makers, RowMaker<T, D> makeNarrowRow, const BorderedImage& image,
+               Image<D> dst, bool streaming) {
+    using InPlace = InPlacePatterns<T, D, reach>;
+    if (image.size.width < InPlace::kLeast) return makeFromKeys<T, reach, D>(image, dst, makeNarrowRow);
+    makeStrips(image, dst, InPlace::kStripPixels,
+               [&](const BorderedImage& strip, Image<D> part) { InPlace(makers, strip).make(part, streaming); });
+}
+
+/// Images too narrow to be made in place do not stream either.
 template <int mode, int reach, class T, class D>
 QorResult lbpOfMode(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t borderType, T value) {
-    return lbp(src, dst, roi, borderType, value, []<bool streaming>() {
-        return [](const BorderedImage& image, Image<D> to) {
-            if constexpr (std::is_floating_point_v<T> || sizeof(D) == 1) {
-                using InPlace = InPlacePatterns<T, D, reach, mode>;
-                if (image.size.width >= InPlace::kLeast)
-                    return makeStrips(image, to, InPlace::kStripPixels, [](const BorderedImage& strip, Image<D> part) {
-                        InPlace(strip).make(part, streaming);
-                    });
-            }
-            makeFromKeys<T, reach, D>(image, to, kernels::patternRow<D, reach, mode, streaming, T>);
-        };
-    });
+    constexpr auto makeRow = kernels::patternRow<D, reach, mode, false, T>;
+    if constexpr (std::is_floating_point_v<T> || sizeof(D) == 1) {
+        // Measured: floats that lie otherwise gain nothing.
+        constexpr uintptr_t alignment = std::is_floating_point_v<T> ? kVectorBytes : 1;
+        return lbp<alignment>(
+            src, dst, roi, borderType, value, [](const BorderedImage& image, Image<D> to, bool streaming) {
+                makeImage<T, D, reach>(kernels::patternMakers<reach, mode, T, D>, makeRow, image, to, streaming);
+            });
+    } else {
+        return lbp<kVectorBytes>(src, dst, roi, borderType, value,
+                                 [](const BorderedImage& image, Image<D> to, bool streaming) {
+                                     makeFromKeys<T, reach, D>(
+                                         image, to, streaming ? kernels::patternRow<D, reach, mode, true, T> : makeRow);
+                                 });
+    }
 }
 
 template <int reach, class T, class D>
@@ -185,21 +197,23 @@ QorResult lbpImage(Image<const T> src, Image<D> dst, QorImageSize roi, uint8_t m
     }
 }
 
+template <bool streaming, class T>
+void makeCorrectedRow(const kernels::PatternKey<T>* const* rows, uint8_t* row, ptrdiff_t width,
+                      const kernels::PatternRowAhead<T>& ahead) {
+    using Key = kernels::PatternKey<T>;
+    constexpr ptrdiff_t kAhead = 16;
+    alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
+    kernels::patternColumnSums(rows, sums + kAhead, width);
+    kernels::correctedPatternRow<streaming>(rows, sums + kAhead, row, width, ahead);
+}
+
 template <class T>
 QorResult lbpImageHorizCorr(Image<const T> src, Image<uint8_t> dst, QorImageSize roi, int32_t borderType, T value) {
-    using Key = kernels::PatternKey<T>;
-    return lbp(src, dst, roi, borderType, value, []<bool streaming>() {
-        return [](const BorderedImage& image, Image<uint8_t> to) {
-            makeFromKeys<T, 1, uint8_t>(
-                image, to,
-                [](const Key* const* rows, uint8_t* row, ptrdiff_t width, const kernels::PatternRowAhead<T>& ahead) {
-                    constexpr ptrdiff_t kAhead = 16;
-                    alignas(64) Wider<Key> sums[kStripBytes / elementBytes<Key> + 4 * kAhead];
-                    kernels::patternColumnSums(rows, sums + kAhead, width);
-                    kernels::correctedPatternRow<streaming>(rows, sums + kAhead, row, width, ahead);
-                });
-        };
-    });
+    return lbp<kVectorBytes>(
+        src, dst, roi, borderType, value, [](const BorderedImage& image, Image<uint8_t> to, bool streaming) {
+            const auto makeRow = streaming ? makeCorrectedRow<true, T> : makeCorrectedRow<false, T>;
+            makeFromKeys<T, 1, uint8_t>(image, to, makeRow);
+        });
 }
 
 }  // namespace

@@ -20,7 +20,7 @@ constexpr double kSpan = std::is_floating_point_v<T> ? 200 : 1 << 8 * sizeof(T) 
 
 /// Counts around the bounds between ways, more often small ones.
 int drawCount() {
-    constexpr int counts[] = {2, 2, 3, 3, 4, 4, 5, 8, 12, 13, 31, 32, 33, 129, 130, 300};
+    constexpr int counts[] = {2, 2, 3, 3, 4, 4, 5, 8, 12, 13, 31, 32, 33, 257, 258, 600};
     return counts[random().below(16)];
 }
 
@@ -202,7 +202,7 @@ constexpr Form lutStep = Form::step, lutLinear = Form::linear, lutCubic = Form::
 /// 16 bits: small regions are searched, larger ones go through a table; few levels are compared, whatever the size.
 template <class T, class Function>
 void checkWays(Function function, Form form) {
-    for (int count : {2, 3, 4, 12, 13, 32, 33, 129, 130, 700})
+    for (int count : {2, 3, 4, 12, 13, 32, 33, 257, 258, 1'025, 1'026, 3'000})
         for (int height : {1, 64, 65, 128, 129})
             for (int repeat = 0; repeat < 2; ++repeat) {
                 SCOPED_TRACE(testing::Message() << count << " levels, " << height << " rows");
@@ -380,16 +380,24 @@ TEST_F(LutStatus, EachAllocationFails) {
     failEach(dst_, 0, real(qoriLUT_32f_C3R));
     failEach(dst_, 3, real(qoriLUT_Linear_32f_C3R));
     failEach(dst_, 3 + 3 + 1, real(qoriLUT_Cubic_32f_AC4R));  // the third channel has three levels
-    std::vector<int32_t> many(200);
+    // Small calls of 16 bits take no memory, whatever the number of levels.
+    std::vector<int32_t> many(2'000);
     std::iota(many.begin(), many.end(), 0);
-    const auto small = [&](int32_t count) {
-        return [=, this] {
-            return call(qoriLUT_Cubic_16u_C1R, static_cast<const uint16_t*>(src_.data<uint16_t>()), 8,
-                        dst_.data<uint16_t>(), 8, QorImageSize{4, 4}, many.data(), many.data(), count);
-        };
-    };
-    failEach(dst_, 0, small(129));
-    failEach(dst_, 3, small(130));
+    const int32_t* const all[3] = {many.data(), many.data(), many.data()};
+    for (int32_t count : {129, 130, 257, 258, 1'025, 1'026, 2'000})
+        for (const QorImageSize roi : {QorImageSize{4, 4}, QorImageSize{128, 32}}) {
+            const int32_t several[3] = {count, 130, 2};
+            for (auto function : {qoriLUT_Linear_16u_C1R, qoriLUT_Cubic_16u_C1R, qoriLUT_16u_C1R})
+                failEach(dst_, 0, [&] {
+                    return call(function, src_.data<uint16_t>(), 256, dst_.data<uint16_t>(), 256, roi, many.data(),
+                                many.data(), count);
+                });
+            for (auto function : {qoriLUT_Linear_16s_C3R, qoriLUT_Cubic_16s_AC4R})
+                failEach(dst_, 0, [&] {
+                    return call(function, src_.data<int16_t>(), 1'024, dst_.data<int16_t>(), 1'024, roi, all, all,
+                                several);
+                });
+        }
     failEach(dst_, 1, [&] {
         return call(qoriLUT_16s_C1R, src_.data<int16_t>(), 280, dst_.data<int16_t>(), 280, kRoi, many.data(),
                     many.data(), 40);

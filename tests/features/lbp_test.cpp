@@ -111,6 +111,9 @@ void sweepPatterns(int reach, int bytesPerPixel, const char* name, Check check) 
     forStreamingChoices(bytesPerPixel, 1 << 20, [&](const Shape& shape) { check(Job{shape, reach, drawBorder()}); });
     qorTestSetCacheSize(1);  // pieces that are whole and others, bands of several tiles and what is left of them
     check(Job{{.width = 16'480, .height = 45}, reach, drawBorder()});
+    for (int shift : {1, 2, 16, 32, 33, 62})  // lines that begin anywhere in a row, in every row or in every second
+        for (int width : {64, 192, 223, 700, 1'400})
+            check(Job{{.width = width, .height = 35, .padding = -width & 31, .shift = shift}, reach, drawBorder()});
     qorTestSetCacheSize(0);
     markSwept(name);
 }

@@ -4,11 +4,10 @@
 #include <algorithm>
 
 #include "kernels/copy_rows.h"
+#include "kernels/streamed_lines.h"
 
 namespace qori::kernels {
 namespace {
-
-constexpr ptrdiff_t kLine = 2 * kVectorBytes;
 
 /// A cache line of the destination.
 QORI_INLINE void streamLine(uint8_t* dst, const uint8_t* src) {
@@ -19,8 +18,32 @@ QORI_INLINE void streamLine(uint8_t* dst, const uint8_t* src) {
 
 /// A piece that begins on a cache line of the destination.
 QORI_INLINE void streamPiece(uint8_t* dst, const uint8_t* src) {
-    for (ptrdiff_t at = 0; at < kStreamedPiece; at += kLine) streamLine(dst + at, src + at);
+    for (ptrdiff_t at = 0; at < kStreamedPiece; at += kCacheLine) streamLine(dst + at, src + at);
 }
+
+/// A row, which streams from `done` on to `end`.
+struct StreamedRow {
+    uint8_t* dst;
+    const uint8_t* src;
+    ptrdiff_t done, end;
+
+    QORI_INLINE void begin(ptrdiff_t bytes) {
+        const auto [head, lines] = StreamedLines::ofBytes(dst, bytes);
+        done = lines == 0 ? bytes : head;
+        end = done + lines;
+        copyRow(dst, src, done);
+    }
+    QORI_INLINE bool streamPiece() {
+        if (end - done < kStreamedPiece) return false;
+        kernels::streamPiece(dst + done, src + done);
+        done += kStreamedPiece;
+        return true;
+    }
+    QORI_INLINE void finish(ptrdiff_t bytes) {
+        for (; done < end; done += kCacheLine) streamLine(dst + done, src + done);
+        copyRow(dst + done, src + done, bytes - done);
+    }
+};
 
 }  // namespace
 
@@ -28,29 +51,16 @@ void copyRowsStreaming(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrd
                        int32_t rows) {
     for (; rows > 0; rows -= kStreamedTogether) {
         const int32_t together = std::min(rows, kStreamedTogether);
-        ptrdiff_t done[kStreamedTogether];
-        for (int32_t k = 0; k < together; ++k) {
-            uint8_t* const to = dst + k * dstStep;
-            done[k] = std::min(bytes, static_cast<ptrdiff_t>(-reinterpret_cast<uintptr_t>(to) & uintptr_t{kLine - 1}));
-            copyRow(to, src + k * srcStep, done[k]);
+        StreamedRow row[kStreamedTogether];
+        for (int32_t k = 0; k < together; ++k, dst += dstStep, src += srcStep) {
+            row[k] = {dst, src, 0, 0};
+            row[k].begin(bytes);
         }
         for (bool isMore = true; isMore;) {
             isMore = false;
-            for (int32_t k = 0; k < together; ++k) {
-                if (bytes - done[k] < kStreamedPiece) continue;
-                streamPiece(dst + k * dstStep + done[k], src + k * srcStep + done[k]);
-                done[k] += kStreamedPiece;
-                isMore = true;
-            }
+            for (int32_t k = 0; k < together; ++k) isMore |= row[k].streamPiece();
         }
-        for (int32_t k = 0; k < together; ++k) {
-            uint8_t* const to = dst + k * dstStep;
-            const uint8_t* const from = src + k * srcStep;
-            for (; bytes - done[k] >= kLine; done[k] += kLine) streamLine(to + done[k], from + done[k]);
-            copyRow(to + done[k], from + done[k], bytes - done[k]);
-        }
-        dst += kStreamedTogether * dstStep;
-        src += kStreamedTogether * srcStep;
+        for (int32_t k = 0; k < together; ++k) row[k].finish(bytes);
     }
 }
 

@@ -3,11 +3,12 @@
 // and wait in registers for the rows below that see them: eight rows of codes take ten rows of keys, 3.75 loads and as
 // many changes of sign a block instead of 9. Floats need no keys, and their comparisons load them.
 //
-// Codes are made of columns begin to end, at least a block, in whole blocks: the first at begin, then at multiples of a
-// block, the last before end, over some of the one before it.
+// Codes are made of columns begin to end, at least a block, in whole blocks: the first at begin, the last before end,
+// over some of the one before it.
 #pragma once
 #include <algorithm>
 
+#include "kernels/streamed_lines.h"
 #include "patterns.h"
 
 namespace qori::kernels {
@@ -31,14 +32,18 @@ constexpr int kRowsTogether = sharesKeys<T> ? kTileRows* reach : 4;
 template <class T>
 constexpr ptrdiff_t kPiece = 1024 / static_cast<ptrdiff_t>(sizeof(T));
 
-/// makeBlock(x) for each block.
-template <class MakeBlock>
+/// Bytes of codes that leave together.
+template <class T>
+constexpr ptrdiff_t kSent = sharesKeys<T> ? kTileRows* kPatternBlock : kCacheLine;
+
+/// makeBlock(x) for each block: the blocks behind the first one lie on multiples of a block, or follow on it.
+template <bool followFirst, class MakeBlock>
 QORI_INLINE void forBlocksBetween(ptrdiff_t begin, ptrdiff_t end, MakeBlock makeBlock) {
     const ptrdiff_t last = end - kPatternBlock;
     for (ptrdiff_t x = begin;;) {
         makeBlock(x);
         if (x == last) return;
-        x = (x & ~ptrdiff_t{kPatternBlock - 1}) + kPatternBlock;
+        x = (followFirst ? x : x & ~ptrdiff_t{kPatternBlock - 1}) + kPatternBlock;
         if (x > last) x = last;
     }
 }
@@ -49,18 +54,18 @@ QORI_INLINE void forBlocksBetween(ptrdiff_t begin, ptrdiff_t end, MakeBlock make
 class WaitingCodes {
 public:
     WaitingCodes() = default;
-    WaitingCodes(const void* codes, int rows, int rowBytes, void* dst, ptrdiff_t step)
+    WaitingCodes(const void* codes, int rows, ptrdiff_t rowBytes, void* dst, ptrdiff_t step)
         : from_(static_cast<const uint8_t*>(codes)),
           to_(static_cast<uint8_t*>(dst)),
           step_(step),
           rowBytes_(rowBytes),
           left_(rows * rowBytes) {}
 
-    /// So many bytes of what waits, whole lines that are a divisor of a row.
-    template <int bytes>
+    /// So many bytes of what waits, if anything does: whole lines that are a divisor of a row.
+    template <ptrdiff_t bytes>
     QORI_INLINE void send() {
         if (left_ == 0) return;
-        for (int i = 0; i < bytes; i += kVectorBytes) stream(to_ + inRow_ + i, load(from_ + i));
+        for (ptrdiff_t i = 0; i < bytes; i += kVectorBytes) stream(to_ + inRow_ + i, load(from_ + i));
         from_ += bytes;
         left_ -= bytes;
         inRow_ += bytes;
@@ -69,16 +74,14 @@ public:
         to_ += step_;
     }
     void sendAll() {
-        while (left_ > 0) send<kLine>();
+        while (left_ > 0) send<kCacheLine>();
     }
-
-    static constexpr int kLine = 64;
 
 private:
     const uint8_t* from_ = nullptr;
     uint8_t* to_ = nullptr;
     ptrdiff_t step_ = 0;
-    int rowBytes_ = 0, inRow_ = 0, left_ = 0;
+    ptrdiff_t rowBytes_ = 0, inRow_ = 0, left_ = 0;
 };
 
 /// The keys of a row that a window of eight neighbours sees: to the left, in the middle, to the right.
@@ -108,7 +111,7 @@ QORI_NOINLINE void patternTile(const uint8_t* const* rowsAround, uint8_t* dst, p
     const uint8_t* rows[made + 2];  // stores of codes cannot alias these copies
     for (int i = 0; i < made + 2; ++i) rows[i] = rowsAround[i * reach];
     WaitingCodes others = sends ? waiting : WaitingCodes{};
-    forBlocksBetween(
+    forBlocksBetween<sends>(
         begin, end, [&](ptrdiff_t x) __attribute__((always_inline)) {
             KeyTriple above = KeyTriple::from<reach>(rows[0] + x), row = KeyTriple::from<reach>(rows[1] + x);
 #pragma GCC unroll 8
@@ -118,7 +121,7 @@ QORI_NOINLINE void patternTile(const uint8_t* const* rowsAround, uint8_t* dst, p
                 above = row;
                 row = below;
             }
-            if constexpr (sends) others.send<made * kPatternBlock>();
+            if constexpr (sends) others.send<kSent<uint8_t>>();
         });
     if (sends) waiting = others;
 }
@@ -126,33 +129,34 @@ QORI_NOINLINE void patternTile(const uint8_t* const* rowsAround, uint8_t* dst, p
 /// Fetches the pixels of a block, which are some lines.
 template <class T>
 QORI_INLINE void fetchBlock(const T* p) {
-    constexpr int bytes = kPatternBlock * static_cast<int>(sizeof(T)), line = WaitingCodes::kLine;
-    for (int at = 0; at < bytes; at += line) _mm_prefetch(reinterpret_cast<const char*>(p) + at, _MM_HINT_T0);
+    constexpr ptrdiff_t bytes = kPatternBlock * sizeof(T);
+    for (ptrdiff_t at = 0; at < bytes; at += kCacheLine)
+        _mm_prefetch(reinterpret_cast<const char*>(p) + at, _MM_HINT_T0);
 }
 
 template <int reach, int mode, bool sends, class T, class D>
 QORI_NOINLINE void patternPiece(const T* const* rowsAround, D* dst, ptrdiff_t begin, ptrdiff_t end,
                                 WaitingCodes& waiting) {
-    constexpr int line = WaitingCodes::kLine, blockBytes = kPatternBlock * static_cast<int>(sizeof(D));
+    constexpr bool isLine = kPatternBlock * sizeof(D) == kCacheLine;
     const RowsAround<T, reach> rows(rowsAround);
     WaitingCodes others = sends ? waiting : WaitingCodes{};
-    forBlocksBetween(
+    forBlocksBetween<sends>(
         begin, end, [&](ptrdiff_t x) __attribute__((always_inline)) {
             fetchBlock(rows.at[2 * reach] + x + kPiece<T>);
             patternBlock<D, reach, mode, false>(rows, dst + x, x, kPatternBlock);
-            if (sends && (blockBytes == line || x % (2 * kPatternBlock) != 0)) others.send<line>();
+            if (sends && (isLine || (x - begin) % (2 * kPatternBlock) != 0)) others.send<kSent<T>>();
         });
     if (sends) waiting = others;
 }
 
-/// A piece of `count` rows of codes, up to as many as are made together.
+/// A piece of `count` rows of codes, up to as many as are made together; what waits is sent meanwhile.
 template <int reach, int mode, bool sends, class T, class D>
 void patternPieces(const T* const* rows, D* dst, ptrdiff_t step, int count, ptrdiff_t begin, ptrdiff_t end,
                    WaitingCodes& waiting) {
     const auto rowOf = [=](int y) { return reinterpret_cast<D*>(reinterpret_cast<uint8_t*>(dst) + y * step); };
     if constexpr (!sharesKeys<T>) {
         for (int y = 0; y < count; ++y) patternPiece<reach, mode, sends>(rows + y, rowOf(y), begin, end, waiting);
-    } else if (sends || count == kTileRows * reach) {
+    } else if (sends || count == kRowsTogether<T, reach>) {
         for (int y = 0; y < reach; ++y)
             patternTile<reach, mode, sends, kTileRows>(rows + y, rowOf(y), step, begin, end, waiting);
     } else {
@@ -161,32 +165,51 @@ void patternPieces(const T* const* rows, D* dst, ptrdiff_t step, int count, ptrd
     }
 }
 
+/// The first column, begin or at least a block behind it, whose code begins a cache line; end where no lines stream.
+template <class D>
+ptrdiff_t columnOfLines(const D* dst, ptrdiff_t begin, ptrdiff_t end) {
+    constexpr ptrdiff_t size = sizeof(D), line = kCacheLine / size;
+    const auto [head, lines] =
+        StreamedLines::ofBytes(reinterpret_cast<const uint8_t*>(dst + begin), (end - begin) * size);
+    const ptrdiff_t ahead = head / size;
+    return lines == 0 ? end : begin + ahead + (ahead > 0 && ahead < kPatternBlock ? line : 0);
+}
+
 }  // namespace lbp
 
 /// `count` rows of codes. rows: at column 0, from `reach` rows above the first one to `reach` below the last; read from
-/// `reach` columns before begin to `reach` behind end. Streaming: dst and step are multiples of 32 bytes; pieces that
-/// are not whole go through the cache.
+/// `reach` columns before begin to `reach` behind end. Streaming: dst lies on elements and step is a multiple of half
+/// a line. Rows have their lines where the first of those made together has them; what is no whole line of it, or too
+/// few rows, goes through the cache.
 template <int reach, int mode, class T, class D>
 void patternRows(const T* const* rows, D* dst, ptrdiff_t step, int count, ptrdiff_t begin, ptrdiff_t end,
                  bool streaming) {
     using namespace lbp;
     constexpr int together = kRowsTogether<T, reach>;
-    alignas(WaitingCodes::kLine) D codes[2][together][kPiece<T>];
+    constexpr ptrdiff_t sent = kSent<T> / static_cast<ptrdiff_t>(sizeof(D));
+    alignas(kCacheLine) D codes[2][together * kPiece<T>];
     WaitingCodes waiting, none;
     int turn = 0;
     for (int y = 0; y < count; y += together) {
         const int made = std::min(together, count - y);
         D* const to = reinterpret_cast<D*>(reinterpret_cast<uint8_t*>(dst) + y * step);
+        const ptrdiff_t lines = streaming && made == together ? columnOfLines(to, begin, end) : end;
         for (ptrdiff_t x = begin, next; x < end; x = next) {
-            next = (x & ~ptrdiff_t{kPatternBlock - 1}) + kPiece<T>;
-            if (end - next < kPatternBlock || (sharesKeys<T> && !streaming)) next = end;
-            if (streaming && made == together && next - x == kPiece<T>) {
-                auto& room = codes[turn];
-                patternPieces<reach, mode, true>(rows + y, room[0] - x, sizeof room[0], made, x, next, waiting);
+            ptrdiff_t inLines = x < lines ? 0 : std::min(kPiece<T>, (end - x) / sent * sent);
+            if (const ptrdiff_t rest = end - x - inLines; rest > 0 && rest < kPatternBlock && inLines > 0)
+                inLines -= sent;
+            if (inLines > 0) {
+                D* const room = codes[turn];
+                const ptrdiff_t bytes = inLines * static_cast<ptrdiff_t>(sizeof(D));
+                next = x + inLines;
+                patternPieces<reach, mode, true>(rows + y, room - x, bytes, made, x, next, waiting);
                 waiting.sendAll();
-                waiting = {room, made, sizeof room[0], to + x, step};
+                waiting = {room, made, bytes, to + x, step};
                 turn ^= 1;
             } else {
+                const ptrdiff_t most = x < lines ? lines : end;
+                next = sharesKeys<T> ? most : (x & ~ptrdiff_t{kPatternBlock - 1}) + kPiece<T>;
+                if (most - next < kPatternBlock) next = most;
                 patternPieces<reach, mode, false>(rows + y, to, step, made, x, next, none);
             }
         }
@@ -194,10 +217,24 @@ void patternRows(const T* const* rows, D* dst, ptrdiff_t step, int count, ptrdif
     waiting.sendAll();
 }
 
-/// A block of codes of a column: columns of keys, from `reach` to the left to `reach` to the right, at the first pixel.
-template <class D, int reach, int mode, class Key>
-void patternColumn(const Key* const* columns, D* dst) {
-    lbp::patternBlock<D, reach, mode, false, true>(lbp::RowsAround<Key, reach>(columns), dst, 0, kPatternBlock);
+/// A block of codes of each of `reach` columns: columns of keys, from `reach` to the left of the first one to `reach`
+/// to the right of the last, at the first pixel.
+template <int reach, int mode, class Key, class D>
+void patternColumns(const Key* const* columns, D (*codes)[kPatternBlock]) {
+    for (int i = 0; i < reach; ++i)
+        lbp::patternBlock<D, reach, mode, false, true>(lbp::RowsAround<Key, reach>(columns + i), codes[i], 0,
+                                                       kPatternBlock);
 }
+
+/// What makes the codes of a mode.
+template <class T, class D>
+struct PatternMakers {
+    void (*rows)(const T* const* rows, D* dst, ptrdiff_t step, int count, ptrdiff_t begin, ptrdiff_t end,
+                 bool streaming);
+    void (*columns)(const PatternKey<T>* const* columns, D (*codes)[kPatternBlock]);
+};
+template <int reach, int mode, class T, class D>
+inline constexpr PatternMakers<T, D> patternMakers{patternRows<reach, mode, T, D>,
+                                                   patternColumns<reach, mode, PatternKey<T>, D>};
 
 }  // namespace qori::kernels

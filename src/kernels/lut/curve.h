@@ -149,8 +149,11 @@ QORI_INLINE __m128i fourWords(const int16_t* p) {
 
 }  // namespace detail
 
+/// Where curve.c has the polynomial of element x: at its interval, or at x.
+enum class Solved { byInterval, byElement };
+
 /// A block in place, element x by the polynomial of interval places[x] - 1 where there is one.
-template <bool isCubic, class T, class L>
+template <bool isCubic, Solved solved = Solved::byInterval, class T, class L>
 QORI_NOINLINE void mapByCurve(T* block, int n, const uint32_t* places, const Curve<L>& curve) {
     const __m128i one = _mm_set1_epi32(1), lastInterval = _mm_set1_epi32(curve.count - 2);
     for (int x = 0; x < n; x += 4) {
@@ -169,12 +172,15 @@ QORI_NOINLINE void mapByCurve(T* block, int n, const uint32_t* places, const Cur
         else
             v = _mm256_cvtepi32_pd(words);
         const __m256d d = _mm256_sub_pd(v, detail::fourAt(curve.levels, a)), base = detail::fourAt(curve.values, a);
+        const auto coefficients = [&](int power) {
+            return solved == Solved::byElement ? _mm256_loadu_pd(curve.c[power] + x)
+                                               : detail::fourAt(curve.c[power], k);
+        };
         __m256d r;
         if constexpr (isCubic)
-            r = detail::evaluateCubic(d, base, detail::fourAt(curve.c[0], k), detail::fourAt(curve.c[1], k),
-                                      detail::fourAt(curve.c[2], k));
+            r = detail::evaluateCubic(d, base, coefficients(0), coefficients(1), coefficients(2));
         else
-            r = detail::evaluateLine(d, base, detail::fourAt(curve.c[0], k));
+            r = detail::evaluateLine(d, base, coefficients(0));
         if constexpr (std::is_floating_point_v<T>) {
             const __m128i mapped = _mm_castps_si128(_mm256_cvtpd_ps(r));
             _mm_storeu_si128(reinterpret_cast<__m128i*>(block + x), _mm_blendv_epi8(words, mapped, inside));

@@ -7,7 +7,7 @@
 namespace qori::kernels {
 
 /// In each of some rows, dst pixel x becomes src pixel pixels - 1 - x. The images do not overlap. Streaming stores go
-/// past the cache where some pixel of every dst row lies on a 32-byte boundary.
+/// past the cache in rows some pixel of which begins with a cache line.
 template <int pixelBytes, bool keepAlpha>
 void reverseRows(uint8_t* dst, ptrdiff_t dstStep, const uint8_t* src, ptrdiff_t srcStep, ptrdiff_t pixels, int32_t rows,
                  bool streaming);
