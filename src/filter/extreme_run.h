@@ -279,9 +279,12 @@ public:
         forEachTap(task_.window, task_.cover.levels > 0, [&](Tap tap) { *next++ = tap; });
         for (int32_t y = 0; y < task_.roi.height; ++y) {
             source_.enter(y, [this](int32_t row) { raise(row); });
+            const T* row = nullptr;
             for (int64_t k = 0; k < task_.cover.taps; ++k) {
                 const Tap tap = taps_[k];
-                rows_[k] = rowOf(tap, y) + task_.elements(tap.x - task_.cover.box.x);
+                // Taps come row by row, and where a row lies takes a division.
+                if (k == 0 || tap.y != taps_[k - 1].y || tap.level != taps_[k - 1].level) row = rowOf(tap, y);
+                rows_[k] = row + task_.elements(tap.x - task_.cover.box.x);
             }
             task_.joins->joinInto(rows_, static_cast<int>(task_.cover.taps), task_.dst.row(y),
                                   task_.elements(task_.roi.width), task_.finish);
