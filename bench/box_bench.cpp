@@ -205,8 +205,8 @@ const Ladders ladders{
      masks<uint16_t, 1>("box 16u C1, side of the mask", qoriFilterBox_16u_C1R),
      masks<float, 1>("box 32f C1, side of the mask", qoriFilterBox_32f_C1R,
                      "wide windows are added up in passes of up to 8 terms, in an order that the "
-                     "bound of the error holds to: 13 loads and 2 stores per vector for 61 columns, half of "
-                     "them across lines, where 7 take 7. 61 x 7 costs 1.6 of 7 x 7, 7 x 61 1.1")}};
+                     "bound of the error holds to: 14 loads and 2 stores per vector for 61 columns, half of "
+                     "them across lines, where 7 take 7 behind the divisions. 61 x 61 costs 1.53 of 7 x 7")}};
 
 }  // namespace
 }  // namespace qori::bench

@@ -23,7 +23,7 @@ struct ChainLevel {
 
 class Chain {
 public:
-    explicit Chain(int32_t window) { add(window); }
+    explicit Chain(int32_t window) { add(window, true); }
 
     int levels() const { return levels_; }
     const ChainLevel& level(int index) const { return level_[index]; }
@@ -34,21 +34,24 @@ private:
 
     /// The number of equal windows that make one of this width: with what remains in single columns, the fewest terms
     /// of this pass and those below it.
-    static int32_t parts(int32_t window) {
+    static int32_t parts(int32_t window, bool isLast) {
         if (window > 512) return 4;
         int32_t best = 2;
         for (int32_t count = 3; count <= kernels::kMostTerms; ++count)
-            if (terms(window, count) <= kernels::kMostTerms && cost(window, count) < cost(window, best)) best = count;
+            if (terms(window, count) <= kernels::kMostTerms && cost(window, count, isLast) < cost(window, best, isLast))
+                best = count;
         return best;
     }
     static int32_t terms(int32_t window, int32_t count) { return count + window % count; }
-    static int32_t cost(int32_t window, int32_t count) {
-        constexpr int32_t kPass = 2;  // a store and the loop, in terms
-        const int32_t own = terms(window, count) + kPass, below = window / count;
-        return below <= kernels::kMostTerms ? own + below : own + cost(below, 4);
+    /// In halves of a term. Those of the last pass are half hidden by its divisions.
+    static int32_t cost(int32_t window, int32_t count, bool isLast) {
+        constexpr int32_t kPass = 4, kTerm = 2;  // a pass: a store and the loop
+        const int32_t own = terms(window, count) * (isLast ? 1 : kTerm) + kPass, below = window / count;
+        if (below <= kernels::kMostTerms) return own + below * kTerm;
+        return own + cost(below, below <= 64 ? parts(below, false) : 4, false);
     }
     /// Returns the level's index.
-    int32_t add(int32_t window) {
+    int32_t add(int32_t window, bool isLast) {
         ChainLevel made{window, 0, {}};
         const auto repeat = [&](int32_t level, int32_t from, int32_t width, int32_t count) {
             for (int32_t k = 0; k < count; ++k) made.term[made.terms++] = {level, from + k * width};
@@ -56,8 +59,8 @@ private:
         if (window <= kernels::kMostTerms) {
             repeat(-1, 0, 1, window);
         } else {
-            const int32_t count = parts(window), width = window / count;
-            repeat(add(width), 0, width, count);
+            const int32_t count = parts(window, isLast), width = window / count;
+            repeat(add(width, false), 0, width, count);
             repeat(-1, count * width, 1, window - count * width);
         }
         level_[levels_] = made;

@@ -122,8 +122,10 @@ private:
     }
     void lastOfChain(const S* const* term, T* to, ptrdiff_t elements) const {
         const auto make = [&](auto terms) {
-            kernels::acrossChain<decltype(terms)::value, keepAlpha>(term, to, elements, rule_);
+            kernels::acrossChain<decltype(terms)::value, keepAlpha>(term, chain_.last().terms, to, elements, rule_);
         };
+        // Integers in doubles, of areas of 65,538 and more, are not worth eight loops of each kind.
+        if constexpr (!isFloat) return make(std::integral_constant<int, 0>{});
         switch (chain_.last().terms) {
             case 1: return make(std::integral_constant<int, 1>{});
             case 2: return make(std::integral_constant<int, 2>{});

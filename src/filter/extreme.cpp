@@ -74,24 +74,14 @@ bool isSquare(const Window& window, const QorImageRect& box) {
 
 /// By the square's own kernels, which make four rows at a time and keep no block of rows; for floats too, whose results
 /// are those of keys. Out of place any anchor will do, the source being read from further on.
-template <class Order, Layout layout, class S>
-QorResult squareOf(Image<const S> src, Image<S> dst, QorImageSize roi, const QorImageRect& box, bool isInPlace) {
-    if (isInPlace) return squareExtremeInPlace<Order, layout>(dst, roi);
-    const S* const middle = src.row(box.y + 1) + ptrdiff_t{box.x + 1} * channels(layout);
-    squareExtreme<Order, layout>(Image<const S>{middle, src.step}, dst, roi);
-    return QOR_OK;
-}
-
 template <bool largest, class S>
 QorResult squareOf(Image<const S> src, Image<S> dst, QorImageSize roi, Layout layout, const QorImageRect& box,
                    bool isInPlace) {
     using Order = std::conditional_t<largest, kernels::Dilation<S>, kernels::Erosion<S>>;
-    switch (layout) {
-        case Layout::C1: return squareOf<Order, Layout::C1>(src, dst, roi, box, isInPlace);
-        case Layout::C3: return squareOf<Order, Layout::C3>(src, dst, roi, box, isInPlace);
-        case Layout::C4: return squareOf<Order, Layout::C4>(src, dst, roi, box, isInPlace);
-        default: return squareOf<Order, Layout::AC4>(src, dst, roi, box, isInPlace);
-    }
+    if (isInPlace) return squareExtremeInPlace<Order>(dst, roi, layout);
+    const S* const middle = src.row(box.y + 1) + ptrdiff_t{box.x + 1} * channels(layout);
+    squareExtreme<Order>(Image<const S>{middle, src.step}, dst, roi, layout);
+    return QOR_OK;
 }
 
 template <class T>

@@ -163,7 +163,7 @@ public:
         int32_t widest = 1;
         for (int k = 0; k < task.cover.rects; ++k) {
             running_[k].take(task.cover.rect[k], elements, work);
-            widening_[k] = Widening::to(task.cover.rect[k].width);
+            widening_[k] = Widening::to(task.cover.rect[k].width, task.channels * elementBytes<T>);
             widest = std::max(widest, task.cover.rect[k].width);
         }
         for (ElementRows<T>& rows : wider_)
@@ -178,8 +178,8 @@ public:
             const int32_t end = std::min(y + kGroup, task_.roi.height);
             source_.enter(end - 1, [](int32_t) {});
             for (int k = 0; k < task_.cover.rects; ++k) {
-                int32_t row = std::max(y, 1 - task_.cover.rect[k].height);
-                while (row < end) row += enter(k, row, row - y, running_[k].together(end - row));
+                const int32_t first = std::max(y, 1 - task_.cover.rect[k].height);
+                if (first < end) makeRows(k, first, first - y, end - first);
             }
         }
     }
@@ -197,7 +197,7 @@ private:
 
     /// Rows of a rectangle, the first of them row `at` of the group, joined with those of the rectangles before it; of
     /// the last one they are the destination's. Nobody wants what comes before its first row.
-    int32_t enter(int k, int32_t y, int32_t at, int32_t rows) {
+    void makeRows(int k, int32_t y, int32_t at, int32_t rows) {
         const T* taps[kGroup * Widening::kMostRadix];
         const T* elsewhere[kGroup];
         T* to[kGroup];
@@ -207,33 +207,48 @@ private:
             to[i] = isLast && y + i >= 0 ? task_.dst.row(y + i) : joined_.row(at + i);
         }
         const int count = widen(k, y, rows, taps);
-        const T* const* const others = k > 0 ? elsewhere : nullptr;
-        running_[k].enter(*task_.joins, rows, taps, count, others, to, isLast ? task_.finish : kernels::JoinFinish{});
-        return rows;
+        const kernels::JoinFinish finish = isLast ? task_.finish : kernels::JoinFinish{};
+        for (int32_t i = 0; i < rows;) {
+            const int32_t together = running_[k].together(rows - i);
+            running_[k].enter(*task_.joins, together, taps + i * count, count, k > 0 ? elsewhere + i : nullptr, to + i,
+                              finish);
+            i += together;
+        }
     }
 
     /// Joins rows with themselves, but for the last pass, whose taps it sets; returns their number for each row. All
     /// rows make a pass before any makes the next: loads across recent stores wait for these.
     int widen(int k, int32_t y, int32_t rows, const T** taps) {
         const QorImageRect& rect = task_.cover.rect[k];
+        const Widening& widening = widening_[k];
         const T* row[kGroup];
         for (int32_t i = 0; i < rows; ++i)
             row[i] = source_.row(running_[k].rowFor(y + i)) + task_.elements(rect.x - task_.cover.box.x);
         int32_t has = 1;
-        for (int32_t pass = 0;; ++pass) {
-            const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening_[k].radix, rect.width));
+        int pass = 0;
+        const auto seen = [&] { return task_.elements(int64_t{task_.roi.width} + rect.width - has); };
+        if (widening.rounds > 0) {
+            T* to[kGroup];
+            for (int32_t i = 0; i < rows; ++i) to[i] = wider_[0].row(i);
+            task_.joins->widen({row, rows, to, seen(), task_.channels, widening.rounds});
+            for (int32_t i = 0; i < rows; ++i) row[i] = to[i];
+            has = 1 << widening.rounds;
+            ++pass;
+        }
+        for (;; ++pass) {
+            const auto next = static_cast<int32_t>(std::min<int64_t>(int64_t{has} * widening.radix, rect.width));
             const int count = (next - 1) / has + 1;
+            ptrdiff_t tap[Widening::kMostRadix];
+            for (int t = 0; t < count; ++t) tap[t] = task_.elements(std::min(t * has, next - has));
             for (int32_t i = 0; i < rows; ++i)
-                for (int t = 0; t < count; ++t)
-                    taps[i * count + t] = row[i] + task_.elements(std::min(t * has, next - has));
+                for (int t = 0; t < count; ++t) taps[i * count + t] = row[i] + tap[t];
+            has = next;
             if (next == rect.width) return count;
             for (int32_t i = 0; i < rows; ++i) {
                 T* const out = wider_[pass % 2].row(i);
-                task_.joins->join(taps + i * count, count, out,
-                                  task_.elements(int64_t{task_.roi.width} + rect.width - next));
+                task_.joins->join(taps + i * count, count, out, seen());
                 row[i] = out;
             }
-            has = next;
         }
     }
 
@@ -264,9 +279,12 @@ public:
         forEachTap(task_.window, task_.cover.levels > 0, [&](Tap tap) { *next++ = tap; });
         for (int32_t y = 0; y < task_.roi.height; ++y) {
             source_.enter(y, [this](int32_t row) { raise(row); });
+            const T* row = nullptr;
             for (int64_t k = 0; k < task_.cover.taps; ++k) {
                 const Tap tap = taps_[k];
-                rows_[k] = rowOf(tap, y) + task_.elements(tap.x - task_.cover.box.x);
+                // Taps come row by row, and where a row lies takes a division.
+                if (k == 0 || tap.y != taps_[k - 1].y || tap.level != taps_[k - 1].level) row = rowOf(tap, y);
+                rows_[k] = row + task_.elements(tap.x - task_.cover.box.x);
             }
             task_.joins->joinInto(rows_, static_cast<int>(task_.cover.taps), task_.dst.row(y),
                                   task_.elements(task_.roi.width), task_.finish);

@@ -19,7 +19,7 @@ template <class Order, Layout layout, class T>
 QorResult extreme3x3InPlace(Image<T> image, QorImageSize roi) {
     const QorResult checked = firstOf(nullCheck(image), stepCheck(image), sizeCheck(roi),
                                       stepFits<layout, T>(image.step, int64_t{roi.width} + 2 * kSquareReach));
-    return checked != QOR_OK ? checked : squareExtremeInPlace<Order, layout>(image, roi);
+    return checked != QOR_OK ? checked : squareExtremeInPlace<Order>(image, roi, layout);
 }
 
 /// Equal images with equal steps are the in-place form's, and its checks are theirs.
@@ -30,7 +30,7 @@ QorResult extreme3x3(Image<const T> src, Image<T> dst, QorImageSize roi) {
                                       stepFits<layout, T>(src.step, int64_t{roi.width} + 2 * kSquareReach),
                                       stepFits<layout, T>(dst.step, roi.width));
     if (checked != QOR_OK) return checked;
-    squareExtreme<Order, layout>(src, dst, roi);
+    squareExtreme<Order>(src, dst, roi, layout);
     return QOR_OK;
 }
 

@@ -3,8 +3,8 @@
 
 #include "frame/float_control.h"
 #include "frame/plan.h"
-#include "frame/row_window.h"
 #include "frame/streaming.h"
+#include "square_rows.h"
 
 namespace qori::filter {
 namespace {
@@ -13,41 +13,48 @@ namespace {
 /// fifth in the second-level cache and nothing beyond it.
 constexpr int32_t kExtremeRows = 4;
 
-template <Layout layout, class T>
-BorderedImage withNeighbours(Image<T> src, QorImageSize roi) {
-    return {asBytes(src.data), src.step, roi, pixelSize<T, layout>, BorderRule::readAll()};
-}
-
-/// One group of rows. Two or three are made as four, the last of which give way: in place, none may be written before
-/// all of the group are made.
-template <class Order, kernels::Stores stores, Layout layout, class T>
-void makeSquareExtremes(const WindowPart& part, int32_t y, int32_t rows, Image<T> dst) {
-    constexpr int n = channels(layout);
-    constexpr bool keepAlpha = layout == Layout::AC4;
-    const ptrdiff_t elements = ptrdiff_t{part.width} * n;
+/// One group of rows; rowOf(y) is a source row, where the region begins. Two or three are made as four, the last of
+/// which give way: in place, none may be written before all of the group are made.
+template <class Order, bool keepAlpha, class T, class RowOf, class Make>
+void makeSquareExtremes(RowOf rowOf, int32_t y, int32_t rows, Image<T> dst, ptrdiff_t elements, int channels,
+                        Make make) {
     const T* src[kExtremeRows + 2];
     T* to[kExtremeRows];
-    for (int32_t k = 0; k < kExtremeRows + 2; ++k)
-        src[k] = advance(part.row<T>(y - kSquareReach + std::min(k, rows + 1)), n * kSquareReach * elementBytes<T>);
+    for (int32_t k = 0; k < kExtremeRows + 2; ++k) src[k] = rowOf(y - kSquareReach + std::min(k, rows + 1));
     for (int32_t k = 0; k < kExtremeRows; ++k) to[k] = dst.row(y + std::min(k, rows - 1));
     if (rows == 1)
-        kernels::squareRows<Order, n, kernels::Stores::delayed, keepAlpha, 1>(src, to, elements);
+        kernels::squareRowsInPlace<Order, keepAlpha, 1>(src, to, elements, channels);
     else
-        kernels::squareRows<Order, n, stores, keepAlpha, kExtremeRows>(src, to, elements);
+        make(src, to, elements, channels);
 }
 
-constexpr WindowNeeds squareExtremeNeeds(Place place) {
-    return {
-        .reach = {kSquareReach, kSquareReach, kSquareReach, kSquareReach}, .rowsAtOnce = kExtremeRows, .place = place};
+/// Of a row with the neighbours on both sides.
+template <class T>
+int64_t seenBytes(QorImageSize roi, Layout layout) {
+    return (int64_t{roi.width} + 2 * kSquareReach) * channels(layout) * elementBytes<T>;
 }
 
-template <class Order, kernels::Stores stores, Layout layout, class T>
-void runSquareExtremes(const BorderedImage& src, Image<T> dst, uint8_t* memory) {
-    RowWindow window(src, squareExtremeNeeds(stores == kernels::Stores::delayed ? Place::inOrder : Place::apart),
-                     memory);
-    window.forEach([&](const WindowPart& part, int32_t y, int32_t rows) {
-        makeSquareExtremes<Order, stores, layout>(part, y, rows, dst);
-    });
+template <class Order, bool keepAlpha, class T>
+void runInPlace(Image<T> image, QorImageSize roi, Layout layout, uint8_t* memory) {
+    const int n = channels(layout);
+    forGroupsInPlace(image, roi.height, kExtremeRows, seenBytes<T>(roi, layout),
+                     ptrdiff_t{kSquareReach} * n * elementBytes<T>, memory, [=](auto rowOf, int32_t y, int32_t rows) {
+                         makeSquareExtremes<Order, keepAlpha>(
+                             rowOf, y, rows, image, ptrdiff_t{roi.width} * n, n,
+                             kernels::squareRowsInPlace<Order, keepAlpha, kExtremeRows, T>);
+                     });
+}
+
+template <class Order, bool keepAlpha, class T>
+void runApart(Image<const T> src, Image<T> dst, QorImageSize roi, Layout layout, kernels::Stores stores) {
+    const int n = channels(layout);
+    const auto rowOf = [=](int32_t row) { return src.row(row); };
+    const auto make = [=](const T* const* from, T* const* to, ptrdiff_t elements, ptrdiff_t pixel) {
+        kernels::squareRows<Order, keepAlpha, kExtremeRows>(from, to, elements, pixel, stores);
+    };
+    for (int32_t y = 0; y < roi.height; y += kExtremeRows)
+        makeSquareExtremes<Order, keepAlpha>(rowOf, y, std::min(kExtremeRows, roi.height - y), dst,
+                                             ptrdiff_t{roi.width} * n, n, make);
 }
 
 /// Whether rows of so many bytes may stream where they are.
@@ -57,50 +64,55 @@ bool mayStream(Image<T> image, int64_t rowBytes) {
     return at % 64 == 0 || (at % 32 == 0 && rowBytes % 32 == 0);
 }
 
+/// Calls body with whether the fourth channel stays; 64f has one channel.
+template <class T, class Body>
+void withAlpha(Layout layout, Body body) {
+    if constexpr (sizeof(T) <= 4)
+        if (layout == Layout::AC4) return body.template operator()<true>();
+    body.template operator()<false>();
+}
+
 }  // namespace
 
-template <class Order, Layout layout, class T>
-QorResult squareExtremeInPlace(Image<T> image, QorImageSize roi) {
-    const BorderedImage src = withNeighbours<layout>(image, roi);
-    const WorkMemory memory(RowWindow::bytes(src, squareExtremeNeeds(Place::inOrder)));
+template <class Order, class T>
+QorResult squareExtremeInPlace(Image<T> image, QorImageSize roi, Layout layout) {
+    const WorkMemory memory(rowsAboveBytes(seenBytes<T>(roi, layout)));
     if (QorResult r = memory.check()) return r;
     return underControlOf<T>([&] {
-        runSquareExtremes<Order, kernels::Stores::delayed, layout>(src, image, memory.begin<uint8_t>());
+        withAlpha<T>(layout, [&]<bool keepAlpha>() {
+            runInPlace<Order, keepAlpha>(image, roi, layout, memory.begin<uint8_t>());
+        });
         return QOR_OK;
     });
 }
 
-template <class Order, Layout layout, class T>
-void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi) {
+template <class Order, class T>
+void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi, Layout layout) {
+    const int64_t pixelBytes = channels(layout) * elementBytes<T>;
+    // With alpha the destination is in the cache, having been read.
+    const bool isStreaming = layout != Layout::AC4 && mayStream(dst, roi.width * pixelBytes) &&
+                             streams(streamRules::copy, traffic(roi, static_cast<int>(2 * pixelBytes)));
     underControlOf<T>([&] {
-        const BorderedImage image = withNeighbours<layout>(src, roi);
-        constexpr int kBytesPerPixel = 2 * pixelSize<T, layout>;
-        if constexpr (layout != Layout::AC4)  // which has the destination in the cache, having read it
-            if (mayStream(dst, int64_t{roi.width} * pixelSize<T, layout>) &&
-                streams(streamRules::copy, traffic(roi, kBytesPerPixel))) {
-                runSquareExtremes<Order, kernels::Stores::streaming, layout>(image, dst, nullptr);
-                streamFence();
-                return QOR_OK;
-            }
-        runSquareExtremes<Order, kernels::Stores::plain, layout>(image, dst, nullptr);
+        withAlpha<T>(layout, [&]<bool keepAlpha>() {
+            runApart<Order, keepAlpha>(src, dst, roi, layout,
+                                       isStreaming ? kernels::Stores::streaming : kernels::Stores::plain);
+        });
         return QOR_OK;
     });
+    if (isStreaming) streamFence();
 }
 
-#define QORI_SQUARE_EXTREMES(Order, layout, T)                                                 \
-    template QorResult squareExtremeInPlace<Order<T>, Layout::layout>(Image<T>, QorImageSize); \
-    template void squareExtreme<Order<T>, Layout::layout>(Image<const T>, Image<T>, QorImageSize);
-#define QORI_SQUARE_ORDERS(layout, T)                 \
-    QORI_SQUARE_EXTREMES(kernels::Erosion, layout, T) \
-    QORI_SQUARE_EXTREMES(kernels::Dilation, layout, T)
-#define QORI_SQUARE_LAYOUTS(T) \
-    QORI_SQUARE_ORDERS(C1, T) QORI_SQUARE_ORDERS(C3, T) QORI_SQUARE_ORDERS(C4, T) QORI_SQUARE_ORDERS(AC4, T)
-QORI_SQUARE_LAYOUTS(uint8_t)
-QORI_SQUARE_LAYOUTS(uint16_t)
-QORI_SQUARE_LAYOUTS(int16_t)
-QORI_SQUARE_LAYOUTS(float)
-QORI_SQUARE_ORDERS(C1, double)
-#undef QORI_SQUARE_LAYOUTS
+#define QORI_SQUARE_EXTREMES(Order, T)                                                 \
+    template QorResult squareExtremeInPlace<Order<T>>(Image<T>, QorImageSize, Layout); \
+    template void squareExtreme<Order<T>>(Image<const T>, Image<T>, QorImageSize, Layout);
+#define QORI_SQUARE_ORDERS(T)                 \
+    QORI_SQUARE_EXTREMES(kernels::Erosion, T) \
+    QORI_SQUARE_EXTREMES(kernels::Dilation, T)
+QORI_SQUARE_ORDERS(uint8_t)
+QORI_SQUARE_ORDERS(uint16_t)
+QORI_SQUARE_ORDERS(int16_t)
+QORI_SQUARE_ORDERS(float)
+QORI_SQUARE_ORDERS(double)
 #undef QORI_SQUARE_ORDERS
 #undef QORI_SQUARE_EXTREMES
 

@@ -11,11 +11,11 @@ inline constexpr int kSquareReach = 1;
 // Order: kernels::Erosion or Dilation of 8u, 16u, 16s, 32f; one channel of 64f. Arguments are as they must be.
 
 /// Returns QOR_OK or QOR_ERR_NO_MEMORY, with nothing written then.
-template <class Order, Layout layout, class T>
-QorResult squareExtremeInPlace(Image<T> image, QorImageSize roi);
+template <class Order, class T>
+QorResult squareExtremeInPlace(Image<T> image, QorImageSize roi, Layout layout);
 
 /// The images share no memory.
-template <class Order, Layout layout, class T>
-void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi);
+template <class Order, class T>
+void squareExtreme(Image<const T> src, Image<T> dst, QorImageSize roi, Layout layout);
 
 }  // namespace qori::filter

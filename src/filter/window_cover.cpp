@@ -3,6 +3,8 @@
 
 #include <algorithm>
 
+#include "kernels/morphology/joins.h"
+
 namespace qori::filter {
 namespace {
 
@@ -12,19 +14,21 @@ constexpr double kStore = 1.5;
 constexpr double kRunning = 2 + kStore + 2 + kStore + 2;
 /// A level: a row joined with itself.
 constexpr double kLevel = 2 + kStore;
+/// A pass of rounds, whose blocks of 16 bytes are loaded and stored alone; a round.
+constexpr double kRounds = 1.5 + kStore + 1, kRound = 0.5;
 
 double widenedCost(Widening widening, int32_t width) {
-    double cost = 0;
-    for (int64_t has = 1, next = 0; next < width || next == 0; has = next) {
+    double cost = widening.rounds > 0 ? kRounds + kRound * widening.rounds : 0;
+    for (int64_t has = int64_t{1} << widening.rounds, next = 0; next < width || next == 0; has = next) {
         next = std::min<int64_t>(has * widening.radix, width);
         cost += static_cast<double>((next - 1) / has + 1) + kStore;
-        if (width == 1) break;
+        if (next == width) break;
     }
     return cost;
 }
 
 double costOf(const QorImageRect& rect) {
-    return widenedCost(Widening::to(rect.width), rect.width) + (rect.height > 1 ? kRunning : 1);
+    return widenedCost(Widening::to(rect.width, 1), rect.width) + (rect.height > 1 ? kRunning : 1);
 }
 
 bool isFull(const Window& window, int32_t x, int32_t y, int32_t length) {
@@ -90,11 +94,25 @@ Survey survey(const Window& window) {
 
 }  // namespace
 
-Widening Widening::to(int32_t width) {
-    Widening best{2};
-    for (int32_t radix = 2; radix <= kMostRadix; ++radix)
-        if (widenedCost({radix}, width) < widenedCost(best, width)) best.radix = radix;
-    return best;
+Widening Widening::to(int32_t width, int pixelBytes) {
+    // Taps that cost less than any pass before them; that may remain after one; and up to which width two passes of
+    // taps cost less than rounds, of which a block of 16 bytes has few where pixels are wide.
+    constexpr int32_t kDirect = 7, kLast = 4, kTwice = 16;
+    if (width <= kDirect) return {kMostRadix, 0};
+    const int32_t most = pixelBytes > 1 && width <= kTwice ? 0 : kernels::mostRounds(pixelBytes);
+    int32_t rounds = 0;
+    while (rounds < most && (width - 1) >> rounds >= kLast) ++rounds;
+    const int64_t taps = ((int64_t{width} - 1) >> rounds) + 1;
+    // The least radix of as few passes as the largest would take.
+    int32_t radix = 2, passes = 1;
+    for (int64_t reach = kMostRadix; reach < taps; reach *= kMostRadix) ++passes;
+    const auto reach = [&] {
+        int64_t product = 1;
+        for (int32_t k = 0; k < passes; ++k) product *= radix;
+        return product;
+    };
+    while (reach() < taps) ++radix;
+    return {radix, rounds};
 }
 
 WindowCover coverOf(const Window& window) {

@@ -69,14 +69,14 @@ void forEachTap(const Window& window, bool usesLevels, Visit visit) {
 /// The window has a pixel. One without a mask and of any size takes no time to speak of.
 WindowCover coverOf(const Window& window);
 
-/// How rows are joined with themselves until each element is the extreme of a number of pixels: in passes, each of
-/// which widens what the one before joined by the radix.
+/// How rows are joined with themselves until each element is the extreme of a number of pixels: in rounds that double
+/// it, all of them in one pass, and in passes each of which widens what the one before joined by the radix.
 struct Widening {
     static constexpr int32_t kMostRadix = 8;  ///< Beyond it, two passes cost less than one.
 
-    int32_t radix;
+    int32_t radix, rounds;
 
-    static Widening to(int32_t width);
+    static Widening to(int32_t width, int pixelBytes);
 };
 
 }  // namespace qori::filter

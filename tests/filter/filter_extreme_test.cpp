@@ -72,6 +72,24 @@ TEST(FilterExtreme, EverySizeAndAnchorRow) {
     }
 }
 
+/// Pixels of every number of bytes, by windows wider than what is joined tap by tap, and regions narrower than a
+/// vector.
+TEST(FilterExtreme, WideWindowsOfAllPixels) {
+    for (int width : {17, 32, 33, 65, 17 + random().below(50)})
+        for (const Shape& shape : {Shape{.width = 1 + random().below(40), .height = 2},
+                                   Shape{.width = 41 + random().below(40), .height = 3, .shift = 1}}) {
+            const Mask mask = rectangle({width, 1 + random().below(3)}, {random().below(width), 0});
+            checkRectangle<uint8_t, Layout::C3, Kind::R, false>(shape, mask, qoriFilterMin_8u_C3R);
+            checkRectangle<uint8_t, Layout::AC4, Kind::R, true>(shape, mask, qoriFilterMax_8u_AC4R);
+            checkRectangle<uint16_t, Layout::C1, Kind::R, false>(shape, mask, qoriFilterMin_16u_C1R);
+            checkRectangle<int16_t, Layout::C4, Kind::R, true>(shape, mask, qoriFilterMax_16s_C4R);
+            checkRectangle<float, Layout::C1, Kind::R, true>(shape, mask, qoriFilterMax_32f_C1R);
+            checkRectangle<float, Layout::C3, Kind::R, false>(shape, mask, qoriFilterMin_32f_C3R);
+            checkRectangle<float, Layout::C4, Kind::R, true>(shape, mask, qoriFilterMax_32f_C4R);
+            if (HasFailure()) return;
+        }
+}
+
 /// Bit by bit, signalling NaNs included.
 TEST(FilterExtreme, OnePixelCopies) {
     const auto asBits = [](const uint32_t* src, int32_t srcStep, uint32_t* dst, int32_t dstStep, QorImageSize roi,

@@ -41,13 +41,14 @@ QORI_NOINLINE void acrossTerms(const S* sums, ptrdiff_t pitch, ptrdiff_t many, T
 
 /// As acrossTerms; the terms lie where they like.
 template <int terms, bool keepAlpha, class S, class T, class Rule>
-QORI_NOINLINE void acrossChain(const S* const* term, T* dst, ptrdiff_t elements, Rule rule) {
-    const S* from[terms];
-    for (int k = 0; k < terms; ++k) from[k] = term[k];
+QORI_NOINLINE void acrossChain(const S* const* term, int many, T* dst, ptrdiff_t elements, Rule rule) {
+    const int last = terms == 0 ? many : terms;
+    const S* from[terms == 0 ? kMostTerms : terms];
+    for (int k = 0; k < last; ++k) from[k] = term[k];
     acrossSums<keepAlpha, S>(
         dst, elements, rule, [&](ptrdiff_t i, ptrdiff_t rest) __attribute__((always_inline)) {
             Vec<S> total = loadUpTo(from[0] + i, rest);
-            for (int k = 1; k < terms; ++k) total = total + loadUpTo(from[k] + i, rest);
+            for (int k = 1; k < last; ++k) total = total + loadUpTo(from[k] + i, rest);
             return total;
         });
 }

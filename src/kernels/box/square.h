@@ -38,6 +38,14 @@ QORI_INLINE __m256i weighed(__m256i bytes) {
 /// Sums of three neighbours of a row, `count` of them.
 template <Square weights, int channels>
 QORI_INLINE WordPair squareRow(const uint8_t* p, ptrdiff_t count) {
+    if constexpr (channels == 1 && weights == Square::binomial) {
+        // (1, 2, 1) is twice (1, 1): pairs that begin with a byte, one before it and one after.
+        const auto pairs = [=](const uint8_t* first) __attribute__((always_inline)) {
+            return Vec<uint16_t>{weighed<1, 1>(loadUpTo(first, count + 1).v)};
+        };
+        const Vec<uint16_t> middle = pairs(p);
+        return {{pairs(p - 1) + middle, middle + Vec<uint16_t>{weighed<1, 1>(loadUpTo(p + 1, count).v)}}};
+    }
     constexpr int middle = weights == Square::ones ? 1 : 2;
     const __m256i left = loadUpTo(p - channels, count).v, right = loadUpTo(p + channels, count).v;
     const __m256i at = loadUpTo(p, count + (channels == 1)).v;  // an even last byte's neighbour lies in its word

@@ -42,8 +42,7 @@ struct Dilation {
 /// How results reach the destination.
 enum class Stores {
     plain,
-    streaming,  ///< Past the cache: every destination row on a 32-byte boundary.
-    delayed     ///< Behind everything that the next vector reads, so that the destination may be the source.
+    streaming  ///< Past the cache: every destination row on a 32-byte boundary.
 };
 
 namespace detail {
@@ -53,6 +52,11 @@ template <class T, int rows>
 struct SquareRows {
     const T* src[rows + 2];
     T* dst[rows];
+
+    SquareRows(const T* const* from, T* const* to) {
+        for (int k = 0; k < rows + 2; ++k) src[k] = from[k];
+        for (int k = 0; k < rows; ++k) dst[k] = to[k];
+    }
 };
 
 template <class T>
@@ -131,8 +135,8 @@ QORI_INLINE bool isDoubtful(const Joined<Order>* made) {
 /// The extremes of the windows around `count` elements of each destination row. Each row's extreme of three neighbours
 /// is formed once, and the extreme of the two rows that neighbouring windows share, once. The rows come by value: whose
 /// address is known may be changed by any store.
-template <class Order, class T, int rows, class Channels, class Count>
-QORI_INLINE void squareExtremes(SquareRows<T, rows> image, ptrdiff_t at, Channels channels, Count count, Vec<T>* out) {
+template <class Order, class T, int rows, class Count>
+QORI_INLINE void squareExtremes(SquareRows<T, rows> image, ptrdiff_t at, ptrdiff_t channels, Count count, Vec<T>* out) {
     const auto across = [=](int row) __attribute__((always_inline)) {
         return Joined<Order>::of(image.src[row] + at, channels, count);
     };
@@ -181,45 +185,53 @@ QORI_NOINLINE void narrowRows(SquareRows<T, rows> image, ptrdiff_t elements, ptr
 /// of them, are read too. src: rows + 2 of them. Where the same destination row is given several times, the first
 /// counts. The last vector ends with the rows, and may overlap the one before. Rows that stream begin with a cache
 /// line, or on a vector where they are whole vectors: of a line no part goes past the cache and another through it.
-template <class Order, int channels, Stores stores, bool keepAlpha, int rows, class T>
-QORI_NOINLINE void squareRows(const T* const* src, T* const* dst, ptrdiff_t elements) {
+template <class Order, bool keepAlpha, int rows, class T>
+QORI_NOINLINE void squareRows(const T* const* src, T* const* dst, ptrdiff_t elements, ptrdiff_t channels,
+                              Stores stores) {
     constexpr ptrdiff_t n = Vec<T>::lanes;
     const std::integral_constant<ptrdiff_t, n> whole;
-    const std::integral_constant<ptrdiff_t, channels> pixel;
-    detail::SquareRows<T, rows> image;
-    for (int k = 0; k < rows + 2; ++k) image.src[k] = src[k];
-    for (int k = 0; k < rows; ++k) image.dst[k] = dst[k];
+    const detail::SquareRows<T, rows> image(src, dst);
     if (elements < n) return detail::narrowRows<Order, keepAlpha>(image, elements, channels);
     const ptrdiff_t last = elements - n;
     Vec<T> out[rows];
-    if constexpr (stores == Stores::delayed) {
-        Vec<T> end[rows];
-        const bool overlaps = last % n != 0;
-        if (overlaps) detail::squareExtremes<Order>(image, last, pixel, whole, end);
-        ptrdiff_t i = 0;
-        for (; i <= last; i += n) {
-            Vec<T> next[rows];
-            detail::squareExtremes<Order>(image, i, pixel, whole, next);
-            if (i > 0) detail::storeExtremes<false, keepAlpha>(image, i - n, out);
-            for (int k = 0; k < rows; ++k) out[k] = next[k];
+    ptrdiff_t i = 0;
+    if constexpr (!keepAlpha)
+        if (stores == Stores::streaming) {
+            const ptrdiff_t passing = elements % n == 0 ? elements : last / (2 * n) * (2 * n);
+            for (; i < passing; i += n) {
+                detail::squareExtremes<Order>(image, i, channels, whole, out);
+                detail::storeExtremes<true, false>(image, i, out);
+            }
         }
-        detail::storeExtremes<false, keepAlpha>(image, i - n, out);
-        if (overlaps) detail::storeExtremes<false, keepAlpha>(image, last, end);
-    } else {
-        constexpr bool streaming = stores == Stores::streaming;
-        const ptrdiff_t passing = elements % n == 0 ? elements : last / (2 * n) * (2 * n);
-        ptrdiff_t i = 0;
-        for (; i <= last; i += n) {
-            detail::squareExtremes<Order>(image, i, pixel, whole, out);
-            if (streaming && i < passing)
-                detail::storeExtremes<streaming, keepAlpha>(image, i, out);
-            else
-                detail::storeExtremes<false, keepAlpha>(image, i, out);
-        }
-        if (i == last + n) return;
-        detail::squareExtremes<Order>(image, last, pixel, whole, out);
-        detail::storeExtremes<false, keepAlpha>(image, last, out);
+    // From the last whole vector on to the one that ends with the rows.
+    for (bool isLast = i == elements; !isLast; i += n) {
+        isLast = i >= last;
+        const ptrdiff_t at = isLast ? last : i;
+        detail::squareExtremes<Order>(image, at, channels, whole, out);
+        detail::storeExtremes<false, keepAlpha>(image, at, out);
     }
+}
+
+/// The same, stored behind everything that the next vector reads, so that the destination may be the source.
+template <class Order, bool keepAlpha, int rows, class T>
+QORI_NOINLINE void squareRowsInPlace(const T* const* src, T* const* dst, ptrdiff_t elements, ptrdiff_t channels) {
+    constexpr ptrdiff_t n = Vec<T>::lanes;
+    const std::integral_constant<ptrdiff_t, n> whole;
+    const detail::SquareRows<T, rows> image(src, dst);
+    if (elements < n) return detail::narrowRows<Order, keepAlpha>(image, elements, channels);
+    const ptrdiff_t last = elements - n;
+    Vec<T> out[rows], end[rows];
+    const bool overlaps = last % n != 0;
+    if (overlaps) detail::squareExtremes<Order>(image, last, channels, whole, end);
+    ptrdiff_t i = 0;
+    for (; i <= last; i += n) {
+        Vec<T> next[rows];
+        detail::squareExtremes<Order>(image, i, channels, whole, next);
+        if (i > 0) detail::storeExtremes<false, keepAlpha>(image, i - n, out);
+        for (int k = 0; k < rows; ++k) out[k] = next[k];
+    }
+    detail::storeExtremes<false, keepAlpha>(image, i - n, out);
+    if (overlaps) detail::storeExtremes<false, keepAlpha>(image, last, end);
 }
 
 }  // namespace qori::kernels

@@ -45,6 +45,27 @@ struct EnteringRows {
     JoinFinish finish;
 };
 
+/// Rounds of doubling that Joins::widen makes of pixels of so many bytes, in registers. Those whose shifts keep more
+/// vectors than registers hold are not worth it.
+constexpr int mostRounds(int pixelBytes) {
+    int rounds = 0;
+    for (int kept = 0; rounds < 5; ++rounds) {
+        kept += ((pixelBytes << rounds) + kBlockBytes - 1) / kBlockBytes;
+        if (kept > 8) break;
+    }
+    return rounds;
+}
+
+/// Rows that are to be joined with themselves.
+template <class T>
+struct WideningRows {
+    const T* const* row;
+    int rows;
+    T* const* to;
+    ptrdiff_t seen;  ///< Elements of the rows; those of `to` are fewer by the pixels of a window less one.
+    int channels, rounds;
+};
+
 /// The joins of an order. Elements are told apart by their bits: 16-bit ones of both kinds are uint16_t here.
 template <class T>
 struct Joins {
@@ -52,6 +73,9 @@ struct Joins {
     void (*join)(const T* const* row, int count, T* to, ptrdiff_t elements);
     /// The same, finished; `to` is none of the rows.
     void (*joinInto)(const T* const* row, int count, T* to, ptrdiff_t elements, JoinFinish finish);
+    /// to[k][i] = the extreme of row[k][i] and of the 2^rounds - 1 pixels that follow; 1 to mostRounds() rounds. Whole
+    /// blocks of 16 bytes are written of `to`.
+    void (*widen)(const WideningRows<T>& rows);
     void (*enter)(const EnteringRows<T>& rows);
     /// Each row becomes its join with all rows below it. Rows are `step` elements apart and padded to whole vectors.
     void (*joinUpwards)(T* last, ptrdiff_t step, int32_t rows, ptrdiff_t elements);

@@ -7,6 +7,7 @@
 #include "joins.h"
 #include "kernels/map.h"
 #include "kernels/vector_math.h"
+#include "widen.h"
 
 namespace qori::kernels {
 
@@ -142,6 +143,32 @@ void joinInto(const T* const* row, int count, T* to, ptrdiff_t elements, JoinFin
     joinRows<Order, true, 0>(row, count, to, elements, how);
 }
 
+template <class Order, int pixelBytes, int rounds, class T>
+void widenRows(const WideningRows<T>& rows) {
+    if constexpr (rounds > 1)
+        if (rows.rounds < rounds) return widenRows<Order, pixelBytes, rounds - 1>(rows);
+    for (int k = 0; k < rows.rows; k += 2) {
+        const int other = k + 1 < rows.rows ? k + 1 : k;
+        widenTwo<Order, pixelBytes, rounds>(asBytes(rows.row[k]), asBytes(rows.row[other]), asBytes(rows.to[k]),
+                                            asBytes(rows.to[other]), rows.seen * ptrdiff_t{sizeof(T)});
+    }
+}
+
+template <class Order, int channels, class T>
+void widenPixels(const WideningRows<T>& rows) {
+    constexpr int pixelBytes = channels * static_cast<int>(sizeof(T));
+    widenRows<Order, pixelBytes, mostRounds(pixelBytes)>(rows);
+}
+
+template <class Order, class T = typename Order::Element>
+void widen(const WideningRows<T>& rows) {
+    switch (rows.channels) {
+        case 1: return widenPixels<Order, 1>(rows);
+        case 3: return widenPixels<Order, 3>(rows);
+        default: return widenPixels<Order, 4>(rows);
+    }
+}
+
 // --- blocks of rows -------------------------------------------------------------------------------------------------
 
 /// What is made of one vector, before it is stored.
@@ -268,7 +295,7 @@ void joinBlockUpwards(T* last, ptrdiff_t step, int32_t rows, ptrdiff_t elements)
 
 template <class Order>
 constexpr Joins<typename Order::Element> joinsOf() {
-    return {join<Order>, joinInto<Order>, enterBlock<Order>, joinBlockUpwards<Order>};
+    return {join<Order>, joinInto<Order>, widen<Order>, enterBlock<Order>, joinBlockUpwards<Order>};
 }
 
 }  // namespace detail
