@@ -316,7 +316,7 @@ Totals dotProductTotals(QorImageSize roi, int32_t hint, Image<const T> src1, Ima
     if constexpr (std::is_same_v<T, float>)
         return totalsOf<Quantity::products, T, layout>(roi, hint, src1, src2);
     else
-        return orderedTotals<T, layout == Layout::C1 && sizeof(T) < 4>(roi, channels(layout), src1, src2);
+        return orderedTotals < T, layout == Layout::C1 && sizeof(T)<4>(roi, channels(layout), src1, src2);
 }
 
 template <class T, Layout layout>
