@@ -61,7 +61,7 @@ QORI_NOINLINE void widenTwo(const uint8_t* a, const uint8_t* b, uint8_t* toA, ui
     using Rounds = Doublings<Order, pixelBytes, rounds>;
     constexpr ptrdiff_t behind = Rounds::depth * n;
     constexpr int kUnrolled = 4;  // what rounds keep moves from register to register once for so many blocks
-    Rounds made;
+    Rounds made{};
     ptrdiff_t i = 0;
     const auto push = [&]() __attribute__((always_inline)) {
         return made.push(i + n <= seen ? Vec<T>{loadBlocks(a + i, b + i).v} : loadEnds<T>(a + i, b + i, seen - i));
