@@ -277,10 +277,12 @@ bool withScaledOperation(int32_t scale, Run run) {
             }
         }
         return withScaleRule<C, typename Op::W, Op::limit>(scale, [&]<class Rule>(Rule rule) {
-            if constexpr (Op::hasExact && std::is_same_v<Rule, Saturate<C, typename Op::W>>)
-                binary(Exact<Op>{});
+            constexpr bool isExact = Op::hasExact && std::is_same_v<Rule, Saturate<C, typename Op::W>>;
+            using Function = std::conditional_t<isExact, Exact<Op>, ByRule<Op, Rule>>;
+            if constexpr (isExact)
+                binary(Function{});
             else
-                binary(ByRule<Op, Rule>{rule});
+                binary(Function{rule});
         });
     }
 }

@@ -99,9 +99,7 @@ void ColumnParts::enter(const uint8_t* row, ptrdiff_t apart) {
 
 void ColumnParts::advance(const uint8_t* entering, const uint8_t* leaving, ptrdiff_t apart) {
     // The next row is far from this one, where no prefetcher looks for it.
-    for (ptrdiff_t x = 0; x < columns_ * apart; x += 64)
-        __builtin_prefetch(
-            reinterpret_cast<const void*>(reinterpret_cast<uintptr_t>(entering) + static_cast<uintptr_t>(step_ + x)));
+    for (ptrdiff_t x = 0; x < columns_ * apart; x += 64) __builtin_prefetch(entering + (step_ + x));
     split(entering, apart, in_);
     split(leaving, apart, out_);
     for (ptrdiff_t x = 0; x < columns_; x += kVectorBytes) {

@@ -2,6 +2,7 @@
 #include "taps_columns.h"
 
 #include "floats.h"
+#include "image/image.h"
 #include "kernels/copy_rows.h"
 
 namespace qori::kernels {
