@@ -53,7 +53,7 @@ QORI_NOINLINE void placeBySearch(const T* block, int n, const L* levels, int32_t
     constexpr int vectors = 4;
     for (int x = 0; x < n; x += 8 * vectors) {
         __m256i at[vectors];
-        for (int i = 0; i < vectors; ++i) at[i] = _mm256_setzero_si256();
+        for (__m256i& v : at) v = _mm256_setzero_si256();
         for (int32_t left = count; left > 0;) {
             const int32_t half = left - (left >> 1);
             const __m256i step = _mm256_set1_epi32(half), back = _mm256_set1_epi32(half - 1);
