@@ -75,10 +75,8 @@ QorResult combineWith(const T* value, Image<const T> src, Image<T> dst, QorImage
     });
 }
 
-template <class T, Layout layout, Kind kind>
-QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
-    constexpr bool anyStep =
-        std::is_same_v<T, uint8_t> || (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
+template <class T, Layout layout, bool anyStep>
+QorResult addChecked(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale) {
     if (QorResult r = check<anyStep>(src, value, dst, roi)) return r;
     if constexpr (!kernels::isFloat<T>) {
         if (scale == 0 && allValues<layout>(value, isZeroValue<T>)) {
@@ -94,6 +92,14 @@ QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImage
         }
     }
     return combineWith<kernels::Sum<T>, layout>(value, src, dst, roi, scale);
+}
+
+/// The forms of one image and of two differ in what they check, and where they do not, they are one function.
+template <class T, Layout layout, Kind kind>
+QorResult addConstant(Image<const T> src, const T* value, Image<T> dst, QorImageSize roi, int32_t scale = 0) {
+    constexpr bool anyStep =
+        std::is_same_v<T, uint8_t> || (std::is_same_v<T, float> && layout == Layout::C1 && kind == Kind::R);
+    return addChecked<T, layout, anyStep>(src, value, dst, roi, scale);
 }
 
 template <class T, Layout layout>
