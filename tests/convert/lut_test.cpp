@@ -208,9 +208,9 @@ void checkWays(Function function, Form form) {
                                             {drawTable<T>(form, count)});
     };
     for (int count : {2, 3, 4, 12, 13, 32, 33, 257, 258})
-        for (int height : {1, 64, 65, 128, 129}) check(count, height), check(count, height);
+        for (int height : {1, 64, 65, 128, 129}) check(count, height);
     for (int count : {1'025, 1'026, 3'000})
-        for (int height : {1, 64, 65}) check(count, height);
+        for (int height : {1, 65}) check(count, height);
 }
 TEST(Lut, WaysAgree) {
     checkWays<uint16_t>(qoriLUT_16u_C1R, Form::step);

@@ -66,13 +66,13 @@ void median(const char* name, Function function) {
     // Several pieces, strips and bins of columns, both ways; the longer rows of 5 x 5.
     sweepRectangles<T, L>(function, {7, 3}, {{.width = 420, .height = 230}, {.width = 900, .height = 3, .padding = 3}});
     sweepRectangles<T, L>(function, {5, 5}, {{.width = 600, .height = 70}});
-    // Several vectors of tiles, the last ones in part, in both directions: every third mask, so that each is met by
-    // members of every size of elements.
+    // Several vectors of tiles, the last ones in part, in both directions: as many elements with channels as without,
+    // and every third mask, so that each is met by members of every size of elements.
     int index = nextTurn();
     for (QorImageSize mask : kTiledMasks)
         if (index++ % 3 == 0)
             sweepRectangles<T, L>(function, mask,
-                                  {{.width = (mask.width < 7 ? 70 : 270) + random().below(30),
+                                  {{.width = (mask.width < 7 ? 70 : 270 / channels(L)) + random().below(30),
                                     .height = 33 + random().below(8),
                                     .padding = 5}});
     markSwept(name);
