@@ -17,7 +17,7 @@ foreach(source IN LISTS sources)
     add_test(NAME ${name} COMMAND ${QORI_TEST_PROGRAMS}/${name} --gtest_brief=1)
     set_tests_properties(${name} PROPERTIES TIMEOUT 900 ENVIRONMENT "${sanitized};GTEST_FILTER=-${slow}")
 endforeach()
-add_test(NAME fuzz_briefly COMMAND ${QORI_TEST_PROGRAMS}/fuzz 2000000)
+add_test(NAME fuzz_briefly COMMAND ${QORI_TEST_PROGRAMS}/fuzz 1000000 3)
 set_tests_properties(fuzz_briefly PROPERTIES ENVIRONMENT "${sanitized}")
 
 # That the programs do run over the sanitized library: one that is not would find none of its symbols.
