@@ -51,7 +51,7 @@ constexpr int mostRounds(int pixelBytes) {
     int rounds = 0;
     for (int kept = 0; rounds < 5; ++rounds) {
         kept += ((pixelBytes << rounds) + kBlockBytes - 1) / kBlockBytes;
-        if (kept > 8) break;
+        if (kept > 9) break;
     }
     return rounds;
 }
