@@ -21,7 +21,8 @@ double widenedCost(Widening widening, int32_t width) {
     double cost = widening.rounds > 0 ? kRounds + kRound * widening.rounds : 0;
     for (int64_t has = int64_t{1} << widening.rounds, next = 0; next < width || next == 0; has = next) {
         next = std::min<int64_t>(has * widening.radix, width);
-        cost += static_cast<double>((next - 1) / has + 1) + kStore;
+        const int64_t taps = (next - 1) / has + 1;
+        cost += static_cast<double>(taps) + kStore;
         if (next == width) break;
     }
     return cost;
