@@ -75,10 +75,13 @@ private:
     void addBlock(const WindowPart& part, int32_t y, S* sums, ptrdiff_t elements) {
         const int32_t inBlock = y % height_;
         S* const ends = at(ends_[part.index]);  // of 1 row less than the block, of 2 less, ...
-        if (inBlock > 0)
-            return kernels::addRowTo(at(entered_[part.index]), part.row<T>(y + reach_.bottom),
-                                     ends + (inBlock - 1) * elements, sums, inBlock == 1, elements);
         const T* const last = part.row<T>(y + reach_.bottom);
+        if (inBlock > 0) {
+            const auto address = [](const T* row) { return reinterpret_cast<intptr_t>(row); };
+            const auto step = (address(last) - address(part.row<T>(y + reach_.bottom - 1))) / elementBytes<T>;
+            return kernels::addRowTo(at(entered_[part.index]), last, ends + (inBlock - 1) * elements, sums,
+                                     inBlock == 1, elements, static_cast<ptrdiff_t>(step));
+        }
         kernels::sumTerms<S>(&last, 1, ends + (height_ - 2) * elements, elements);
         for (int32_t k = height_ - 2; k >= 0; --k) {
             const T* const row[] = {ends + k * elements, part.row<T>(y - reach_.top + k)};

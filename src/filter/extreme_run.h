@@ -29,7 +29,7 @@ struct ExtremeTask {
     WindowCover cover;
     const kernels::Joins<T>* joins;
     kernels::JoinFinish finish;
-    void (*toKeys)(const T* bits, T* keys, ptrdiff_t elements);  ///< Of floats that are joined; else null.
+    void (*toKeys)(const T* bits, T* keys, ptrdiff_t elements, ptrdiff_t ahead);  ///< Null unless floats are joined.
 
     ptrdiff_t elements(int64_t pixels) const { return static_cast<ptrdiff_t>(pixels * channels); }
     /// The task of some of its columns.
@@ -48,10 +48,10 @@ struct ElementRows {
     RowRing ring{};
 
     void take(WorkBuffer& work, int64_t elements, int32_t rows) {
-        constexpr int64_t lanes = 32 / static_cast<int64_t>(sizeof(T));
-        const int64_t padded = roundUp(elements, lanes);
-        ring = {reinterpret_cast<uint8_t*>(work.take<T>(padded * rows)), padded * static_cast<int64_t>(sizeof(T)),
-                rows};
+        constexpr int64_t kFewSets = 2048;  // rows so far apart share the same few sets of a cache
+        int64_t rowBytes = roundUp(elements * elementBytes<T>, kVectorBytes);
+        if (rowBytes % kFewSets == 0) rowBytes += kBlockAlignment;
+        ring = {work.take<uint8_t>(rowBytes * rows), rowBytes, rows};
     }
     T* row(int32_t slot) const { return reinterpret_cast<T*>(ring.row(slot)); }
 };
@@ -87,13 +87,17 @@ public:
     /// to memory, which loads across two of them would wait for.
     const T* rowAhead(int32_t y) const { return task_.toKeys == nullptr ? inImage(y) : row(y); }
 
+    /// Elements from a row in the image to one so many rows below; copies are in the cache anyway.
+    ptrdiff_t ahead(int32_t rows) const { return isKept_ ? 0 : stepOf(rows); }
+
 private:
+    ptrdiff_t stepOf(int64_t rows) const { return static_cast<ptrdiff_t>(rows * task_.src.step / elementBytes<T>); }
     const T* inImage(int32_t y) const { return task_.src.row(y) + ptrdiff_t{task_.cover.box.x} * task_.channels; }
     void copy(int32_t y) {
         const T* const from = inImage(y);
         T* const to = rows_.row((y - task_.cover.box.y) % rows_.ring.rows);
         if constexpr (std::is_same_v<T, kernels::FloatKey>)
-            if (task_.toKeys != nullptr) return task_.toKeys(from, to, elements_);
+            if (task_.toKeys != nullptr) return task_.toKeys(from, to, elements_, stepOf(1));
         kernels::copyRow(asBytes(to), asBytes(from), elements_ * elementBytes<T>);
     }
 
@@ -230,7 +234,7 @@ private:
         if (widening.rounds > 0) {
             T* to[kGroup];
             for (int32_t i = 0; i < rows; ++i) to[i] = wider_[0].row(i);
-            task_.joins->widen({row, rows, to, seen(), task_.channels, widening.rounds});
+            task_.joins->widen({row, rows, to, seen(), task_.channels, widening.rounds, source_.ahead(2)});
             for (int32_t i = 0; i < rows; ++i) row[i] = to[i];
             has = 1 << widening.rounds;
             ++pass;

@@ -21,7 +21,8 @@ double widenedCost(Widening widening, int32_t width) {
     double cost = widening.rounds > 0 ? kRounds + kRound * widening.rounds : 0;
     for (int64_t has = int64_t{1} << widening.rounds, next = 0; next < width || next == 0; has = next) {
         next = std::min<int64_t>(has * widening.radix, width);
-        cost += static_cast<double>((next - 1) / has + 1) + kStore;
+        const int64_t taps = (next - 1) / has + 1;
+        cost += static_cast<double>(taps) + kStore;
         if (next == width) break;
     }
     return cost;
@@ -95,13 +96,9 @@ Survey survey(const Window& window) {
 }  // namespace
 
 Widening Widening::to(int32_t width, int pixelBytes) {
-    // Taps that cost less than any pass before them; that may remain after one; and up to which width two passes of
-    // taps cost less than rounds, of which a block of 16 bytes has few where pixels are wide.
-    constexpr int32_t kDirect = 7, kLast = 4, kTwice = 16;
+    constexpr int32_t kDirect = 7;  // taps that cost less than any pass before them
     if (width <= kDirect) return {kMostRadix, 0};
-    const int32_t most = pixelBytes > 1 && width <= kTwice ? 0 : kernels::mostRounds(pixelBytes);
-    int32_t rounds = 0;
-    while (rounds < most && (width - 1) >> rounds >= kLast) ++rounds;
+    const int32_t rounds = std::min(kernels::mostRounds(pixelBytes), floorLog2(width - 1));
     const int64_t taps = ((int64_t{width} - 1) >> rounds) + 1;
     // The least radix of as few passes as the largest would take.
     int32_t radix = 2, passes = 1;

@@ -115,5 +115,7 @@ inline std::vector<Shape> extremeShapes() {
 
 /// Wide enough for several tiles of columns, of float pixels of three and four channels.
 constexpr Shape kTiled{.width = 2500, .height = 9, .padding = 7};
+/// Work rows of any pixels as long as this many pages, or halves of them, lie further apart than they are long.
+constexpr Shape kWholePages{.width = 2048, .height = 6};
 
 }  // namespace qori::test

@@ -44,6 +44,7 @@ void sweepRectangles(const char* name, Function function) {
     });
     checkRectangle<T, L, Kind::R, largest>(kTiled, rectangle({5, 9}, {1, 8}), function);
     checkRectangle<T, L, Kind::R, largest>(kTiled, rectangle({30, 3}, {0, 0}), function);
+    checkRectangle<T, L, Kind::R, largest>(kWholePages, rectangle({9, 4}, {8, 0}), function);
     markSwept(name);
 }
 

@@ -118,16 +118,24 @@ QORI_NOINLINE void slideRow(S* sums, const T* entering, const T* leaving, ptrdif
         });
 }
 
-/// sums += entering, total = sums + rest.
+/// sums += entering, total = sums + rest. The processor is told of the row `ahead` of the entering one, which comes
+/// next: it sees no further than the ends of rows by itself.
 template <class S, class T>
-QORI_NOINLINE void addRowTo(S* sums, const T* entering, const S* rest, S* total, bool isFirst, ptrdiff_t elements) {
-    forVectors<S>(
-        elements, [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
-            Vec<S> sum = loadAs<S>(entering + i, count);
-            if (!isFirst) sum = loadUpTo(sums + i, count) + sum;
-            storeUpTo(sums + i, sum, count);
-            storeUpTo(total + i, sum + loadUpTo(rest + i, count), count);
-        });
+QORI_NOINLINE void addRowTo(S* sums, const T* entering, const S* rest, S* total, bool isFirst, ptrdiff_t elements,
+                            ptrdiff_t ahead) {
+    constexpr ptrdiff_t n = Vec<S>::lanes;
+    const auto add = [&](ptrdiff_t i, auto count) __attribute__((always_inline)) {
+        Vec<S> sum = loadAs<S>(entering + i, count);
+        if (!isFirst) sum = loadUpTo(sums + i, count) + sum;
+        storeUpTo(sums + i, sum, count);
+        storeUpTo(total + i, sum + loadUpTo(rest + i, count), count);
+    };
+    ptrdiff_t i = 0;
+    for (; i + 2 * n <= elements; i += 2 * n) {
+        __builtin_prefetch(entering + i + ahead);
+        for (int v = 0; v < 2; ++v) add(i + v * n, kWhole<S>);
+    }
+    for (; i < elements; i += n) i + n <= elements ? add(i, kWhole<S>) : add(i, elements - i);
 }
 
 /// Element i of a vector's `channels` interleaved running sums: the sum of all elements of its channel up to it.

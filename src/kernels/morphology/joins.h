@@ -51,7 +51,7 @@ constexpr int mostRounds(int pixelBytes) {
     int rounds = 0;
     for (int kept = 0; rounds < 5; ++rounds) {
         kept += ((pixelBytes << rounds) + kBlockBytes - 1) / kBlockBytes;
-        if (kept > 8) break;
+        if (kept > 9) break;
     }
     return rounds;
 }
@@ -64,6 +64,7 @@ struct WideningRows {
     T* const* to;
     ptrdiff_t seen;  ///< Elements of the rows; those of `to` are fewer by the pixels of a window less one.
     int channels, rounds;
+    ptrdiff_t ahead;  ///< Elements from a row to one that is read soon, which the processor is told of.
 };
 
 /// The joins of an order. Elements are told apart by their bits: 16-bit ones of both kinds are uint16_t here.
@@ -86,8 +87,8 @@ extern const Joins<uint8_t> kByteJoins[2];
 extern const Joins<uint16_t> kWordJoins[2], kSignedWordJoins[2];
 extern const Joins<FloatKey> kKeyJoins[2];
 
-/// The keys of an order, of floats' bits; no row is the other.
+/// The keys of an order, of floats' bits; no row is the other. `ahead`: elements from a row to one that is read soon.
 template <bool largest>
-void toKeys(const FloatKey* bits, FloatKey* keys, ptrdiff_t elements);
+void toKeys(const FloatKey* bits, FloatKey* keys, ptrdiff_t elements, ptrdiff_t ahead);
 
 }  // namespace qori::kernels

@@ -6,6 +6,7 @@
 
 #include "joins.h"
 #include "kernels/map.h"
+#include "kernels/streamed_lines.h"
 #include "kernels/vector_math.h"
 #include "widen.h"
 
@@ -150,7 +151,8 @@ void widenRows(const WideningRows<T>& rows) {
     for (int k = 0; k < rows.rows; k += 2) {
         const int other = k + 1 < rows.rows ? k + 1 : k;
         widenTwo<Order, pixelBytes, rounds>(asBytes(rows.row[k]), asBytes(rows.row[other]), asBytes(rows.to[k]),
-                                            asBytes(rows.to[other]), rows.seen * ptrdiff_t{sizeof(T)});
+                                            asBytes(rows.to[other]), rows.seen * ptrdiff_t{sizeof(T)},
+                                            rows.ahead * ptrdiff_t{sizeof(T)});
     }
 }
 
@@ -185,6 +187,10 @@ struct Held {
     }
 };
 
+/// Rows of so few taps come from the cache, and what is slow are the destination's; more are read from the image, where
+/// what prefetches them is in the way of loads.
+inline constexpr int kFewTaps = 4;
+
 /// Stores what is made, or holds it.
 template <class Order, int fixed, int vectors, class T>
 QORI_INLINE void enterVectors(const EnteringRows<T>& rows, ptrdiff_t at, Held<T>* held) {
@@ -208,6 +214,9 @@ QORI_INLINE void enterVectors(const EnteringRows<T>& rows, ptrdiff_t at, Held<T>
             for (int v = 0; v < vectors; ++v) row[v] = Order::join(row[v], load(entering.lastRows + at + v * n));
         if (entering.elsewhere != nullptr)
             for (int v = 0; v < vectors; ++v) row[v] = Order::join(row[v], load(entering.elsewhere + at + v * n));
+        if constexpr (vectors > 1 && fixed > 0 && fixed <= kFewTaps)
+            for (int bytes = 0; bytes < vectors * kVectorBytes; bytes += kCacheLine)
+                __builtin_prefetch(asBytes(entering.to + at) + 2 * vectors * kVectorBytes + bytes);
         finish<Order, vectors>(row, rows.finish, static_cast<const T*>(entering.to) + at);
         for (int v = 0; v < vectors; ++v) store(to + v * n, row[v]);
     }

@@ -54,9 +54,12 @@ QORI_NOINLINE Vec<T> loadEnds(const uint8_t* a, const uint8_t* b, ptrdiff_t coun
     return {_mm256_permute2x128_si256(loadPartial(a, count).v, loadPartial(b, count).v, 0x20)};
 }
 
-/// Two rows; `seen` bytes are read of either, which those of `to` and all shifts come to.
+/// Two rows; `seen` bytes are read of either, which those of `to` and all shifts come to. The processor is told of rows
+/// `ahead` of them: what it sees ahead by itself ends with the row, and rounds leave it no time at the next one's
+/// start.
 template <class Order, int pixelBytes, int rounds, class T = typename Order::Element>
-QORI_NOINLINE void widenTwo(const uint8_t* a, const uint8_t* b, uint8_t* toA, uint8_t* toB, ptrdiff_t seen) {
+QORI_NOINLINE void widenTwo(const uint8_t* a, const uint8_t* b, uint8_t* toA, uint8_t* toB, ptrdiff_t seen,
+                            ptrdiff_t ahead) {
     constexpr ptrdiff_t n = kBlockBytes, spread = ptrdiff_t{(1 << rounds) - 1} * pixelBytes;
     using Rounds = Doublings<Order, pixelBytes, rounds>;
     constexpr ptrdiff_t behind = Rounds::depth * n;
@@ -70,9 +73,11 @@ QORI_NOINLINE void widenTwo(const uint8_t* a, const uint8_t* b, uint8_t* toA, ui
         storeBlocks(toA + (at - behind), toB + (at - behind), {v.v});
     };
     for (; i < behind; i += n) push();
-    for (; i + kUnrolled * n <= seen; i += kUnrolled * n)
+    for (; i + kUnrolled * n <= seen; i += kUnrolled * n) {
+        __builtin_prefetch(a + i + ahead), __builtin_prefetch(b + i + ahead);
         for (ptrdiff_t at = i; at < i + kUnrolled * n; at += n)
             put(at, made.push(Vec<T>{loadBlocks(a + at, b + at).v}));
+    }
     for (; i - behind < seen - spread; i += n) put(i, push());
 }
 
