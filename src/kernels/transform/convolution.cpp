@@ -258,18 +258,16 @@ private:
         QORI_INLINE ComplexLine total() const { return line::plusI(ofReal, ofImaginary); }
     };
 
-    /// To point m the sum over i from m of factor i times end i - m, two points at a time.
+    /// To point m the sum over i from m of factor i times end i - m, two points at a time, without the last factor.
     template <class Index>
     QORI_NOINLINE void addTo(Index index, const float* factors, const float* ends) const {
         for (ptrdiff_t m = 0; m < count_; m += 2, factors += 4) {
             Sum first, second;
-            const ptrdiff_t products = count_ - m - 1;
-            for (ptrdiff_t i = 0; i < products; ++i) {
+            for (ptrdiff_t i = 0; i < count_ - m - 1; ++i) {
                 const ComplexLine x = line::loadLine(ends + i * kLineFloats);
                 first.add(x, factors + 2 * i);
                 second.add(x, factors + 2 * i + 2);
             }
-            first.add(line::loadLine(ends + products * kLineFloats), factors + 2 * products);
             order_.add(block_, index(m), first.total());
             order_.add(block_, index(m + 1), second.total());
         }

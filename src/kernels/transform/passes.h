@@ -62,10 +62,9 @@ private:
 };
 
 /// Between n points there are 2 n - 1 lags. A cyclic convolution of fewer points has one place for two of them where
-/// they are more than half around: so many of either sign, the largest ones to an even number, are summed apart.
-constexpr int64_t missingLags(int64_t n, int64_t points) {
-    return points >= 2 * n - 1 ? 0 : (n - points / 2 + 1) / 2 * 2;
-}
+/// they are more than half around: so many of either sign, the largest ones, are summed apart. It is an even number, as
+/// n is odd and points are whole eights; the last factor is 0.
+constexpr int64_t missingLags(int64_t n, int64_t points) { return points >= 2 * n - 1 ? 0 : n - points / 2 + 1; }
 
 /// So many of the parts of a convolution's outer stage hold points of a block: half of them, or one more where lags are
 /// missing, which is so up to an eighth of the points.
