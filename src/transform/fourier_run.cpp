@@ -43,6 +43,16 @@ void forEachRows(const FourierPlan& plan, const Images& images, int most, Each e
     }
 }
 
+enum class Towards { left, right };
+
+/// Blocks go from one side to the other, each a cache line of every row, which no prefetcher sees coming: the next one
+/// is asked for, unless the image is in a second-level cache.
+LineColumns towards(Towards side, LineColumns block) {
+    constexpr ptrdiff_t cached = 1 << 21, line = 2 * kColumns;
+    if (block.rows.count * block.rows.step > cached) block.ahead = side == Towards::left ? -line : 2 * line - 1;
+    return block;
+}
+
 /// Complex columns of a real image's spectra, the real ones being one of them, of each channel.
 class SpectrumColumns {
 public:
@@ -264,15 +274,16 @@ void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     if (columns.hasLastColumn() && kernels::areColumnsShiftable(table, columns.between(blocks - 1))) {
         turnSaved(plan, images, w, Direction::forward);
         for (int32_t b = blocks - 1; b > 0; --b)
-            kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
+            kernels::transformColumnsShifted(table, towards(Towards::left, columns.between(b)), plan.columnForward,
+                                             w.saved, w.lines);
         turnSaved(plan, images, w, Direction::inverse);
         return storeSaved(std::min(plan.size.width, 2 * kColumns / images.channels) - 1);
     }
     // Else from the left: packed pairs begin a pixel before those between, which have been read by then. The last
     // column waits until the last block has been read.
     for (int32_t b = 1; b < blocks; ++b)
-        kernels::transformColumns(table, columns.between(b), columns.packed(b), plan.columnForward, Parts::inOrder,
-                                  w.lines, w.work);
+        kernels::transformColumns(table, towards(Towards::right, columns.between(b)), columns.packed(b),
+                                  plan.columnForward, Parts::inOrder, w.lines, w.work);
     storeSaved(plan.size.width - 1);
 }
 
@@ -293,8 +304,8 @@ void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     if (from.hasLastColumn())
         from.forEachChannel([&](int c) { kernels::columnToFloats(from.column(plan.size.width - 1, c), last(c)); });
     for (int32_t b = from.blocks() - 1; b > 0; --b)
-        kernels::transformColumns(table, from.packed(b), to.between(b), plan.columnInverse, Parts::exchanged, w.lines,
-                                  w.work);
+        kernels::transformColumns(table, towards(Towards::left, from.packed(b)), to.between(b), plan.columnInverse,
+                                  Parts::exchanged, w.lines, w.work);
     kernels::columnsToLines(from.packed(0), plan.columnInverse, Parts::exchanged, w.lines);
     inverseFirstColumns(plan, from, to, w);
     inverseRealRows(plan, images, w);
@@ -316,7 +327,7 @@ void transformComplex(const FourierPlan& plan, const Images& images, uint8_t* bu
     for (int32_t x = 0; x < plan.size.width; x += kColumns) {
         const LineColumns columns{rowsOf(images.dst, images.dstStep, images, 0, plan.size.height), ptrdiff_t{x} * 2, 0,
                                   std::min(kColumns, plan.size.width - x)};
-        kernels::transformColumns(ofColumns, columns, columns, scale, parts, w.lines, w.work);
+        kernels::transformColumns(ofColumns, towards(Towards::right, columns), columns, scale, parts, w.lines, w.work);
     }
 }
 
