@@ -6,7 +6,7 @@
 
 #include <algorithm>
 
-#include "kernels/transform/move_lines.h"
+#include "kernels/transform/pixel_rows.h"
 
 namespace qori::transform {
 namespace {
@@ -118,7 +118,36 @@ void forEachLines(const FourierPlan& plan, const Images& images, float* lines, E
 /// more rows than lanes, or where that is a larger part of the errors and rows are short, they go alone.
 bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 31; }
 
+/// Even rows of four channels.
+void forwardPixelRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    const kernels::FourierTable* const table = plan.rows();
+    const int32_t* const positions = table->positions();
+    const int32_t width = plan.size.width;
+    forEachRows(plan, images, kernels::kPixelRows, [&](const LineRows& src, const LineRows& dst) {
+        kernels::pixelsToLines(src, width, plan.rowForward, w.lines);
+        kernels::transformLines(table, w.lines, w.work);
+        if (!plan.hasWideHalves()) return kernels::halvesToPixels(w.lines, width, positions, plan.roots(), dst);
+        kernels::splitWideHalves(w.lines, width, positions, plan.wideRoots());
+        kernels::linesToPixels(w.lines, positions, width, Parts::inOrder, dst);
+    });
+}
+
+void inversePixelRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    const kernels::FourierTable* const table = plan.rows();
+    const int32_t width = plan.size.width;
+    forEachRows(plan, images, kernels::kPixelRows, [&](const LineRows&, const LineRows& dst) {
+        if (plan.hasWideHalves()) {
+            kernels::pixelsToLines(dst, width, plan.rowInverse, w.lines);
+            kernels::joinWideHalves(w.lines, width, plan.wideRoots());
+        } else
+            kernels::pixelsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
+        kernels::transformLines(table, w.lines, w.work);
+        kernels::linesToPixels(w.lines, table->positions(), width, Parts::exchanged, dst);
+    });
+}
+
 void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    if (plan.halfRoots != 0 && images.channels == 4) return forwardPixelRows(plan, images, w);
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
     if (plan.hasShortRows)
@@ -153,6 +182,7 @@ void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& 
 
 /// From the order between rows and columns, in place.
 void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    if (plan.halfRoots != 0 && images.channels == 4) return inversePixelRows(plan, images, w);
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
     if (plan.hasShortRows)
