@@ -143,7 +143,7 @@ const Ladders ladders{{
                              293, 300, 331, 343, 361,  384,  409,  500,  509,  512,  521,  529, 600, 625, 720,
                              841, 900, 961, 997, 1000, 1009, 1024, 1050, 2039, 2048, 4093, 4096});
          },
-     .reason = "primes are convolved, with parts of more than twice their length where p - 1 has large factors"},
+     .reason = "primes are convolved, with parts of about twice their length where p - 1 has large factors"},
 }};
 
 }  // namespace

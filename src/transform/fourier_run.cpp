@@ -6,7 +6,7 @@
 
 #include <algorithm>
 
-#include "kernels/transform/move_lines.h"
+#include "kernels/transform/pixel_rows.h"
 
 namespace qori::transform {
 namespace {
@@ -41,6 +41,16 @@ void forEachRows(const FourierPlan& plan, const Images& images, int most, Each e
         each(rowsOf(images.src, images.srcStep, images, y, count),
              rowsOf(images.dst, images.dstStep, images, y, count));
     }
+}
+
+enum class Towards { left, right };
+
+/// Blocks go from one side to the other, each a cache line of every row, which no prefetcher sees coming: the next one
+/// is asked for, unless the image is in a second-level cache.
+LineColumns towards(Towards side, LineColumns block) {
+    constexpr ptrdiff_t cached = 1 << 21, line = 2 * kColumns;
+    if (block.rows.count * block.rows.step > cached) block.ahead = side == Towards::left ? -line : 2 * line - 1;
+    return block;
 }
 
 /// Complex columns of a real image's spectra, the real ones being one of them, of each channel.
@@ -108,7 +118,36 @@ void forEachLines(const FourierPlan& plan, const Images& images, float* lines, E
 /// more rows than lanes, or where that is a larger part of the errors and rows are short, they go alone.
 bool areAlone(QorImageSize size) { return size.height <= kColumns || size.width <= 31; }
 
+/// Even rows of four channels.
+void forwardPixelRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    const kernels::FourierTable* const table = plan.rows();
+    const int32_t* const positions = table->positions();
+    const int32_t width = plan.size.width;
+    forEachRows(plan, images, kernels::kPixelRows, [&](const LineRows& src, const LineRows& dst) {
+        kernels::pixelsToLines(src, width, plan.rowForward, w.lines);
+        kernels::transformLines(table, w.lines, w.work);
+        if (!plan.hasWideHalves()) return kernels::halvesToPixels(w.lines, width, positions, plan.roots(), dst);
+        kernels::splitWideHalves(w.lines, width, positions, plan.wideRoots());
+        kernels::linesToPixels(w.lines, positions, width, Parts::inOrder, dst);
+    });
+}
+
+void inversePixelRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    const kernels::FourierTable* const table = plan.rows();
+    const int32_t width = plan.size.width;
+    forEachRows(plan, images, kernels::kPixelRows, [&](const LineRows&, const LineRows& dst) {
+        if (plan.hasWideHalves()) {
+            kernels::pixelsToLines(dst, width, plan.rowInverse, w.lines);
+            kernels::joinWideHalves(w.lines, width, plan.wideRoots());
+        } else
+            kernels::pixelsToHalves(dst, width, plan.rowInverse, plan.roots(), w.lines);
+        kernels::transformLines(table, w.lines, w.work);
+        kernels::linesToPixels(w.lines, table->positions(), width, Parts::exchanged, dst);
+    });
+}
+
 void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    if (plan.halfRoots != 0 && images.channels == 4) return forwardPixelRows(plan, images, w);
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
     if (plan.hasShortRows)
@@ -143,6 +182,7 @@ void forwardRealRows(const FourierPlan& plan, const Images& images, const Work& 
 
 /// From the order between rows and columns, in place.
 void inverseRealRows(const FourierPlan& plan, const Images& images, const Work& w) {
+    if (plan.halfRoots != 0 && images.channels == 4) return inversePixelRows(plan, images, w);
     const kernels::FourierTable* const table = plan.rows();
     const int32_t width = plan.size.width;
     if (plan.hasShortRows)
@@ -264,15 +304,16 @@ void forwardReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     if (columns.hasLastColumn() && kernels::areColumnsShiftable(table, columns.between(blocks - 1))) {
         turnSaved(plan, images, w, Direction::forward);
         for (int32_t b = blocks - 1; b > 0; --b)
-            kernels::transformColumnsShifted(table, columns.between(b), plan.columnForward, w.saved, w.lines);
+            kernels::transformColumnsShifted(table, towards(Towards::left, columns.between(b)), plan.columnForward,
+                                             w.saved, w.lines);
         turnSaved(plan, images, w, Direction::inverse);
         return storeSaved(std::min(plan.size.width, 2 * kColumns / images.channels) - 1);
     }
     // Else from the left: packed pairs begin a pixel before those between, which have been read by then. The last
     // column waits until the last block has been read.
     for (int32_t b = 1; b < blocks; ++b)
-        kernels::transformColumns(table, columns.between(b), columns.packed(b), plan.columnForward, Parts::inOrder,
-                                  w.lines, w.work);
+        kernels::transformColumns(table, towards(Towards::right, columns.between(b)), columns.packed(b),
+                                  plan.columnForward, Parts::inOrder, w.lines, w.work);
     storeSaved(plan.size.width - 1);
 }
 
@@ -293,8 +334,8 @@ void inverseReal(const FourierPlan& plan, const Images& images, uint8_t* buffer)
     if (from.hasLastColumn())
         from.forEachChannel([&](int c) { kernels::columnToFloats(from.column(plan.size.width - 1, c), last(c)); });
     for (int32_t b = from.blocks() - 1; b > 0; --b)
-        kernels::transformColumns(table, from.packed(b), to.between(b), plan.columnInverse, Parts::exchanged, w.lines,
-                                  w.work);
+        kernels::transformColumns(table, towards(Towards::left, from.packed(b)), to.between(b), plan.columnInverse,
+                                  Parts::exchanged, w.lines, w.work);
     kernels::columnsToLines(from.packed(0), plan.columnInverse, Parts::exchanged, w.lines);
     inverseFirstColumns(plan, from, to, w);
     inverseRealRows(plan, images, w);
@@ -316,7 +357,7 @@ void transformComplex(const FourierPlan& plan, const Images& images, uint8_t* bu
     for (int32_t x = 0; x < plan.size.width; x += kColumns) {
         const LineColumns columns{rowsOf(images.dst, images.dstStep, images, 0, plan.size.height), ptrdiff_t{x} * 2, 0,
                                   std::min(kColumns, plan.size.width - x)};
-        kernels::transformColumns(ofColumns, columns, columns, scale, parts, w.lines, w.work);
+        kernels::transformColumns(ofColumns, towards(Towards::right, columns), columns, scale, parts, w.lines, w.work);
     }
 }
 

@@ -78,6 +78,7 @@ struct Dft {
                                   {293, 2},
                                   {4001, 1},
                                   {503, 2},
+                                  {467, 2},
                                   {3, 569},
                                   {1553, 1},
                                   {1, 1259},
@@ -214,10 +215,12 @@ TEST(Dft, TakesNoNeedlessRoundings) {
 /// again at least. Of more than eight rows halves are put together in doubles; in floats errors are a twentieth larger.
 TEST(Dft, RoundsShortRowsOnce) {
     EXPECT_LE(realError(true, {20, 4}), 0.52e-7);
+    EXPECT_LE(realError(true, {24, 4}), 0.52e-7);
     EXPECT_LE(realError(false, {64, 2}), 0.45e-7);
     EXPECT_LE(realError(true, {2, 12}), 0.45e-7);
     EXPECT_LE(realError(false, {2, 48}), 0.45e-7);
     EXPECT_LE(realError(false, {1, 6}), 0.35e-7);
+    EXPECT_LE(realError(false, {18, 16}), 0.955e-7);
     EXPECT_LE(realError(true, {32, 9}), 0.955e-7);
     EXPECT_LE(realError(false, {64, 9}), 1.03e-7);
 }

@@ -46,6 +46,9 @@ QORI_NOINLINE void passIn(const LineColumns& from, float scale, const FourierTab
     const Vec<float> factor = splat(scale);
     for (ptrdiff_t j = 0; j < part; ++j, w += 2 * (radix - 1)) {
         ComplexLine a[radix];
+        if (from.ahead != 0)
+            for (int q = 0; q < radix; ++q)
+                _mm_prefetch(reinterpret_cast<const char*>(rowOf(from, j + q * part) + from.ahead), _MM_HINT_T1);
         for (int q = 0; q < radix; ++q) {
             const ComplexLine z = Lanes::read(rowOf(from, j + q * part));
             a[q] = exchangedIf<isExchanged>({z.re * factor, z.im * factor});

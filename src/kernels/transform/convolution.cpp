@@ -7,7 +7,9 @@
 //
 // Any n: with jk = (j^2 + k^2 - (k - j)^2) / 2, the sum over j of x(j) e^(-2 pi i jk / n) is a chirp times the
 // convolution of x times the chirp with the chirp's conjugate (Bluestein: A linear filtering approach to the
-// computation of the discrete Fourier transform, 1970). That is linear, and cyclic of any length from 2 n - 1 on.
+// computation of the discrete Fourier transform, 1970). That is linear, and cyclic of any length from 2 n - 1 on; of a
+// shorter one but for the largest lags, which only the ends of a block have. Their sums are a triangle of products,
+// which costs less than points up to the next length that does without.
 //
 // Convolutions are transformed, multiplied by the spectrum of what does not change, transformed back through the same
 // stages from the last to the first, so that nothing is ever put in order. Between the exchanged parts of the way back
@@ -49,15 +51,15 @@ struct Convolution {
     float* block;
 };
 
-/// Points times a chirp, which are at most half of the convolution's, 0 behind them; frequencies in order. Without a
-/// chirp they are part of another convolution, which goes on between exchanged parts.
+/// Points times a chirp, 0 behind them; frequencies in order. Without a chirp they are part of another convolution,
+/// which goes on between exchanged parts.
 template <bool hasChirp>
 struct PaddedOrder {
     const float* chirp;
     ptrdiff_t points;
 
-    /// How many of the parts of an outer stage hold points.
-    static constexpr int filled(int radix) { return radix / 2; }
+    /// How many of the parts of an outer stage are read and written.
+    static constexpr int filled(int radix) { return line::filledParts(radix); }
     QORI_INLINE ComplexLine load(const float* block, ptrdiff_t i) const {
         if (i >= points) return {zero<float>(), zero<float>()};
         const ComplexLine a = line::loadLine(block + i * kLineFloats);
@@ -66,6 +68,11 @@ struct PaddedOrder {
     QORI_INLINE void store(float* block, ptrdiff_t i, ComplexLine a) const {
         if (i >= points) return;
         line::storeLine(block + i * kLineFloats, hasChirp ? line::times(a, chirp + 2 * i) : exchanged(a));
+    }
+    QORI_INLINE void add(float* block, ptrdiff_t i, ComplexLine a) const {
+        float* const at = block + i * kLineFloats;
+        const ComplexLine b = hasChirp ? line::times(a, chirp + 2 * i) : exchanged(a);
+        line::storeLine(at, line::operator+(line::loadLine(at), b));
     }
 };
 
@@ -216,19 +223,79 @@ void convolve(const Convolution& c, const RotatedOrder& order, float* work, floa
     }
 }
 
+/// What a convolution lacks: points of either end of a block go to those of the other one.
+template <class Order>
+class MissingLags {
+public:
+    /// The ends are kept behind the convolution's points, as the block is written over.
+    MissingLags(const Convolution& c, const Order& order, float* work)
+        : order_(order),
+          block_(c.block),
+          count_(line::missingLags(order.points, c.inner.points)),
+          factors_(c.spectrum + 2 * ptrdiff_t{c.inner.points}),
+          ends_(work + c.inner.points * ptrdiff_t{kLineFloats}) {
+        for (ptrdiff_t i = 0; i < count_; ++i) {
+            line::storeLine(ends_ + i * kLineFloats, order.load(c.block, order.points - 1 - i));
+            line::storeLine(ends_ + (count_ + i) * kLineFloats, order.load(c.block, i));
+        }
+    }
+
+    void add() const {
+        const ptrdiff_t last = order_.points - 1;
+        addTo([=](ptrdiff_t i) { return i; }, factors_, ends_);
+        addTo([=](ptrdiff_t i) { return last - i; }, factors_ + 2 * count_, ends_ + count_ * kLineFloats);
+    }
+
+private:
+    /// A sum of products with factors, those with their parts apart.
+    struct Sum {
+        ComplexLine ofReal{zero<float>(), zero<float>()}, ofImaginary = ofReal;
+
+        QORI_INLINE void add(ComplexLine x, const float* factor) {
+            ofReal = line::mulAdd(x, splat(factor[0]), ofReal);
+            ofImaginary = line::mulAdd(x, splat(factor[1]), ofImaginary);
+        }
+        QORI_INLINE ComplexLine total() const { return line::plusI(ofReal, ofImaginary); }
+    };
+
+    /// To point m the sum over i from m of factor i times end i - m, two points at a time, without the last factor.
+    template <class Index>
+    QORI_NOINLINE void addTo(Index index, const float* factors, const float* ends) const {
+        for (ptrdiff_t m = 0; m < count_; m += 2, factors += 4) {
+            Sum first, second;
+            for (ptrdiff_t i = 0; i < count_ - m - 1; ++i) {
+                const ComplexLine x = line::loadLine(ends + i * kLineFloats);
+                first.add(x, factors + 2 * i);
+                second.add(x, factors + 2 * i + 2);
+            }
+            order_.add(block_, index(m), first.total());
+            order_.add(block_, index(m + 1), second.total());
+        }
+    }
+
+    const Order& order_;
+    float* block_;
+    ptrdiff_t count_;
+    const float* factors_;
+    float* ends_;
+};
+
 template <bool hasChirp>
 void convolve(const Convolution& c, const PaddedOrder<hasChirp>& order, float* work, float* first) {
+    const MissingLags missing(c, order, work);
     if (c.inner.stages[0].radix == 8)
         convolveFrom<8, false>(c, order, work, first);
     else
         convolveFrom<4, false>(c, order, work, first);
+    missing.add();
 }
 
 /// The work of a part is behind that of the whole.
 void convolvePart(const Convolution& c, float* work, ptrdiff_t at, float* first) {
     const FourierTable& padded = *c.inner.at<FourierTable>(c.inner.inner);
     const ptrdiff_t points = c.inner.convolvedPoints;
-    const float* const spectrum = c.inner.at<float>(c.inner.spectrumAt) + 2 * (at / points * padded.points);
+    const ptrdiff_t apart = padded.points + 2 * line::missingLags(points, padded.points);
+    const float* const spectrum = c.inner.at<float>(c.inner.spectrumAt) + 2 * (at / points * apart);
     convolve(Convolution{padded, spectrum, work + at * kLineFloats}, PaddedOrder<false>{nullptr, points},
              work + c.inner.points * ptrdiff_t{kLineFloats}, first);
 }

@@ -36,27 +36,37 @@ constexpr int64_t stageCost(int64_t radix, int64_t part) {
         case 2: return 50 + beyondCache;
         case 3: return (part % 3 == 0 ? 115 : 98) + beyondCache;
         case 4: return (part == 1 ? 88 : 109) + beyondCache;
-        case 5: return (part % 5 == 0 ? 149 : 129) + beyondCache;
+        case 5: return (part % 5 == 0 ? 160 : 140) + beyondCache;
         case 7: return (part % 7 == 0 ? 245 : 225) + beyondCache;
         case 8: return (part == 1 ? 124 : 164) + beyondCache;
         default: return 119 + 18 * radix + beyondCache;
     }
 }
 
-/// The product of a convolution, and points from their places and to them; next to as many lines as a first-level cache
-/// holds there is no room for the points, and beyond the cache a first stage of radix 8 waits for memory.
-int64_t productCost(int64_t points, const Factors& factors) {
+/// What points cost beside their stages, with those of so many lines: next to as many as a first-level cache holds
+/// there is no room for the points of the whole, and beyond the cache a first stage of radix 8 waits for memory.
+int64_t placeCost(int64_t lines, const Factors& factors) {
     constexpr int64_t most = kPointsAtOnce;
-    if (points > most) return factors.radix[0] == 8 ? 120 : 40;
-    return points > most - most / 8 ? 220 : 60;
+    if (lines > most) return factors.radix[0] == 8 ? 120 : 40;
+    return lines > most - most / 4 ? 160 : 0;
 }
 
-/// Of all points of a convolution, forth and back, with those of the parts that are left.
-int64_t convolutionCost(int64_t points, const Factors& factors) {
-    const int64_t ofStages = (2 * factors.cost() + productCost(points, factors)) * points, part = factors.convolved;
+int64_t paddedCost(int64_t n, int64_t points);
+
+/// Of all points of a convolution, forth and back, with those of the parts that are left; `ends` lines are beside them.
+int64_t convolutionCost(int64_t points, const Factors& factors, int64_t ends = 0) {
+    const int64_t ofStages = (2 * factors.cost() + placeCost(points + ends, factors)) * points,
+                  part = factors.convolved;
     if (part == 1) return ofStages;
-    const int64_t padded = convolutionPoints(part);
-    return ofStages + points / part * convolutionCost(padded, Factors(padded, TableUse::chirp));
+    return ofStages + points / part * paddedCost(part, convolutionPoints(part));
+}
+
+/// Of a block in a longer convolution, with the sums of what that one lacks; short ones are hardly more than calls.
+int64_t paddedCost(int64_t n, int64_t points) {
+    constexpr int64_t ofCalls = 6000, ofEnd = 60, ofProduct = 70;
+    const int64_t missing = missingLags(n, points);
+    const int64_t whole = convolutionCost(points, Factors(points, TableUse::chirp), 2 * missing);
+    return whole + ofCalls + missing * (ofEnd + (missing + 1) * ofProduct);
 }
 
 }  // namespace
@@ -116,16 +126,21 @@ void Factors::convolveLargePrimes(int64_t n) {
 int64_t convolutionPoints(int64_t linear) {
     constexpr int64_t mostOdd = 135;
     int64_t best = 0, least = INT64_MAX;
+    const auto consider = [&](int64_t points) {
+        const int64_t cost = paddedCost(linear, points);
+        if (cost >= least) return;
+        least = cost;
+        best = points;
+    };
     for (int64_t threes = 1; threes <= mostOdd; threes *= 3)
         for (int64_t fives = threes; fives <= mostOdd; fives *= 5)
             for (int64_t odd = fives; odd <= mostOdd; odd *= 7) {
                 int64_t points = 8 * odd;
-                while (points < 2 * linear - 1) points *= 2;
-                const int64_t cost = convolutionCost(points, Factors(points, TableUse::chirp));
-                if (cost < least) {
-                    least = cost;
-                    best = points;
+                while (points < 2 * linear - 1) {
+                    if (mayLackLags(linear, points)) consider(points);
+                    points *= 2;
                 }
+                consider(points);
             }
     return best;
 }
@@ -136,8 +151,7 @@ bool isRotatable(int64_t n) {
     const Factors factors(n - 1, TableUse::prime);
     const int64_t cost = convolutionCost(n - 1, factors);
     if (n <= kMostPrimeFactor) return factors.convolved == 1 && cost < stageCost(n, 1) * n;
-    const int64_t points = convolutionPoints(n);
-    return cost < convolutionCost(points, Factors(points, TableUse::chirp));
+    return cost < paddedCost(n, convolutionPoints(n));
 }
 
 }  // namespace qori::kernels::line

@@ -30,8 +30,8 @@ private:
     void convolveLargePrimes(int64_t n);
 };
 
-/// The cyclic convolution of small factors that holds the linear one of so many points at the least cost. It has three
-/// twos or more: the first stage is of radix 4 or 8, the last one of 2, 4 or 8.
+/// The cyclic convolution of small factors that makes a linear one of so many points at the least cost, what it lacks
+/// (missingLags) included. It has three twos or more: the first stage is of radix 4 or 8, the last one of 2, 4 or 8.
 int64_t convolutionPoints(int64_t linear);
 
 /// Whether a prime costs least as a convolution of one point fewer. Below 67 sums have the smaller errors, and

@@ -36,6 +36,7 @@ struct FourierLayout {
     int64_t bytes = inLines(sizeof(FourierTable));
     int64_t convolution = 0;  ///< Points of the inner table's transform,
     int64_t padded = 0;       ///< and of its own inner one's.
+    int64_t ends = 0;         ///< Points of a padded block that lags are missing between, as many as factors of these.
 
     QORI_NOINLINE explicit FourierLayout(int64_t n, TableUse use = TableUse::alone) {
         const Factors factors(n, use);
@@ -62,8 +63,10 @@ struct FourierLayout {
         convolution = table.isRotated ? factors.convolved - 1 : line::convolutionPoints(factors.convolved);
         const FourierLayout inner = ofConvolution();
         padded = inner.convolution;
+        ends = table.isRotated ? inner.ends : 2 * line::missingLags(factors.convolved, convolution);
         if (use == TableUse::alone) table.factorsAt = add(8 * factors.convolved);
-        if (padded == 0) table.spectrumAt = add(8 * convolution * (use == TableUse::prime ? n / factors.convolved : 1));
+        const int64_t parts = use == TableUse::prime ? n / factors.convolved : 1;
+        if (padded == 0) table.spectrumAt = add(8 * (convolution + ends) * parts);
         table.inner = add(inner.bytes);
     }
     FourierLayout ofConvolution() const {
@@ -158,6 +161,22 @@ void storeSpectrum(const FourierTable& inner, Root* wave, void* memory, float* o
     for (int32_t k = 0; k < inner.points; ++k) storeRoot(out + 2 * ptrdiff_t{k}, wave[k]);
 }
 
+/// Behind a spectrum: what missing lags are multiplied with, less what is in their places among those of the wave.
+template <class Factor>
+void storeMissing(int64_t n, int64_t points, const Root* wave, Factor factor, float* out) {
+    const int64_t missing = line::missingLags(n, points);
+    const auto store = [=](float* at, int64_t lag) {
+        const Root is = wave[lag < 0 ? points + lag : lag], be = factor(lag);
+        const auto scale = static_cast<double>(points);
+        storeRoot(at, {(be.re - is.re) * scale, (be.im - is.im) * scale});
+    };
+    out += 2 * points;
+    for (int64_t i = 0; i < missing; ++i, out += 2) {
+        store(out, i + 1 - n);
+        store(out + 2 * missing, n - 1 - i);
+    }
+}
+
 /// What the frequencies of a convolution are multiplied with, in the order that its stages leave. Where they leave
 /// parts, what each of these is convolved with goes around on both sides of point 0.
 void fillSpectrum(FourierTable* table, const SpectrumMemory& memory) {
@@ -170,10 +189,12 @@ void fillSpectrum(FourierTable* table, const SpectrumMemory& memory) {
     for (const Root* wave = memory.wave; wave < memory.wave + inner->points; wave += part) {
         for (int32_t j = 0; j < ofPart.points; ++j) {
             const int32_t before = ofPart.points - j;
-            memory.padded[j] = j < part ? wave[j] : before < part ? wave[part - before] : Root{};
+            memory.padded[j] = j < part && j <= before ? wave[j] : before < part ? wave[part - before] : Root{};
         }
+        const auto factor = [=](int64_t lag) { return wave[lag < 0 ? part + lag : lag]; };
+        storeMissing(part, ofPart.points, memory.padded, factor, out);
         storeSpectrum(ofPart, memory.padded, memory.roots, out);
-        out += 2 * ptrdiff_t{ofPart.points};
+        out += 2 * (ofPart.points + 2 * line::missingLags(part, ofPart.points));
     }
 }
 
@@ -183,14 +204,16 @@ void fillChirp(FourierTable* table, int64_t convolution, const SpectrumMemory& m
     const int64_t n = table->convolvedPoints;
     auto* const chirp = table->at<float>(table->factorsAt);
     const auto scale = 1 / static_cast<double>(convolution);
+    const auto rootAt = [=](int64_t j) { return rootOfUnity(j * j % (2 * n), 2 * n); };
+    const auto back = [=](Root root) { return Root{root.re * scale, -root.im * scale}; };
     for (int64_t j = 0; j < convolution; ++j) wave[j] = {};
     for (int64_t j = 0; j < n; ++j) {
-        const Root root = rootOfUnity(j * j % (2 * n), 2 * n);
+        const Root root = rootAt(j);
         storeRoot(chirp + 2 * j, root);
-        const Root back = {root.re * scale, -root.im * scale};
-        wave[j] = back;
-        if (j > 0) wave[convolution - j] = back;
+        if (2 * j <= convolution) wave[j] = wave[(convolution - j) % convolution] = back(root);
     }
+    const auto factor = [=](int64_t lag) { return back(rootAt(lag)); };
+    storeMissing(n, convolution, wave, factor, table->at<float>(table->spectrumAt));
     fillSpectrum(table, memory);
 }
 
@@ -254,7 +277,7 @@ int64_t fourierInitBytes(int64_t n) {
 
 int64_t fourierWorkBytes(int64_t n) {
     const FourierLayout layout(n);
-    return kLineBytes * (layout.convolution + layout.padded);
+    return kLineBytes * (layout.convolution + layout.padded + layout.ends);
 }
 
 void makeFourierTable(FourierTable* table, int32_t n, void* init) {

@@ -215,6 +215,17 @@ struct LaneMasks {
     }
 };
 
+/// Of columns that are read: each(elements, row), and what is read next in every row.
+template <class Each>
+QORI_INLINE void forEachRowRead(const LineColumns& columns, Each each) {
+    const uint8_t* p = reinterpret_cast<const uint8_t*>(columns.rows.row(0) + columns.element);
+    const ptrdiff_t ahead = columns.ahead * ptrdiff_t{sizeof(float)};
+    for (ptrdiff_t y = 0; y < columns.rows.count; ++y, p += columns.rows.step) {
+        if (ahead != 0) _mm_prefetch(reinterpret_cast<const char*>(p + ahead), _MM_HINT_T1);
+        each(reinterpret_cast<const float*>(p), y);
+    }
+}
+
 template <class Each>
 QORI_INLINE void forEachRowOf(const LineColumns& columns, Each each) {
     uint8_t* p = reinterpret_cast<uint8_t*>(columns.rows.row(0) + columns.element);
@@ -358,18 +369,18 @@ void columnsToLines(const LineColumns& columns, float scale, Parts parts, float*
     const int channels = columns.rows.channels;
     const bool isWhole = columns.begin == 0 && columns.end == kLineColumns;
     if (channels == 1 && isWhole)
-        return forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
+        return forEachRowRead(columns, [=](const float* p, ptrdiff_t y) {
             line::storeLine(lines + y * kLineFloats, scaled(line::separate(load(p), load(p + kRows)), factor, parts));
         });
     if (channels == 1) {
         const LaneMasks masks(columns.begin, columns.end);
-        return forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
+        return forEachRowRead(columns, [=](const float* p, ptrdiff_t y) {
             const Vec<float> a{_mm256_maskload_ps(p, masks.low)}, b{_mm256_maskload_ps(p + kRows, masks.high)};
             line::storeLine(lines + y * kLineFloats, scaled(line::separate(a, b), factor, parts));
         });
     }
     line::withChannelLanes(columns, [&](auto lanes) {
-        forEachRowOf(columns, [=](const float* p, ptrdiff_t y) {
+        forEachRowRead(columns, [=](const float* p, ptrdiff_t y) {
             line::storeLine(lines + y * kLineFloats, scaled(lanes.read(p), factor, parts));
         });
     });

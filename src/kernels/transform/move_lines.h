@@ -65,6 +65,7 @@ struct LineColumns {
     ptrdiff_t element;
     int begin, end;
     int channel = 0;
+    ptrdiff_t ahead = 0;  ///< Elements to those that are read next, which are asked for while these are read.
 };
 
 /// Row y becomes line y; lanes without a column hold nothing of use.

@@ -61,6 +61,16 @@ private:
     ptrdiff_t step_, apart_, end_, start_ = 0;
 };
 
+/// Between n points there are 2 n - 1 lags. A cyclic convolution of fewer points has one place for two of them where
+/// they are more than half around: so many of either sign, the largest ones, are summed apart. It is an even number, as
+/// n is odd and points are whole eights; the last factor is 0.
+constexpr int64_t missingLags(int64_t n, int64_t points) { return points >= 2 * n - 1 ? 0 : n - points / 2 + 1; }
+
+/// So many of the parts of a convolution's outer stage hold points of a block: half of them, or one more where lags are
+/// missing, which is so up to an eighth of the points.
+constexpr int filledParts(int radix) { return radix / 2 + 1; }
+constexpr bool mayLackLags(int64_t n, int64_t points) { return n <= points / 8 * filledParts(8); }
+
 enum class Way { forth, back };
 
 /// One stage of so many blocks; back, the way of a convolution, between exchanged parts.

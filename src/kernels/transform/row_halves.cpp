@@ -128,7 +128,6 @@ void halvesToRows(float* lines, int32_t n, const int32_t* positions, const float
     }
     switch (rows.channels) {
         case 3: return splitByTwo<3>(lines, n, positions, roots, rows);
-        case 4: return splitByTwo<4>(lines, n, positions, roots, rows);
         default: return splitByTwo<1>(lines, n, positions, roots, rows);
     }
 }
@@ -142,7 +141,6 @@ void rowsToHalves(const LineRows& rows, int32_t n, float scale, const float* roo
     }
     switch (rows.channels) {
         case 3: return joinByTwo<3>(rows, n, scale, roots, lines);
-        case 4: return joinByTwo<4>(rows, n, scale, roots, lines);
         default: return joinByTwo<1>(rows, n, scale, roots, lines);
     }
 }

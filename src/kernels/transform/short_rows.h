@@ -15,7 +15,9 @@ inline constexpr int32_t kMostShortRow = 128;
 /// measured to have larger errors than another library's have.
 constexpr bool isShortLength(int32_t n) {
     switch (n) {
+        case 18:
         case 20:
+        case 24:
         case 25:
         case 27:
         case 32:
@@ -32,7 +34,7 @@ constexpr bool isShortLength(int32_t n) {
 /// Whether rows are. Where there are more than eight, the errors of columns are larger than what wide halves leave of
 /// the rows'; odd ones have no halves.
 constexpr bool isShortRow(int32_t width, int32_t height) {
-    return isShortLength(width) && (width <= 20 || width % 2 == 1 || height <= kLineColumns);
+    return isShortLength(width) && (width <= 16 || width % 2 == 1 || height <= kLineColumns);
 }
 constexpr bool hasWideHalves(int32_t width, int32_t height) {
     return width % 2 == 0 && isShortLength(width) && !isShortRow(width, height);
