@@ -31,8 +31,7 @@ public:
 
 private:
     void strip(const MedianJob<uint8_t>& job, ptrdiff_t at, int32_t width) {
-        windows_.begin({job.windows.data + at, job.windows.step, job.apart}, width + job.mask.width - 1,
-                       job.size.height);
+        windows_.begin({job.windows.data + at, job.windows.step, job.apart}, width + job.mask.width - 1);
         for (int32_t y = 0; y < job.size.height; ++y) {
             uint8_t* const to = job.dst.row(y) + at;
             if (job.apart == 1) {
@@ -92,7 +91,7 @@ private:
     void tile(const MedianJob<T>& job, ptrdiff_t at, int32_t y0, QorImageSize size) {
         const int32_t columns = size.width + job.mask.width - 1, rows = size.height + job.mask.height - 1;
         ordinals_.read(job.windows.row(y0) + at, job.windows.step, job.apart, columns, rows);
-        windows_.begin(ordinals_.bins(), columns, size.height);
+        windows_.begin(ordinals_.bins(), columns);
         for (int32_t y = 0; y < size.height; ++y) {
             windows_.makeRow(bytes_, rests_);
             T* const to = job.dst.row(y0 + y) + at;

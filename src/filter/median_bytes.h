@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
-// Medians of bytes of any mask, row after row of a strip of columns: by counts of few thresholds while the medians of a
-// row are near each other or take few values, else by whole histograms.
+// Medians of bytes of any mask, row after row of a strip of columns: by counts of few thresholds while medians near
+// each other take few values, else by whole histograms.
 #pragma once
+#include <type_traits>
+
 #include "frame/plan.h"
-#include "kernels/median/bands.h"
 #include "kernels/median/column_parts.h"
 #include "kernels/median/histograms.h"
+#include "kernels/median/tile_thresholds.h"
 
 namespace qori::filter {
 
@@ -19,36 +21,29 @@ public:
 
     ByteWindows(WorkBuffer& memory, int32_t columns, QorImageSize mask);
 
-    /// Another strip, of so many columns or fewer, of which so many rows of medians will be made.
-    void begin(const kernels::ByteRows& rows, int32_t columns, int32_t height);
+    /// Another strip, of so many columns or fewer.
+    void begin(const kernels::ByteRows& rows, int32_t columns);
     /// The next row of medians, from row 0; rests: how many of the window's elements equal to each come before it, or
     /// null.
     void makeRow(uint8_t* medians, Rest* rests);
 
 private:
     static constexpr bool kIsSmall = std::is_same_v<Histograms, kernels::ColumnParts>;
-    enum class Method { none, bands16, bands32, histograms };
 
-    static bool bandsSuffice(QorImageSize mask);
-    static Method methodFor(int thresholds) {
-        return thresholds <= 16 ? Method::bands16 : thresholds <= 32 ? Method::bands32 : Method::histograms;
-    }
-    bool makeRowByBands(uint8_t* medians, uint16_t* rests);
+    int32_t medians() const { return columns_ - mask_.width + 1; }
+    static bool thresholdsSuffice(QorImageSize mask) { return kIsSmall && kernels::TileThresholds::suffice(mask); }
+    bool makeRowByThresholds(uint8_t* medians,
+                             uint16_t* rests) requires std::is_same_v<Histograms, kernels::ColumnParts>;
     void makeRowByHistograms(uint8_t* medians, Rest* rests);
-    template <class Bands>
-    bool start(Bands& bands, const kernels::Thresholds& thresholds, uint8_t* medians, uint16_t* rests);
-    template <class Bands>
-    bool goOn(Bands& bands, uint8_t* medians, uint16_t* rests);
 
     QorImageSize mask_;
-    uint8_t *counts_, *table_, *histogramMemory_;
+    uint8_t *thresholdMemory_, *histogramMemory_;
     kernels::ByteRows rows_{};
     int32_t columns_ = 0, y_ = 0;
-    Method method_ = Method::none;
-    int32_t since_ = 0;  ///< The method's first row ...
-    int64_t until_ = 0;  ///< ... and the one at which others are thought of.
-    kernels::ColumnBands<16> bands16_;
-    kernels::ColumnBands<32> bands32_;
+    bool byThresholds_ = false;
+    int32_t since_ = 0;  ///< The first row by thresholds, or by histograms.
+    int timesFew_ = 0;   ///< That a row by histograms was found to take few thresholds.
+    kernels::TileThresholds thresholds_;
     Histograms histograms_;
 };
 

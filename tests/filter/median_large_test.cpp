@@ -113,6 +113,8 @@ TEST(MedianLarge, BytesOfChangingImages) {
         expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 150 + random().below(180), 500);
         expectMedians<1>(qoriFilterMedian_8u_C1R, {41, 5}, 150 + random().below(180), 500);
     }
+    for (int32_t width : {31, 33, 63, 65, 95, 97, 127, 129})
+        expectMedians<1>(qoriFilterMedian_8u_C1R, {width, 3 + 2 * random().below(8)}, 1 + random().below(300), 200);
     for (int i = 0; i < 40; ++i)  // too small for thresholds, and just large enough
         expectMedians<1>(qoriFilterMedian_8u_C1R, {17, 17}, 1 + random().below(30), 1 + random().below(30));
     expectMedians<1>(qoriFilterMedian_8u_C1R, {61, 61}, 260, 300);
@@ -135,7 +137,7 @@ TEST(MedianLarge, MasksAtTheEndsOfCounters) {
         expectMedians<1>(qoriFilterMedian_8u_C1R, mask, 3 + random().below(140), 20);
 }
 
-/// Medians at both sides of every multiple of 16, where counts of columns may be parted, and jumps between them; each
+/// Medians at both sides of every multiple of 16, at both ends of the range, and jumps between them; each
 /// height has counts of its own, one or two bytes with or without a sign, and few rows are as good as many.
 TEST(MedianLarge, BytesThatJumpBetweenLevels) {
     for (QorImageSize mask : {QorImageSize{17, 17}, {3, 129}, {33, 41}, {65, 127}, {31, 255}, {129, 3}})
@@ -144,6 +146,22 @@ TEST(MedianLarge, BytesThatJumpBetweenLevels) {
                                      [=](int columns, int rows) {
                                          return aroundLevels(columns, rows, random().oneIn(2) ? 0 : 15 % apart, apart);
                                      });
+}
+
+/// Medians that come to the ends of the range a value at a time, go back, and come again.
+TEST(MedianLarge, BytesThatDriftToTheEnds) {
+    for (bool down : {false, true})
+        for (QorImageSize mask : {QorImageSize{17, 17}, {65, 5}})
+            expectMediansOfPlanes<1>(
+                qoriFilterMedian_8u_C1R, mask, 1 + random().below(100), 500, [=](int columns, int rows) {
+                    Plane<uint8_t> image{columns, rows};
+                    for (int y = 0; y < rows; ++y)
+                        for (int x = 0; x < columns; ++x) {
+                            const int value = 257 - std::abs(y % 238 - 119) / 20 - (x + y) % 2;
+                            image.at(x, y) = static_cast<uint8_t>(std::min(value, 255) ^ (down ? 255 : 0));
+                        }
+                    return image;
+                });
 }
 
 /// Elements by their order: each kind of bytes, made many values whose order is that of the bytes.

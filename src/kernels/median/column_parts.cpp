@@ -4,18 +4,6 @@
 namespace qori::kernels {
 namespace {
 
-struct Steps {
-    alignas(kVectorBytes) uint8_t from[32][32];  ///< from[k]: -1 (as a byte) in bins k and beyond, 0 before.
-};
-constexpr Steps stepsTable() {
-    Steps steps{};
-    for (int k = 0; k < 32; ++k)
-        for (int i = k; i < 32; ++i) steps.from[k][i] = 255;
-    return steps;
-}
-alignas(64) constexpr Steps kSteps = stepsTable();
-
-/// ones + kVectorBytes - n: a vector whose first n bytes are set.
 struct Firsts {
     uint8_t ones[2 * kVectorBytes];
 };
@@ -28,100 +16,126 @@ constexpr Firsts kFirsts = firstsTable();
 
 QORI_INLINE __m256i block(const uint8_t* p) { return _mm256_load_si256(reinterpret_cast<const __m256i*>(p)); }
 QORI_INLINE void storeBlock(uint8_t* p, __m256i v) { _mm256_store_si256(reinterpret_cast<__m256i*>(p), v); }
-QORI_INLINE __m256i stepsFrom(unsigned low) { return block(kSteps.from[0] + low); }
-
-/// Bytes whose order as signed ones is that of the unsigned ones.
-QORI_INLINE __m256i ordered(__m256i bytes) { return _mm256_xor_si256(bytes, _mm256_set1_epi8(-128)); }
-QORI_INLINE __m256i firstOf(int part) { return _mm256_set1_epi8(static_cast<char>((16 * part) ^ 128)); }
-
-/// Bytes as words, times a power of two.
-QORI_INLINE void storeWords(uint16_t* p, Bytes bytes, int shift) {
-    const __m256i low = _mm256_cvtepu8_epi16(_mm256_castsi256_si128(bytes.v)),
-                  high = _mm256_cvtepu8_epi16(_mm256_extracti128_si256(bytes.v, 1));
-    store(p, Vec<uint16_t>{_mm256_slli_epi16(low, shift)});
-    store(p + 16, Vec<uint16_t>{_mm256_slli_epi16(high, shift)});
+QORI_INLINE __m256i bytesOf(int v) { return _mm256_set1_epi8(static_cast<char>(v)); }
+QORI_INLINE __m256i wordsOf(int v) { return _mm256_set1_epi16(static_cast<short>(v)); }
+QORI_INLINE __m256i numbers() {
+    return _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20, 21, 22, 23, 24,
+                            25, 26, 27, 28, 29, 30, 31);
+}
+/// -1 in places beyond.
+QORI_INLINE __m256i beyond(const uint8_t* place, __m256i n) {
+    return _mm256_cmpgt_epi8(n, _mm256_set1_epi8(static_cast<char>(*place)));
 }
 
 }  // namespace
 
-/// What stands behind the last column becomes counts that are in no window.
-void ColumnParts::split(const uint8_t* row, ptrdiff_t apart, Entries to) const {
-    const Bytes half{_mm256_set1_epi8(kBins / 2)}, halfLess{_mm256_set1_epi8(kBins / 2 - 1)};
-    const Bytes highBits{_mm256_set1_epi8(static_cast<char>(0xF0))}, lowBits{_mm256_set1_epi8(kBins - 1)};
-    const auto put = [&](ptrdiff_t x, Bytes v) __attribute__((always_inline)) {
-        const Bytes part = Bytes{_mm256_avg_epu8(v.v, halfLess.v)} & highBits;
-        store(to.part + x, part);
-        storeWords(to.counts + x, part, 1);
-        storeWords(to.steps + x, Bytes{_mm256_add_epi8(v.v, half.v)} & lowBits, 5);
-    };
-    if (apart == 1) {
-        ptrdiff_t x = 0;
-        for (; x <= columns_ - kVectorBytes; x += kVectorBytes) put(x, load(row + x));
-        if (x < columns_) put(x, loadPartial(row + x, columns_ - x));
-    } else {
-        for (int32_t x = 0; x < columns_; ++x) to.part[x] = row[x * apart];
-        for (ptrdiff_t x = 0; x < columns_; x += kVectorBytes) put(x, load(to.part + x));
-    }
+/// v + kBefore is 32 a + b, 31 a + (a + b).
+QORI_INLINE ColumnParts::Entry ColumnParts::split(__m256i v) {
+    const __m256i high = _mm256_and_si256(_mm256_srli_epi16(_mm256_avg_epu8(v, bytesOf(kBefore - 1)), 4), bytesOf(15));
+    const __m256i low = _mm256_and_si256(_mm256_add_epi8(v, bytesOf(kBefore)), bytesOf(31));
+    const __m256i sum = _mm256_add_epi8(high, low);
+    const __m256i more = _mm256_cmpgt_epi8(sum, bytesOf(kValues - 1));
+    const __m256i part = _mm256_sub_epi8(high, more);
+    return {part, _mm256_sub_epi8(sum, _mm256_and_si256(more, bytesOf(kValues)))};
 }
 
-void ColumnParts::begin(const ByteRows& rows, int32_t y, int32_t columns, QorImageSize window) {
+/// A row's, at their columns, of which some are looked at.
+const uint8_t* ColumnParts::elements(int32_t y, int32_t from, int32_t to, uint8_t* gathered) const {
+    const uint8_t* const row = rows_.row(y);
+    if (rows_.apart == 1) return row;
+    const ptrdiff_t apart = rows_.apart;
+    for (ptrdiff_t x = from; x < to; ++x) gathered[x] = row[x * apart];
+    return gathered;
+}
+
+/// What stands behind the last column becomes counts that are in no window.
+QORI_INLINE Bytes ColumnParts::some(const uint8_t* elements, ptrdiff_t x, ptrdiff_t end) {
+    return end - x >= kVectorBytes ? load(elements + x) : loadPartial(elements + x, end - x);
+}
+
+void ColumnParts::begin(const ByteRows& rows, int32_t columns, QorImageSize window) {
+    rows_ = rows;
     columns_ = columns;
     padded_ = static_cast<ptrdiff_t>(paddedOf(columns));
+    plane_ = padded_ * kPlaces;
     width_ = window.width;
     height_ = window.height;
-    step_ = rows.step;
     within_ = memory_;
-    beneath_ = within_ + padded_ * kApart;
-    uint8_t* const entries = beneath_ + padded_ * kParts;
-    const auto entriesAt = [&](uint8_t* p) {
-        return Entries{p, reinterpret_cast<uint16_t*>(p + padded_), reinterpret_cast<uint16_t*>(p + 3 * padded_)};
-    };
-    in_ = entriesAt(entries);
-    out_ = entriesAt(entries + kEntryBytes * padded_);
-    __builtin_memset(memory_, 0, static_cast<size_t>(bytes(columns)));
-    for (int32_t k = 0; k < window.height; ++k) enter(rows.row(ptrdiff_t{y} + k), rows.apart);
+    beneath_ = within_ + plane_ * kParts;
+    differences_ = beneath_ + padded_ * kParts;
+    uint8_t* const entries = differences_ + padded_ * kParts;
+    in_ = {entries, entries + padded_};
+    out_ = {entries + 2 * padded_, entries + 3 * padded_};
+    __builtin_memset(beneath_, 0, static_cast<size_t>(padded_ * kParts));
+    __builtin_memset(hints_, kParts / 2, sizeof hints_);
 }
 
-void ColumnParts::enter(const uint8_t* row, ptrdiff_t apart) {
-    split(row, apart, in_);
-    for (ptrdiff_t x = 0; x < columns_; x += kVectorBytes) {
-        const __m256i in = ordered(load(in_.part + x).v);
+void ColumnParts::build(int32_t y, int32_t from, int32_t to) {
+    for (int part = 0; part < kParts; ++part) {
+        __builtin_memset(within_ + part * plane_ + ptrdiff_t{from} * kPlaces, 0,
+                         static_cast<size_t>(to - from) * kPlaces);
+        __builtin_memset(beneath(part) + from, 0, static_cast<size_t>(to - from));
+    }
+    for (int32_t k = 0; k < height_; ++k) enter(y + k, from, to);
+}
+
+void ColumnParts::enter(int32_t y, int32_t from, int32_t to) {
+    const Entries in = in_;
+    const uint8_t* const ins = elements(y, from, to, in.part);
+    uint8_t* const beneaths = beneath_;
+    const ptrdiff_t padded = padded_, plane = plane_, end = to;
+    for (ptrdiff_t x = from; x < end; x += kVectorBytes) {
+        const Entry enters = split(some(ins, x, end).v);
+        store(in.part + x, Bytes{enters.part});
+        store(in.place + x, Bytes{enters.place});
+        uint8_t* p = beneaths + x;
         for (int part = 1; part < kParts; ++part) {
-            uint8_t* const p = beneath(part) + x;
-            store(p, Bytes{_mm256_sub_epi8(load(p).v, _mm256_cmpgt_epi8(firstOf(part), in))});
+            p += padded;
+            const __m256i notBelow = _mm256_cmpgt_epi8(enters.part, bytesOf(part - 1));
+            store(p, Bytes{_mm256_add_epi8(load(p).v, _mm256_sub_epi8(notBelow, bytesOf(-1)))});
         }
     }
-    for (ptrdiff_t x = 0; x < columns_; ++x) {
-        uint8_t* const p = within_ + x * kApart + in_.counts[x];
-        storeBlock(p, _mm256_sub_epi8(block(p), stepsFrom(in_.steps[x])));
+    const __m256i n = numbers();
+    uint8_t* column = within_ + from * ptrdiff_t{kPlaces};
+    for (ptrdiff_t x = from; x < end; ++x, column += kPlaces) {
+        uint8_t* const p = column + in.part[x] * plane;
+        storeBlock(p, _mm256_sub_epi8(block(p), beyond(in.place + x, n)));
     }
 }
 
-void ColumnParts::advance(const uint8_t* entering, const uint8_t* leaving, ptrdiff_t apart) {
+void ColumnParts::advance(int32_t y, int32_t from, int32_t to) {
+    const Entries in = in_, out = out_;
+    const ptrdiff_t padded = padded_, plane = plane_, end = to;
     // The next row is far from this one, where no prefetcher looks for it.
-    for (ptrdiff_t x = 0; x < columns_ * apart; x += 64) __builtin_prefetch(entering + (step_ + x));
-    split(entering, apart, in_);
-    split(leaving, apart, out_);
-    for (ptrdiff_t x = 0; x < columns_; x += kVectorBytes) {
-        const __m256i in = ordered(load(in_.part + x).v), out = ordered(load(out_.part + x).v);
-        uint8_t* p = beneath_ + x;
+    const uint8_t* const next = rows_.row(ptrdiff_t{y} + height_);
+    for (ptrdiff_t x = from * rows_.apart; x < end * rows_.apart; x += 64) __builtin_prefetch(next + x);
+    const uint8_t *const ins = elements(y + height_ - 1, from, to, in.part), *const outs =
+                                                                                 elements(y - 1, from, to, out.part);
+    // What is stored are bytes, which may be anything: members are not read among the stores.
+    uint8_t* const beneaths = beneath_;
+    for (ptrdiff_t x = from; x < end; x += kVectorBytes) {
+        const Entry enters = split(some(ins, x, end).v), leaves = split(some(outs, x, end).v);
+        store(in.part + x, Bytes{enters.part});
+        store(in.place + x, Bytes{enters.place});
+        store(out.part + x, Bytes{leaves.part});
+        store(out.place + x, Bytes{leaves.place});
+        uint8_t* p = beneaths + x;
 #pragma GCC unroll 8
         for (int part = 1; part < kParts; ++part) {
-            p += padded_;
-            const __m256i first = firstOf(part);
-            const __m256i change = _mm256_sub_epi8(_mm256_cmpgt_epi8(first, out), _mm256_cmpgt_epi8(first, in));
+            p += padded;
+            const __m256i last = bytesOf(part - 1);
+            const __m256i change =
+                _mm256_sub_epi8(_mm256_cmpgt_epi8(enters.part, last), _mm256_cmpgt_epi8(leaves.part, last));
             store(p, Bytes{_mm256_add_epi8(load(p).v, change)});
         }
     }
-    // What is stored are bytes, which may be anything.
-    const Entries in = in_, out = out_;
-    uint8_t* column = within_;
-    const ptrdiff_t columns = columns_;
+    const __m256i n = numbers();
+    uint8_t* column = within_ + from * ptrdiff_t{kPlaces};
 #pragma GCC unroll 4
-    for (ptrdiff_t x = 0; x < columns; ++x, column += kApart) {
-        uint8_t *const p = column + in.counts[x], *const q = column + out.counts[x];
-        storeBlock(p, _mm256_sub_epi8(block(p), stepsFrom(in.steps[x])));
-        storeBlock(q, _mm256_add_epi8(block(q), stepsFrom(out.steps[x])));
+    for (ptrdiff_t x = from; x < end; ++x, column += kPlaces) {
+        uint8_t *const p = column + in.part[x] * plane, *const q = column + out.part[x] * plane;
+        storeBlock(p, _mm256_sub_epi8(block(p), beyond(in.place + x, n)));
+        storeBlock(q, _mm256_add_epi8(block(q), beyond(out.place + x, n)));
     }
 }
 
@@ -147,137 +161,140 @@ int ColumnParts::partOf(int32_t x, int32_t below) const {
     return part;
 }
 
-/// Columns are tall where differences of their counts do not fit signed bytes. Sums of theirs begin with this, so that
-/// signed comparisons are right for all words.
+/// By columns, the elements below a part in the column behind the window less those in its first one; where these are
+/// no signed bytes, the elements themselves.
 template <bool isTall>
-constexpr int16_t kBias = isTall ? INT16_MIN : 0;
-
-/// Adds counts of columns, or differences of two as signed ones.
-template <bool isSigned>
-QORI_INLINE void add(PartSums& sums, __m256i counts) {
-    const __m256i zeros = _mm256_setzero_si256(), above = isSigned ? _mm256_cmpgt_epi8(zeros, counts) : zeros;
-    sums.low = _mm256_add_epi16(sums.low, _mm256_unpacklo_epi8(counts, above));
-    sums.high = _mm256_add_epi16(sums.high, _mm256_unpackhi_epi8(counts, above));
+const uint8_t* ColumnParts::beside(int part, int32_t end) {
+    const uint8_t* const p = beneath(part);
+    if constexpr (isTall) {
+        return p;
+    } else {
+        uint8_t* const to = differences_ + part * padded_;
+        if ((fresh_ >> part & 1) == 0) {
+            fresh_ |= 1u << part;
+            for (ptrdiff_t x = from_; x < end; x += kVectorBytes)
+                store(to + x, Bytes{_mm256_sub_epi8(load(p + x + width_).v, load(p + x).v)});
+        }
+        return to;
+    }
 }
 
+namespace {
+
+/// Counts of a window become those of the next. Differences of columns are signed bytes unless they are tall.
 template <bool isTall>
-QORI_INLINE PartSums ColumnParts::summedUp(int32_t x, int part) const {
-    const uint8_t* p = within(part, x);
-    const uint8_t* const end = p + ptrdiff_t{width_} * kApart;
-    const __m256i none = _mm256_set1_epi16(kBias<isTall>);
-    PartSums sums{none, none};
-    if (isTall || width_ % 2 != 0) {
-        add<false>(sums, block(p));
-        p += kApart;
-    }
+QORI_INLINE void move(PartSums& sums, const uint8_t* leaving, const uint8_t* entering, const uint8_t* beneath,
+                      int32_t width) {
     if constexpr (isTall) {
-        for (; p != end; p += kApart) add<false>(sums, block(p));
+        const __m256i in = _mm256_add_epi8(block(entering), bytesOf(beneath[width])),
+                      out = _mm256_add_epi8(block(leaving), bytesOf(*beneath)), low = wordsOf(255);
+        sums.even =
+            _mm256_add_epi16(sums.even, _mm256_sub_epi16(_mm256_and_si256(in, low), _mm256_and_si256(out, low)));
+        sums.odd = _mm256_add_epi16(sums.odd, _mm256_sub_epi16(_mm256_srli_epi16(in, 8), _mm256_srli_epi16(out, 8)));
     } else {
-        for (; p != end; p += 2 * kApart) add<false>(sums, _mm256_add_epi8(block(p), block(p + kApart)));
+        const __m256i change = _mm256_add_epi8(_mm256_sub_epi8(block(entering), block(leaving)), bytesOf(*beneath));
+        sums.even = _mm256_add_epi16(sums.even, _mm256_maddubs_epi16(wordsOf(1), change));
+        sums.odd = _mm256_add_epi16(sums.odd, _mm256_maddubs_epi16(wordsOf(256), change));
     }
+}
+QORI_INLINE void raise(PartSums& sums, int by) {
+    sums = {_mm256_add_epi16(sums.even, wordsOf(by)), _mm256_add_epi16(sums.odd, wordsOf(by))};
+}
+QORI_INLINE int firstOf(const PartSums& sums) {
+    return static_cast<int16_t>(_mm_extract_epi16(_mm256_castsi256_si128(sums.even), 0));
+}
+QORI_INLINE int lastOf(const PartSums& sums) {
+    return static_cast<int16_t>(_mm_extract_epi16(_mm256_extracti128_si256(sums.odd, 1), 7));
+}
+/// Places before that of the median.
+QORI_INLINE unsigned placesBefore(const PartSums& sums) {
+    return static_cast<unsigned>(
+        __builtin_popcount(static_cast<unsigned>(_mm256_movemask_epi8(_mm256_packs_epi16(sums.even, sums.odd)))));
+}
+
+}  // namespace
+
+/// Counts of a window's columns, so many of which are added up as bytes.
+template <int atOnce>
+QORI_INLINE void addColumns(PartSums& sums, const uint8_t*& p, int32_t& left) {
+    constexpr int kBytes = 32;
+    for (; left >= atOnce; left -= atOnce, p += atOnce * kBytes) {
+        __m256i bytes = block(p);
+        for (int k = 1; k < atOnce; ++k) bytes = _mm256_add_epi8(bytes, block(p + k * kBytes));
+        sums.even = _mm256_add_epi16(sums.even, _mm256_and_si256(bytes, wordsOf(255)));
+        sums.odd = _mm256_add_epi16(sums.odd, _mm256_srli_epi16(bytes, 8));
+    }
+}
+
+QORI_INLINE PartSums ColumnParts::summedUp(int32_t x, int part) const {
+    PartSums sums{_mm256_setzero_si256(), _mm256_setzero_si256()};
+    const uint8_t* p = within(part, x);
+    int32_t left = width_;
+    if (height_ <= 255 / 8) addColumns<8>(sums, p, left);
+    if (height_ <= 255 / 4) addColumns<4>(sums, p, left);
+    addColumns<1>(sums, p, left);
     return sums;
 }
 
-/// Counts of a window become those of the next.
-template <bool isTall>
-QORI_INLINE void move(PartSums& sums, const uint8_t* leaving, const uint8_t* entering) {
-    if constexpr (isTall) {
-        add<false>(sums, block(entering));
-        PartSums less{_mm256_setzero_si256(), _mm256_setzero_si256()};
-        add<false>(less, block(leaving));
-        sums = {_mm256_sub_epi16(sums.low, less.low), _mm256_sub_epi16(sums.high, less.high)};
-    } else {
-        add<true>(sums, _mm256_sub_epi8(block(entering), block(leaving)));
-    }
-}
-
-/// PartSums of lanes 0 to 7 and 16 to 23 are in low, the others in high.
-QORI_INLINE void storeInOrder(uint16_t* p, const PartSums& sums) {
-    store(p, Vec<uint16_t>{_mm256_permute2x128_si256(sums.low, sums.high, 0x20)});
-    store(p + 16, Vec<uint16_t>{_mm256_permute2x128_si256(sums.low, sums.high, 0x31)});
-}
-
-/// All of a part's elements.
-template <bool isTall>
-QORI_INLINE int32_t lastOf(const PartSums& sums) {
-    return (_mm_extract_epi16(_mm256_extracti128_si256(sums.high, 1), 7) - kBias<isTall>)&0xFFFF;
-}
-
-/// The counts within another part: those of the one left before where they are not much out of date.
-template <bool isTall>
-QORI_INLINE PartSums ColumnParts::countsOf(const Window& left, int32_t x, int part) const {
-    if (left.part != part || 2 * (x - left.x) > width_) return summedUp<isTall>(x, part);
-    PartSums counts = left.counts;
-    const ptrdiff_t across = ptrdiff_t{width_} * kApart;
-    for (const uint8_t *p = within(part, left.x), *const end = within(part, x); p != end; p += kApart)
-        move<isTall>(counts, p, p + across);
-    return counts;
-}
-
 /// Takes the median's part to be the next one up or down, unless it is farther away.
-template <bool isTall>
-QORI_NOINLINE void ColumnParts::leave(Window& now, Window& left, int32_t below) const {
-    const bool isAbove = now.rest >= 0;
-    Window next = now;
-    next.part += isAbove ? 1 : -1;
-    next.counts = countsOf<isTall>(left, now.x, next.part);
-    const int32_t all = lastOf<isTall>(next.counts);
-    next.rest += isAbove ? -lastOf<isTall>(now.counts) : all;
-    if (next.rest < 0 || next.rest >= all) {
-        next.part = partOf(now.x, below);
-        next.counts = countsOf<isTall>(left, now.x, next.part);
-        next.rest = below - before(next.part, now.x);
-    }
-    left = now;
-    now = next;
+QORI_NOINLINE void ColumnParts::leave(Window& now, int32_t below) const {
+    const int first = firstOf(now.sums), last = lastOf(now.sums);
+    const bool isAbove = last < 0;
+    now.part += isAbove ? 1 : -1;
+    now.sums = summedUp(now.x, now.part);
+    raise(now.sums, isAbove ? last : first - (lastOf(now.sums) & 0xFFFF));
+    if (placesBefore(now.sums) - 1 < unsigned{kValues}) return;
+    now.part = partOf(now.x, below);
+    now.sums = summedUp(now.x, now.part);
+    raise(now.sums, before(now.part, now.x) - below - 1);
 }
 
 template <bool isTall, bool wantsRests>
-void ColumnParts::follow(int32_t below, uint8_t* to, uint16_t* rests) const {
-    const int32_t last = columns_ - width_;
-    const ptrdiff_t across = ptrdiff_t{width_} * kApart;
-    Window left{{}, 0, -1, 0}, now = left;
-    now.part = first_;
-    now.counts = summedUp<isTall>(0, now.part);
-    now.rest = below - before(now.part, 0);
+void ColumnParts::follow(int32_t first, int32_t end, int32_t below, uint8_t* to, uint16_t* rests) {
+    const ptrdiff_t across = ptrdiff_t{width_} * kPlaces;
+    uint8_t& hint = hints_[static_cast<size_t>(first / kBlock) % sizeof hints_];
+    from_ = first;
+    fresh_ = 0;
+    Window now{summedUp(first, hint), first, hint};
+    raise(now.sums, before(now.part, first) - below - 1);
     for (;;) {
         // In this part for as long as the median is.
-        const uint8_t *leaving = within(now.part, now.x), *const beneathLeaving = beneath(now.part),
-                      *const beneathEntering = beneathLeaving + width_;
-        const int base = kBins * now.part - kBins / 2;
-        PartSums counts = now.counts;
-        int32_t rest = now.rest, x = now.x;
+        const uint8_t *leaving = within(now.part, now.x),
+                      *entering = leaving + across, *const beneaths = beside<isTall>(now.part, end);
+        const int base = kValues * now.part - kBefore - 1;
+        PartSums sums = now.sums;
+        int32_t x = now.x;
 #pragma GCC unroll 4
-        for (; x <= last; ++x) {
-            const __m256i ranks = _mm256_set1_epi16(static_cast<int16_t>(rest + kBias<isTall>));
-            const __m256i low = _mm256_cmpgt_epi16(counts.low, ranks), high = _mm256_cmpgt_epi16(counts.high, ranks);
-            const auto bits = static_cast<unsigned>(_mm256_movemask_epi8(_mm256_packs_epi16(low, high)));
-            if (rest < 0 || bits == 0) break;
-            const int bin = __builtin_ctz(bits);
-            to[x] = static_cast<uint8_t>(base + bin);
+        for (; x < end; ++x) {
+            const unsigned place = placesBefore(sums);
+            if (place - 1 >= unsigned{kValues}) break;
+            to[x] = static_cast<uint8_t>(base + static_cast<int>(place));
             if constexpr (wantsRests) {
-                alignas(kVectorBytes) uint16_t stored[kBins + 1];
-                stored[0] = static_cast<uint16_t>(kBias<isTall>);
-                storeInOrder(stored + 1, counts);
-                rests[x] = static_cast<uint16_t>(rest + kBias<isTall> - stored[bin]);
+                alignas(kVectorBytes) uint16_t stored[2][kPlaces / 2];
+                store(stored[0], Vec<uint16_t>{sums.even});
+                store(stored[1], Vec<uint16_t>{sums.odd});
+                rests[x] = static_cast<uint16_t>(~stored[(place - 1) % 2][(place - 1) / 2]);
             }
-            rest += beneathLeaving[x] - beneathEntering[x];
-            move<isTall>(counts, leaving, leaving + across);
-            leaving += kApart;
+            move<isTall>(sums, leaving, entering, beneaths + x, width_);
+            leaving += kPlaces;
+            entering += kPlaces;
         }
-        if (x > last) return;
-        now = {counts, x, now.part, rest};
-        leave<isTall>(now, left, below);
-        if (x == 0) first_ = now.part;
+        if (x == end) return;
+        now.sums = sums;
+        now.x = x;
+        leave(now, below);
+        if (x == first) hint = static_cast<uint8_t>(now.part);
     }
 }
 
-void ColumnParts::medians(int32_t below, uint8_t* to, uint16_t* rests) const {
+void ColumnParts::medians(int32_t first, int32_t end, int32_t below, uint8_t* to, uint16_t* rests) {
     constexpr int32_t kMostSigned = 127;
-    if (height_ > kMostSigned || width_ * height_ > INT16_MAX)
-        rests == nullptr ? follow<true, false>(below, to, rests) : follow<true, true>(below, to, rests);
+    if (height_ > kMostSigned)
+        rests == nullptr ? follow<true, false>(first, end, below, to, rests)
+                         : follow<true, true>(first, end, below, to, rests);
     else
-        rests == nullptr ? follow<false, false>(below, to, rests) : follow<false, true>(below, to, rests);
+        rests == nullptr ? follow<false, false>(first, end, below, to, rests)
+                         : follow<false, true>(first, end, below, to, rests);
 }
 
 }  // namespace qori::kernels

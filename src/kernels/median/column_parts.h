@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 // Medians of bytes by histograms of columns, at a cost that hardly grows with the window (Perreault and Hebert: Median
-// filtering in constant time, 2007). Values fall into nine parts: part k begins at 32 k - 16, so that the middle of the
-// range is not the edge of one. Of what the windows of a row see of each column are counted the elements below each
-// part, and within each part those up to each of its values. The former lie by rows of columns and are compared as
-// vectors, the latter by columns. A window is followed from pixel to pixel by the counts within the part that its
-// median is in, as words, and by how many elements come before the part; where the median leaves it, the counts within
-// another one are summed up anew. A part is left about once in thirty pixels of photographs.
+// filtering in constant time, 2007). Values fall into nine parts of 31: part k begins at 31 k - 12, so that the middle
+// of the range is not the edge of one. Of what the windows of a row see of each column are counted the elements below
+// each part, and within each part those up to each of its values. The former lie by rows of columns and are compared as
+// vectors, the latter by parts and columns. A window is followed from pixel to pixel by the counts up to the values of
+// the part that its median is in, as words; where the median leaves it, the counts of another part are summed up anew.
+// A part is left about once in thirty pixels of photographs.
 #pragma once
 #include "byte_rows.h"
 #include "image/image.h"
@@ -13,71 +13,80 @@
 
 namespace qori::kernels {
 
-/// Counts within a part, of a window: bins 0 to 7 and 16 to 23 are in low, the others in high.
+/// Of a window, for the places of a part: how many elements are up to a place's value, less those that come before the
+/// median, less one, so that places before the median are negative. The first place is what is below the part. Places
+/// with even numbers, and with odd ones.
 struct PartSums {
-    __m256i low, high;
+    __m256i even, odd;
 };
 
 class ColumnParts {
 public:
     using Rest = uint16_t;
+    /// Ranges of columns begin at multiples of it.
+    static constexpr int32_t kBlock = kVectorBytes;
 
     /// Counts of a column are bytes, those of a window words.
     static bool suffice(int64_t width, int64_t height) { return height <= 255 && width * height <= UINT16_MAX; }
-    static int64_t bytes(int32_t columns) { return paddedOf(columns) * (kApart + kParts + 2 * kEntryBytes); }
+    static int64_t bytes(int32_t columns) { return paddedOf(columns) * (kParts * (kPlaces + 2) + 4); }
 
     /// Memory of bytes(columns), on a 32-byte boundary.
     explicit ColumnParts(uint8_t* memory) : memory_(memory) {}
 
-    /// The windows of row y of so many columns come into sight.
-    void begin(const ByteRows& rows, int32_t y, int32_t columns, QorImageSize window);
-    /// The lowest row, and the one that went out of sight.
-    void advance(const uint8_t* entering, const uint8_t* leaving, ptrdiff_t apart);
-    /// Medians of the row's windows: bytes with at most `below` elements before them, and, unless rests is null, how
-    /// many of the elements equal to it come before the median.
-    void medians(int32_t below, uint8_t* to, uint16_t* rests) const;
+    /// Of so many columns, none of them counted yet.
+    void begin(const ByteRows& rows, int32_t columns, QorImageSize window);
+    /// Counts what the windows of row y see of the columns.
+    void build(int32_t y, int32_t from, int32_t to);
+    /// The windows of row y come into sight, those of the row above go, of columns that are counted.
+    void advance(int32_t y, int32_t from, int32_t to);
+    /// Medians of the row's windows first to end - 1: bytes with at most `below` elements before them, and, unless
+    /// rests is null, how many of the elements equal to it come before the median.
+    void medians(int32_t first, int32_t end, int32_t below, uint8_t* to, uint16_t* rests);
 
 private:
-    static constexpr int kParts = 9, kBins = 32, kApart = kParts * kBins, kEntryBytes = 1 + 2 * int{sizeof(uint16_t)};
+    static constexpr int kParts = 9, kPlaces = 32, kValues = kPlaces - 1, kBefore = 12;
 
-    /// The counts within a part, of the window at x, and the median's place among them.
+    /// The counts of the window at x within a part.
     struct Window {
-        PartSums counts;
+        PartSums sums;
         int32_t x;
         int part;
-        int32_t rest;
     };
-    /// A row's elements: 16 times the part, where its counts begin within a column's, and the bytes of kSteps before
-    /// what an element adds to them.
+    /// A row's elements: their parts, and the places within, those whose counts do not change.
     struct Entries {
-        uint8_t* part;
-        uint16_t *counts, *steps;
+        uint8_t *part, *place;
+    };
+    struct Entry {
+        __m256i part, place;
     };
 
     /// Whole vectors, which may begin at any column.
     static int64_t paddedOf(int32_t columns) { return (int64_t{columns} + 31) / 32 * 32 + 32; }
+    static Entry split(__m256i values);
 
-    const uint8_t* within(int part, int32_t x) const { return within_ + ptrdiff_t{x} * kApart + part * kBins; }
+    const uint8_t* within(int part, int32_t x) const { return within_ + part * plane_ + ptrdiff_t{x} * kPlaces; }
     uint8_t* beneath(int part) const { return beneath_ + part * padded_; }
-    void split(const uint8_t* row, ptrdiff_t apart, Entries to) const;
-    void enter(const uint8_t* row, ptrdiff_t apart);
+    const uint8_t* elements(int32_t y, int32_t from, int32_t to, uint8_t* gathered) const;
+    static Bytes some(const uint8_t* elements, ptrdiff_t x, ptrdiff_t end);
+    void enter(int32_t y, int32_t from, int32_t to);
+    template <bool isTall>
+    const uint8_t* beside(int part, int32_t end);
     template <bool isTall, bool wantsRests>
-    void follow(int32_t below, uint8_t* to, uint16_t* rests) const;
+    void follow(int32_t first, int32_t end, int32_t below, uint8_t* to, uint16_t* rests);
     int32_t before(int part, int32_t x) const;
     int partOf(int32_t x, int32_t below) const;
-    template <bool isTall>
     QORI_INLINE PartSums summedUp(int32_t x, int part) const;
-    template <bool isTall>
-    QORI_INLINE PartSums countsOf(const Window& left, int32_t x, int part) const;
-    template <bool isTall>
-    QORI_NOINLINE void leave(Window& now, Window& left, int32_t below) const;
+    QORI_NOINLINE void leave(Window& now, int32_t below) const;
 
     uint8_t* memory_;
-    uint8_t *within_ = nullptr, *beneath_ = nullptr;
+    uint8_t *within_ = nullptr, *beneath_ = nullptr, *differences_ = nullptr;
     Entries in_{}, out_{};
+    ByteRows rows_{};
     int32_t columns_ = 0, width_ = 0, height_ = 0;
-    ptrdiff_t padded_ = 0, step_ = 0;
-    mutable int first_ = kParts / 2;  ///< The part that the first median of the row before was in, or any.
+    ptrdiff_t padded_ = 0, plane_ = 0;
+    int32_t from_ = 0;        ///< Differences are those of windows from here on ...
+    unsigned fresh_ = 0;      ///< ... of these parts.
+    uint8_t hints_[16] = {};  ///< The parts that the first medians of the row before were in, or any.
 };
 
 }  // namespace qori::kernels

@@ -36,35 +36,48 @@ public:
     /// Memory of kColumnBytes for each column, on a 32-byte boundary.
     explicit ColumnHistograms(uint8_t* memory) : memory_(memory) {}
 
-    /// The windows of row y of so many columns come into sight.
-    void begin(const ByteRows& rows, int32_t y, int32_t columns, QorImageSize window) {
+    /// Of so many columns, none of them counted yet.
+    void begin(const ByteRows& rows, int32_t columns, QorImageSize window) {
         coarse_ = reinterpret_cast<uint32_t*>(memory_);
         fine_ = coarse_ + ptrdiff_t{columns} * kBins;
-        columns_ = columns;
-        width_ = window.width;
-        __builtin_memset(memory_, 0, static_cast<size_t>(columns) * kColumnBytes);
-        for (int32_t k = 0; k < window.height; ++k) enter(rows.row(ptrdiff_t{y} + k), rows.apart);
+        rows_ = rows;
+        window_ = window;
     }
-    /// The lowest row, and the one that went out of sight.
-    void advance(const uint8_t* entering, const uint8_t* leaving, ptrdiff_t apart) {
-        for (int32_t x = 0; x < columns_; ++x) {
-            countAt(x, entering[x * apart], true);
-            countAt(x, leaving[x * apart], false);
+    /// Counts what the windows of row y see of the columns.
+    void build(int32_t y, int32_t from, int32_t to) {
+        const auto clear = [=](uint32_t* counts, int bins) {
+            __builtin_memset(counts + ptrdiff_t{from} * bins, 0,
+                             sizeof(uint32_t) * static_cast<size_t>((to - from) * ptrdiff_t{bins}));
+        };
+        clear(coarse_, kBins);
+        clear(fine_, kBins * kBins);
+        for (int32_t k = 0; k < window_.height; ++k) {
+            const uint8_t* const row = rows_.row(ptrdiff_t{y} + k);
+            for (int32_t x = from; x < to; ++x) countAt(x, row[x * rows_.apart], true);
         }
     }
-    /// Medians of the row's windows: bytes with at most `below` elements before them, and, unless rests is null, how
-    /// many of the elements equal to it come before the median.
-    void medians(int32_t below, uint8_t* to, uint32_t* rests) const {
+    /// The windows of row y come into sight, those of the row above go, of columns that are counted.
+    void advance(int32_t y, int32_t from, int32_t to) {
+        const uint8_t *const entering = rows_.row(ptrdiff_t{y} + window_.height - 1), *const leaving = rows_.row(y - 1);
+        for (int32_t x = from; x < to; ++x) {
+            countAt(x, entering[x * rows_.apart], true);
+            countAt(x, leaving[x * rows_.apart], false);
+        }
+    }
+    /// Medians of the row's windows first to end - 1: bytes with at most `below` elements before them, and, unless
+    /// rests is null, how many of the elements equal to it come before the median.
+    void medians(int32_t first, int32_t end, int32_t below, uint8_t* to, uint32_t* rests) const {
+        const int32_t width = window_.width;
         const auto rank = static_cast<uint32_t>(below);
         Bins coarse{}, fine[kBins], current{};
         int32_t seen[kBins];  // the window for which fine counts were last right
-        for (int32_t& x : seen) x = -width_;
-        for (int32_t x = 0; x < width_; ++x) coarse.add(coarse_ + ptrdiff_t{x} * kBins);
-        for (int32_t x = 0, last = -1;; ++x) {
+        for (int32_t& x : seen) x = first - width;
+        for (int32_t x = first; x < first + width; ++x) coarse.add(coarse_ + ptrdiff_t{x} * kBins);
+        for (int32_t x = first, last = -1;; ++x) {
             uint32_t before, rest;
             const int high = coarse.find(rank, &before);
             if (high == last) {
-                current.add(fineAt(x + width_ - 1, high));
+                current.add(fineAt(x + width - 1, high));
                 current.subtract(fineAt(x - 1, high));
             } else {
                 if (last >= 0) fine[last] = current, seen[last] = x - 1;
@@ -74,8 +87,8 @@ public:
             const int low = current.find(rank - before, &rest);
             to[x] = static_cast<uint8_t>(kBins * high + low);
             if (rests != nullptr) rests[x] = rank - before - rest;
-            if (x + width_ >= columns_) return;
-            coarse.add(coarse_ + ptrdiff_t{x + width_} * kBins);
+            if (x + 1 == end) return;
+            coarse.add(coarse_ + ptrdiff_t{x + width} * kBins);
             coarse.subtract(coarse_ + ptrdiff_t{x} * kBins);
         }
     }
@@ -100,9 +113,6 @@ private:
         }
     };
 
-    void enter(const uint8_t* row, ptrdiff_t apart) {
-        for (int32_t x = 0; x < columns_; ++x) countAt(x, row[x * apart], true);
-    }
     uint32_t* fineAt(int32_t x, int high) const { return fine_ + (ptrdiff_t{x} * kBins + high) * kBins; }
     static void count(uint32_t* p, const int8_t* steps, bool enters) {
         for (int i = 0; i < kBins; ++i) p[i] += static_cast<uint32_t>(enters ? steps[i] : -steps[i]);
@@ -114,13 +124,13 @@ private:
     /// Fine counts of the window at `from` brought to that at `to`, or made anew where that is less work.
     QORI_INLINE Bins broughtTo(int32_t to, const Bins& fine, int high, int32_t from) const {
         Bins now;
-        if (2 * (to - from) > width_) {
+        if (2 * (to - from) > window_.width) {
             now = {};
-            for (int32_t x = to; x < to + width_; ++x) now.add(fineAt(x, high));
+            for (int32_t x = to; x < to + window_.width; ++x) now.add(fineAt(x, high));
         } else {
             now = fine;
             for (int32_t x = from; x < to; ++x) {
-                now.add(fineAt(x + width_, high));
+                now.add(fineAt(x + window_.width, high));
                 now.subtract(fineAt(x, high));
             }
         }
@@ -129,7 +139,8 @@ private:
 
     uint8_t* memory_;
     uint32_t *coarse_ = nullptr, *fine_ = nullptr;
-    int32_t columns_ = 0, width_ = 0;
+    ByteRows rows_{};
+    QorImageSize window_{};
 };
 
 }  // namespace qori::kernels
