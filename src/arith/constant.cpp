@@ -2,6 +2,7 @@
 // An image and constants, one per processed channel.
 #include "images.h"
 #include "kernels/arith/divide.h"
+#include "kernels/copy/stream_rows.h"
 #include "kernels/copy_rows.h"
 
 namespace qori::arith {
@@ -56,12 +57,14 @@ void copyImage(Image<const T> src, Image<T> dst, QorImageSize roi) {
         runUnary<layout>([](int, auto block) { return block; }, src, dst, roi);
     } else {
         constexpr int pixel = pixelSize<T, layout>;
-        const bool streaming = streams(streamRules::copy, traffic(roi, 2 * pixel));
-        const auto copy = streaming ? kernels::copyRowStreaming : kernels::copyRow;
+        if (streams(streamRules::copy, traffic(roi, 2 * pixel))) {
+            kernels::copyRowsStreaming(asBytes(dst.data), dst.step, asBytes(src.data), src.step,
+                                       ptrdiff_t{roi.width} * pixel, roi.height);
+            return streamFence();
+        }
         forEachRow(
-            roi, [&](ptrdiff_t pixels, const T* s, T* d) { copy(asBytes(d), asBytes(s), pixels * pixel); },
+            roi, [&](ptrdiff_t pixels, const T* s, T* d) { kernels::copyRow(asBytes(d), asBytes(s), pixels * pixel); },
             walk(src, channels(layout)), walk(dst, channels(layout)));
-        if (streaming) streamFence();
     }
 }
 

@@ -22,7 +22,10 @@ QorResult runRoots(Op op, Image<const T> src, Image<T> dst, QorImageSize roi) {
     const int64_t elements = int64_t{roi.width} * n;
     if (elements >= lanes || 4 * elements <= 3 * lanes) return runUnary<layout>(op, src, dst, roi);
     forEachRow(
-        roi, [&](ptrdiff_t pixels, T* d, const T* s) { mapRow<keepsAlpha<layout>, Op>(&op, pixels * n, false, d, s); },
+        roi,
+        [&](ptrdiff_t pixels, T* d, const T* s) {
+            mapRow<keepsAlpha<layout>, Op>(&op, pixels * n, RowStores::cached, d, s);
+        },
         walk(dst, n), walk(src, n));
     return QOR_OK;
 }

@@ -59,12 +59,12 @@ using RowsOf = Rows<pixelSize<T, layout>, layout == Layout::AC4>;
 /// Calls body(first row, rows) for the rows of the source, one by one or as many at a time as stream together: what
 /// lies beside them is written while the ends of the rows are in the cache.
 template <class Body>
-QORI_INLINE void forGroups(const Frame& frame, RowWay way, Body body) {
+QORI_INLINE void forGroups(const Frame& frame, RowWay way, int32_t dstStep, Body body) {
     if (way != RowWay::streams) {
         for (int32_t y = 0; y < frame.src.height; ++y) body(y, 1);
         return;
     }
-    constexpr int32_t most = kernels::kStreamedTogether;
+    const int32_t most = kernels::kStreamedTogether * kernels::streamedApart(dstStep);
     for (int64_t y = 0; y < frame.src.height; y += most)
         body(static_cast<int32_t>(y), static_cast<int32_t>(std::min(int64_t{most}, frame.src.height - y)));
 }
@@ -81,7 +81,7 @@ void frameByConstant(const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t 
     };
     fillRows(0, frame.top);
     forGroups(
-        frame, way, [&](int32_t y, int32_t rows) __attribute__((always_inline)) {
+        frame, way, dstStep, [&](int32_t y, int32_t rows) __attribute__((always_inline)) {
             uint8_t* const inside = dst + ptrdiff_t{frame.top + y} * dstStep + leftBytes;
             R::move(inside, dstStep, src + ptrdiff_t{y} * srcStep, srcStep, {frame.src.width, rows}, way);
             for (int32_t k = 0; k < rows; ++k) {
@@ -117,7 +117,7 @@ void frameByNearest(const uint8_t* src, int32_t srcStep, uint8_t* dst, int32_t d
     const RowWay way = R::wayOf(frame);
     uint8_t* const first = dst + ptrdiff_t{frame.top} * dstStep;
     forGroups(
-        frame, way, [&](int32_t y, int32_t rows) __attribute__((always_inline)) {
+        frame, way, dstStep, [&](int32_t y, int32_t rows) __attribute__((always_inline)) {
             uint8_t* const inside = first + ptrdiff_t{y} * dstStep + ptrdiff_t{frame.left} * R::pixelBytes;
             const uint8_t* const from = src + ptrdiff_t{y} * srcStep;
             R::move(inside, dstStep, from, srcStep, {frame.src.width, rows}, way);

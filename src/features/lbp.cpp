@@ -151,7 +151,7 @@ QorResult lbp(Image<const T> src, Image<D> dst, QorImageSize roi, int32_t border
     const bool mayStream = step % kVectorBytes == 0 && first % alignment == 0;
     return underControlOf<T>([&] {
         const bool streaming =
-            mayStream && streams(streamRules::copy, wholeTraffic(roi, elementBytes<T> + elementBytes<D>));
+            mayStream && streams(streamRules::patterns, wholeTraffic(roi, elementBytes<T> + elementBytes<D>));
         make(image, dst, streaming);
         if (streaming) streamFence();
         return QOR_OK;

@@ -21,6 +21,7 @@ bool streams(StreamRule rule, int32_t trafficBytes) {
         case StreamRule::Limit::aboveCache: return trafficBytes > cache;
         case StreamRule::Limit::halfCache: return trafficBytes >= cache / 2;
         case StreamRule::Limit::aboveHalfCache: return trafficBytes > cache / 2;
+        case StreamRule::Limit::quarterCache: return trafficBytes >= cache / 4;
     }
     return false;
 }

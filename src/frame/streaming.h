@@ -7,7 +7,7 @@
 namespace qori {
 
 struct StreamRule {
-    enum class Limit { cache, aboveCache, halfCache, aboveHalfCache };
+    enum class Limit { cache, aboveCache, halfCache, aboveHalfCache, quarterCache };
     int32_t queryAbove;  ///< Bytes of traffic up to which the cache size is not even asked for.
     Limit limit;         ///< What the traffic must reach (or exceed) to stream.
 };
@@ -25,8 +25,11 @@ inline constexpr StreamRule channelSplit{524'288, StreamRule::Limit::aboveCache}
 inline constexpr StreamRule workFill{2'097'152, StreamRule::Limit::aboveCache};
 /// Fills of 8- and 16-bit images.
 inline constexpr StreamRule constantFill{3'145'728, StreamRule::Limit::halfCache};
-/// Every other copy and the arithmetic: measured, streaming gains from half the cache on, as the images compete for it.
-inline constexpr StreamRule copy{1'048'576, StreamRule::Limit::halfCache};
+/// Every other copy and the arithmetic. Measured, streaming is faster from where the second-level cache ends, and from a
+/// quarter of the largest on even where the source has just been written and the destination is read next.
+inline constexpr StreamRule copy{1'048'576, StreamRule::Limit::quarterCache};
+/// Binary patterns, which are bound by arithmetic too: measured, nothing is gained below.
+inline constexpr StreamRule patterns{1'048'576, StreamRule::Limit::halfCache};
 }  // namespace streamRules
 
 /// Bytes that a call moves, in 32-bit arithmetic that wraps: a call too large to count does not stream.

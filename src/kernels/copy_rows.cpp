@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "copy_rows.h"
 
-#include "streamed_lines.h"
-
 namespace qori::kernels {
 namespace {
 
@@ -113,13 +111,16 @@ QORI_INLINE void fillShort(uint8_t* dst, const Pattern& pattern, ptrdiff_t phase
 
 void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) { copyAligned(dst, src, bytes); }
 
-void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes) {
+void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, RowStores stores) {
     const auto [head, lines] = StreamedLines::ofBytes(dst, bytes);
     if (lines == 0) return copyAligned(dst, src, bytes);
     copyShort(dst, src, head);
-    const ptrdiff_t end = head + lines;
+    const ptrdiff_t end = head + lines, ahead = fetchedAhead(stores);
     ptrdiff_t done = head;
-    for (; done <= end - 2 * kCacheLine; done += 2 * kCacheLine) copyVectors<true, 4>(dst + done, src + done);
+    for (; done <= end - 2 * kCacheLine; done += 2 * kCacheLine) {
+        fetchLines<2 * kCacheLine>(src + done, ahead);
+        copyVectors<true, 4>(dst + done, src + done);
+    }
     if (done < end) copyVectors<true, 2>(dst + done, src + done);
     copyShort(dst + end, src + end, bytes - end);
 }

@@ -3,13 +3,14 @@
 #pragma once
 #include "byte_tables.h"
 #include "simd.h"
+#include "streamed_lines.h"
 
 namespace qori::kernels {
 
 void copyRow(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
 
-/// Stores past the cache from the first 32-byte boundary of the destination on.
-void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes);
+/// Whole lines of the destination past the cache.
+void copyRowStreaming(uint8_t* dst, const uint8_t* src, ptrdiff_t bytes, RowStores stores = RowStores::streamed);
 
 /// Rows of 8 KiB and more by the processor's string move, which need not fetch a cache line that it overwrites whole:
 /// for images that do not stay in the second-level cache, on processors with fast strings.

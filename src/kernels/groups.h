@@ -123,9 +123,40 @@ QORI_NOINLINE ptrdiff_t streamSpans(const Kernel& kernel, std::array<uint8_t*, o
         advance(std::min(head - done, span));
     }
     const ptrdiff_t inLines = (pixels - head) / kCacheLine * kCacheLine;
-    for (ptrdiff_t done = 0; done < inLines; done += group) {
-        kernel.template run<2, true>(out, in);
-        advance(group);
+    // Behind the end of a row may lie what is not read.
+    const ptrdiff_t ahead = pixels * narrowest >= 2 * kFetchedAhead ? kFetchedAhead : 0;
+    const auto fetch = [&] {
+        [&]<size_t... r>(std::index_sequence<r...>) {
+            (fetchLines<group * Kernel::in[r].pixelBytes>(in[r], ahead), ...);
+        }
+        (std::make_index_sequence<ins>{});
+    };
+    if constexpr (outs > 1) {
+        // Lines of several planes that come in halves, one plane after the other, are often sent in halves.
+        static_assert(
+            std::ranges::all_of(Kernel::out, [](const Run& run) { return run.pixelBytes * group == kVectorBytes; }));
+        alignas(kCacheLine) uint8_t lines[outs][kCacheLine];
+        std::array<uint8_t*, outs> first, second;
+        for (size_t r = 0; r < outs; ++r) {
+            first[r] = lines[r];
+            second[r] = lines[r] + kVectorBytes;
+        }
+        for (ptrdiff_t done = 0; done < inLines; done += 2 * group) {
+            for (const auto& half : {first, second}) {
+                fetch();
+                kernel.template run<2, false>(half, in);
+                advanceRuns(in, Kernel::in, group);
+            }
+            for (size_t r = 0; r < outs; ++r)
+                for (ptrdiff_t at = 0; at < kCacheLine; at += kVectorBytes) stream(out[r] + at, load(lines[r] + at));
+            advanceRuns(out, Kernel::out, 2 * group);
+        }
+    } else {
+        for (ptrdiff_t done = 0; done < inLines; done += group) {
+            fetch();
+            kernel.template run<2, true>(out, in);
+            advance(group);
+        }
     }
     return head + inLines;
 }

@@ -101,11 +101,14 @@ constexpr bool runsFromCopy = requires {
 };
 
 /// Blocks three at a time; gives how many elements that made. Pointers come by value: through a reference, every
-/// store might change them, and they would be loaded again for each vector.
+/// store might change them, and they would be loaded again for each vector. Where the blocks stream, what lies `ahead`
+/// of them is fetched.
 template <bool keepAlpha, bool streams, int n, class Op, class D, class... S>
-QORI_INLINE ptrdiff_t mapTriples(Op& op, ptrdiff_t elements, D* dst, const S*... src) {
+QORI_INLINE ptrdiff_t mapTriples(Op& op, ptrdiff_t elements, [[maybe_unused]] ptrdiff_t ahead, D* dst,
+                                 const S*... src) {
     ptrdiff_t i = 0;
     for (; i <= elements - 3 * n; i += 3 * n) {
+        if constexpr (streams) (fetchLines<3 * n * sizeof(S)>(src + i, ahead), ...);
         for (int phase = 0; phase < 3; ++phase)
             storePack<keepAlpha, streams>(dst + i + phase * n, op(phase, loadPack<S, n>(src + i + phase * n)...));
     }
@@ -128,24 +131,25 @@ QORI_INLINE void mapTail(Op& op, int phase, ptrdiff_t rest, D* dst, const S*... 
 /// What an operation does with a row; the operation is known to the function alone, so that whatever calls it for many
 /// rows is compiled once for all operations.
 template <class D, class... S>
-using RowFunction = void (*)(void* op, ptrdiff_t elements, bool streaming, D* dst, const S*... src);
+using RowFunction = void (*)(void* op, ptrdiff_t elements, RowStores stores, D* dst, const S*... src);
 
 template <class Op, class D, class... S>
-QORI_NOINLINE void streamRow(void* operation, ptrdiff_t elements, D* dst, const S*... src);
+QORI_NOINLINE void streamRow(void* operation, ptrdiff_t elements, ptrdiff_t ahead, D* dst, const S*... src);
 
 }  // namespace detail
 
 /// dst[i] = op(src[i]...) for `elements` elements. keepAlpha leaves every fourth element of dst as it was; dst and the
-/// sources may be the same. Streaming wants dst on a vector's boundary and is ignored elsewhere, and with keepAlpha,
-/// which reads what it writes anyway.
+/// sources may be the same. What streams wants dst on a vector's boundary; elsewhere, and with keepAlpha, which reads
+/// what it writes anyway, everything goes through the cache.
 template <bool keepAlpha, class Op, class D, class... S>
-QORI_NOINLINE void mapRow(void* operation, ptrdiff_t elements, bool streaming, D* dst, const S*... src) {
+QORI_NOINLINE void mapRow(void* operation, ptrdiff_t elements, RowStores stores, D* dst, const S*... src) {
     constexpr int n = blockOf<D, S...>;
     // As the last call that a row makes, it costs rows that do not stream nothing.
     if constexpr (!keepAlpha && requires { Op::mayStream; })
-        if (streaming) return detail::streamRow<Op>(operation, elements, dst, src...);
+        if (stores != RowStores::cached)
+            return detail::streamRow<Op>(operation, elements, fetchedAhead(stores), dst, src...);
     std::conditional_t<detail::runsFromCopy<Op>, Op, Op&> op = *static_cast<Op*>(operation);
-    ptrdiff_t i = detail::mapTriples<keepAlpha, false, n>(op, elements, dst, src...);
+    ptrdiff_t i = detail::mapTriples<keepAlpha, false, n>(op, elements, 0, dst, src...);
     int phase = 0;
     for (; i <= elements - n; i += n, ++phase)
         detail::storePack<keepAlpha, false>(dst + i, op(phase, detail::loadPack<S, n>(src + i)...));
@@ -157,16 +161,17 @@ namespace detail {
 /// A row whose whole cache lines stream. Apart from mapRow, whose phases the compiler knows: short rows take up to 1.5
 /// times as long where it does not.
 template <class Op, class D, class... S>
-void streamRow(void* operation, ptrdiff_t elements, D* dst, const S*... src) {
+void streamRow(void* operation, ptrdiff_t elements, ptrdiff_t ahead, D* dst, const S*... src) {
     const auto [head, lines] = StreamedLines::ofGroups(dst, elements);
-    if (head > 0 || lines == 0) mapRow<false, Op>(operation, lines == 0 ? elements : head, false, dst, src...);
+    if (head > 0 || lines == 0)
+        mapRow<false, Op>(operation, lines == 0 ? elements : head, RowStores::cached, dst, src...);
     if (lines == 0) return;
     elements -= head;
     dst += head;
     (void(src += head), ...);
     constexpr int n = blockOf<D, S...>;
     std::conditional_t<runsFromCopy<Op>, Op, Op&> op = *static_cast<Op*>(operation);
-    ptrdiff_t i = mapTriples<false, true, n>(op, lines, dst, src...);
+    ptrdiff_t i = mapTriples<false, true, n>(op, lines, ahead, dst, src...);
     int phase = 0;
     for (; i <= elements - n; i += n, phase = phase == 2 ? 0 : phase + 1) {
         const auto result = op(phase, loadPack<S, n>(src + i)...);
@@ -208,7 +213,8 @@ QORI_NOINLINE bool mapGathered(RowFunction<D, S...> makeRow, void* op, int chann
         if constexpr (keepAlpha) gather(result, dst, y, count);
         [&]<size_t... i>(std::index_sequence<i...>) {
             (gather(sources[i], src, y, count), ...);
-            makeRow(op, ptrdiff_t{elements} * count, false, result, reinterpret_cast<const S*>(sources[i])...);
+            makeRow(op, ptrdiff_t{elements} * count, RowStores::cached, result,
+                    reinterpret_cast<const S*>(sources[i])...);
         }
         (std::index_sequence_for<S...>{});
         const int bytes = elements * elementBytes<D>;
@@ -217,20 +223,69 @@ QORI_NOINLINE bool mapGathered(RowFunction<D, S...> makeRow, void* op, int chann
     return true;
 }
 
+/// An image's rows, or those that a run is cut into.
+template <class T>
+struct Rows {
+    T* first;
+    ptrdiff_t step;
+
+    QORI_INLINE T* at(int32_t y, ptrdiff_t i) const { return advance(first, step * y) + i; }
+};
+
+/// Elements of a piece of a row that streams: whole lines and groups of three blocks.
+template <class D, class... S>
+constexpr ptrdiff_t streamedPiece = std::max<ptrdiff_t>(384 / elementBytes<D>, 3 * blockOf<D, S...>);
+
+/// Rows of the destination do not overlap.
+template <class D, class... S>
+QORI_NOINLINE void streamRows(RowFunction<D, S...> makeRow, void* op, ptrdiff_t elements, int32_t rows, Rows<D> dst,
+                              Rows<const S>... src) {
+    constexpr ptrdiff_t piece = streamedPiece<D, S...>, fewest = StreamedLines::fewestBytes / elementBytes<D>;
+    forStreamedPieces(
+        rows, streamedApart(dst.step), elements,
+        [=](int32_t y, ptrdiff_t begin) {
+            const ptrdiff_t left = elements - begin,
+                            count = StreamedLines::ofGroups(dst.at(y, begin), left).head + piece;
+            return left - count < fewest ? left : count;
+        },
+        [=](int32_t y, ptrdiff_t begin, ptrdiff_t count) {
+            makeRow(op, count, RowStores::fetching, dst.at(y, begin), src.at(y, begin)...);
+        });
+}
+
+/// A run as rows of whole pieces, and what is left of it.
+template <class D, class... S>
+void streamRun(RowFunction<D, S...> makeRow, void* op, ptrdiff_t elements, D* dst, const S*... src) {
+    constexpr ptrdiff_t piece = streamedPiece<D, S...>, row = kStreamedApart / elementBytes<D> / piece * piece;
+    const ptrdiff_t rows = elements / row, done = rows * row;
+    streamRows<D, S...>(makeRow, op, row, static_cast<int32_t>(rows), {dst, row * elementBytes<D>},
+                        {src, row * elementBytes<S>}...);
+    if (done < elements) makeRow(op, elements - done, RowStores::fetching, dst + done, (src + done)...);
+}
+
 template <bool keepAlpha, class D, class... S>
 QORI_NOINLINE void mapRows(RowFunction<D, S...> makeRow, void* op, QorImageSize roi, int channels, bool streaming,
                            const Image<D>& dst, const Image<const S>&... src) {
     constexpr int fewest = 4;  // rows that are worth gathering
-    if (int64_t{roi.width} * channels < blockOf<D, S...> && roi.height >= fewest) [[unlikely]] {
+    const ptrdiff_t elements = ptrdiff_t{roi.width} * channels, bytes = elements * elementBytes<D>;
+    if (elements < blockOf<D, S...> && roi.height >= fewest) [[unlikely]] {
         if (mapGathered<keepAlpha>(makeRow, op, channels, roi, dst, src...)) return;
     }
-    constexpr ptrdiff_t fewestToStream = StreamedLines::fewestBytes / elementBytes<D>;
-    const auto makeOne = [=](ptrdiff_t pixels, D* d, const S*... s) {
-        const ptrdiff_t elements = pixels * channels;
-        makeRow(op, elements, streaming && elements >= fewestToStream, d, s...);
-    };
-    forEachRow(roi, makeOne, walk(dst, channels), walk(src, channels)...);
-    if (streaming) streamFence();
+    const bool isRun = roi.height == 1 || isOneRun(roi, walk(dst, channels), walk(src, channels)...);
+    RowStores stores = RowStores::cached;
+    if (streaming && (isRun || (bytes >= StreamedLines::fewestBytes && std::abs(ptrdiff_t{dst.step}) >= bytes)))
+        stores = std::min({RowStores::fetching, storesOfRows(roi.height, src.step, elements * elementBytes<S>)...});
+    if (stores != RowStores::fetching) {
+        const auto makeOne = [=](ptrdiff_t pixels, D* d, const S*... s) {
+            makeRow(op, pixels * channels, stores, d, s...);
+        };
+        forEachRow(roi, makeOne, walk(dst, channels), walk(src, channels)...);
+    } else if (isRun) {
+        streamRun<D, S...>(makeRow, op, elements * roi.height, dst.data, src.data...);
+    } else {
+        streamRows<D, S...>(makeRow, op, elements, roi.height, {dst.data, dst.step}, {src.data, src.step}...);
+    }
+    if (stores != RowStores::cached) streamFence();
 }
 
 }  // namespace detail

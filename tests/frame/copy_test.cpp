@@ -150,14 +150,17 @@ void copyManaged(const char* name, Function function) {
 /// Images too large for the second-level cache, in rows about the length from which other moves are taken.
 constexpr int kLongRows[] = {8191, 8192, 8193, 12301};
 constexpr int kManyRows = 65;
+/// What streams in one piece, many at a time.
+constexpr int kPieceRow = 512, kManyPieces = 1100;
 
 TEST(Copy, LongRowsArriveWhateverTheirAlignment) {
     for (int32_t cache : {1, 1 << 28}) {  // past the cache, and through it
         qorTestSetCacheSize(cache);
-        for (int width : kLongRows) {
+        for (int width : {kLongRows[0], kLongRows[1], kLongRows[2], kLongRows[3], kPieceRow}) {
+            const int height = width == kPieceRow ? kManyPieces : kManyRows;
             for (int shift : {0, 1, 33}) {
-                const Shape from{.width = width, .height = kManyRows, .padding = 7, .shift = shift};
-                const Shape to{.width = width, .height = kManyRows, .padding = 64 - shift, .flipped = shift == 1};
+                const Shape from{.width = width, .height = height, .padding = 7, .shift = shift};
+                const Shape to{.width = width, .height = height, .padding = 64 - shift, .flipped = shift == 1};
                 SCOPED_TRACE(describe(from));
                 TestImage src(kSrcSlot, from, 1), dst(kDstSlot, to, 1);
                 src.fill<uint8_t>(1, [] { return random().value<uint8_t>(); });
@@ -246,7 +249,7 @@ TEST(Copy, WholeCacheLinesStream) {
 }
 
 TEST(Copy, OfRowsThatOverlapTheLastStays) {
-    constexpr int width = 300'000, rows = 3;
+    constexpr int width = 8'000, rows = 300;  // more than what lies between rows that stream together
     std::vector<uint8_t> src(width * rows);
     for (uint8_t& byte : src) byte = random().value<uint8_t>();
     for (int step : {0, 1'000}) {

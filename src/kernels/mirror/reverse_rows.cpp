@@ -5,7 +5,6 @@
 #include <array>
 
 #include "kernels/byte_tables.h"
-#include "kernels/copy/stream_rows.h"
 #include "kernels/streamed_lines.h"
 #include "pixels.h"
 
@@ -153,7 +152,7 @@ struct Reversal {
     using G = Group<pixelBytes>;
     /// The fewest groups that are whole cache lines, and several of them.
     static constexpr ptrdiff_t unit = G::even ? kCacheLine : 2 * G::bytes;
-    static constexpr ptrdiff_t piece = G::even ? kStreamedPiece : 3 * unit;
+    static constexpr ptrdiff_t piece = G::even ? 512 : 3 * unit;
     static_assert(unit % kCacheLine == 0 && piece % unit == 0);
 
     uint8_t* dst;
