@@ -25,8 +25,8 @@ inline constexpr StreamRule channelSplit{524'288, StreamRule::Limit::aboveCache}
 inline constexpr StreamRule workFill{2'097'152, StreamRule::Limit::aboveCache};
 /// Fills of 8- and 16-bit images.
 inline constexpr StreamRule constantFill{3'145'728, StreamRule::Limit::halfCache};
-/// Every other copy and the arithmetic. Measured, streaming is faster from where the second-level cache ends, and from a
-/// quarter of the largest on even where the source has just been written and the destination is read next.
+/// Every other copy and the arithmetic. Measured, streaming is faster from where the second-level cache ends, and from
+/// a quarter of the largest on even where the source has just been written and the destination is read next.
 inline constexpr StreamRule copy{1'048'576, StreamRule::Limit::quarterCache};
 /// Binary patterns, which are bound by arithmetic too: measured, nothing is gained below.
 inline constexpr StreamRule patterns{1'048'576, StreamRule::Limit::halfCache};
