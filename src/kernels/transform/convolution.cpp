@@ -231,7 +231,7 @@ public:
     MissingLags(const Convolution& c, const Order& order, float* work)
         : order_(order),
           block_(c.block),
-          count_(line::missingLags(order.points, c.inner.points)),
+          count_(static_cast<ptrdiff_t>(line::missingLags(order.points, c.inner.points))),
           factors_(c.spectrum + 2 * ptrdiff_t{c.inner.points}),
           ends_(work + c.inner.points * ptrdiff_t{kLineFloats}) {
         for (ptrdiff_t i = 0; i < count_; ++i) {
@@ -294,7 +294,7 @@ void convolve(const Convolution& c, const PaddedOrder<hasChirp>& order, float* w
 void convolvePart(const Convolution& c, float* work, ptrdiff_t at, float* first) {
     const FourierTable& padded = *c.inner.at<FourierTable>(c.inner.inner);
     const ptrdiff_t points = c.inner.convolvedPoints;
-    const ptrdiff_t apart = padded.points + 2 * line::missingLags(points, padded.points);
+    const ptrdiff_t apart = static_cast<ptrdiff_t>(padded.points + 2 * line::missingLags(points, padded.points));
     const float* const spectrum = c.inner.at<float>(c.inner.spectrumAt) + 2 * (at / points * apart);
     convolve(Convolution{padded, spectrum, work + at * kLineFloats}, PaddedOrder<false>{nullptr, points},
              work + c.inner.points * ptrdiff_t{kLineFloats}, first);
