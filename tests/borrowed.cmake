@@ -11,7 +11,8 @@ list(JOIN slow : slow)
 # Of where a block came from one call is kept: the tests' own vectors took most of the time of some, each with a stack of
 # thirty calls that are none, because their programs keep no frame pointers.
 set(sanitized "LD_PRELOAD=${sanitizer};LD_LIBRARY_PATH=${bin}:${PROJECT_BINARY_DIR}/bin"
-    "ASAN_OPTIONS=handle_segv=2:malloc_context_size=1" "UBSAN_OPTIONS=print_stacktrace=1")
+    "ASAN_OPTIONS=handle_segv=2:malloc_context_size=1" "UBSAN_OPTIONS=print_stacktrace=1"
+    QORI_SHAPES_APART=3)
 foreach(source IN LISTS sources)
     cmake_path(GET source STEM name)
     add_test(NAME ${name} COMMAND ${QORI_TEST_PROGRAMS}/${name} --gtest_brief=1)
