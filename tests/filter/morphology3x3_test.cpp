@@ -68,8 +68,7 @@ void sweepSquare(const char* name, Function function) {
                              .atBegin = true};
         qorTestSetCacheSize(1);
         const int queries = qorTestCacheQueries();
-        forShapes({shapes[0], shapes[1], withTail},
-                  [=](const Shape& s) { checkSquare<T, L, kind, largest>(s, function); });
+        for (const Shape& shape : {shapes[0], shapes[1], withTail}) checkSquare<T, L, kind, largest>(shape, function);
         EXPECT_EQ(L == Layout::AC4 ? 0 : 1, std::min(qorTestCacheQueries() - queries, 1));
         qorTestSetCacheSize(0);
     }

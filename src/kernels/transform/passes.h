@@ -69,7 +69,12 @@ constexpr int64_t missingLags(int64_t n, int64_t points) { return points >= 2 * 
 /// So many of the parts of a convolution's outer stage hold points of a block: half of them, or one more where lags are
 /// missing, which is so up to an eighth of the points.
 constexpr int filledParts(int radix) { return radix / 2 + 1; }
-constexpr bool mayLackLags(int64_t n, int64_t points) { return n <= points / 8 * filledParts(8); }
+/// Products grow with the square of the lags: beyond so many they cost more than any transform, and in the end more
+/// than costs can count.
+constexpr int64_t kMostMissing = 1 << 16;
+constexpr bool mayLackLags(int64_t n, int64_t points) {
+    return n <= points / 8 * filledParts(8) && missingLags(n, points) <= kMostMissing;
+}
 
 enum class Way { forth, back };
 
