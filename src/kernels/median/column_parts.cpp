@@ -1,27 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "column_parts.h"
 
+#include "lanes.h"
+
 namespace qori::kernels {
 namespace {
 
-struct Firsts {
-    uint8_t ones[2 * kVectorBytes];
-};
-constexpr Firsts firstsTable() {
-    Firsts firsts{};
-    for (int i = 0; i < kVectorBytes; ++i) firsts.ones[i] = 255;
-    return firsts;
-}
-constexpr Firsts kFirsts = firstsTable();
+using namespace lanes;
 
-QORI_INLINE __m256i block(const uint8_t* p) { return _mm256_load_si256(reinterpret_cast<const __m256i*>(p)); }
-QORI_INLINE void storeBlock(uint8_t* p, __m256i v) { _mm256_store_si256(reinterpret_cast<__m256i*>(p), v); }
-QORI_INLINE __m256i bytesOf(int v) { return _mm256_set1_epi8(static_cast<char>(v)); }
-QORI_INLINE __m256i wordsOf(int v) { return _mm256_set1_epi16(static_cast<short>(v)); }
-QORI_INLINE __m256i numbers() {
-    return _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20, 21, 22, 23, 24,
-                            25, 26, 27, 28, 29, 30, 31);
-}
 /// -1 in places beyond.
 QORI_INLINE __m256i beyond(const uint8_t* place, __m256i n) {
     return _mm256_cmpgt_epi8(n, _mm256_set1_epi8(static_cast<char>(*place)));
@@ -147,7 +133,7 @@ int32_t ColumnParts::before(int part, int32_t x) const {
     int32_t left = width_;
     for (; left > kVectorBytes; left -= kVectorBytes, p += kVectorBytes)
         sums = _mm256_add_epi64(sums, _mm256_sad_epu8(load(p).v, zeros));
-    const Bytes rest = load(p) & load(kFirsts.ones + kVectorBytes - left);
+    const Bytes rest = load(p) & Bytes{firsts(static_cast<int>(left))};
     sums = _mm256_add_epi64(sums, _mm256_sad_epu8(rest.v, zeros));
     const __m128i two = _mm_add_epi32(_mm256_castsi256_si128(sums), _mm256_extracti128_si256(sums, 1));
     return _mm_cvtsi128_si32(_mm_add_epi32(two, _mm_unpackhi_epi64(two, two)));

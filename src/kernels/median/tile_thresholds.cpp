@@ -4,8 +4,12 @@
 #include <algorithm>
 #include <utility>
 
+#include "lanes.h"
+
 namespace qori::kernels {
 namespace {
+
+using namespace lanes;
 
 /// Thresholds of a tile, on average: more than histograms are worth, and few enough to leave histograms for.
 constexpr int kMany = 24, kFew = 10;
@@ -14,21 +18,9 @@ constexpr int32_t kRowsToKeep = 16;
 /// Cycles that histograms take for the pixels of a tile.
 constexpr int32_t kHistogramsTake = 24 * kVectorBytes;
 
-QORI_INLINE __m256i block(const uint8_t* p) { return _mm256_load_si256(reinterpret_cast<const __m256i*>(p)); }
-QORI_INLINE void storeBlock(uint8_t* p, __m256i v) { _mm256_store_si256(reinterpret_cast<__m256i*>(p), v); }
-QORI_INLINE __m256i bytesOf(int v) { return _mm256_set1_epi8(static_cast<char>(v)); }
-QORI_INLINE __m256i wordsOf(int v) { return _mm256_set1_epi16(static_cast<int16_t>(v)); }
-
 /// What is below a threshold are bytes with a sign.
 QORI_INLINE __m256i ordered(__m256i bytes) { return _mm256_xor_si256(bytes, bytesOf(-128)); }
 QORI_INLINE __m256i orderedThreshold(int threshold) { return bytesOf(threshold - 128); }
-
-/// -1 in the first n bytes.
-QORI_INLINE __m256i firsts(int n) {
-    const __m256i numbers = _mm256_setr_epi8(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20,
-                                             21, 22, 23, 24, 25, 26, 27, 28, 29, 30, 31);
-    return _mm256_cmpgt_epi8(bytesOf(std::min(n, kVectorBytes)), numbers);
-}
 
 /// Every 128 bits are added the last element of those before.
 QORI_INLINE __m256i lastBefore(__m256i v, __m256i last) {
